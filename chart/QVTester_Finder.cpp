@@ -1,0 +1,265 @@
+// Finder marks of a chart: a row scan with run-length counts and three cross-checks, after the finder search of QR
+// codes (ISO/IEC 18004). It departs from the usual form, and every limit in use refers to it as it is:
+//   - the row step is 3 whatever the image size, then 2, and the run's first count after a find at a row's end;
+//   - no rows are jumped once two marks are known;
+//   - the diagonal check is always applied; vertical and horizontal checks differ in the size they allow;
+//   - the best three are chosen by module size alone, and the points come back as (row, column).
+
+#include <algorithm>
+#include <cfloat>
+#include <climits>
+#include <cmath>
+#include <cstdlib>
+#include <numeric>
+#include <optional>
+
+#include "qvtester/log.h"
+#include "qvtester/tester.h"
+
+namespace {
+
+constexpr int kFirstRow = 2;
+constexpr int kRowStep = 3;
+constexpr int kRowStepAfterFind = 2;
+constexpr int kNoLimit = INT_MAX - 1;
+
+int Total(const int* counts) { return std::accumulate(counts, counts + 5, 0); }
+
+// The last three runs of a failed match may be the first three of the next.
+void ShiftTwoRuns(int* counts) {
+  counts[0] = counts[2];
+  counts[1] = counts[3];
+  counts[2] = counts[4];
+  counts[3] = 1;
+  counts[4] = 0;
+}
+
+cv::Point RowColumn(const QVFinderPattern& mark) { return {mark.getY(), mark.getX()}; }
+
+float SumOfModuleSizes(const std::vector<QVFinderPattern>& candidates) {
+  float sum = 0;
+  for (const QVFinderPattern& candidate : candidates) sum += candidate.estimatedModuleSize;
+  return sum;
+}
+
+void SetAverage(std::vector<QVFinderPattern>& candidates, float average) {
+  for (QVFinderPattern& candidate : candidates) candidate.setAverage(average);
+}
+
+// A walk over the image, one pixel at a time.
+struct Walk {
+  const cv::Mat& image;
+  int i, j, di, dj;
+
+  bool Inside() const { return i >= 0 && i < image.rows && j >= 0 && j < image.cols; }
+
+  // Counts pixels of one kind while they last, the image lasts, and the count is at most `most`.
+  void Count(bool dark, int most, int& count) {
+    for (; Inside() && (image.ptr<uchar>(i)[j] == 0) == dark && count <= most; i += di, j += dj) ++count;
+  }
+};
+
+// Run lengths along a line through the core at (i, j): first against (di, dj), then along it. The first half may count
+// maxCount pixels and end at the border, the second stays below maxCount and ends before it, but for its last run.
+// Answers where counting ended, or nothing when a run is too long or leaves the image.
+std::optional<cv::Point> CountRuns(const cv::Mat& image, int i, int j, int di, int dj, int maxCount, int* counts) {
+  Walk back{image, i, j, -di, -dj};
+  back.Count(true, kNoLimit, counts[2]);
+  if (!back.Inside()) return std::nullopt;
+  back.Count(false, maxCount, counts[1]);
+  if (!back.Inside() || counts[1] > maxCount) return std::nullopt;
+  back.Count(true, maxCount, counts[0]);
+  if (counts[0] > maxCount) return std::nullopt;
+
+  Walk ahead{image, i + di, j + dj, di, dj};
+  ahead.Count(true, kNoLimit, counts[2]);
+  if (!ahead.Inside()) return std::nullopt;
+  ahead.Count(false, maxCount - 1, counts[3]);
+  if (!ahead.Inside() || counts[3] >= maxCount) return std::nullopt;
+  ahead.Count(true, maxCount - 1, counts[4]);
+  if (counts[4] >= maxCount) return std::nullopt;
+  return cv::Point(ahead.i, ahead.j);
+}
+
+}  // namespace
+
+std::vector<cv::Point> QVTester::GetFinderPoints(cv::Mat image) {
+  if (image.type() != CV_8UC1) CV_Error(cv::Error::StsUnsupportedFormat, "finder marks need one channel of 8 bits");
+  hasSkipped = false;
+  possibleCenters.clear();
+  if (image.rows < 3) return selectBestPatterns();
+
+  int iSkip = kRowStep;
+  bool done = false;
+  for (int i = kFirstRow; i < image.rows && !done; i += iSkip) {
+    const uchar* row = image.ptr<uchar>(i);
+    int counts[5] = {};
+    int s = 0;
+    for (int j = 0; j < image.cols; ++j) {
+      if (row[j] == 0) {
+        if (s % 2 == 1) ++s;
+        ++counts[s];
+      } else if (s != 4) {
+        if (s % 2 == 0) ++s;
+        ++counts[s];
+      } else if (foundPatternCross(counts) && handlePossibleCenter(image, counts, i, j)) {
+        iSkip = kRowStepAfterFind;
+        if (hasSkipped) {
+          done = haveMultiplyConfirmedCenters();
+        } else {
+          findRowSkip();  // called for hasSkipped; the skip itself is always 0
+        }
+        std::fill_n(counts, 5, 0);
+        s = 0;
+      } else {
+        ShiftTwoRuns(counts);
+        s = 3;
+      }
+    }
+    if (foundPatternCross(counts) && handlePossibleCenter(image, counts, i, image.cols)) {
+      iSkip = counts[0];
+      if (hasSkipped) done = haveMultiplyConfirmedCenters();
+    }
+  }
+  return selectBestPatterns();
+}
+
+bool QVTester::foundPatternCross(int* stateCount) {
+  if (std::any_of(stateCount, stateCount + 5, [](int count) { return count == 0; })) return false;
+  const int total = Total(stateCount);
+  if (total < 7) return false;
+  const float moduleSize = static_cast<float>(total) / 7.0f;
+  const float maxVariance = moduleSize * 0.5f;
+  const auto near = [&](int count, float modules) {
+    return std::fabs(modules * moduleSize - static_cast<float>(count)) < modules * maxVariance;
+  };
+  return near(stateCount[0], 1) && near(stateCount[1], 1) && near(stateCount[2], 3) && near(stateCount[3], 1) &&
+         near(stateCount[4], 1);
+}
+
+bool QVTester::handlePossibleCenter(cv::Mat image, int* stateCount, int i, int j) {
+  const int total = Total(stateCount);
+  float centerJ = centerFromEnd(stateCount, j);
+  const float centerI = crossCheckVertical(image, i, static_cast<int>(centerJ), stateCount[2], total);
+  if (centerI == FLT_MAX) return false;
+  centerJ = crossCheckHorizontal(image, static_cast<int>(centerJ), static_cast<int>(centerI), stateCount[2], total);
+  if (centerJ == FLT_MAX) return false;
+  if (!crossCheckDiagonal(image, static_cast<int>(centerI), static_cast<int>(centerJ), stateCount[2], total)) {
+    return false;
+  }
+
+  const float moduleSize = static_cast<float>(total) / 7.0f;
+  for (QVFinderPattern& candidate : possibleCenters) {
+    if (candidate.aboutEquals(moduleSize, centerI, centerJ)) {
+      candidate = candidate.combineEstimate(centerI, centerJ, moduleSize);
+      return true;
+    }
+  }
+  possibleCenters.emplace_back(centerJ, centerI, moduleSize, 1);
+  return true;
+}
+
+float QVTester::centerFromEnd(int* stateCount, int end) {
+  return static_cast<float>(end - stateCount[4] - stateCount[3]) - static_cast<float>(stateCount[2]) * 0.5f;
+}
+
+float QVTester::crossCheckVertical(cv::Mat image, int startI, int centerJ, int maxCount, int rowStateCountTotal) {
+  getCrossCheckStateCount();
+  const auto end = CountRuns(image, startI, centerJ, 1, 0, maxCount, crossCheckStateCount);
+  if (!end) return FLT_MAX;
+  // 40 % off the row's total is too much.
+  if (5 * std::abs(Total(crossCheckStateCount) - rowStateCountTotal) >= 2 * rowStateCountTotal) return FLT_MAX;
+  return foundPatternCross(crossCheckStateCount) ? centerFromEnd(crossCheckStateCount, end->x) : FLT_MAX;
+}
+
+float QVTester::crossCheckHorizontal(cv::Mat image, int startJ, int centerI, int maxCount, int rowStateCountTotal) {
+  getCrossCheckStateCount();
+  const auto end = CountRuns(image, centerI, startJ, 0, 1, maxCount, crossCheckStateCount);
+  if (!end) return FLT_MAX;
+  // 20 % off the row's total is too much: half of what the vertical check allows.
+  if (5 * std::abs(Total(crossCheckStateCount) - rowStateCountTotal) >= rowStateCountTotal) return FLT_MAX;
+  return foundPatternCross(crossCheckStateCount) ? centerFromEnd(crossCheckStateCount, end->y) : FLT_MAX;
+}
+
+bool QVTester::crossCheckDiagonal(cv::Mat image, int startI, int centerJ, int maxCount, int rowStateCountTotal) {
+  getCrossCheckStateCount();
+  return CountRuns(image, startI, centerJ, 1, 1, maxCount, crossCheckStateCount) &&
+         std::abs(Total(crossCheckStateCount) - rowStateCountTotal) < 2 * rowStateCountTotal &&
+         foundPatternCross(crossCheckStateCount);
+}
+
+int QVTester::findRowSkip() {
+  bool seen = false;
+  for (const QVFinderPattern& candidate : possibleCenters) {
+    if (candidate.count < 2) continue;
+    if (seen) {
+      hasSkipped = true;
+      // Both operands are the second confirmed candidate, so the scan never jumps rows.
+      const QVFinderPattern& first = candidate;
+      const QVFinderPattern& second = candidate;
+      return (std::abs(first.getX() - second.getX()) - std::abs(first.getY() - second.getY())) / 2;
+    }
+    seen = true;
+  }
+  return 0;
+}
+
+bool QVTester::haveMultiplyConfirmedCenters() {
+  int confirmedCount = 0;
+  float totalModuleSize = 0;
+  for (const QVFinderPattern& candidate : possibleCenters) {
+    if (candidate.count < 2) continue;
+    ++confirmedCount;
+    totalModuleSize += candidate.estimatedModuleSize;
+  }
+  if (confirmedCount < 3) return false;
+  // The sum over the confirmed ones is set against the number of all: unconfirmed candidates keep the scan going.
+  const float average = totalModuleSize / static_cast<float>(possibleCenters.size());
+  float totalDeviation = 0;
+  for (const QVFinderPattern& candidate : possibleCenters) {
+    totalDeviation += std::fabs(candidate.estimatedModuleSize - average);
+  }
+  return totalDeviation <= 0.05f * totalModuleSize;
+}
+
+std::vector<cv::Point> QVTester::selectBestPatterns() {
+  std::vector<cv::Point> points;
+  if (possibleCenters.size() < 3) {
+    QVDEBUGP("[OKAPI] startSize : %d", static_cast<int>(possibleCenters.size()));
+  }
+
+  if (possibleCenters.size() > 3) {
+    const auto n = static_cast<float>(possibleCenters.size());
+    float sumOfSquares = 0;
+    for (const QVFinderPattern& candidate : possibleCenters) {
+      sumOfSquares += candidate.estimatedModuleSize * candidate.estimatedModuleSize;
+    }
+    const float average = SumOfModuleSizes(possibleCenters) / n;
+    const float stdDev = std::sqrt(sumOfSquares / n - average * average);
+    const float limit = std::max(0.2f * average, stdDev);  // rounding may make stdDev NaN; then the first holds
+    SetAverage(possibleCenters, average);
+    std::sort(possibleCenters.begin(), possibleCenters.end(), QVFinderPattern::compareAvg);
+    for (std::size_t i = 0; i < possibleCenters.size() && possibleCenters.size() > 3;) {
+      if (std::fabs(possibleCenters[i].estimatedModuleSize - average) > limit) {
+        possibleCenters.erase(possibleCenters.begin() + static_cast<std::ptrdiff_t>(i));
+      } else {
+        ++i;
+      }
+    }
+  }
+
+  if (possibleCenters.size() > 3) {
+    SetAverage(possibleCenters, SumOfModuleSizes(possibleCenters) / static_cast<float>(possibleCenters.size()));
+    std::sort(possibleCenters.begin(), possibleCenters.end(), QVFinderPattern::compareAvgAndCount);
+    // The index moves on after each removal, so every other one of the tail stays. Only the first three are used.
+    for (std::size_t i = 3; i < possibleCenters.size(); ++i) {
+      possibleCenters.erase(possibleCenters.begin() + static_cast<std::ptrdiff_t>(i));
+    }
+  }
+
+  const std::size_t emitted = std::min<std::size_t>(possibleCenters.size(), 3);
+  for (std::size_t i = 0; i < emitted; ++i) points.push_back(RowColumn(possibleCenters[i]));
+  return points;
+}
+
+void QVTester::getCrossCheckStateCount() { std::fill_n(crossCheckStateCount, 5, 0); }

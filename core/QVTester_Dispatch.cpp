@@ -1,0 +1,119 @@
+// The single door to every test, and the result block that the tests fill.
+
+#include "core/test_table.h"
+#include "qvtester/log.h"
+#include "qvtester/tester.h"
+
+namespace {
+
+const QVTest* FindTest(int index) {
+  return index >= 0 && index < static_cast<int>(std::size(kTests)) ? &kTests[index] : nullptr;
+}
+
+template <typename T>
+void FreeArray(T*& array) {
+  delete[] array;
+  array = nullptr;
+}
+
+// Takes the new array over; giving a record the array it already holds is no reason to free it.
+template <typename T>
+void ReplaceArray(T*& array, T* fresh) {
+  if (array != fresh) delete[] array;
+  array = fresh;
+}
+
+void Free(QVPhase1Result& r) {
+  FreeArray(r.image_);
+  FreeArray(r.raw_data_);
+  FreeArray(r.error_points_);
+  r.image_width_ = r.image_height_ = r.raw_width_ = r.raw_height_ = r.error_point_count_ = 0;
+}
+
+void Free(QVPreviewResult& r) {
+  FreeArray(r.preview_diff_map_);
+  r.preview_diff_cols_ = r.preview_diff_rows_ = 0;
+}
+
+void Free(QVCaptureResult& r) {
+  FreeArray(r.capture_lab_);
+  FreeArray(r.capture_delta_e_);
+  r.capture_lab_count_ = r.capture_delta_e_count_ = 0;
+}
+
+}  // namespace
+
+int QVTester::RunTest(QV_TEST_INDEX test, bool fake_mode) {
+  if (const int code = ValidateTest(test); code != QV_SUCCESS) {
+    QVDEBUGP("[OKAPI] Error : Invalid parameter or insufficient image");
+    return code;
+  }
+  QVDEBUGP("[OKAPI] %s, testindex: %d, fake_mode: %d, step: %d", "RunTest", test, fake_mode ? 1 : 0, step_);
+  const QVTest& row = *FindTest(test);
+  return row.routine == nullptr ? QV_ERROR_INVALID_ARGUMENT : row.routine(*this, fake_mode);
+}
+
+int QVTester::ValidateTest(QV_TEST_INDEX test) {
+  const QVTest* row = FindTest(test);
+  if (row == nullptr || row->needs == Of()) return QV_ERROR_INVALID_ARGUMENT;
+  for (const int slot : row->needs) {
+    if (slot != kNoSlot && resources_[slot] == nullptr) return QV_ERROR_SLOT_EMPTY;
+  }
+  return QV_SUCCESS;
+}
+
+int QVTester::GetResult(QVResultData** out) {
+  *out = results_.get();
+  return QV_SUCCESS;
+}
+
+int QVTester::ReleaseTestResult(QV_TEST_INDEX test) {
+  if (FindTest(test) == nullptr) return QV_ERROR_INVALID_ARGUMENT;
+  if (results_ == nullptr) return QV_SUCCESS;
+  QVResultData& results = *results_;
+  if (test <= QV_TEST_PHASE1_12) Free(results.phase1_[test]);
+  switch (test) {
+    case QV_TEST_CAMERA_PREVIEW: Free(results.preview_main_); break;
+    case QV_TEST_CAMERA_PREVIEW_2: Free(results.preview_front_); break;
+    case QV_TEST_CAMERA_AUTOFOCUS:
+      FreeArray(results.af_sfr_first_);
+      FreeArray(results.af_sfr_second_);
+      FreeArray(results.af_sfr_third_);
+      results.af_sfr_count_ = 0;
+      break;
+    case QV_TEST_CAMERA_CAPTURE: Free(results.capture_main_); break;
+    case QV_TEST_CAMERA_CAPTURE_2: Free(results.capture_front_); break;
+    case QV_TEST_LENS_DUST: FreeArray(results.dust_hist_main_); break;
+    case QV_TEST_LENS_DUST_2: FreeArray(results.dust_hist_front_); break;
+    default: break;  // the others leave no arrays
+  }
+  return QV_SUCCESS;
+}
+
+int QVTester::ReleaseDataForTest(QV_TEST_INDEX test) {
+  const QVTest* row = FindTest(test);
+  if (row == nullptr || row->releases == Of()) return QV_ERROR_INVALID_ARGUMENT;
+  for (const int slot : row->releases) {
+    if (slot != kNoSlot) ReleaseImage(static_cast<QV_RESOURCE_INDEX>(slot));
+  }
+  return ReleaseTestResult(test);
+}
+
+void QVTester::SetResult(QVPhase1Result* r, int code) { r->result_ = code; }
+
+void QVTester::SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image) {
+  r->image_width_ = width;
+  r->image_height_ = height;
+  ReplaceArray(r->image_, image);
+}
+
+void QVTester::SetResultRawData(QVPhase1Result* r, int width, int height, float* data) {
+  r->raw_width_ = width;
+  r->raw_height_ = height;
+  ReplaceArray(r->raw_data_, data);
+}
+
+void QVTester::SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count) {
+  r->error_point_count_ = count;
+  ReplaceArray(r->error_points_, points);
+}

@@ -1,0 +1,245 @@
+#ifndef QVTESTER_TESTER_H_
+#define QVTESTER_TESTER_H_
+
+#include <array>
+#include <cstdint>
+#include <memory>
+#include <opencv2/core.hpp>
+#include <vector>
+
+#include "qvtester/finder_pattern.h"
+#include "qvtester/indices.h"
+#include "qvtester/resource.h"
+#include "qvtester/results.h"
+
+/// One record of the region lists (properties 76 and 78).
+struct QVRegionRecord {
+  std::int32_t fields[5];
+};
+
+/// The tester: properties, input slots, result block, and every test and measuring step as a member.
+///
+/// Members answer a QV_RESULT_CODE unless they say otherwise, and may throw cv::Exception; the exported functions of
+/// api.h turn that into codes. Pointers must be valid here; the exported functions check them.
+/// Finder points hold the ROW in x and the COLUMN in y, throughout.
+class QV_API QVTester {
+ public:
+  QVTester();
+  ~QVTester();
+  QVTester(const QVTester&) = delete;
+  QVTester& operator=(const QVTester&) = delete;
+
+  // ---- Life cycle, properties -----------------------------------------------------------------------------------
+
+  /// Releases everything held and starts with empty slots and a zeroed result block; properties stay. Answers 1.
+  int Initialize();
+  /// Frees all slots and results; properties stay. Answers 1.
+  int Release();
+
+  /// Copies a property's value in; no range check. -97 for an unknown index or a list with a negative count.
+  int SetProperty(QV_PROPERTY_INDEX index, void* value);
+  /// Copies a property's value out. -97 for an unknown index or a table that was never set; *out is then untouched.
+  int GetProperty(QV_PROPERTY_INDEX index, void* out);
+
+  /// Logs and stores the step number. Answers 0.
+  int SetStep(int step);
+
+  /// Log and write, or log and read, prop_binary_thr_working_.
+  int setWorkingBinaryThresh(int value);
+  int getWorkingBinaryThresh();
+
+  // ---- Input slots ----------------------------------------------------------------------------------------------
+
+  /// Loads a file: an image into 14-33, a video into 34-35. -97 for another slot or a file that is missing or
+  /// unreadable.
+  int SetResource(QV_RESOURCE_INDEX index, char* path);
+  /// Copies height x width pixels of three 16-bit values into one of the slots 14-35, as they come.
+  int SetResource(QV_RESOURCE_INDEX index, int width, int height, unsigned short* data);
+  /// Converts an NV21 preview frame to CV_8UC4 (BGRA), into any slot.
+  /// @throws cv::Exception for an odd width or half height.
+  int SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data);
+  /// Inert: answers 1.
+  int SetResource(QV_RESOURCE_INDEX index, int width, int height, bool flag, unsigned short* first,
+                  unsigned short* second, unsigned short* third, unsigned short* fourth);
+  /// Copies height x width pixels of three floats into one of the slots 0-13.
+  int SetHDRResource(QV_RESOURCE_INDEX index, int width, int height, bool flag, float* data);
+  /// Empties one of the slots 0-13; -97 for any other.
+  int ReleaseImage(QV_RESOURCE_INDEX index);
+  /// Inert: answer 1.
+  int GetLDRImage(QV_RESOURCE_INDEX index, int* width, int* height, unsigned char** data);
+  int SaveHDRImage(QV_RESOURCE_INDEX index, char* path);
+
+  // ---- Dispatch and results -------------------------------------------------------------------------------------
+
+  /// Validates the slots, logs, and runs the test's routine, whose code it answers.
+  int RunTest(QV_TEST_INDEX test, bool fake_mode);
+  /// 1 when every slot that the test needs is loaded, -98 when one is not, -97 for a test that can't be run.
+  int ValidateTest(QV_TEST_INDEX test);
+  int GetResult(QVResultData** out);
+  /// Frees the arrays that the test left; -97 outside 0 to 29.
+  int ReleaseTestResult(QV_TEST_INDEX test);
+  /// Frees slots and result of one of the tests 0-12; -97 for test 3 and any other.
+  int ReleaseDataForTest(QV_TEST_INDEX test);
+
+  /// Store into a record of the tests 0-12, which takes over the array (from new[]) and frees the one before.
+  void SetResult(QVPhase1Result* r, int code);
+  void SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image);
+  void SetResultRawData(QVPhase1Result* r, int width, int height, float* data);
+  void SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count);
+
+  // ---- Chart: finder marks --------------------------------------------------------------------------------------
+
+  /// Centres of the chart's finder marks (dark:light:dark:light:dark as 1:1:3:1:1 across the centre).
+  ///
+  /// @param image  rows x cols, CV_8UC1; 0 is dark, anything else light.
+  /// @return at most three points, row in x, column in y; fewer when fewer candidates were confirmed.
+  /// @throws cv::Exception (StsUnsupportedFormat) for another depth or more channels.
+  /// Row scan with three cross-checks, after the finder search of QR codes (ISO/IEC 18004); where and why ours
+  /// differs: chart/QVTester_Finder.cpp.
+  std::vector<cv::Point> GetFinderPoints(cv::Mat image);
+
+  // Steps of the search, on its state below. Counts are the five run lengths dark, light, dark, light, dark.
+  bool foundPatternCross(int* stateCount);
+  bool handlePossibleCenter(cv::Mat image, int* stateCount, int i, int j);
+  float centerFromEnd(int* stateCount, int end);
+  float crossCheckVertical(cv::Mat image, int startI, int centerJ, int maxCount, int rowStateCountTotal);
+  float crossCheckHorizontal(cv::Mat image, int startJ, int centerI, int maxCount, int rowStateCountTotal);
+  bool crossCheckDiagonal(cv::Mat image, int startI, int centerJ, int maxCount, int rowStateCountTotal);
+  int findRowSkip();
+  bool haveMultiplyConfirmedCenters();
+  std::vector<cv::Point> selectBestPatterns();
+  /// Zeroes crossCheckStateCount.
+  void getCrossCheckStateCount();
+
+  // ---- Chart: geometry ------------------------------------------------------------------------------------------
+
+  /// The mark at the chart's right angle: opposite the longest side of the first three points.
+  cv::Point GetCornerPoint(std::vector<cv::Point> points);
+  /// Corner, then the mark to its right and the one below it, as seen on the upright chart.
+  void SortPatternPoints(std::vector<cv::Point> points, cv::Point& corner, cv::Point& second, cv::Point& third);
+  /// The chart's angle in whole degrees, 0 to 359; 315 is upright; -1 unless there are exactly three points.
+  float GetPatternAngle(std::vector<cv::Point> points);
+  /// Turns the image upright about the middle of a square canvas of its longer side, uncovered pixels 0, and carries
+  /// the three points along.
+  void NormalizePatternImage(cv::Mat image, std::vector<cv::Point>& points, cv::Mat& normalized);
+
+  // ---- Sharpness ------------------------------------------------------------------------------------------------
+
+  /// Spatial frequency response of one region with one straight, slightly slanted edge.
+  ///
+  /// @param roi         rows x cols, one channel, grey levels; at least 5 pixels across the edge.
+  /// @param[out] freq   npix/2 + 1 values are appended, in units of Nyquist (1.0 = 0.5 cycles/pixel); npix is the
+  ///                    region's smaller side.
+  /// @param[out] sfr    as many responses, 1 at zero frequency.
+  /// @param[out] mtf50  frequency of response 0.5, in units of Nyquist; NaN or infinity where the curve gives none.
+  /// @return true, always.
+  /// @throws cv::Exception for a region that is too small or of several channels.
+  /// Slanted edge after ISO 12233; where and why ours differs: sharpness/QVTester_MTF.cpp.
+  bool CalculateSFR(cv::Mat roi, std::vector<float>& freq, std::vector<float>& sfr, float& mtf50);
+  /// As CalculateSFR, for the MTF50 alone. Answers 1.
+  int CalculateMTF(cv::Mat roi, float& mtf50);
+
+  // Steps of the response. Columns are n x 1, rows 1 x n, all CV_32F.
+  /// The region with its edge running down the rows: transposed when it has fewer rows than columns, else shared.
+  cv::Mat ConvertToVertical(cv::Mat roi);
+  /// Derivative kernels of 2 and 3 taps, signed so that the edge's peak is positive. The caller frees both (delete[]).
+  void CalculateFilterValue(cv::Mat* roi, float** fil1, float** fil2);
+  /// Hamming window of length n about mid.
+  cv::Mat GetAHammingWindow(int n, float mid);
+  /// Derivative along each row; out becomes nlin x npix.
+  void GetFirstDerivative(cv::Mat src, int nlin, int npix, float* fil, int nfil, cv::Mat& out);
+  /// Centre of gravity of a column, as a row index; NaN or infinity when its sum is 0.
+  float GetCentroid(cv::Mat x);
+  /// The column moved so that row `center` comes to the middle; rows moved in are 0.
+  cv::Mat GetShiftedArray(cv::Mat x, int center);
+  /// Least-squares polynomial; dst is (order + 1) x 1, lowest power first.
+  /// @throws cv::Exception (StsAssert) for shapes that don't fit.
+  void polyfit(const cv::Mat& src_x, const cv::Mat& src_y, cv::Mat& dst, int order);
+  /// Line through edge positions, one a row: column = offset + slope * row. True, always.
+  bool FindEdge(cv::Mat loc, int nlin, float* slope, float* offset);
+  /// Edge spread: the region's pixels projected along the edge into npix * fac bins. `loc` is not used.
+  cv::Mat ProjectData(cv::Mat bb, float slope, float loc, int fac);
+
+  /// Sharpness of a chart photo: the SFR of its two slanted-edge regions.
+  ///
+  /// @param image               rows x cols, CV_8UC3 or CV_8UC4, the whole chart in view.
+  /// @param[out] freq           npix/2 + 1 values from 0, in units of Nyquist (1.0 = 0.5 cycles/pixel). Pass it empty.
+  /// @param[out] sfrVertical    as many responses, 1 at zero frequency; sfrHorizontal likewise.
+  /// @param[out] mtf50Vertical  frequency of response 0.5, in units of Nyquist; NaN or infinity where the curve gives
+  ///                            none; mtf50Horizontal likewise.
+  /// @return 1, or -91 when the chart does not show exactly three finder marks (no output is touched).
+  /// @throws cv::Exception when a region reaches outside the straightened chart, or the depth is not 8 bits.
+  /// Slanted edge after ISO 12233; where and why ours differs: sharpness/QVTester_MTF.cpp.
+  int GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vector<float>& sfrVertical,
+                      std::vector<float>& sfrHorizontal, float& mtf50Vertical, float& mtf50Horizontal);
+  /// As GetSFRFromImage, for the MTF50 values alone, with the chart's geometry in the log.
+  int GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50Horizontal);
+  /// GetSFRFromImage on the photo in slot 17, for the MTF50 values alone; -98 when the slot is empty.
+  int CheckMTF(float* mtf50Vertical, float* mtf50Horizontal);
+
+  // ---- Camera tests ---------------------------------------------------------------------------------------------
+
+  /// Test 14: the SFR of the chart photo in slot 17, into the af_sfr_ fields. The code of GetSFRFromImage; only 1
+  /// stores.
+  int TestCameraAutofocus();
+  /// Tests 15 and 18: mean of the first channel of the photo in slot 16, or 23. Answer 1.
+  int TestCameraFlash();
+  int TestCameraFlashVT();
+
+  // ---- State ----------------------------------------------------------------------------------------------------
+
+  static constexpr int kSlotCount = 37;
+  std::array<std::unique_ptr<QVResource>, kSlotCount> resources_;  // null: the slot is empty
+  std::unique_ptr<QVResultData> results_;                          // from Initialize to Release
+  int step_ = 0;
+  int hdr_width_ = -1;  // of the last HDR buffer that was loaded, like the two below
+  int hdr_height_ = -1;
+  bool hdr_flag_ = false;
+
+  // Search for finder marks; each GetFinderPoints starts anew.
+  bool hasSkipped = false;
+  std::vector<QVFinderPattern> possibleCenters;
+  int crossCheckStateCount[5] = {};
+
+  // Constants that no property reaches.
+  float param_f0_ = 0.3909f;
+  float param_f1_ = 0.7f;
+
+  // Properties; core/property_table.h gives each its index and default.
+  int prop_param_0_, prop_param_1_, prop_param_2_;
+  float prop_param_6_;
+  int prop_param_7_;
+  float prop_param_8_, prop_param_9_, prop_param_10_;
+  int prop_param_16_;
+  float prop_param_17_, prop_param_18_, prop_param_19_;
+  int prop_param_26_;
+  float prop_param_27_, prop_param_28_, prop_param_29_, prop_param_30_, prop_param_31_;
+  int prop_param_32_;
+  float prop_param_33_, prop_param_34_, prop_param_35_, prop_param_36_, prop_param_37_;
+  int prop_param_43_, prop_param_44_, prop_param_45_, prop_param_46_;
+  float prop_param_47_, prop_param_48_, prop_param_49_, prop_param_50_, prop_param_51_;
+  float prop_color_matrix_[9];
+  float prop_param_53_, prop_param_54_;
+  int prop_param_55_, prop_param_56_, prop_param_57_, prop_param_58_, prop_param_59_, prop_param_60_;
+  float prop_param_61_;
+  cv::Mat prop_camera_matrix_0_, prop_camera_matrix_1_;  // 3 x 3, CV_32F
+  cv::Mat prop_dist_coeffs_0_, prop_dist_coeffs_1_;      // 5 x 1, CV_32F
+  int prop_param_66_, prop_param_67_, prop_param_68_, prop_param_69_;
+  float prop_param_70_;
+  int prop_param_71_, prop_param_74_;
+  int prop_region_count_0_, prop_region_count_1_;
+  std::unique_ptr<QVRegionRecord[]> prop_region_list_0_, prop_region_list_1_;
+  float prop_param_79_;
+  int prop_param_80_, prop_param_81_, prop_param_82_, prop_param_83_, prop_param_84_, prop_param_85_, prop_param_86_;
+  cv::Mat prop_table_0_, prop_table_1_;  // 1 x 256, CV_32S, over the caller's memory
+  int prop_video_flash_frame_count_;
+  int prop_param_90_;
+  float prop_ref_patch_values_1_[72];
+  float prop_ref_patch_values_0_[72];
+  bool ref_patch_values_0_set_ = false;  // property 92 was set, and slot 25 not loaded since
+  bool ref_patch_values_1_set_ = false;  // property 91 was set, and slot 18 not loaded since
+  int prop_binary_thr_working_;
+  int prop_param_94_;
+};
+
+#endif  // QVTESTER_TESTER_H_

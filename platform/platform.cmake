@@ -1,0 +1,16 @@
+# What differs between an Android device and a Linux host. On both, the log is liblog's.
+find_path(QV_LIBLOG_INCLUDE_DIR android/log.h PATH_SUFFIXES android)
+find_library(QV_LIBLOG_LIBRARY log PATH_SUFFIXES android ${CMAKE_LIBRARY_ARCHITECTURE}/android)
+if(NOT QV_LIBLOG_INCLUDE_DIR OR NOT QV_LIBLOG_LIBRARY)
+  message(FATAL_ERROR "liblog is missing; on Debian, install android-liblog-dev")
+endif()
+mark_as_advanced(QV_LIBLOG_INCLUDE_DIR QV_LIBLOG_LIBRARY)
+
+add_library(qvtester_platform INTERFACE)
+target_include_directories(qvtester_platform SYSTEM INTERFACE "${QV_LIBLOG_INCLUDE_DIR}")
+target_link_libraries(qvtester_platform INTERFACE "${QV_LIBLOG_LIBRARY}")
+
+# Debian keeps liblog outside the loader's path.
+if(NOT ANDROID)
+  get_filename_component(QV_PLATFORM_RPATH "${QV_LIBLOG_LIBRARY}" DIRECTORY)
+endif()

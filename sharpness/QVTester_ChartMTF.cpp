@@ -1,0 +1,125 @@
+// Sharpness of a chart photo: its finder marks, the upright picture, the two slanted-edge regions.
+
+#include <cmath>
+#include <cstdlib>
+#include <opencv2/imgproc.hpp>
+
+#include "chart/chart_image.h"
+#include "chart/chart_layout.h"
+#include "core/slots.h"
+#include "qvtester/log.h"
+#include "qvtester/tester.h"
+
+namespace {
+
+constexpr std::size_t kMarks = 3;
+
+struct UprightChart {
+  cv::Mat image;                    // grey
+  cv::Point corner, second, third;  // rows in x, columns in y
+};
+
+UprightChart Straighten(QVTester& tester, const cv::Mat& gray, std::vector<cv::Point> points) {
+  UprightChart chart;
+  tester.NormalizePatternImage(gray, points, chart.image);
+  tester.SortPatternPoints(points, chart.corner, chart.second, chart.third);
+  return chart;
+}
+
+cv::Mat InFloat(const cv::Mat& region) {
+  cv::Mat values;
+  region.convertTo(values, CV_32F);
+  return values;
+}
+
+double Distance(cv::Point a, cv::Point b) {
+  const double dx = a.x - b.x;
+  const double dy = a.y - b.y;
+  return std::sqrt(dx * dx + dy * dy);
+}
+
+void LogGeometry(const char* name, const UprightChart& chart) {
+  const cv::Point a = chart.corner;
+  const cv::Point b = chart.second;
+  const cv::Point c = chart.third;
+  QVDEBUGP("%s distance between Topleft(x:%d,y:%d) to Topright(x:%d,y:%d) : %f", name, a.x, a.y, b.x, b.y,
+           Distance(a, b));
+  QVDEBUGP("%s distance between Topleft(x:%d,y:%d) to bottomleft(x:%d,y:%d) : %f", name, a.x, a.y, c.x, c.y,
+           Distance(a, c));
+  QVDEBUGP("%s distance between Bottomleft(x:%d,y:%d) to Topright(x:%d,y:%d) : %f", name, c.x, c.y, b.x, b.y,
+           Distance(c, b));
+}
+
+}  // namespace
+
+int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vector<float>& sfrVertical,
+                              std::vector<float>& sfrHorizontal, float& mtf50Vertical, float& mtf50Horizontal) {
+  const char* const name = "GetSFRFromImage";
+  cv::Mat gray;
+  cv::cvtColor(image, gray, cv::COLOR_RGB2GRAY);
+  QVDEBUGP("[%s] prop_binary_thr_working_: %d", name, prop_binary_thr_working_);
+  const std::vector<cv::Point> points = GetFinderPoints(Binarise(gray, prop_binary_thr_working_));
+  if (points.size() != kMarks) {
+    QVDEBUGP("[%s] GetSFRFromImage, finder point : %d \n return PATTERN NOT FOUND!", name,
+             static_cast<int>(points.size()));
+    return QV_ERROR_PATTERN_NOT_FOUND;
+  }
+
+  const UprightChart chart = Straighten(*this, gray, points);
+  const float scale = static_cast<float>(chart.second.y - chart.corner.y) / kChartSide;
+  const cv::Mat vertical = InFloat(chart.image(PlaceRegion(kVerticalRegion, chart.corner, scale)));
+  const cv::Mat horizontal = InFloat(chart.image(PlaceRegion(kHorizontalRegion, chart.corner, scale)));
+  CalculateSFR(vertical, freq, sfrVertical, mtf50Vertical);
+  std::vector<float> same_freq;  // both regions have the same smaller side, so one axis serves both
+  CalculateSFR(horizontal, same_freq, sfrHorizontal, mtf50Horizontal);
+  return QV_SUCCESS;
+}
+
+int QVTester::GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50Horizontal) {
+  const char* const name = "GetMTFFromImage";
+  cv::Mat gray;
+  cv::cvtColor(image, gray, cv::COLOR_RGB2GRAY);
+  QVDEBUGP("[%s] prop_binary_thr_working_: %d", name, prop_binary_thr_working_);
+  const std::vector<cv::Point> points = GetFinderPoints(Binarise(gray, prop_binary_thr_working_));
+  const int count = static_cast<int>(points.size());
+  QVDEBUGP("%s %d circle is detected using finder_point algorithm!", name, count);
+  if (points.size() != kMarks) {
+    QVDEBUGP("[%s] finder point : %d \n return PATTERN NOT FOUND!", name, count);
+    return QV_ERROR_PATTERN_NOT_FOUND;
+  }
+
+  const UprightChart chart = Straighten(*this, gray, points);
+  LogGeometry(name, chart);
+  // The absolute distance here, the signed one in GetSFRFromImage.
+  const float scale = static_cast<float>(std::abs(chart.second.y - chart.corner.y)) / kChartSide;
+
+  const cv::Rect v = PlaceRegion(kVerticalRegion, chart.corner, scale);
+  const cv::Mat vertical = chart.image(v);
+  QVDEBUGP("%s vertical roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, v.x, v.y,
+           v.width, v.height, vertical.rows, vertical.cols);
+  const cv::Rect h = PlaceRegion(kHorizontalRegion, chart.corner, scale);
+  const cv::Mat horizontal = chart.image(h);
+  QVDEBUGP("%s horizontal roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, h.x, h.y,
+           h.width, h.height, horizontal.rows, horizontal.cols);
+  CalculateMTF(InFloat(vertical), mtf50Vertical);
+  CalculateMTF(InFloat(horizontal), mtf50Horizontal);
+  return QV_SUCCESS;
+}
+
+int QVTester::CheckMTF(float* mtf50Vertical, float* mtf50Horizontal) {
+  cv::Mat photo;
+  if (const int code = FetchImage(*this, QV_RESOURCE_CHART_PHOTO, photo); code != QV_SUCCESS) return code;
+  std::vector<float> freq;
+  std::vector<float> sfr_vertical;
+  std::vector<float> sfr_horizontal;
+  float vertical = 0;
+  float horizontal = 0;
+  const int code = GetSFRFromImage(photo, freq, sfr_vertical, sfr_horizontal, vertical, horizontal);
+  if (code != QV_SUCCESS) {
+    QVDEBUGP("%s Fail to get SFR data (Result:%d)", "CheckMTF", code);
+    return code;
+  }
+  *mtf50Vertical = vertical;
+  *mtf50Horizontal = horizontal;
+  return QV_SUCCESS;
+}

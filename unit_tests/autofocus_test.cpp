@@ -1,0 +1,180 @@
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+
+#include "qvtester/api.h"
+#include "qvtester/tester.h"
+#include "tools/method_law.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+class Autofocus : public ::testing::Test {
+ protected:
+  void SetUp() override { InitTestModule(); }
+  void TearDown() override { FinalizeTestModule(); }
+
+  static void Load(const cv::Mat& photo) {
+    if (theTester->resources_[17] == nullptr) theTester->resources_[17] = std::make_unique<QVResource>();
+    theTester->resources_[17]->SetImage(photo);
+  }
+  static int Measure(const cv::Mat& photo) {
+    Load(photo);
+    return RunTest(QV_TEST_CAMERA_AUTOFOCUS, false);
+  }
+  // All that the last good run left.
+  static std::vector<float> Held() {
+    QVResultData* results = nullptr;
+    GetResult(&results);
+    std::vector<float> held = {results->af_sfr_scalar1_, results->af_sfr_scalar2_};
+    for (const float* list : {results->af_sfr_first_, results->af_sfr_second_, results->af_sfr_third_}) {
+      held.insert(held.end(), list, list + results->af_sfr_count_);
+    }
+    return held;
+  }
+
+  LogLines log_;
+};
+
+TEST_F(Autofocus, AChartPhotoGivesCurvesAndFigures) {
+  ASSERT_EQ(1, Measure(DrawChart()));
+  EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] RunTest, testindex: 14, fake_mode: 0, step: 0",
+                                             "[GetSFRFromImage] prop_binary_thr_working_: 125"));
+  QVResultData* results = nullptr;
+  GetResult(&results);
+  EXPECT_EQ(75 / 2 + 1, results->af_sfr_count_);  // 750 chart units at a tenth of a pixel
+  EXPECT_EQ(1.0f, results->af_sfr_second_[0]);
+  EXPECT_EQ(1.0f, results->af_sfr_third_[0]);
+  const auto [low, high] = method_law::MeasuredMtf50(ChartView().blur_px, 75);
+  for (const float mtf50 : {results->af_sfr_scalar1_, results->af_sfr_scalar2_}) {
+    EXPECT_GT(mtf50, 0.95 * low);  // 5 %: the drawing has four subpixels and whole grey levels
+    EXPECT_LT(mtf50, 1.05 * high);
+  }
+}
+
+TEST_F(Autofocus, SharperPhotosReadHigher) {
+  float before = 1;
+  for (const double blur : {0.5, 1.0, 1.5, 2.5}) {
+    ChartView view;
+    view.blur_px = blur;
+    ASSERT_EQ(1, Measure(DrawChart(view)));
+    EXPECT_LT(Held()[0], before) << blur;
+    before = Held()[0];
+  }
+}
+
+TEST_F(Autofocus, TurnedChartsAreStraightened) {
+  ChartView upright;
+  upright.scale = 0.08;
+  ASSERT_EQ(1, Measure(DrawChart(upright)));
+  const float expected = Held()[1];
+  for (const double turn : {90.0, 180.0, 270.0, 17.0, -33.0}) {
+    ChartView view = upright;
+    view.turn_deg = turn;
+    ASSERT_EQ(1, Measure(DrawChart(view))) << turn;
+    EXPECT_NEAR(expected, Held()[1], 0.2 * expected) << turn;  // resampling softens, by 20 % at the most here
+  }
+}
+
+TEST_F(Autofocus, TwoMarksChangeNothing) {  // the fault that matters: stale numbers taken for new ones
+  ChartView two;
+  two.marks = 2;
+  ASSERT_EQ(1, Measure(DrawChart()));
+  const std::vector<float> before = Held();
+  const LogLines log;
+  EXPECT_EQ(-91, Measure(DrawChart(two)));
+  EXPECT_EQ(before, Held());
+  EXPECT_THAT(LogLines::Texts(),
+              ElementsAre("[OKAPI] RunTest, testindex: 14, fake_mode: 0, step: 0",
+                          "[GetSFRFromImage] prop_binary_thr_working_: 125", "[OKAPI] startSize : 2",
+                          "[GetSFRFromImage] GetSFRFromImage, finder point : 2 \n return PATTERN NOT FOUND!",
+                          "TestCameraAutofocus Fail to get SFR data (Result:-91)"));
+  float vertical = 5;
+  float horizontal = 6;
+  EXPECT_EQ(-91, CheckMTF(&vertical, &horizontal));
+  EXPECT_EQ(5.0f, vertical);
+  EXPECT_EQ(6.0f, horizontal);
+  EXPECT_EQ("CheckMTF Fail to get SFR data (Result:-91)", LogLines::Texts().back());
+}
+
+TEST_F(Autofocus, AFourthMarkIsThinnedOut) {
+  ChartView four;
+  four.marks = 4;
+  EXPECT_EQ(1, Measure(DrawChart(four)));
+}
+
+TEST_F(Autofocus, UnusablePhotosChangeNothing) {
+  ASSERT_EQ(1, Measure(DrawChart()));
+  const std::vector<float> before = Held();
+  cv::Mat deep;
+  DrawChart().convertTo(deep, CV_16U, 257);
+  cv::Mat grey;
+  cv::cvtColor(DrawChart(), grey, cv::COLOR_BGR2GRAY);
+  for (const cv::Mat& photo : {deep, grey, cv::Mat()}) EXPECT_EQ(-95, Measure(photo));
+  EXPECT_EQ(before, Held());
+}
+
+TEST_F(Autofocus, ReleasedResultsAreGone) {
+  ASSERT_EQ(1, Measure(DrawChart()));
+  EXPECT_EQ(1, ReleaseTestResult(QV_TEST_CAMERA_AUTOFOCUS));
+  QVResultData* results = nullptr;
+  GetResult(&results);
+  EXPECT_EQ(0, results->af_sfr_count_);
+  EXPECT_EQ(nullptr, results->af_sfr_first_);
+  EXPECT_EQ(1, Measure(DrawChart()));
+}
+
+TEST_F(Autofocus, TheThresholdDecides) {
+  Load(DrawChart());
+  setWorkingBinaryThresh(5);
+  EXPECT_EQ(-91, RunTest(QV_TEST_CAMERA_AUTOFOCUS, false)) << "all is light";
+  setWorkingBinaryThresh(90);
+  EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_AUTOFOCUS, false));
+}
+
+TEST_F(Autofocus, TheMtfMeasuresAgree) {
+  ASSERT_EQ(1, Measure(DrawChart()));
+  const LogLines log;
+  float vertical = 0;
+  float horizontal = 0;
+  ASSERT_EQ(1, theTester->GetMTFFromImage(DrawChart(), vertical, horizontal));
+  EXPECT_EQ(Held()[0], vertical);
+  EXPECT_EQ(Held()[1], horizontal);
+  // The marks' middles in a picture of 1000 x 1000: 151.5 and 848.5.
+  EXPECT_THAT(
+      LogLines::Texts(),
+      ElementsAre(
+          "[GetMTFFromImage] prop_binary_thr_working_: 125",
+          "GetMTFFromImage 3 circle is detected using finder_point algorithm!",
+          "GetMTFFromImage distance between Topleft(x:151,y:151) to Topright(x:151,y:848) : 697.000000",
+          "GetMTFFromImage distance between Topleft(x:151,y:151) to bottomleft(x:848,y:151) : 697.000000",
+          "GetMTFFromImage distance between Bottomleft(x:848,y:151) to Topright(x:151,y:848) : 985.706853",
+          "GetMTFFromImage vertical roi region x : 539, y : 477, width : 216, height : 75, row : 75, col : 216",
+          "GetMTFFromImage horizontal roi region x : 474, y : 245, width : 75, height : 216, row : 216, col : 75"));
+  ASSERT_EQ(1, CheckMTF(&vertical, &horizontal));
+  EXPECT_EQ(Held()[0], vertical);
+
+  LogLines miss;
+  EXPECT_EQ(-91, theTester->GetMTFFromImage(cv::Mat(50, 50, CV_8UC3, cv::Scalar::all(255)), vertical, horizontal));
+  EXPECT_THAT(LogLines::Texts(), ElementsAre("[GetMTFFromImage] prop_binary_thr_working_: 125", "[OKAPI] startSize : 0",
+                                             "GetMTFFromImage 0 circle is detected using finder_point algorithm!",
+                                             "[GetMTFFromImage] finder point : 0 \n return PATTERN NOT FOUND!"));
+}
+
+TEST_F(Autofocus, MarksInOneColumnGiveNoRegion) {
+  // With corner and second mark in one column the scale is 0, and both regions are empty.
+  QVTester tester;
+  cv::Mat photo = DrawMarks({400, 400}, 5, {{20, 20}, {20, 60}, {340, 20}});
+  cv::cvtColor(photo, photo, cv::COLOR_GRAY2BGR);
+  std::vector<float> freq;
+  std::vector<float> sfr;
+  float mtf50 = 0;
+  EXPECT_THROW(tester.GetSFRFromImage(photo, freq, sfr, sfr, mtf50, mtf50), cv::Exception);
+}
+
+}  // namespace

@@ -1,0 +1,189 @@
+#include <gmock/gmock.h>
+
+#include "core/test_table.h"
+#include "qvtester/api.h"
+#include "qvtester/log.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+QV_TEST_INDEX Index(int test) { return static_cast<QV_TEST_INDEX>(test); }
+
+const char* const kRefused = "[OKAPI] Error : Invalid parameter or insufficient image";
+
+class Dispatch : public ::testing::Test {
+ protected:
+  void SetUp() override { InitTestModule(); }
+  void TearDown() override { FinalizeTestModule(); }
+
+  static void Fill(int slot) {
+    theTester->resources_[slot] = std::make_unique<QVResource>();
+    theTester->resources_[slot]->SetImage(cv::Mat(20, 20, CV_8UC3, cv::Scalar(200, 3, 7)));
+  }
+  static QVResultData* Results() {
+    QVResultData* results = nullptr;
+    EXPECT_EQ(1, GetResult(&results));
+    return results;
+  }
+
+  LogLines log_;
+};
+
+TEST_F(Dispatch, TestsNeedTheirSlots) {
+  for (const QVTest& test : kTests) {
+    InitTestModule();
+    int missing = 0;
+    for (const int slot : test.needs) missing += slot != kNoSlot ? 1 : 0;
+    for (const int slot : test.needs) {
+      if (slot == kNoSlot) continue;
+      EXPECT_EQ(-98, RunTest(test.index, false)) << test.name;
+      Fill(slot);
+      --missing;
+    }
+    EXPECT_EQ(0, missing);
+    EXPECT_EQ(test.index == 3 ? -97 : 1, theTester->ValidateTest(test.index)) << test.name;
+  }
+  for (const int unknown : {3, 30, -1, 1 << 30}) {
+    const LogLines log;
+    EXPECT_EQ(-97, RunTest(Index(unknown), false));
+    EXPECT_THAT(LogLines::Texts(), ElementsAre(kRefused));
+  }
+}
+
+TEST_F(Dispatch, TestsWithoutARoutineAreLoggedAndRefused) {
+  Fill(13);
+  SetStep(4);
+  const LogLines log;
+  EXPECT_EQ(-97, RunTest(Index(5), true));
+  EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] RunTest, testindex: 5, fake_mode: 1, step: 4"));
+}
+
+TEST_F(Dispatch, FlashIsTheMeanOfTheFirstChannel) {
+  Fill(16);
+  Fill(23);
+  EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_FLASH, false));
+  EXPECT_EQ(200.0f, Results()->flash_mean_);
+  EXPECT_EQ(0.0f, Results()->flash_mean_vtcam_);
+  theTester->resources_[23]->SetImage(cv::Mat(1, 2, CV_8UC1, std::array<uchar, 2>{10, 15}.data()));
+  EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_FLASH_VT, false));
+  EXPECT_EQ(12.5f, Results()->flash_mean_vtcam_);
+  EXPECT_EQ(200.0f, Results()->flash_mean_);
+}
+
+TEST_F(Dispatch, ASlotWithoutAnImageIsUnusable) {
+  theTester->resources_[16] = std::make_unique<QVResource>();
+  EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_FLASH, false));
+  EXPECT_EQ(-98, theTester->TestCameraAutofocus()) << "a direct call with its slot empty";
+}
+
+TEST_F(Dispatch, RecordsOwnTheirArrays) {  // the address sanitizer sees what is freed twice or not at all
+  QVPhase1Result& record = Results()->phase1_[4];
+  for (int i = 0; i < 2; ++i) {
+    theTester->SetResultImage(&record, 2, 3, new unsigned char[6]{});
+    theTester->SetResultRawData(&record, 4, 5, new float[20]{});
+    theTester->SetResultErrorPoint(&record, new QVRECT[2]{}, 2);
+  }
+  unsigned char* image = record.image_;
+  theTester->SetResultImage(&record, 2, 3, image);
+  EXPECT_EQ(image, record.image_);
+  EXPECT_EQ(5, record.raw_height_);
+  EXPECT_EQ(1, ReleaseTestResult(Index(4)));
+  EXPECT_EQ(nullptr, record.image_);
+  EXPECT_EQ(nullptr, record.error_points_);
+  EXPECT_EQ(0, record.error_point_count_);
+  theTester->SetResultRawData(&record, 1, 1, new float[1]{});  // left for Initialize
+  EXPECT_EQ(1, InitTestModule());
+  for (int test = -1; test <= 30; ++test) EXPECT_EQ(test >= 0 && test < 30 ? 1 : -97, ReleaseTestResult(Index(test)));
+}
+
+TEST_F(Dispatch, ReleasingATestsDataEmptiesItsSlots) {
+  for (const int slot : {0, 1, 2, 3, 14, 17}) Fill(slot);
+  EXPECT_EQ(1, ReleaseDataForTest(Index(1)));  // slot 0 as well
+  EXPECT_EQ(nullptr, theTester->resources_[0]);
+  EXPECT_NE(nullptr, theTester->resources_[1]);
+  EXPECT_EQ(nullptr, theTester->resources_[2]);
+  EXPECT_EQ(nullptr, theTester->resources_[3]);
+  for (const int refused : {3, 13, 14, 29, 30, -1}) EXPECT_EQ(-97, ReleaseDataForTest(Index(refused)));
+  EXPECT_NE(nullptr, theTester->resources_[14]);
+}
+
+TEST_F(Dispatch, TheTesterOutlivesASecondInit) {
+  QVTester* before = theTester;
+  setWorkingBinaryThresh(99);
+  Fill(17);
+  Results()->flash_mean_ = 5;
+  EXPECT_EQ(1, InitTestModule());
+  EXPECT_EQ(before, theTester);
+  EXPECT_EQ(99, getWorkingBinaryThresh());
+  EXPECT_EQ(nullptr, theTester->resources_[17]);
+  EXPECT_EQ(0.0f, Results()->flash_mean_);
+}
+
+TEST_F(Dispatch, NullPointersAreRefused) {
+  float value = 5;
+  EXPECT_EQ(-97, GetResult(nullptr));
+  EXPECT_EQ(-97, SetProperty(QV_PROPERTY_BINARY_THR_WORKING, nullptr));
+  EXPECT_EQ(-97, GetProperty(QV_PROPERTY_BINARY_THR_WORKING, nullptr));
+  EXPECT_EQ(-97, CheckMTF(&value, nullptr));
+  EXPECT_EQ(-98, CheckMTF(&value, &value));
+  EXPECT_EQ(5.0f, value);
+  EXPECT_EQ(1, GetImage(QV_RESOURCE_CHART_PHOTO, nullptr, nullptr, nullptr));
+  EXPECT_EQ(1, SaveHDRImage(QV_RESOURCE_HDR_FIRST, nullptr));
+  EXPECT_EQ(1, SetResourceWithLDRs(QV_RESOURCE_HDR_FIRST, 0, 0, false, nullptr, nullptr, nullptr, nullptr));
+}
+
+TEST(WithoutATester, EveryFunctionSaysSo) {
+  const LogLines log;
+  EXPECT_EQ(0, FinalizeTestModule());
+  EXPECT_THAT(LogLines::All(), ElementsAre("[OKAPI] [OKAPI] finalize vision test\r\n"));
+  ASSERT_EQ(nullptr, theTester);
+  float value = 0;
+  char path[] = "a.png";
+  QVResultData* results = nullptr;
+  EXPECT_EQ(-96, RunTest(QV_TEST_CAMERA_FLASH, false));
+  EXPECT_EQ(-96, SetResource(QV_RESOURCE_CHART_PHOTO, path));
+  EXPECT_EQ(-96, GetResult(&results));
+  EXPECT_EQ(-96, SetProperty(QV_PROPERTY_BINARY_THR_WORKING, &value));
+  EXPECT_EQ(-96, ReleaseImage(QV_RESOURCE_HDR_FIRST));
+  EXPECT_EQ(-96, SetStep(1));
+  EXPECT_EQ(-96, CheckMTF(&value, &value));
+  EXPECT_EQ(-96, getWorkingBinaryThresh());
+  EXPECT_EQ(-96, GetImage(QV_RESOURCE_CHART_PHOTO, nullptr, nullptr, nullptr));
+  EXPECT_EQ(-96, SaveHDRImage(QV_RESOURCE_HDR_FIRST, nullptr));
+}
+
+TEST(Log, LinesAreStrippedEndedAndCut) {
+  const LogLines log;
+  QVDEBUGP("value %d \t\n ", 7);
+  QVDEBUGP("%s", " \n ");
+  QVDEBUGP("%s", "");
+  EXPECT_THAT(LogLines::All(), ElementsAre("[OKAPI] value 7\r\n", "[OKAPI] \r\n", "[OKAPI] \r\n"));
+}
+
+TEST(Log, LongLinesNeverOverrun) {
+  const LogLines log;
+  for (const std::size_t length : {4092u, 4093u, 4094u, 9000u}) QVDEBUGP("%s", std::string(length, 'x').c_str());
+  ASSERT_THAT(LogLines::All(), SizeIs(4));  // liblog itself cuts lines at about a thousand characters
+  for (const std::string& line : LogLines::All()) EXPECT_THAT(line, StartsWith("[OKAPI] xxx"));
+}
+
+TEST(Threshold, SettingAndReadingAreLogged) {
+  InitTestModule();
+  const LogLines log;
+  EXPECT_EQ(1, setWorkingBinaryThresh(-5));
+  EXPECT_EQ(-5, getWorkingBinaryThresh());
+  EXPECT_EQ(0, SetStep(3));
+  EXPECT_THAT(LogLines::Texts(),
+              ElementsAre("setWorkingBinaryThresh value: -5", "getWorkingBinaryThresh value: -5", "SetStep, step: 3"));
+  FinalizeTestModule();
+}
+
+}  // namespace

@@ -1,0 +1,131 @@
+#include "unit_tests/drawing.h"
+
+#include <cmath>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
+
+#include "chart/chart_layout.h"
+
+namespace {
+
+constexpr int kSubpixels = 4;
+
+// Chart units to pixel corners: (0, 0) is the top left corner of the first pixel.
+cv::Point2d Place(const ChartView& view, double x, double y) {
+  const double angle = view.turn_deg * CV_PI / 180;
+  const double u = (x - kChartSide / 2.0) * view.scale;
+  const double v = (y - kChartSide / 2.0) * view.scale;
+  return {view.size.width / 2.0 + u * std::cos(angle) + v * std::sin(angle),
+          view.size.height / 2.0 - u * std::sin(angle) + v * std::cos(angle)};
+}
+
+void FillPolygon(cv::Mat& canvas, const ChartView& view, const std::vector<cv::Point2d>& corners, int level) {
+  constexpr int kShift = 8;
+  std::vector<cv::Point> scaled;
+  for (const cv::Point2d& corner : corners) {
+    const cv::Point2d p = Place(view, corner.x, corner.y) * kSubpixels;
+    scaled.emplace_back(cvRound((p.x - 0.5) * (1 << kShift)), cvRound((p.y - 0.5) * (1 << kShift)));
+  }
+  cv::fillConvexPoly(canvas, scaled, cv::Scalar::all(level), cv::LINE_8, kShift);
+}
+
+void FillSquare(cv::Mat& canvas, const ChartView& view, double x, double y, double half, int level) {
+  FillPolygon(canvas, view, {{x - half, y - half}, {x + half, y - half}, {x + half, y + half}, {x - half, y + half}},
+              level);
+}
+
+void FillMark(cv::Mat& canvas, const ChartView& view, double x, double y, double module) {
+  FillSquare(canvas, view, x, y, 3.5 * module, 10);
+  FillSquare(canvas, view, x, y, 2.5 * module, 220);
+  FillSquare(canvas, view, x, y, 1.5 * module, 10);
+}
+
+}  // namespace
+
+void DrawMark(cv::Mat& image, int row, int column, int module, int dark, int light) {
+  for (const auto& [inset, level] : {std::pair{0, dark}, {1, light}, {2, dark}}) {
+    const int side = (7 - 2 * inset) * module;
+    image(cv::Rect(column + inset * module, row + inset * module, side, side)).setTo(level);
+  }
+}
+
+cv::Mat DrawMarks(cv::Size size, int module, const std::vector<cv::Point>& corners) {
+  cv::Mat image(size, CV_8UC1, cv::Scalar(255));
+  for (const cv::Point& corner : corners) DrawMark(image, corner.x, corner.y, module);
+  return image;
+}
+
+cv::Mat DrawChart(const ChartView& view) {
+  cv::Mat canvas(view.size * kSubpixels, CV_8UC1, cv::Scalar(220));
+  const auto target = EdgeTarget();
+  FillPolygon(canvas, view, {target.begin(), target.end()}, 50);
+
+  for (int i = 0; i < std::min(view.marks, 3); ++i) {
+    const auto& [x, y] = kMarkCentres[view.marks == 2 ? 2 * i : i];
+    FillMark(canvas, view, x, y, kMarkModule);
+  }
+  if (view.marks > 3) FillMark(canvas, view, kChartSide, kChartSide, 1.2 * kMarkModule);
+
+  cv::Mat photo;
+  cv::resize(canvas, photo, view.size, 0, 0, cv::INTER_AREA);
+  if (view.blur_px > 0) cv::GaussianBlur(photo, photo, cv::Size(), view.blur_px);
+  cv::cvtColor(photo, photo, cv::COLOR_GRAY2BGR);
+  return photo;
+}
+
+std::vector<cv::Point2d> MarkCentres(const ChartView& view) {
+  const cv::Point2d half(0.5, 0.5);
+  return {Place(view, 0, 0) - half, Place(view, kChartSide, 0) - half, Place(view, 0, kChartSide) - half};
+}
+
+cv::Mat DrawEdge(const EdgeView& view) {
+  constexpr int kSamples = 4;
+  cv::Mat region(view.rows, view.cols, CV_32F);
+  const double across = std::cos(std::atan(view.slope));
+  for (int r = 0; r < view.rows; ++r) {
+    for (int c = 0; c < view.cols; ++c) {
+      double sum = 0;
+      for (int s = 0; s < kSamples * kSamples; ++s) {
+        const double y = r + (s / kSamples + 0.5) / kSamples - view.rows / 2.0;
+        const double x = c + (s % kSamples + 0.5) / kSamples - view.cols / 2.0;
+        const double distance = (x - view.place - view.slope * y) * across;
+        sum += 0.5 * std::erfc(-distance / (view.sigma_px * std::sqrt(2.0)));
+      }
+      const double share = sum / (kSamples * kSamples);
+      region.at<float>(r, c) =
+          static_cast<float>(view.dark + (view.light - view.dark) * (view.dark_left ? share : 1 - share));
+    }
+  }
+  return region;
+}
+
+TemporaryFolder::TemporaryFolder() {
+  std::string pattern = (std::filesystem::temp_directory_path() / "qvtester-test-XXXXXX").string();
+  path_ = mkdtemp(pattern.data());
+}
+
+TemporaryFolder::~TemporaryFolder() {
+  std::error_code ignored;
+  std::filesystem::remove_all(path_, ignored);
+}
+
+std::string TemporaryFolder::Path(const std::string& name) const { return path_ + "/" + name; }
+
+std::string TemporaryFolder::Write(const std::string& name, const std::string& content) const {
+  std::ofstream(Path(name), std::ios::binary) << content;
+  return Path(name);
+}
+
+std::string TemporaryFolder::Write(const std::string& name, const cv::Mat& image) const {
+  cv::imwrite(Path(name), image);
+  return Path(name);
+}
+
+std::string ReadFile(const std::string& path) {
+  std::ifstream file(path, std::ios::binary);
+  return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+}

@@ -1,0 +1,60 @@
+#ifndef QVTESTER_UNIT_TESTS_DRAWING_H_
+#define QVTESTER_UNIT_TESTS_DRAWING_H_
+
+#include <opencv2/core.hpp>
+#include <string>
+#include <vector>
+
+// Pictures with known content.
+
+/// One finder mark of seven modules, axis-parallel, its top left pixel at (row, column); dark is 0.
+void DrawMark(cv::Mat& image, int row, int column, int module, int dark = 0, int light = 255);
+
+/// A white CV_8UC1 canvas with marks of `module` pixels at these top left corners, (row, column) each.
+cv::Mat DrawMarks(cv::Size size, int module, const std::vector<cv::Point>& corners);
+
+struct ChartView {
+  int marks = 3;        // 2 leaves out the one at the top right, 4 adds a larger one at the bottom right
+  double turn_deg = 0;  // counter-clockwise about the middle
+  double scale = 0.1;   // pixels per chart unit
+  cv::Size size = {1000, 1000};
+  double blur_px = 0.8;
+};
+
+/// Photo of the sharpness chart, CV_8UC3: marks and slanted edges, the chart's middle in the photo's.
+cv::Mat DrawChart(const ChartView& view = {});
+/// Where the marks' centres lie, pixel centres at whole numbers: corner, second, third as (column, row).
+std::vector<cv::Point2d> MarkCentres(const ChartView& view);
+
+struct EdgeView {
+  int rows = 400, cols = 120;
+  double slope = 0.0875;  // columns per row
+  double sigma_px = 1.0;  // Gaussian blur, before the pixel's own aperture
+  double dark = 40, light = 200;
+  bool dark_left = true;
+  double place = 0;  // of the edge's middle, from the region's, columns
+};
+
+/// A region with one slanted edge, each pixel the mean of the blurred edge over its square. CV_32F, not rounded.
+cv::Mat DrawEdge(const EdgeView& view);
+
+/// A new directory below the system's one for temporary files; removed with all it holds when it goes.
+class TemporaryFolder {
+ public:
+  TemporaryFolder();
+  ~TemporaryFolder();
+  TemporaryFolder(const TemporaryFolder&) = delete;
+  TemporaryFolder& operator=(const TemporaryFolder&) = delete;
+  std::string Path(const std::string& name) const;
+  /// Writes a file of this content and answers its path.
+  std::string Write(const std::string& name, const std::string& content) const;
+  /// Writes an image file and answers its path.
+  std::string Write(const std::string& name, const cv::Mat& image) const;
+
+ private:
+  std::string path_;
+};
+
+std::string ReadFile(const std::string& path);
+
+#endif  // QVTESTER_UNIT_TESTS_DRAWING_H_

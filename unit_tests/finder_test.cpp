@@ -1,0 +1,251 @@
+#include <gmock/gmock.h>
+
+#include <cfloat>
+#include <opencv2/imgproc.hpp>
+#include <random>
+
+#include "qvtester/tester.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using ::testing::UnorderedElementsAre;
+
+// Where a drawn mark is found: its middle, cut to whole pixels.
+cv::Point Found(cv::Point corner, int module) { return {corner.x + 7 * module / 2, corner.y + 7 * module / 2}; }
+
+std::vector<int> ModuleSizes(const std::vector<QVFinderPattern>& candidates) {
+  std::vector<int> sizes;
+  for (const QVFinderPattern& candidate : candidates) sizes.push_back(cvRound(candidate.estimatedModuleSize));
+  return sizes;
+}
+
+TEST(FinderPattern, MergesAreWeightedByCount) {
+  const QVFinderPattern twice(10, 20, 4, 2);
+  const QVFinderPattern merged = twice.combineEstimate(23, 13, 7);  // row 23, column 13
+  EXPECT_EQ(11.0f, merged.x);
+  EXPECT_EQ(21.0f, merged.y);
+  EXPECT_EQ(5.0f, merged.estimatedModuleSize);
+  EXPECT_EQ(3, merged.count);
+  EXPECT_EQ(1, QVFinderPattern(1.9f, -0.9f, 1, 1).getX());
+  EXPECT_EQ(0, QVFinderPattern(1.9f, -0.9f, 1, 1).getY());
+}
+
+TEST(FinderPattern, TheSameMarkIsOneModuleAwayAtMost) {
+  const QVFinderPattern mark(100, 50, 4, 1);
+  EXPECT_TRUE(mark.aboutEquals(4, 54, 96));
+  EXPECT_FALSE(mark.aboutEquals(4, 54.5f, 100));
+  EXPECT_FALSE(mark.aboutEquals(4, 50, 95.5f));
+  EXPECT_TRUE(mark.aboutEquals(8, 50, 100)) << "differs by the mark's own module size";
+  EXPECT_FALSE(mark.aboutEquals(8.5f, 50, 100));
+  EXPECT_TRUE(QVFinderPattern(0, 0, 0.25f, 1).aboutEquals(1.25f, 0, 0)) << "one pixel is always allowed";
+}
+
+TEST(FinderPattern, OrdersPutTheNearestAndTheMostSeenFirst) {
+  QVFinderPattern near(0, 0, 5, 1);
+  QVFinderPattern far(0, 0, 8, 3);
+  near.setAverage(6);
+  far.setAverage(6);
+  EXPECT_TRUE(QVFinderPattern::compareAvg(near, far));
+  EXPECT_FALSE(QVFinderPattern::compareAvg(far, far));
+  EXPECT_TRUE(QVFinderPattern::compareAvgAndCount(far, near));
+  far.count = 1;
+  EXPECT_TRUE(QVFinderPattern::compareAvgAndCount(near, far));
+}
+
+struct Runs {
+  std::array<int, 5> counts;
+  bool pattern;
+};
+
+TEST(FinderRuns, TheRatioIsHalfAModuleWide) {
+  QVTester tester;
+  for (const auto& [counts, pattern] : {Runs{{2, 2, 6, 2, 2}, true},
+                                        {{1, 1, 3, 1, 1}, true},
+                                        {{1, 1, 1, 1, 1}, false},  // under seven pixels
+                                        {{3, 3, 9, 3, 0}, false},  // a run is missing
+                                        {{20, 20, 44, 28, 28}, true},
+                                        {{30, 20, 60, 20, 10}, false},  // 10 is exactly half a module off
+                                        {{20, 20, 30, 35, 35}, false},  // the core exactly 1.5 modules off
+                                        {{20, 20, 31, 35, 34}, false},
+                                        {{22, 22, 45, 25, 26}, true}}) {
+    auto copy = counts;
+    EXPECT_EQ(pattern, tester.foundPatternCross(copy.data())) << ::testing::PrintToString(counts);
+  }
+}
+
+TEST(FinderRuns, TheCentreIsCountedFromTheEnd) {
+  QVTester tester;
+  int counts[5] = {2, 2, 7, 3, 2};
+  EXPECT_EQ(91.5f, tester.centerFromEnd(counts, 100));
+}
+
+class CrossCheck : public ::testing::Test {
+ protected:
+  cv::Mat image_ = DrawMarks({40, 40}, 3, {{10, 8}});
+  QVTester tester_;
+};
+
+TEST_F(CrossCheck, FindsTheMiddleOfAWholeMark) {
+  EXPECT_EQ(20.5f, tester_.crossCheckVertical(image_, 20, 18, 9, 21));
+  EXPECT_EQ(18.5f, tester_.crossCheckHorizontal(image_, 18, 20, 9, 21));
+  EXPECT_TRUE(tester_.crossCheckDiagonal(image_, 20, 18, 9, 21));
+  EXPECT_THAT(tester_.crossCheckStateCount, ElementsAre(3, 3, 9, 3, 3));
+}
+
+TEST_F(CrossCheck, TheSizesMayDifferByDirection) {
+  // A total of 21 against a row total of 30 is 30 % off: enough for the vertical check, too much for the horizontal.
+  EXPECT_EQ(20.5f, tester_.crossCheckVertical(image_, 20, 18, 9, 30));
+  EXPECT_EQ(FLT_MAX, tester_.crossCheckHorizontal(image_, 18, 20, 9, 30));
+  EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(image_, 20, 18, 9, 35));  // exactly 40 %
+  EXPECT_EQ(18.5f, tester_.crossCheckHorizontal(image_, 18, 20, 9, 26));
+  EXPECT_FALSE(tester_.crossCheckDiagonal(image_, 20, 18, 9, 7)) << "twice the row's total off";
+  EXPECT_TRUE(tester_.crossCheckDiagonal(image_, 20, 18, 9, 8));
+}
+
+TEST_F(CrossCheck, ASideMayHoldMaxCountBeforeTheCoreButNotBehind) {
+  EXPECT_EQ(20.5f, tester_.crossCheckVertical(image_, 20, 18, 4, 21));
+  EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(image_, 20, 18, 3, 21));
+  image_.rowRange(22, 40).setTo(255);  // what lies behind the core is gone
+  image_.rowRange(25, 27).setTo(0);
+  image_.rowRange(27, 29).setTo(0);
+  EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(image_, 20, 18, 2, 21)) << "three light pixels before the core";
+}
+
+TEST_F(CrossCheck, MarksAtTheBorderFailInsteadOfReadingOutside) {
+  for (const cv::Rect& view :
+       {cv::Rect(8, 10, 21, 18), cv::Rect(8, 10, 21, 12), cv::Rect(8, 16, 21, 15), cv::Rect(8, 20, 21, 11)}) {
+    const cv::Mat cut = image_(view).clone();
+    EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(cut, 20 - view.y, 10, 9, 21)) << view;
+    EXPECT_EQ(FLT_MAX, tester_.crossCheckHorizontal(cut.t(), 20 - view.y, 10, 9, 21)) << view;
+    EXPECT_FALSE(tester_.crossCheckDiagonal(cut, 20 - view.y, 10, 9, 21)) << view;
+  }
+  EXPECT_FALSE(tester_.crossCheckDiagonal(image_, -1, 5, 9, 21));
+  EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(image_, 40, 5, 9, 21));
+  const cv::Mat exact = image_(cv::Rect(8, 10, 21, 21)).clone();  // the first run may touch the border, the last too
+  EXPECT_EQ(10.5f, tester_.crossCheckVertical(exact, 10, 10, 9, 21));
+}
+
+TEST(FinderPoints, DrawnMarksAreFoundExactly) {
+  std::mt19937 random(1);
+  QVTester tester;
+  for (int round = 0; round < 1000; ++round) {
+    const auto any = [&](int from, int to) { return std::uniform_int_distribution<int>(from, to)(random); };
+    const int module = any(2, 9);
+    const int room = 11 * module;
+    const auto near = [&] { return any(0, 2 * module); };
+    const auto away = [&] { return room + any(0, 40); };
+    const std::vector<cv::Point> corners = {{near(), near()}, {near(), away()}, {away(), near()}};
+    const cv::Mat image = DrawMarks({2 * room + 50, 2 * room + 50}, module, corners);
+    EXPECT_THAT(tester.GetFinderPoints(image),
+                UnorderedElementsAre(Found(corners[0], module), Found(corners[1], module), Found(corners[2], module)))
+        << "round " << round << ", module " << module;
+  }
+}
+
+TEST(FinderPoints, AMarkAtTheRightBorderCountsAtTheRowsEnd) {
+  QVTester tester;
+  const cv::Mat image = DrawMarks({100, 60}, 4, {{10, 72}});
+  EXPECT_THAT(tester.GetFinderPoints(image), ElementsAre(Found({10, 72}, 4)));
+  EXPECT_GT(tester.possibleCenters[0].count, 1);
+}
+
+TEST(FinderPoints, FewerThanThreeAreHandedOutAndLogged) {
+  QVTester tester;
+  const LogLines log;
+  EXPECT_THAT(tester.GetFinderPoints(cv::Mat(2, 50, CV_8UC1, cv::Scalar(0))), IsEmpty());
+  EXPECT_THAT(tester.GetFinderPoints(cv::Mat()), IsEmpty());
+  EXPECT_THAT(tester.GetFinderPoints(cv::Mat(50, 50, CV_8UC1, cv::Scalar(255))), IsEmpty());
+  EXPECT_THAT(tester.GetFinderPoints(DrawMarks({80, 60}, 3, {{5, 5}, {5, 50}})), SizeIs(2));
+  EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] startSize : 0", "[OKAPI] startSize : 0", "[OKAPI] startSize : 0",
+                                             "[OKAPI] startSize : 2"));
+}
+
+TEST(FinderPoints, ALargerFourthMarkIsDropped) {
+  QVTester tester;
+  cv::Mat image = DrawMarks({300, 300}, 5, {{10, 10}, {10, 200}, {200, 10}});
+  DrawMark(image, 150, 150, 10);
+  EXPECT_THAT(tester.GetFinderPoints(image),
+              UnorderedElementsAre(Found({10, 10}, 5), Found({10, 200}, 5), Found({200, 10}, 5)));
+  EXPECT_THAT(tester.GetFinderPoints(DrawMarks({300, 300}, 5, {{10, 10}, {10, 200}, {200, 10}, {200, 200}})),
+              SizeIs(3));
+}
+
+TEST(FinderPoints, SubMatricesAreReadByTheirStride) {
+  QVTester tester;
+  const std::vector<cv::Point> corners = {{20, 20}, {20, 120}, {120, 20}};
+  const cv::Mat whole = DrawMarks({400, 300}, 6, corners);
+  const cv::Mat view = whole(cv::Rect(11, 13, 200, 180));
+  EXPECT_THAT(tester.GetFinderPoints(view), tester.GetFinderPoints(view.clone()));
+  EXPECT_THAT(tester.GetFinderPoints(view), SizeIs(3));
+}
+
+TEST(FinderPoints, OtherDepthsAreAnError) {
+  QVTester tester;
+  for (const int type : {CV_16UC1, CV_32FC1, CV_8UC3}) {
+    try {
+      tester.GetFinderPoints(cv::Mat(10, 10, type, cv::Scalar(0)));
+      FAIL() << type;
+    } catch (const cv::Exception& e) {
+      EXPECT_EQ(-210, e.code);
+    }
+  }
+}
+
+TEST(FinderPoints, GarbageIsSurvived) {
+  std::mt19937 random(7);
+  QVTester tester;
+  const LogLines log;
+  for (int round = 0; round < 2000; ++round) {
+    const int rows = 1 + static_cast<int>(random() % 40);
+    const int cols = 1 + static_cast<int>(random() % 60);
+    const unsigned dark = 1 + random() % 9;
+    cv::Mat image(rows, cols, CV_8UC1);
+    for (uchar& pixel : cv::Mat_<uchar>(image)) pixel = random() % 10 < dark ? 0 : 255;
+    cv::resize(image, image, {}, 1 + random() % 3, 1 + random() % 3, cv::INTER_NEAREST);
+    for (const cv::Point& point : tester.GetFinderPoints(image)) {
+      EXPECT_TRUE(cv::Rect(0, 0, image.rows, image.cols).contains(point));
+    }
+  }
+}
+
+TEST(FinderSelection, ThePatternIsConfirmedBySizes) {
+  QVTester tester;
+  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters());
+  tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10, 2}, {0, 0, 10, 1}};
+  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters()) << "only two were seen twice";
+  tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10.5f, 2}, {0, 0, 11, 3}};
+  EXPECT_TRUE(tester.haveMultiplyConfirmedCenters());  // deviations sum to 1.0 of 31.5
+  tester.possibleCenters.emplace_back(0.0f, 0.0f, 10.0f, 1);
+  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters()) << "an unconfirmed one lowers the average";
+  tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10, 2}, {0, 0, 14, 2}};
+  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters());
+}
+
+TEST(FinderSelection, TwoConfirmedMarksOnlyRaiseTheFlag) {
+  QVTester tester;
+  tester.possibleCenters = {{0, 0, 5, 2}, {300, 0, 5, 1}};
+  EXPECT_EQ(0, tester.findRowSkip());
+  EXPECT_FALSE(tester.hasSkipped);
+  tester.possibleCenters[1].count = 2;
+  EXPECT_EQ(0, tester.findRowSkip()) << "no rows are ever jumped";
+  EXPECT_TRUE(tester.hasSkipped);
+}
+
+TEST(FinderSelection, StrayModuleSizesGoFirstThenTheLeastSeen) {
+  QVTester tester;
+  tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, 30, 9}};
+  EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)));
+  EXPECT_THAT(ModuleSizes(tester.possibleCenters), ElementsAre(10, 10, 10));
+
+  tester.possibleCenters.clear();
+  for (int i = 1; i <= 8; ++i) tester.possibleCenters.emplace_back(0.0f, static_cast<float>(i), 10.0f, i);
+  EXPECT_THAT(tester.selectBestPatterns(), ElementsAre(cv::Point(8, 0), cv::Point(7, 0), cv::Point(6, 0)));
+  EXPECT_THAT(tester.possibleCenters, SizeIs(5)) << "of a tail of five, every other one goes";
+}
+
+}  // namespace

@@ -1,0 +1,104 @@
+#include <gmock/gmock.h>
+
+#include <numeric>
+#include <opencv2/imgproc.hpp>
+
+#include "qvtester/tester.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+
+// Points hold the row in x, the column in y.
+const cv::Point kCorner(100, 200), kRight(100, 300), kBelow(200, 200);
+
+TEST(Geometry, EveryListOrderGivesTheSameMarks) {
+  QVTester tester;
+  std::vector<cv::Point> points = {kCorner, kRight, kBelow};
+  std::vector<int> order = {0, 1, 2};
+  do {
+    const std::vector<cv::Point> list = {points[order[0]], points[order[1]], points[order[2]]};
+    cv::Point corner;
+    cv::Point second;
+    cv::Point third;
+    tester.SortPatternPoints(list, corner, second, third);
+    EXPECT_EQ(kCorner, tester.GetCornerPoint(list));
+    EXPECT_EQ(kCorner, corner);
+    EXPECT_EQ(kRight, second);
+    EXPECT_EQ(kBelow, third);
+  } while (std::next_permutation(order.begin(), order.end()));
+}
+
+TEST(Geometry, EqualLongestSidesAreSettledByOrder) {
+  QVTester tester;
+  const cv::Point a(0, 0), b(0, 10), apex(30, 5);  // both long sides meet in the apex
+  EXPECT_EQ(b, tester.GetCornerPoint({a, apex, b})) << "d01 = d12";
+  EXPECT_EQ(b, tester.GetCornerPoint({apex, a, b})) << "d01 = d20";
+  EXPECT_EQ(a, tester.GetCornerPoint({a, b, apex})) << "d12 = d20";
+}
+
+TEST(Geometry, ShortListsAreSurvived) {
+  QVTester tester;
+  cv::Point corner;
+  cv::Point second;
+  cv::Point third(9, 9);
+  tester.SortPatternPoints({}, corner, second, third);
+  EXPECT_EQ(cv::Point(-1, -1), second);
+  EXPECT_EQ(cv::Point(0, 0), third);
+  EXPECT_EQ(-1.0f, tester.GetPatternAngle({kCorner, kRight}));
+  EXPECT_EQ(-1.0f, tester.GetPatternAngle({kCorner, kRight, kBelow, kBelow}));
+}
+
+TEST(Geometry, AnglesCountFromTheUprightChart) {
+  QVTester tester;
+  // The right and lower marks after quarter turns of the chart, counter-clockwise.
+  const cv::Point k(500, 500);
+  const std::vector<std::pair<cv::Point, cv::Point>> turned = {
+      {{0, 100}, {100, 0}}, {{-100, 0}, {0, 100}}, {{0, -100}, {-100, 0}}, {{100, 0}, {0, -100}}};
+  std::vector<float> angles;
+  for (const auto& [right, below] : turned) angles.push_back(tester.GetPatternAngle({k, k + right, k + below}));
+  EXPECT_THAT(angles, ElementsAre(315, 45, 135, 224));
+}
+
+TEST(Geometry, AnUprightPictureIsCopiedOntoASquare) {
+  QVTester tester;
+  cv::Mat image(480, 640, CV_8UC1);
+  cv::randu(image, 0, 255);
+  std::vector<cv::Point> points = {kCorner, kRight, kBelow};
+  cv::Mat upright;
+  tester.NormalizePatternImage(image, points, upright);
+  ASSERT_EQ(cv::Size(640, 640), upright.size());
+  EXPECT_EQ(0, cv::norm(image, upright.rowRange(0, 480), cv::NORM_INF));
+  EXPECT_EQ(0, cv::countNonZero(upright.rowRange(480, 640)));
+  EXPECT_THAT(points, ElementsAre(kCorner, kRight, kBelow));
+}
+
+TEST(Geometry, PointsTravelWithThePicture) {
+  QVTester tester;
+  for (int turn = 0; turn < 360; turn += 7) {
+    // A chart turned about the middle of a 640 x 640 picture, its marks drawn as dots.
+    std::vector<cv::Point> points;
+    cv::Mat image = cv::Mat::zeros(480, 640, CV_8UC1);
+    const double angle = turn * CV_PI / 180;
+    for (const cv::Point2d& p : {cv::Point2d(-80, -80), {80, -80}, {-80, 80}}) {
+      const cv::Point2d at(320 + p.x * std::cos(angle) + p.y * std::sin(angle),
+                           240 - p.x * std::sin(angle) + p.y * std::cos(angle));
+      points.emplace_back(cvRound(at.y), cvRound(at.x));
+      cv::circle(image, {cvRound(at.x), cvRound(at.y)}, 4, cv::Scalar(255), cv::FILLED);
+    }
+    cv::Mat upright;
+    tester.NormalizePatternImage(image, points, upright);
+    for (const cv::Point& p : points) EXPECT_GT(upright.at<uchar>(p.x, p.y), 200) << "turned by " << turn;
+    cv::Point corner;
+    cv::Point second;
+    cv::Point third;
+    tester.SortPatternPoints(points, corner, second, third);
+    // The angle is known to a degree: 160 pixels sideways rise by 3 at the most, 2 more for rounding.
+    EXPECT_NEAR(0, second.x - corner.x, 5) << "turned by " << turn;
+    EXPECT_NEAR(160, second.y - corner.y, 3);
+    EXPECT_NEAR(0, third.y - corner.y, 5);
+    EXPECT_NEAR(160, third.x - corner.x, 3);
+  }
+}
+
+}  // namespace

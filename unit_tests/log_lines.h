@@ -1,0 +1,40 @@
+#ifndef QVTESTER_UNIT_TESTS_LOG_LINES_H_
+#define QVTESTER_UNIT_TESTS_LOG_LINES_H_
+
+#include <android/log.h>
+
+#include <string>
+#include <vector>
+
+// While one lives, log lines come here instead of standard error, each as "[OKAPI] text\r\n". One at a time.
+class LogLines {
+ public:
+  LogLines() {
+    Lines().clear();
+    __android_log_set_minimum_priority(ANDROID_LOG_DEBUG);
+    __android_log_set_logger([](const __android_logger_data*, const char* message) { Lines().emplace_back(message); });
+  }
+  ~LogLines() { __android_log_set_logger(__android_log_stderr_logger); }
+  LogLines(const LogLines&) = delete;
+  LogLines& operator=(const LogLines&) = delete;
+
+  static const std::vector<std::string>& All() { return Lines(); }
+
+  // The lines' texts, without tag and line end.
+  static std::vector<std::string> Texts() {
+    std::vector<std::string> texts;
+    for (const std::string& line : Lines()) {
+      const std::string tag = "[OKAPI] ";
+      texts.push_back(line.substr(tag.size(), line.size() - tag.size() - 2));
+    }
+    return texts;
+  }
+
+ private:
+  static std::vector<std::string>& Lines() {
+    static std::vector<std::string> lines;
+    return lines;
+  }
+};
+
+#endif  // QVTESTER_UNIT_TESTS_LOG_LINES_H_

@@ -1,0 +1,133 @@
+#include <gmock/gmock.h>
+
+#include <cstring>
+
+#include "core/property_table.h"
+#include "qvtester/tester.h"
+
+namespace {
+
+using ::testing::Each;
+using ::testing::ElementsAre;
+using ::testing::ElementsAreArray;
+
+QV_PROPERTY_INDEX Index(int index) { return static_cast<QV_PROPERTY_INDEX>(index); }
+
+template <typename T>
+T Get(QVTester& tester, int index) {
+  T value = {};
+  EXPECT_EQ(1, tester.GetProperty(Index(index), &value)) << "property " << index;
+  return value;
+}
+
+bool IsScalar(const QVProperty& property) {
+  return std::holds_alternative<IntProperty>(property.kind) || std::holds_alternative<FloatProperty>(property.kind);
+}
+
+TEST(Properties, EveryOneKeepsItsOwnValue) {
+  QVTester tester;
+  for (const QVProperty& property : kProperties) {  // two rows on one member would overwrite each other
+    std::array<std::uint32_t, 9> value;
+    value.fill(1000u + static_cast<unsigned>(property.index));
+    if (!std::holds_alternative<RegionList>(property.kind) && !std::holds_alternative<SharedTable>(property.kind) &&
+        !std::holds_alternative<PatchValues>(property.kind)) {
+      ASSERT_EQ(1, tester.SetProperty(Index(property.index), value.data()));
+    }
+  }
+  for (const QVProperty& property : kProperties) {
+    if (!IsScalar(property)) continue;
+    EXPECT_EQ(1000u + static_cast<unsigned>(property.index), Get<std::uint32_t>(tester, property.index));
+  }
+  std::uint32_t nine[9];
+  for (const int index : {52, 62, 63}) {
+    tester.GetProperty(Index(index), nine);
+    EXPECT_THAT(nine, Each(1000u + static_cast<unsigned>(index)));
+  }
+}
+
+TEST(Properties, DefaultsAreTheCalibratedOnes) {
+  QVTester tester;
+  EXPECT_EQ(538, Get<int>(tester, 0));
+  EXPECT_EQ(0x40000000u, Get<std::uint32_t>(tester, 51));  // 2.0
+  EXPECT_EQ(0x3f28f5c3u, Get<std::uint32_t>(tester, 79));  // 0.66
+  EXPECT_EQ(125, Get<int>(tester, 86));
+  EXPECT_EQ(125, Get<int>(tester, 93));
+  EXPECT_EQ(25, Get<int>(tester, 94));
+  const auto matrix = Get<std::array<float, 9>>(tester, 63);
+  EXPECT_THAT(matrix, ElementsAre(3528.04f, 0, 1023.5f, 0, 3528.04f, 1223.5f, 0, 0, 1));
+}
+
+TEST(Properties, UnknownIndicesChangeNothing) {
+  QVTester tester;
+  int untouched = 77;
+  for (const int index : {-1, 3, 5, 11, 15, 20, 25, 38, 42, 72, 73, 95, 1 << 30}) {
+    EXPECT_EQ(-97, tester.SetProperty(Index(index), &untouched)) << index;
+    EXPECT_EQ(-97, tester.GetProperty(Index(index), &untouched)) << index;
+  }
+  EXPECT_EQ(77, untouched);
+}
+
+TEST(Properties, DistortionReadsAsNineFloatsWithZerosBehind) {
+  QVTester tester;
+  float coefficients[5] = {1, 2, 3, 4, 5};
+  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_DIST_COEFFS_0, coefficients));
+  std::array<float, 9> out;
+  out.fill(-1);
+  ASSERT_EQ(1, tester.GetProperty(QV_PROPERTY_DIST_COEFFS_0, out.data()));
+  EXPECT_THAT(out, ElementsAre(1, 2, 3, 4, 5, 0, 0, 0, 0));
+}
+
+TEST(Properties, RegionListsAreCopiedByTheirCount) {
+  QVTester tester;
+  EXPECT_EQ(nullptr, Get<QVRegionRecord*>(tester, 76));
+  QVRegionRecord records[2] = {{{1, 2, 3, 4, 5}}, {{6, 7, 8, 9, 10}}};
+  for (int count : {2, 1, 0}) {
+    ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_REGION_COUNT_0, &count));
+    ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_REGION_LIST_0, records));
+    auto* held = Get<QVRegionRecord*>(tester, 76);
+    ASSERT_NE(nullptr, held);
+    EXPECT_NE(records, held);
+    EXPECT_EQ(0, std::memcmp(held, records, sizeof(QVRegionRecord) * static_cast<std::size_t>(count)));
+  }
+  int negative = -1;
+  auto* before = Get<QVRegionRecord*>(tester, 76);
+  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_REGION_COUNT_0, &negative));
+  EXPECT_EQ(-97, tester.SetProperty(QV_PROPERTY_REGION_LIST_0, records));
+  EXPECT_EQ(before, Get<QVRegionRecord*>(tester, 76));
+  EXPECT_EQ(nullptr, Get<QVRegionRecord*>(tester, 78)) << "the other list is its own";
+}
+
+TEST(Properties, TablesStayInTheCallersMemory) {
+  QVTester tester;
+  std::array<int, 256> table = {};
+  std::array<int, 256> out;
+  out.fill(9);
+  EXPECT_EQ(-97, tester.GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
+  EXPECT_THAT(out, Each(9));
+  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, table.data()));
+  table[255] = 42;
+  ASSERT_EQ(1, tester.GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
+  EXPECT_THAT(out, ElementsAreArray(table));
+  EXPECT_TRUE(tester.prop_table_1_.empty());
+}
+
+TEST(Properties, PatchValuesRaiseTheirOwnFlag) {
+  QVTester tester;
+  std::array<float, 72> values;
+  values.fill(3);
+  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_REF_PATCH_VALUES_1, values.data()));
+  EXPECT_TRUE(tester.ref_patch_values_1_set_);
+  EXPECT_FALSE(tester.ref_patch_values_0_set_);
+  const auto held = Get<std::array<float, 72>>(tester, 91);
+  EXPECT_THAT(held, Each(3));
+}
+
+TEST(Properties, InitialisingAgainKeepsThem) {
+  QVTester tester;
+  int value = 90;
+  tester.SetProperty(QV_PROPERTY_BINARY_THR_WORKING, &value);
+  tester.Initialize();
+  EXPECT_EQ(90, Get<int>(tester, 93));
+}
+
+}  // namespace

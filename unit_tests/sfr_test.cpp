@@ -1,0 +1,226 @@
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+
+#include "qvtester/tester.h"
+#include "tools/method_law.h"
+#include "unit_tests/drawing.h"
+
+namespace {
+
+using ::testing::Each;
+using ::testing::ElementsAre;
+using ::testing::FloatNear;
+using ::testing::Pointwise;
+
+struct Sfr {
+  std::vector<float> freq, sfr;
+  float mtf50 = 0;
+};
+
+Sfr Measure(const cv::Mat& region) {
+  QVTester tester;
+  Sfr result;
+  EXPECT_TRUE(tester.CalculateSFR(region, result.freq, result.sfr, result.mtf50));
+  return result;
+}
+
+cv::Mat Column(std::vector<float> values) { return cv::Mat(values, true); }
+
+std::vector<float> Values(const cv::Mat& matrix) { return matrix.reshape(1, 1); }
+
+class KnownBlur : public ::testing::TestWithParam<double> {};
+
+TEST_P(KnownBlur, Mtf50LiesWithinTheLaw) {
+  const double sigma = GetParam();
+  for (const int cols : {100, 151}) {
+    for (const double slope_deg : {3.0, 5.0, 8.0}) {
+      for (const double place : {0.0, 0.3, 2.7, -6.5}) {
+        EdgeView view;
+        view.rows = 2 * cols;
+        view.cols = cols;
+        view.slope = std::tan(slope_deg * CV_PI / 180);
+        view.sigma_px = sigma;
+        view.place = place;
+        const float mtf50 = Measure(DrawEdge(view)).mtf50;
+        const auto [low, high] = method_law::MeasuredMtf50(sigma, cols);
+        EXPECT_GT(mtf50, 0.98 * low) << cols << " " << slope_deg << " " << place;  // 2 % is the law's own
+        EXPECT_LT(mtf50, 1.02 * high) << cols << " " << slope_deg << " " << place;
+      }
+    }
+  }
+}
+INSTANTIATE_TEST_SUITE_P(Sigma, KnownBlur, ::testing::Values(0.5, 0.8, 1.2, 2.0, 3.0));
+
+TEST(SlantedEdge, PolarityAndOrientationLeaveTheResponseAlone) {
+  const float rounding = 2e-5f;  // sums of other grey levels round elsewhere, no more
+  EdgeView view;
+  const Sfr plain = Measure(DrawEdge(view));
+  view.dark_left = false;
+  const Sfr inverted = Measure(DrawEdge(view));
+  EXPECT_THAT(inverted.sfr, Pointwise(FloatNear(rounding), plain.sfr));
+  const Sfr lying = Measure(DrawEdge({}).t());
+  EXPECT_EQ(plain.sfr, lying.sfr) << "a region wider than tall is transposed, nothing else";
+  EXPECT_EQ(plain.mtf50, lying.mtf50);
+}
+
+TEST(SlantedEdge, TheAxisEndsAtNyquistForEvenWidths) {
+  for (const int cols : {100, 101}) {
+    EdgeView view;
+    view.cols = cols;
+    const Sfr result = Measure(DrawEdge(view));
+    ASSERT_EQ(cols / 2 + 1u, result.freq.size());
+    ASSERT_EQ(result.freq.size(), result.sfr.size());
+    EXPECT_EQ(0.0f, result.freq[0]);
+    EXPECT_EQ(1.0f, result.sfr[0]);
+    EXPECT_EQ(2.0f * static_cast<float>(cols / 2) / static_cast<float>(cols), result.freq.back());
+  }
+}
+
+TEST(SlantedEdge, UprightEdgesGoThroughInfinities) {
+  EdgeView view;
+  view.slope = 0;
+  const Sfr result = Measure(DrawEdge(view));
+  const auto [low, high] = method_law::MeasuredMtf50(view.sigma_px, view.cols);
+  EXPECT_GT(result.mtf50, 0.98 * low);
+  EXPECT_LT(result.mtf50, 1.02 * high);
+}
+
+TEST(SlantedEdge, AFlatRegionGivesAnAxisAndNoFigures) {
+  for (const float level : {0.0f, 128.0f}) {
+    const Sfr result = Measure(cv::Mat(200, 60, CV_32F, cv::Scalar(level)));
+    ASSERT_EQ(31u, result.freq.size());
+    EXPECT_EQ(1.0f, result.freq.back());
+    EXPECT_FALSE(std::isfinite(result.mtf50));
+    for (const float response : result.sfr) EXPECT_FALSE(std::isfinite(response));
+  }
+}
+
+TEST(SlantedEdge, NoiseAndStripesAreSurvived) {  // slopes far beyond any array, bins outside it
+  cv::theRNG().state = 5;
+  for (int round = 0; round < 300; ++round) {
+    cv::Mat region(10 + round % 50, 5 + round % 37, CV_8UC1);
+    cv::randu(region, 0, 2 + round % 254);
+    if (round % 3 == 0) cv::repeat(region.row(0).clone(), region.rows, 1, region);
+    const Sfr result = Measure(region);
+    EXPECT_EQ(static_cast<std::size_t>(std::min(region.rows, region.cols) / 2 + 1), result.sfr.size());
+  }
+}
+
+TEST(SlantedEdge, NarrowRegionsAreAnError) {
+  EXPECT_NO_THROW(Measure(cv::Mat(20, 5, CV_32F, cv::Scalar(3))));
+  EXPECT_THROW(Measure(cv::Mat(20, 4, CV_32F, cv::Scalar(3))), cv::Exception);
+  EXPECT_THROW(Measure(cv::Mat()), cv::Exception);
+}
+
+TEST(SlantedEdge, Mtf50AloneIsTheSameFigure) {
+  QVTester tester;
+  float mtf50 = 0;
+  cv::Mat levels;
+  DrawEdge({}).convertTo(levels, CV_8U);
+  EXPECT_EQ(1, tester.CalculateMTF(levels, mtf50));
+  EXPECT_EQ(Measure(levels).mtf50, mtf50);
+}
+
+TEST(SfrSteps, KernelsFollowTheBrighterSide) {
+  QVTester tester;
+  cv::Mat region = cv::Mat::zeros(3, 10, CV_32F);
+  const auto first_tap = [&] {
+    float* fil1 = nullptr;
+    float* fil2 = nullptr;
+    tester.CalculateFilterValue(&region, &fil1, &fil2);
+    const std::vector<float> taps(fil2, fil2 + 3);
+    EXPECT_EQ(taps[0], fil1[0]);
+    EXPECT_THAT(taps, ElementsAre(fil1[0], 0, fil1[1]));
+    delete[] fil1;
+    delete[] fil2;
+    return taps[0];
+  };
+  EXPECT_EQ(0.5f, first_tap()) << "equal sides";
+  region.col(9).setTo(-100);  // the right strip stops a column short of this
+  region.col(4).setTo(-100);
+  EXPECT_EQ(0.5f, first_tap());
+  region.col(3).setTo(1);
+  EXPECT_EQ(-0.5f, first_tap());
+}
+
+TEST(SfrSteps, TheDerivativeCorrelatesAndFillsItsFirstColumn) {
+  QVTester tester;
+  const cv::Mat rows = (cv::Mat_<float>(2, 5) << 0, 1, 4, 9, 16, 5, 5, 5, 5, 7);
+  cv::Mat out;
+  float two[] = {0.5f, -0.5f};
+  tester.GetFirstDerivative(rows, 2, 5, two, 2, out);
+  EXPECT_THAT(Values(out), ElementsAre(-0.5f, -0.5f, -1.5f, -2.5f, -3.5f, 0, 0, 0, 0, -1));
+  float three[] = {0.5f, 0, -0.5f};
+  tester.GetFirstDerivative(rows, 2, 5, three, 3, out);  // the last column sees its neighbour mirrored
+  EXPECT_THAT(Values(out), ElementsAre(0, -4, -4, -6, 0, 0, 0, 0, -1, 0));
+}
+
+TEST(SfrSteps, TheWindowLeansHalfASample) {
+  QVTester tester;
+  const auto window = Values(tester.GetAHammingWindow(4, 2.5f));  // wid = 1.5
+  EXPECT_FLOAT_EQ(static_cast<float>(0.54 + 0.46 * std::cos(2.5 * 3.141592 / 1.5)), window[0]);
+  EXPECT_FLOAT_EQ(static_cast<float>(0.54 + 0.46 * std::cos(0.5 * 3.141592 / 1.5)), window[2]);
+  EXPECT_EQ(window[2], window[3]) << "the peak lies between the third and the fourth of four";
+}
+
+TEST(SfrSteps, ShiftsMoveTheCentreToTheMiddle) {
+  QVTester tester;
+  const cv::Mat x = Column({1, 2, 3, 4, 5});  // middle: index 3
+  EXPECT_THAT(Values(tester.GetShiftedArray(x, 4)), ElementsAre(2, 3, 4, 5, 0));
+  EXPECT_THAT(Values(tester.GetShiftedArray(x, 3)), ElementsAre(1, 2, 3, 4, 5));
+  EXPECT_THAT(Values(tester.GetShiftedArray(x, 1)), ElementsAre(0, 0, 1, 2, 3));
+  EXPECT_THAT(Values(tester.GetShiftedArray(x, 100)), Each(0));
+  EXPECT_THAT(Values(tester.GetShiftedArray(x, -100)), Each(0));
+  EXPECT_EQ(2.875f, tester.GetCentroid(Column({0, 1, 2, 3, 1, 1})));
+}
+
+TEST(SfrSteps, PolynomialsAreFittedLowestPowerFirst) {
+  QVTester tester;
+  const cv::Mat x = Column({0, 1, 2, 3, 4});
+  cv::Mat fit(3, 1, CV_32F);
+  tester.polyfit(x, Column({3, 4, 9, 18, 31}), fit, 2);  // 3 - x + 2 x^2
+  EXPECT_THAT(Values(fit), Pointwise(FloatNear(1e-4f), {3.0f, -1.0f, 2.0f}));
+  float slope = 0;
+  float offset = 0;
+  EXPECT_TRUE(tester.FindEdge(Column({7, 7.5f, 8, 8.5f}), 4, &slope, &offset));
+  EXPECT_FLOAT_EQ(0.5f, slope);
+  EXPECT_FLOAT_EQ(7.0f, offset);
+  try {
+    cv::Mat wrong(3, 1, CV_32F);
+    tester.polyfit(x, x, wrong, 1);
+    FAIL();
+  } catch (const cv::Exception& e) {
+    EXPECT_EQ(-215, e.code);
+    EXPECT_EQ("polyfit", e.func);
+    EXPECT_EQ("external/vision/lib/QVTester_MTF", e.file);
+    EXPECT_EQ(
+        "(src_x.rows>0)&&(src_y.rows>0)&&(src_x.cols==1)&&(src_y.cols==1) "
+        "&&(dst.cols==1)&&(dst.rows==(order+1))&&(order>=1)",
+        e.err);
+  }
+}
+
+TEST(SfrSteps, PixelsFallIntoBinsAlongTheEdge) {
+  QVTester tester;
+  const cv::Mat region = (cv::Mat_<float>(3, 4) << 0, 0, 8, 8, 0, 0, 8, 8, 0, 0, 0, 8);
+  // Upright: bin n is column n.
+  EXPECT_THAT(Values(tester.ProjectData(region, 0, 0, 1)), ElementsAre(0, 0, 16.0f / 3, 8));
+  // Half a column a row: row 2 falls one bin lower, row 1 stays; one bin of slant, so the window starts at bin 1.
+  EXPECT_THAT(Values(tester.ProjectData(region, 0.5f, 0, 1)), ElementsAre(0, 0, 8, 8));
+  // The other way, barely slanted: no margin, and the last column's lower rows fall outside.
+  EXPECT_THAT(Values(tester.ProjectData(region, -0.25f, 0, 1)), ElementsAre(0, 0, 8.0f / 3, 16.0f / 3));
+  // Two bins a pixel: every other one is empty and reads 0.
+  EXPECT_THAT(Values(tester.ProjectData(region.row(0), 0, 0, 2)), ElementsAre(0, 0, 0, 0, 8, 0, 8, 0));
+  for (const float steep : {NAN, INFINITY, -3e9f}) {
+    for (const float value : Values(tester.ProjectData(region, steep, 0, 1))) EXPECT_TRUE(std::isnan(value));
+  }
+}
+
+TEST(SfrSteps, ASlantWithoutEndNeedsNoMemory) {
+  QVTester tester;
+  EXPECT_EQ(4u, Values(tester.ProjectData(cv::Mat::ones(3, 4, CV_32F), 4e8f, 0, 1)).size());
+}
+
+}  // namespace
