@@ -223,10 +223,8 @@ bool QVTester::haveMultiplyConfirmedCenters() {
 }
 
 std::vector<cv::Point> QVTester::selectBestPatterns() {
-  std::vector<cv::Point> points;
-  if (possibleCenters.size() < 3) {
-    QVDEBUGP("[OKAPI] startSize : %d", static_cast<int>(possibleCenters.size()));
-  }
+  startSize = static_cast<int>(possibleCenters.size());
+  if (startSize < 3) QVDEBUGP("[OKAPI] startSize : %d", startSize);
 
   if (possibleCenters.size() > 3) {
     const auto n = static_cast<float>(possibleCenters.size());
@@ -257,6 +255,7 @@ std::vector<cv::Point> QVTester::selectBestPatterns() {
     }
   }
 
+  std::vector<cv::Point> points;
   const std::size_t emitted = std::min<std::size_t>(possibleCenters.size(), 3);
   for (std::size_t i = 0; i < emitted; ++i) points.push_back(RowColumn(possibleCenters[i]));
   return points;

@@ -11,8 +11,23 @@
 /// Side of the square whose corners the three finder marks take: the reference of every scale.
 inline constexpr int kChartSide = 6970;
 
-/// A module is a seventh of a finder mark's width.
-inline constexpr int kMarkModule = 100;
+/// Finder marks come in three sizes; a module is a seventh of a mark's width, in chart units. The search misses modules
+/// under 3 pixels, and on a chart turned by some 30 degrees places a mark up to a quarter of a module off: so the marks
+/// should be the smallest whose modules still take 6 pixels.
+struct MarkSize {
+  const char* name;
+  int module;
+};
+inline constexpr std::array<MarkSize, 3> kMarkSizes = {{{"fine", 25}, {"medium", 50}, {"coarse", 100}}};
+inline constexpr double kModulePx = 6;
+
+/// The size for photos of this scale; the largest when even that is small.
+constexpr const MarkSize& SuitableMarks(double pixels_per_unit) {
+  for (const MarkSize& size : kMarkSizes) {
+    if (size.module * pixels_per_unit >= kModulePx) return size;
+  }
+  return kMarkSizes.back();
+}
 
 /// Centres of the marks: corner, second, third.
 inline constexpr std::array<std::array<int, 2>, 3> kMarkCentres = {{{0, 0}, {kChartSide, 0}, {0, kChartSide}}};
@@ -50,6 +65,49 @@ inline std::array<cv::Point2d, 4> EdgeTarget(double angle_deg = kEdgeAngleDeg) {
   const cv::Point2d right(kWidth, -slope * kWidth);
   const cv::Point2d up(-slope * kHeight, -kHeight);
   return {corner, corner + right, corner + right + up, corner + up};
+}
+
+/// A colour patch of the ring along the square's sides, at its sampling position.
+struct ChartPatch {
+  const char* name;
+  int red, green, blue;  // sRGB
+};
+
+/// Patches are sampled over D / 21 to each side of their middle and drawn somewhat larger.
+inline constexpr double kPatchHalf = 420;
+
+// In sampling order: six along the top, six along the bottom, six down the left side, six down the right. The white is
+// number 9; 12, 13 and 14 are the three that are measured without a standard.
+inline constexpr std::array<ChartPatch, 24> kPatches = {{
+    {"grey 20", 20, 20, 20}, {"yellow", 250, 225, 110},   {"purple", 90, 40, 110},    {"light cyan", 150, 240, 245},
+    {"brown", 110, 60, 40},  {"grey 240", 240, 240, 240}, {"dark teal", 20, 90, 100}, {"pink", 250, 190, 205},
+    {"grey 45", 45, 45, 45}, {"white", 255, 255, 255},    {"maroon", 120, 20, 60},    {"light green", 170, 245, 170},
+    {"red", 190, 30, 40},    {"green", 20, 110, 50},      {"blue", 40, 50, 160},      {"grey 225", 225, 225, 225},
+    {"grey 70", 70, 70, 70}, {"lavender", 205, 195, 250}, {"navy", 20, 30, 100},      {"peach", 255, 205, 160},
+    {"grey 90", 90, 90, 90}, {"grey 210", 210, 210, 210}, {"dark olive", 80, 80, 20}, {"sky", 170, 210, 255},
+}};
+
+constexpr bool PatchesKeepOffTheThreshold() {
+  for (const ChartPatch& patch : kPatches) {
+    // The measures weigh a photo's channels as red, green, blue whatever their order, so both orders count.
+    for (const int first : {patch.red, patch.blue}) {
+      const int last = patch.red + patch.blue - first;
+      const double grey = 0.299 * first + 0.587 * patch.green + 0.114 * last;
+      if (grey > 125 - 30 && grey < 125 + 30) return false;
+    }
+  }
+  return true;
+}
+static_assert(PatchesKeepOffTheThreshold(), "specks near the default threshold of 125 pass for marks");
+
+inline cv::Point2d PatchCentre(int number) {
+  const double along = (number % 6 + 1) * kChartSide / 7.0;
+  switch (number / 6) {
+    case 0: return {along, 0.0};
+    case 1: return {along, static_cast<double>(kChartSide)};
+    case 2: return {0.0, along};
+    default: return {static_cast<double>(kChartSide), along};
+  }
 }
 
 #endif  // QVTESTER_CHART_CHART_LAYOUT_H_

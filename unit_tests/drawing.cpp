@@ -13,6 +13,7 @@
 namespace {
 
 constexpr int kSubpixels = 4;
+constexpr double kModule = kMarkSizes.back().module;
 
 // Chart units to pixel corners: (0, 0) is the top left corner of the first pixel.
 cv::Point2d Place(const ChartView& view, double x, double y) {
@@ -66,9 +67,9 @@ cv::Mat DrawChart(const ChartView& view) {
 
   for (int i = 0; i < std::min(view.marks, 3); ++i) {
     const auto& [x, y] = kMarkCentres[view.marks == 2 ? 2 * i : i];
-    FillMark(canvas, view, x, y, kMarkModule);
+    FillMark(canvas, view, x, y, kModule);
   }
-  if (view.marks > 3) FillMark(canvas, view, kChartSide, kChartSide, 1.2 * kMarkModule);
+  if (view.marks > 3) FillMark(canvas, view, kChartSide, kChartSide, 1.2 * kModule);
 
   cv::Mat photo;
   cv::resize(canvas, photo, view.size, 0, 0, cv::INTER_AREA);

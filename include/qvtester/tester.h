@@ -198,6 +198,7 @@ class QV_API QVTester {
 
   // Search for finder marks; each GetFinderPoints starts anew.
   bool hasSkipped = false;
+  int startSize = 0;  // candidates before the best three were chosen
   std::vector<QVFinderPattern> possibleCenters;
   int crossCheckStateCount[5] = {};
 

@@ -1,0 +1,51 @@
+#ifndef QVTESTER_TOOLS_CHART_VIEW_H_
+#define QVTESTER_TOOLS_CHART_VIEW_H_
+
+#include <array>
+#include <opencv2/core.hpp>
+#include <string>
+#include <vector>
+
+#include "chart/chart_layout.h"
+#include "qvtester/tester.h"
+#include "tools/record.h"
+
+// What the last search for finder marks saw of a chart photo, read back from the tester.
+
+struct Mark {
+  cv::Point2d centre;  // column, row; pixel centres at whole numbers
+  double module_px;
+};
+
+struct ChartView {
+  std::vector<Mark> marks;  // with three: corner, second, third; otherwise the candidates, in the order found
+  int candidates = 0;       // before the best three were chosen
+  int threshold = 0;        // grey level
+  double legs_ratio = 0;    // the rest only with three marks
+  double legs_angle_deg = 0;
+  double turn_deg = 0;  // counter-clockwise, (-180, 180]
+
+  bool complete() const { return marks.size() == 3; }
+};
+
+/// Looks at the tester's search state; call right after the test that searched.
+ChartView LookAtChart(QVTester& tester);
+
+/// Adds marks, module size, legs, turn and threshold to the phase.
+void AddChartFigures(Phase& phase, const ChartView& view);
+
+/// Why three marks did not come back, a sentence each: how many were found, marks too small, a threshold off the
+/// picture's two grey peaks.
+std::vector<std::string> ExplainMiss(const ChartView& view, const cv::Mat& photo);
+
+/// A measured region in detail, on the straightened picture and on the photo.
+struct RegionView {
+  std::array<cv::Point2d, 4> outline;  // on the photo, column and row
+  cv::Mat pixels;                      // of the straightened picture, CV_32F, the edge running down the rows
+  std::vector<double> edge_profile;    // mean grey level a bin of one pixel, across the edge
+};
+
+/// Cuts both regions, vertical first, as the measures do.
+std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo);
+
+#endif  // QVTESTER_TOOLS_CHART_VIEW_H_

@@ -1,0 +1,18 @@
+#ifndef QVTESTER_TOOLS_COMMANDS_H_
+#define QVTESTER_TOOLS_COMMANDS_H_
+
+#include <CLI/CLI.hpp>
+#include <functional>
+
+/// A command's body; answers the exit status.
+using CommandBody = std::function<int()>;
+
+// Each declares its options on the command-line parser's object and hands back what runs once they are parsed.
+CommandBody DeclareAutofocus(CLI::App& command);
+CommandBody DeclareChart(CLI::App& command);
+CommandBody DeclareFlash(CLI::App& command);
+CommandBody DeclareList(CLI::App& command);
+CommandBody DeclareMtf(CLI::App& command);
+CommandBody DeclareSimulate(CLI::App& command);
+
+#endif  // QVTESTER_TOOLS_COMMANDS_H_

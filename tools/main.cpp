@@ -1,0 +1,58 @@
+#include <CLI/CLI.hpp>
+#include <csignal>
+#include <cstdio>
+#include <exception>
+
+#include "tools/commands.h"
+#include "tools/program.h"
+
+namespace {
+
+struct Command {
+  const char* name;
+  const char* purpose;
+  CommandBody (*declare)(CLI::App& command);
+};
+
+constexpr Command kCommands[] = {
+    {"autofocus", "Measure the sharpness of a chart photo (test 14)", DeclareAutofocus},
+    {"mtf", "Measure the two MTF50 values of a chart photo, outside the numbered tests", DeclareMtf},
+    {"flash", "Measure the mean brightness of a flash photo (tests 15 and 18)", DeclareFlash},
+    {"chart", "Draw the test chart", DeclareChart},
+    {"simulate", "Take a photo of the chart with a camera of known faults", DeclareSimulate},
+    {"list", "List the library's tests, slots, properties or codes", DeclareList},
+};
+
+constexpr char kFooter[] =
+    "Exit status: 0 measured, within all limits; 1 measured, a limit broken; 2 wrong usage; 3 could not measure;\n"
+    "4 internal fault; 130 interrupted. `qvtester COMMAND --help` shows a command's options.";
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  std::signal(SIGINT, [](int) { std::_Exit(130); });
+  CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
+  app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
+  app.require_subcommand(1);
+  app.footer(kFooter);
+  app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
+  app.get_formatter()->column_width(32);
+
+  CommandBody body;
+  for (const Command& row : kCommands) {
+    CLI::App* command = app.add_subcommand(row.name, row.purpose);
+    command->callback([&body, chosen = row.declare(*command)] { body = chosen; });
+  }
+  try {
+    app.parse(argc, argv);
+    return body();
+  } catch (const CLI::ParseError& e) {
+    return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
+  } catch (const Failure& e) {
+    std::fprintf(stderr, "qvtester: %s\n", e.what());
+    return e.status;
+  } catch (const std::exception& e) {
+    std::fprintf(stderr, "qvtester: internal fault: %s\n", e.what());
+    return kInternalFault;
+  }
+}

@@ -1,0 +1,207 @@
+#include "tools/measure.h"
+
+#include <algorithm>
+#include <cmath>
+#include <filesystem>
+#include <iostream>
+#include <iterator>
+
+#include "core/property_table.h"
+#include "tools/codes.h"
+
+namespace {
+
+// A tester of this run's own: nothing carries over from another unit.
+class FreshTester {
+ public:
+  FreshTester() {
+    FinalizeTestModule();
+    if (InitTestModule() != QV_SUCCESS) throw Failure(kInternalFault, "the library can't be started");
+  }
+  ~FreshTester() { FinalizeTestModule(); }
+  FreshTester(const FreshTester&) = delete;
+  FreshTester& operator=(const FreshTester&) = delete;
+};
+
+struct ValueReader {
+  QVTester& tester;
+  QV_PROPERTY_INDEX index;
+
+  Json operator()(const IntProperty& /*kind*/) const { return Get<int, 1>()[0]; }
+  Json operator()(const FloatProperty& /*kind*/) const { return Get<float, 1>()[0]; }
+  Json operator()(const FloatArray& /*kind*/) const { return Get<float, 9>(); }
+  Json operator()(const MatrixProperty& /*kind*/) const { return Get<float, 9>(); }
+  Json operator()(const RegionList& /*kind*/) const { return nullptr; }
+  Json operator()(const SharedTable& /*kind*/) const { return Get<int, 256>(); }
+  Json operator()(const PatchValues& /*kind*/) const { return Get<float, 72>(); }
+
+ private:
+  template <typename T, std::size_t n>
+  Json Get() const {
+    std::array<T, n> values = {};
+    return tester.GetProperty(index, values.data()) == QV_SUCCESS ? Json(values) : Json(nullptr);
+  }
+};
+
+Json PropertiesOffDefault(QVTester& tester) {
+  QVTester defaults;
+  Json changed = Json::object();
+  for (const QVProperty& property : kProperties) {
+    const auto index = static_cast<QV_PROPERTY_INDEX>(property.index);
+    const Json value = std::visit(ValueReader{tester, index}, property.kind);
+    if (value != std::visit(ValueReader{defaults, index}, property.kind))
+      changed[std::to_string(property.index)] = value;
+  }
+  return changed;
+}
+
+std::string ReadInput(const std::string& path) {
+  if (path == "-") return {std::istreambuf_iterator<char>(std::cin), {}};
+  if (!std::filesystem::exists(path)) throw Failure(kCouldNotMeasure, "no such file");
+  if (std::filesystem::is_directory(path)) throw Failure(kCouldNotMeasure, "is a directory, not a photo");
+  return ReadWholeFile(path, kCouldNotMeasure);
+}
+
+// Loads one slot. What can't be read becomes the run's code and a sentence; what the decoder says, a warning.
+bool Load(Record& record, const SlotInput& input, const std::string& scratch, SideOutput& side) {
+  const std::string shown = input.path == "-" ? "standard input" : input.path;
+  const auto refuse = [&](int code, const std::string& why) {
+    record.phase.code = code;
+    record.details = {shown + ": " + why};
+    return false;
+  };
+  std::string content;
+  try {
+    content = ReadInput(input.path);
+  } catch (const Failure& e) {
+    return refuse(QV_ERROR_INVALID_ARGUMENT, e.what());
+  }
+  if (content.empty()) return refuse(QV_ERROR_INVALID_ARGUMENT, "the file is empty");
+
+  std::string path = input.path;
+  if (path == "-") {
+    path = scratch + "/input";
+    WriteWholeFile(path, content);
+  }
+  const int code = SetResource(input.slot, path.data());
+  const std::vector<std::string> chatter = side.TakeChatter();
+  if (code == QV_ERROR_INVALID_ARGUMENT) return refuse(code, "not a picture that can be decoded");
+  if (code != QV_SUCCESS) return refuse(code, FindCode(code).meaning);
+  if (!chatter.empty()) {
+    record.details.push_back(shown + ": the decoder says \"" + chatter.front() + "\"; is the file cut?");
+  }
+  const cv::Mat photo = SlotPhoto(input.slot);
+  record.inputs.push_back({input.slot, shown, HexDigest(content, "SHA256"), photo.cols, photo.rows});
+  return true;
+}
+
+std::string Verdict(const Record& record) {
+  std::string text = Name(record.outcome());
+  if (record.marginal()) text += ", marginal";
+  return Format("%s  code %d, %s, %lld ms\n", text.c_str(), record.phase.code, FindCode(record.phase.code).name,
+                static_cast<long long>(record.phase.end_millis - record.phase.start_millis));
+}
+
+// Where, why, which code, what to do about it.
+std::string MissSentence(const Record& record) {
+  const ResultCode& row = FindCode(record.phase.code);
+  std::string text;
+  for (const std::string& sentence : record.details) text += (text.empty() ? "" : "; ") + sentence;
+  if (text.empty()) text = row.meaning;
+  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name, row.meaning, row.look_at);
+}
+
+}  // namespace
+
+void MeasureOptions::DeclareOn(CLI::App& command) {
+  command.add_option("--json", json, "Write the record to FILE; - is standard output")->type_name("FILE");
+  command.add_option("--annotate", annotate, "Write a picture of what was measured")->type_name("PNG");
+  command.add_option("--limits", limits, "Judge the figures by this limits file")->type_name("FILE");
+  command.add_option("--dut", dut, "Serial number of the unit, for the record")->type_name("ID");
+  command.add_option("--station", station, "Name of the station, for the record")->type_name("ID");
+  command.add_flag("--verbose", verbose, "Show the library's log and what decoders say");
+  command.add_flag("--quiet", quiet, "Print nothing but what was asked for and errors");
+}
+
+cv::Mat SlotPhoto(QV_RESOURCE_INDEX slot) {
+  cv::Mat photo;
+  if (theTester->resources_[slot] != nullptr) theTester->resources_[slot]->GetImage(&photo);
+  return photo;
+}
+
+std::string FrequencyText(double nyquist, int photo_height, const std::optional<double>& pixel_pitch_um) {
+  if (!std::isfinite(nyquist)) return "none (the curve gives no figure)";
+  std::string text = Format("%.4f Nyquist  %.4f c/p  %.0f LW/PH", nyquist, nyquist / 2, nyquist * photo_height);
+  if (pixel_pitch_um) text += Format("  %.1f lp/mm", nyquist / 2 * 1000 / *pixel_pitch_um);
+  return text;
+}
+
+std::string LimitText(const Measurement& m) {
+  if (!m.limit.given()) return "";
+  std::string text = "  (";
+  if (m.limit.min) text += Format("at least %g, ", *m.limit.min);
+  if (m.limit.max) text += Format("at most %g, ", *m.limit.max);
+  return text + Name(m.outcome) + (m.marginal ? ", marginal)" : ")");
+}
+
+int Measure(const MeasureOptions& options, const Measuring& measuring) {
+  Record record;
+  record.start_millis = MillisSinceEpoch();
+  record.dut_id = options.dut;
+  record.station_id = options.station;
+  record.test_name = measuring.test_name;
+  record.test_index = measuring.test_index;
+  record.phase.name = measuring.phase;
+  if (!options.limits.empty()) record.limits = ReadLimits(options.limits);
+
+  std::string picture;
+  {
+    const ScratchFolder scratch;
+    SideOutput side(options.verbose);
+    const FreshTester fresh;
+    if (options.threshold) setWorkingBinaryThresh(*options.threshold);
+    const bool loaded = std::all_of(measuring.inputs.begin(), measuring.inputs.end(),
+                                    [&](const SlotInput& input) { return Load(record, input, scratch.path(), side); });
+    record.phase.start_millis = record.phase.end_millis = MillisSinceEpoch();
+    if (loaded) {
+      record.phase.code = measuring.run();
+      record.phase.end_millis = MillisSinceEpoch();
+      if (record.phase.code == QV_SUCCESS && measuring.collect) {
+        QVResultData* results = nullptr;
+        GetResult(&results);
+        measuring.collect(record.phase, *results);
+      }
+      if (measuring.look) measuring.look(record);
+    }
+    record.properties = PropertiesOffDefault(*theTester);
+    record.Judge();
+    const bool shows = record.phase.code == QV_SUCCESS ||
+                       (record.phase.code == QV_ERROR_PATTERN_NOT_FOUND && measuring.annotates_misses);
+    if (!options.annotate.empty() && loaded && shows) picture = measuring.annotate(record);
+    record.log_lines = SideOutput::Lines();
+  }
+
+  if (!picture.empty()) {
+    WriteWholeFile(options.annotate, picture);
+    record.phase.attachments.push_back({std::filesystem::path(options.annotate).filename().string(), "image/png",
+                                        options.annotate, HexDigest(picture, "SHA1")});
+  }
+  record.end_millis = MillisSinceEpoch();
+  if (!options.json.empty()) WriteWholeFile(options.json, record.ToJson().dump(2) + "\n");
+
+  const bool measured = record.phase.code == QV_SUCCESS;
+  std::ostream& out = options.json == "-" || options.annotate == "-" ? std::cerr : std::cout;
+  if (!measured) {
+    std::cerr << MissSentence(record) << '\n';
+    return record.phase.code == QV_ERROR_INTERNAL ? kInternalFault : kCouldNotMeasure;
+  }
+  for (const std::string& sentence : record.details) std::cerr << "warning: " << sentence << '\n';
+  if (!options.quiet) {
+    for (const Input& input : record.inputs) {
+      out << Format("%s  %d x %d\n", input.path.c_str(), input.width, input.height);
+    }
+    if (measuring.report) out << measuring.report(record);
+    out << Verdict(record);
+  }
+  return record.outcome() == Outcome::kPass ? kWithinLimits : kLimitBroken;
+}

@@ -1,0 +1,57 @@
+#ifndef QVTESTER_TOOLS_MEASURE_H_
+#define QVTESTER_TOOLS_MEASURE_H_
+
+#include <CLI/CLI.hpp>
+#include <functional>
+#include <opencv2/core.hpp>
+#include <string>
+#include <vector>
+
+#include "qvtester/api.h"
+#include "qvtester/tester.h"
+#include "tools/picture.h"
+#include "tools/record.h"
+
+// The road every measuring command takes: a fresh tester, its properties and slots, one test, a record, a verdict.
+
+struct MeasureOptions {
+  std::string json, annotate, limits, dut, station;
+  std::optional<int> threshold;
+  std::optional<double> pixel_pitch_um;
+  bool verbose = false, quiet = false;
+
+  /// Declares the options that all measuring commands share.
+  void DeclareOn(CLI::App& command);
+};
+
+struct SlotInput {
+  QV_RESOURCE_INDEX slot;
+  std::string path;  // "-" is standard input
+};
+
+/// What one command adds to the common road.
+struct Measuring {
+  std::string phase, test_name;
+  std::optional<int> test_index;
+  std::vector<SlotInput> inputs;
+  std::function<int()> run;                                  // answers the library's code
+  std::function<void(Phase&, const QVResultData&)> collect;  // after code 1
+  std::function<void(Record&)> look;                         // after any code, while the search state is fresh
+  std::function<std::string(const Record&)> report;          // lines for a person, after code 1
+  std::function<std::string(const Record&)> annotate;        // a PNG file's content
+  bool annotates_misses = false;                             // also when the finder marks were not found
+};
+
+/// Measures, prints, writes what was asked for, and answers the exit status.
+int Measure(const MeasureOptions& options, const Measuring& measuring);
+
+/// The image that a slot of the tester holds.
+cv::Mat SlotPhoto(QV_RESOURCE_INDEX slot);
+
+/// "0.3124 Nyquist  0.1562 c/p  937 LW/PH", and lp/mm when the pixel pitch is known.
+std::string FrequencyText(double nyquist, int photo_height, const std::optional<double>& pixel_pitch_um);
+
+/// "  (limit 0.38 to 0.6: FAIL)" for a figure with a limit, nothing for one without.
+std::string LimitText(const Measurement& m);
+
+#endif  // QVTESTER_TOOLS_MEASURE_H_

@@ -1,0 +1,69 @@
+#ifndef QVTESTER_TOOLS_PICTURE_H_
+#define QVTESTER_TOOLS_PICTURE_H_
+
+#include <cairo.h>
+
+#include <memory>
+#include <opencv2/core.hpp>
+#include <string>
+#include <vector>
+
+// A picture for a person to look at: lines, text and plots, drawn with cairo.
+
+struct Colour {
+  double red, green, blue;
+};
+inline constexpr Colour kInk = {0.12, 0.12, 0.14};
+inline constexpr Colour kFaint = {0.72, 0.72, 0.74};
+inline constexpr Colour kGood = {0.0, 0.75, 0.85};      // cyan
+inline constexpr Colour kDoubtful = {0.95, 0.80, 0.0};  // yellow
+inline constexpr Colour kPoor = {0.90, 0.10, 0.10};     // red
+
+enum class Align { kLeft, kCentre, kRight };
+
+class Picture {
+ public:
+  Picture(int width, int height);
+
+  /// Puts a CV_8UC3 or CV_8UC1 picture with its top left corner at (x, y), scaled.
+  void Place(const cv::Mat& image, double x, double y, double scale);
+  void Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed = false);
+  void FillRectangle(const cv::Rect2d& rectangle, Colour colour);
+  void Circle(cv::Point2d centre, double radius, Colour colour, double width);
+  /// The baseline starts, is centred or ends at the place. Backed text stays readable on a photo.
+  void Text(const std::string& text, cv::Point2d place, double size, Colour colour, Align align = Align::kLeft,
+            bool backed = false);
+  /// As Text, reading upwards.
+  void TextUpwards(const std::string& text, cv::Point2d place, double size, Colour colour);
+  /// The picture as a PNG file's content.
+  std::string Png() const;
+
+  int width() const { return cairo_image_surface_get_width(surface_.get()); }
+  int height() const { return cairo_image_surface_get_height(surface_.get()); }
+
+ private:
+  std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface_;
+  std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr_;
+};
+
+/// One curve in a frame with axes.
+struct Plot {
+  std::string title, x_label, y_label;
+  double x_max = 1, y_min = 0, y_max = 1;  // the x axis starts at 0
+  std::string second_x_label;              // above the frame, empty for none
+  double second_x_factor = 1;              // second axis = first x factor
+  std::vector<cv::Point2d> curve;
+  bool bars = false;  // the curve as bars
+  std::vector<double> horizontal_lines;
+  struct Marker {
+    cv::Point2d at;
+    std::string text;
+    Colour colour;
+  };
+  std::vector<Marker> markers;
+};
+
+/// Draws the plot into this frame, axis labels included.
+void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area);
+
+#endif  // QVTESTER_TOOLS_PICTURE_H_

@@ -1,0 +1,182 @@
+#include <algorithm>
+#include <cmath>
+#include <memory>
+
+#include "tools/chart_view.h"
+#include "tools/commands.h"
+#include "tools/measure.h"
+
+namespace {
+
+constexpr const char* kRegionNames[] = {"vertical", "horizontal"};
+constexpr const char* kMarkNames[] = {"1 corner", "2", "3"};
+
+struct SharpnessOptions : MeasureOptions {
+  std::string photo;
+};
+
+std::vector<double> Widen(const float* values, int count) { return {values, values + count}; }
+
+std::string ReportChart(const Record& record, const ChartView& view) {
+  const Phase& phase = record.phase;
+  std::string text =
+      Format("marks      %zu found, %.1f px a module; legs %.3f : 1 at %.1f degrees; threshold %d\n", view.marks.size(),
+             phase.Find("module_size")->value(), view.legs_ratio, view.legs_angle_deg, view.threshold);
+  return text + Format("chart      turned by %.0f degrees counter-clockwise\n", view.turn_deg);
+}
+
+std::string ReportSharpness(const Record& record, const ChartView& view, const std::optional<double>& pitch) {
+  std::string text = ReportChart(record, view);
+  for (const char* region : kRegionNames) {
+    const Measurement& m = *record.phase.Find(std::string("mtf50_") + region);
+    text += Format("MTF50      %-10s  %s%s\n", region, FrequencyText(m.value(), record.inputs[0].height, pitch).c_str(),
+                   LimitText(m).c_str());
+  }
+  return text;
+}
+
+// The photo with its marks in order, both regions where they lie, and each region's curves beside it.
+std::string AnnotateSharpness(const Record& record, const ChartView& view) {
+  constexpr double kPhoto = 1080;
+  constexpr double kPlotWidth = 420;
+  constexpr double kHead = 44;
+  const cv::Mat photo = SlotPhoto(QV_RESOURCE_CHART_PHOTO);
+  const double scale = std::min(1.0, kPhoto / std::max(photo.cols, photo.rows));
+  const double width = photo.cols * scale;
+  const double height = std::max(photo.rows * scale, 760.0);
+  Picture picture(cvRound(width + 2 * kPlotWidth + 16), cvRound(height + kHead));
+  picture.Place(photo, 0, kHead, scale);
+  const auto on_photo = [&](cv::Point2d p) { return cv::Point2d((p.x + 0.5) * scale, (p.y + 0.5) * scale + kHead); };
+
+  const bool measured = record.phase.code == QV_SUCCESS;
+  const Colour mark_colour = measured ? kGood : kPoor;
+  picture.Text(measured ? Format("%s: %s, chart turned by %.0f degrees, threshold %d", record.test_name.c_str(),
+                                 Name(record.outcome()), view.turn_deg, view.threshold)
+                        : Format("%s: code %d, %zu of 3 marks, threshold %d", record.test_name.c_str(),
+                                 record.phase.code, view.marks.size(), view.threshold),
+               {12, 28}, 18, kInk);
+  for (std::size_t i = 0; i < view.marks.size(); ++i) {
+    const Mark& mark = view.marks[i];
+    const cv::Point2d at = on_photo(mark.centre);
+    picture.Circle(at, std::max(6.0, 5 * mark.module_px * scale), mark_colour, 3);
+    picture.Text(measured ? kMarkNames[i] : "candidate", at + cv::Point2d(0, 5.5 * mark.module_px * scale + 18), 16,
+                 mark_colour, Align::kCentre, true);
+  }
+  if (!measured) return picture.Png();
+
+  const std::array<RegionView, 2> regions = LookAtRegions(*theTester, photo);
+  for (std::size_t i = 0; i < regions.size(); ++i) {
+    const RegionView& region = regions[i];
+    const Measurement& mtf50 = *record.phase.Find(std::string("mtf50_") + kRegionNames[i]);
+    const Colour colour = mtf50.outcome == Outcome::kFail ? kPoor : mtf50.marginal ? kDoubtful : kGood;
+    const char* const word = !mtf50.limit.given()              ? ""
+                             : mtf50.outcome == Outcome::kFail ? ", poor"
+                             : mtf50.marginal                  ? ", marginal"
+                                                               : ", good";
+    std::vector<cv::Point2d> outline;
+    for (const cv::Point2d& corner : region.outline) outline.push_back(on_photo(corner));
+    picture.Line(outline, colour, 3, true);
+    const cv::Point2d middle = (outline[0] + outline[2]) / 2;
+    picture.Text(kRegionNames[i], middle - cv::Point2d(0, 8), 16, colour, Align::kCentre, true);
+    picture.Text(Format("MTF50 %.3f Nyquist%s", mtf50.value(), word), middle + cv::Point2d(0, 14), 16, colour,
+                 Align::kCentre, true);
+
+    const double left = width + 16 + static_cast<double>(i) * kPlotWidth;
+    Plot profile;
+    profile.title =
+        Format("Edge profile, %s region (%d x %d px)", kRegionNames[i], region.pixels.cols, region.pixels.rows);
+    profile.x_label = "across the edge, pixels";
+    profile.y_label = "grey level";
+    profile.x_max = static_cast<double>(region.edge_profile.size());
+    profile.y_max = 255;
+    for (std::size_t k = 0; k < region.edge_profile.size(); ++k) {
+      profile.curve.emplace_back(static_cast<double>(k), region.edge_profile[k]);
+    }
+    DrawPlot(picture, profile, {left, kHead, kPlotWidth, 330});
+
+    const Measurement* curve = record.phase.Find(std::string("sfr_") + kRegionNames[i]);
+    if (curve == nullptr) continue;
+    Plot response;
+    response.title = Format("SFR, %s region", kRegionNames[i]);
+    response.x_label = "frequency, fraction of Nyquist";
+    response.second_x_label = "cycles per pixel";
+    response.second_x_factor = 0.5;
+    response.y_label = "response";
+    response.y_max = 1.1;
+    response.horizontal_lines = {0.5};
+    for (std::size_t k = 0; k < curve->values.size(); ++k)
+      response.curve.emplace_back(curve->axis[k], curve->values[k]);
+    response.markers = {{{mtf50.value(), 0.5}, Format("MTF50 %.4f Nyquist", mtf50.value()), colour}};
+    DrawPlot(picture, response, {left, kHead + 340, kPlotWidth, 400});
+  }
+  return picture.Png();
+}
+
+CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
+  auto options = std::make_shared<SharpnessOptions>();
+  command.add_option("PHOTO", options->photo, "Photo of the sharpness chart; - is standard input")->required();
+  command.add_option("--threshold", options->threshold, "Grey level above which a pixel is light [125]")
+      ->check(CLI::Range(0, 255))
+      ->type_name("N");
+  command.add_option("--pixel-pitch", options->pixel_pitch_um, "Pixel pitch of the sensor, for figures in lp/mm")
+      ->check(CLI::PositiveNumber)
+      ->type_name("UM");
+  options->DeclareOn(command);
+  return [options, test] {
+    auto view = std::make_shared<ChartView>();
+    Measuring m = test;
+    m.inputs = {{QV_RESOURCE_CHART_PHOTO, options->photo}};
+    m.look = [view](Record& record) {
+      if (record.phase.code != QV_SUCCESS && record.phase.code != QV_ERROR_PATTERN_NOT_FOUND) return;
+      *view = LookAtChart(*theTester);
+      AddChartFigures(record.phase, *view);
+      if (record.phase.code == QV_ERROR_PATTERN_NOT_FOUND) {
+        std::string sentence = record.inputs[0].path + ": ";
+        for (const std::string& reason : ExplainMiss(*view, SlotPhoto(QV_RESOURCE_CHART_PHOTO))) {
+          sentence += (sentence.back() == ' ' ? "" : ", ") + reason;
+        }
+        record.details.push_back(sentence);
+      } else if (view->candidates > 3) {
+        record.details.push_back(Format("%s: %d places passed as finder marks; the three most alike were used",
+                                        record.inputs[0].path.c_str(), view->candidates));
+      }
+    };
+    m.report = [view, options](const Record& record) {
+      return ReportSharpness(record, *view, options->pixel_pitch_um);
+    };
+    m.annotates_misses = true;
+    m.annotate = [view](const Record& record) { return AnnotateSharpness(record, *view); };
+    return Measure(*options, m);
+  };
+}
+
+}  // namespace
+
+CommandBody DeclareAutofocus(CLI::App& command) {
+  Measuring m;
+  m.phase = "camera_autofocus";
+  m.test_name = "QV_TEST_CAMERA_AUTOFOCUS";
+  m.test_index = QV_TEST_CAMERA_AUTOFOCUS;
+  m.run = [] { return RunTest(QV_TEST_CAMERA_AUTOFOCUS, false); };
+  m.collect = [](Phase& phase, const QVResultData& results) {
+    const std::vector<double> freq = Widen(results.af_sfr_first_, results.af_sfr_count_);
+    phase.Add("mtf50_vertical", results.af_sfr_scalar1_);
+    phase.Add("mtf50_horizontal", results.af_sfr_scalar2_);
+    phase.Add("sfr_vertical", freq, Widen(results.af_sfr_second_, results.af_sfr_count_));
+    phase.Add("sfr_horizontal", freq, Widen(results.af_sfr_third_, results.af_sfr_count_));
+  };
+  return DeclareSharpness(command, m);
+}
+
+CommandBody DeclareMtf(CLI::App& command) {
+  auto figures = std::make_shared<std::array<float, 2>>();
+  Measuring m;
+  m.phase = "mtf_check";
+  m.test_name = "CheckMTF";
+  m.run = [figures] { return CheckMTF(figures->data(), figures->data() + 1); };
+  m.collect = [figures](Phase& phase, const QVResultData& /*unused*/) {
+    phase.Add("mtf50_vertical", (*figures)[0]);
+    phase.Add("mtf50_horizontal", (*figures)[1]);
+  };
+  return DeclareSharpness(command, m);
+}

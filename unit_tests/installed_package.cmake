@@ -1,0 +1,32 @@
+# Installs the build to a scratch prefix, builds the example against it twice (CMake's package, pkg-config), and runs both.
+function(run)
+  execute_process(COMMAND ${ARGV} RESULT_VARIABLE status OUTPUT_VARIABLE out ERROR_VARIABLE err)
+  if(NOT status EQUAL 0)
+    message(FATAL_ERROR "${ARGV}\n${out}${err}")
+  endif()
+  set(out "${out}" PARENT_SCOPE)
+endfunction()
+
+file(REMOVE_RECURSE "${SCRATCH}")
+set(prefix "${SCRATCH}/prefix")
+run("${CMAKE_COMMAND}" --install "${BUILD}" --prefix "${prefix}")
+run("${CMAKE_COMMAND}" -S "${EXAMPLE}" -B "${SCRATCH}/example" "-DCMAKE_PREFIX_PATH=${prefix}"
+    "-DCMAKE_CXX_COMPILER=${CXX}" "-DCMAKE_CXX_FLAGS=${FLAGS}")
+run("${CMAKE_COMMAND}" --build "${SCRATCH}/example")
+
+file(GLOB_RECURSE packages "${prefix}/*/qvtester.pc")
+get_filename_component(folder "${packages}" DIRECTORY)
+set(ENV{PKG_CONFIG_PATH} "${folder}")
+run(pkg-config --define-variable=prefix=${prefix} --cflags --libs qvtester)
+separate_arguments(flags UNIX_COMMAND "${out} ${FLAGS}")
+get_filename_component(libraries "${folder}" DIRECTORY)
+run("${CXX}" "${EXAMPLE}/measure_sharpness.cpp" -o "${SCRATCH}/by_pkg_config" ${flags} "-Wl,-rpath,${libraries}")
+
+set(photo "${SCRATCH}/chart.png")
+run("${prefix}/bin/qvtester" simulate -o "${photo}" --size 1200x900 --blur 1)
+foreach(program "${SCRATCH}/example/measure_sharpness" "${SCRATCH}/by_pkg_config")
+  run("${program}" "${photo}")
+  if(NOT out MATCHES "MTF50 vertical 0\\.[0-9]+, horizontal 0\\.[0-9]+ of Nyquist")
+    message(FATAL_ERROR "${program} prints: ${out}")
+  endif()
+endforeach()

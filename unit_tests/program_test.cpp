@@ -1,0 +1,205 @@
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <opencv2/imgcodecs.hpp>
+
+#include "unit_tests/drawing.h"
+#include "unit_tests/program.h"
+
+namespace {
+
+using nlohmann::json;
+using ::testing::AllOf;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+using ::testing::SizeIs;
+
+class Program : public ::testing::Test {
+ protected:
+  // A simulated photo of the chart; answers its path.
+  std::string Simulate(std::vector<std::string> options = {}) {
+    const std::string photo = folder_.Path("photo.png");
+    std::vector<std::string> arguments = {"simulate", "-o", photo, "--size", "1200x900", "--quiet"};
+    arguments.insert(arguments.end(), options.begin(), options.end());
+    EXPECT_EQ(0, RunProgram(arguments).status);
+    return photo;
+  }
+  json Truth() const { return json::parse(ReadFile(folder_.Path("photo.truth.json"))); }
+
+  TemporaryFolder folder_;
+};
+
+TEST_F(Program, AutofocusReportsRecordsAndDraws) {
+  const std::string photo = Simulate({"--turn", "3", "--blur", "0.8", "--noise", "1"});
+  const std::string picture = folder_.Path("annotated.png");
+  const std::string file = folder_.Path("record.json");
+  const ProgramRun run =
+      RunProgram({"autofocus", photo, "--json", file, "--annotate", picture, "--threshold", "110", "--dut", "SN0042"});
+  EXPECT_EQ(0, run.status) << run.err;
+  EXPECT_THAT(run.err, IsEmpty());
+  EXPECT_THAT(run.out,
+              AllOf(HasSubstr("MTF50      vertical"), HasSubstr("Nyquist"), HasSubstr("c/p"), HasSubstr("PASS")));
+
+  const json record = CheckedRecord(ReadFile(file));
+  EXPECT_EQ("PASS", record["outcome"]);
+  EXPECT_EQ("SN0042", record["dut_id"]);
+  EXPECT_EQ(14, record["metadata"]["test_index"]);
+  EXPECT_EQ(json({{"93", 110}}), record["metadata"]["properties"]) << "only what differs from its default";
+  EXPECT_EQ(1200, record["inputs"][0]["width"]);
+  EXPECT_EQ(110, Measured(record, "camera_autofocus_threshold"));
+  const json expected = Truth()["mtf50_expected_of_method"];
+  for (const char* name : {"camera_autofocus_mtf50_vertical", "camera_autofocus_mtf50_horizontal"}) {
+    const double mtf50 = Measured(record, name);
+    EXPECT_GT(mtf50, 0.85 * expected["nyquist_low"].get<double>()) << name;  // straightening softens
+    EXPECT_LT(mtf50, 1.05 * expected["nyquist_high"].get<double>()) << name;
+  }
+  const json curve = Measured(record, "camera_autofocus_sfr_vertical");
+  EXPECT_EQ(json({0.0, 1.0}), curve[0]);
+  EXPECT_GT(cv::imread(picture).cols, 1200);
+}
+
+TEST_F(Program, MarksLieWhereTheyWereDrawn) {
+  for (const std::string turn : {"0", "90", "-170", "31"}) {
+    const std::string photo = Simulate({"--turn", turn, "--blur", "0.5", "--shading", "30", "--size", "2000x1500"});
+    const json record = CheckedRecord(RunProgram({"autofocus", photo, "--json", "-"}).out);
+    const json marks = Measured(record, "camera_autofocus_marks");
+    const json truth = Truth()["marks"];
+    for (std::size_t i = 0; i < 3; ++i) {
+      EXPECT_NEAR(truth[i]["x"], marks[i][0], 1.5) << "mark " << i << ", turned by " << turn;
+      EXPECT_NEAR(truth[i]["y"], marks[i][1], 1.5) << "mark " << i << ", turned by " << turn;
+    }
+  }
+}
+
+TEST_F(Program, LimitsDecideTheVerdict) {
+  const std::string photo = Simulate({"--blur", "1"});
+  const auto judge = [&](const std::string& limits) {
+    const std::string path =
+        folder_.Write("limits.json", R"({"name": "a", "revision": "3", "limits": )" + limits + "}");
+    return RunProgram({"autofocus", photo, "--json", "-", "--limits", path});
+  };
+  const char* const kName = "camera_autofocus_mtf50_vertical";
+  ProgramRun run =
+      judge(R"({"camera_autofocus_mtf50_vertical": {"min": 0.1, "marginal_min": 0.9, "unit": "Nyquist"}})");
+  EXPECT_EQ(0, run.status);
+  json record = CheckedRecord(run.out);
+  EXPECT_TRUE(record["marginal"]);
+  EXPECT_EQ("PASS", record["outcome"]);
+  EXPECT_EQ(0.9, record["phases"][0]["measurements"][kName]["limits"]["marginal_min"]);
+  EXPECT_THAT(run.err, HasSubstr("MTF50")) << "the report gives way to the record";
+
+  run = judge(R"({"camera_autofocus_mtf50_vertical": {"min": 0.9}})");
+  EXPECT_EQ(1, run.status);
+  EXPECT_EQ("FAIL", CheckedRecord(run.out)["outcome"]);
+
+  for (const auto& [limits, complaint] :
+       {std::pair(R"({"camera_autofocus_mtf51": {"min": 0}})", "camera_autofocus_mtf51: no measurement"),
+        {R"({"camera_autofocus_mtf50_vertical": {"min": 0, "unit": "px"}})", "its unit is \"Nyquist\", not \"px\""},
+        {R"({"camera_autofocus_mtf50_vertical": {"min": "0"}})", "not a number"},
+        {R"({"camera_autofocus_mtf50_vertical": {"minimum": 0}})", "neither a bound nor a unit"},
+        {R"([)", "not a limits file"}}) {
+    run = judge(limits);
+    EXPECT_EQ(2, run.status) << limits;
+    EXPECT_THAT(run.err, HasSubstr(complaint));
+  }
+}
+
+TEST_F(Program, MissesSayWhy) {
+  const std::string sharp = Simulate();
+  ProgramRun run = RunProgram({"autofocus", sharp, "--threshold", "250", "--json", folder_.Path("miss.json")});
+  EXPECT_EQ(3, run.status);
+  EXPECT_THAT(run.out, IsEmpty());
+  EXPECT_THAT(run.err, AllOf(HasSubstr("no finder mark was found"), HasSubstr("threshold of 250"),
+                             HasSubstr("code -91"), HasSubstr("QV_ERROR_PATTERN_NOT_FOUND")));
+  const json record = CheckedRecord(ReadFile(folder_.Path("miss.json")));
+  EXPECT_EQ("ERROR", record["outcome"]);
+  EXPECT_EQ(-91, record["phases"][0]["result_code"]);
+
+  ChartView two;
+  two.marks = 2;
+  run = RunProgram({"mtf", folder_.Write("two.png", DrawChart(two)), "--annotate", folder_.Path("two-seen.png")});
+  EXPECT_EQ(3, run.status);
+  EXPECT_THAT(run.err, HasSubstr("two.png: 2 of 3 finder marks were found"));
+  EXPECT_FALSE(cv::imread(folder_.Path("two-seen.png")).empty());
+}
+
+TEST_F(Program, BadInputIsACodeAndASentence) {
+  const std::string png = ReadFile(folder_.Write("small.png", cv::Mat(1, 1, CV_8UC3, cv::Scalar(9, 9, 9))));
+  const std::vector<std::pair<std::string, std::string>> bad = {
+      {folder_.Path("missing.png"), "no such file"},
+      {folder_.Path(""), "is a directory"},
+      {folder_.Write("empty.jpg", std::string()), "the file is empty"},
+      {folder_.Write("words.jpg", std::string("words")), "not a picture that can be decoded"},
+      {folder_.Write("cut.png", png.substr(0, 25)), "not a picture that can be decoded"}};
+  for (const auto& [path, complaint] : bad) {
+    for (const char* command : {"autofocus", "mtf", "flash"}) {
+      const ProgramRun run = RunProgram({command, path, "--json", "-"});
+      EXPECT_EQ(3, run.status) << path;
+      EXPECT_THAT(run.err,
+                  AllOf(HasSubstr(path), HasSubstr(complaint), HasSubstr("code -97"), Not(HasSubstr("libpng"))));
+      EXPECT_EQ("ERROR", CheckedRecord(run.out)["outcome"]);
+    }
+  }
+  EXPECT_EQ(3, RunProgram({"autofocus", folder_.Path("small.png")}).status);
+  EXPECT_EQ(0, RunProgram({"flash", folder_.Path("small.png")}).status);
+}
+
+TEST_F(Program, ACutPhotoIsMeasuredWithAWarning) {
+  std::vector<uchar> jpeg;
+  cv::imencode(".jpg", DrawChart(), jpeg, {cv::IMWRITE_JPEG_QUALITY, 95});
+  const std::string photo = folder_.Write("cut.jpg", std::string(jpeg.begin(), jpeg.end() - 400));
+  const ProgramRun run = RunProgram({"autofocus", photo});
+  EXPECT_EQ(0, run.status);
+  EXPECT_THAT(run.err, AllOf(HasSubstr("warning: "), HasSubstr("Premature end"), HasSubstr("is the file cut?")));
+}
+
+TEST_F(Program, FlashReadsEitherCameraAndStandardInput) {
+  const std::string png = ReadFile(folder_.Write("flash.png", cv::Mat(4, 4, CV_8UC3, cv::Scalar(200, 1, 2))));
+  json record = CheckedRecord(RunProgram({"flash", "-", "--json", "-"}, png).out);
+  EXPECT_EQ(200, Measured(record, "camera_flash_mean"));
+  EXPECT_EQ("standard input", record["inputs"][0]["path"]);
+  record = CheckedRecord(RunProgram({"flash", "--vt", "-", "--json", "-"}, png).out);
+  EXPECT_EQ(18, record["metadata"]["test_index"]);
+  EXPECT_EQ(200, Measured(record, "camera_flash_vt_mean"));
+}
+
+TEST_F(Program, WrongUsageIsStatusTwo) {
+  for (const std::vector<std::string>& arguments :
+       std::vector<std::vector<std::string>>{{},
+                                             {"frobnicate"},
+                                             {"autofocus"},
+                                             {"autofocus", "a.png", "--threshold", "x"},
+                                             {"list", "colours"},
+                                             {"simulate"},
+                                             {"simulate", "-o", folder_.Path("a.png"), "--size", "40"},
+                                             {"simulate", "-o", folder_.Path("a.nothing"), "--size", "40x40"},
+                                             {"autofocus", "a.png", "--limits", folder_.Path("missing.json")}}) {
+    const ProgramRun run = RunProgram(arguments);
+    EXPECT_EQ(2, run.status) << ::testing::PrintToString(arguments);
+    EXPECT_THAT(run.err, Not(IsEmpty()));
+  }
+  EXPECT_EQ(0, RunProgram({"--help"}).status);
+  EXPECT_THAT(RunProgram({"--version"}).out, HasSubstr("qvtester "));
+}
+
+TEST_F(Program, VerboseShowsTheLogWithoutCarriageReturns) {
+  const ProgramRun run = RunProgram({"autofocus", Simulate(), "--verbose", "--quiet"});
+  EXPECT_THAT(run.err, AllOf(HasSubstr("[GetSFRFromImage] prop_binary_thr_working_: 125\n"), Not(HasSubstr("\r"))));
+  EXPECT_THAT(run.out, IsEmpty());
+}
+
+TEST_F(Program, ListsShowEveryRow) {
+  EXPECT_THAT(RunProgram({"list", "tests"}).out, HasSubstr("29  QV_TEST_TOUCH_PANEL_PRINT"));
+  EXPECT_THAT(RunProgram({"list", "slots"}).out, HasSubstr("17  image                QV_TEST_CAMERA_AUTOFOCUS"));
+  EXPECT_THAT(RunProgram({"list", "properties"}).out, HasSubstr("93  prop_binary_thr_working_       int        125"));
+  EXPECT_THAT(RunProgram({"list", "codes"}).out, HasSubstr("-91  QV_ERROR_PATTERN_NOT_FOUND"));
+}
+
+TEST_F(Program, TheSameSeedGivesTheSamePhoto) {
+  const std::string first = ReadFile(Simulate({"--noise", "2", "--seed", "7", "--size", "300x200"}));
+  EXPECT_EQ(first, ReadFile(Simulate({"--noise", "2", "--seed", "7", "--size", "300x200"})));
+  EXPECT_NE(first, ReadFile(Simulate({"--noise", "2", "--seed", "8", "--size", "300x200"})));
+}
+
+}  // namespace
