@@ -3,7 +3,7 @@
 #include <cmath>
 
 QVFinderPattern::QVFinderPattern(float x, float y, float estimatedModuleSize, int count)
-    : x(x), y(y), estimatedModuleSize(estimatedModuleSize), average(0), count(count) {}
+    : x(x), y(y), estimatedModuleSize(estimatedModuleSize), count(count) {}
 
 int QVFinderPattern::getX() const { return static_cast<int>(x); }
 int QVFinderPattern::getY() const { return static_cast<int>(y); }

@@ -90,7 +90,7 @@ struct Getter {
   }
   int operator()(const RegionList& p) const {
     const QVRegionRecord* records = (tester.*p.member).get();
-    return Copy(&records, sizeof(records));
+    return Copy(&records, sizeof(void*));
   }
   int operator()(const SharedTable& p) const {
     const cv::Mat& table = tester.*p.member;

@@ -241,11 +241,11 @@ cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
   const int offset = std::min(static_cast<int>(slant), 0);
   const int del = std::abs(static_cast<int>(slant));
   const double bins = nn + 100.0 * del;
-  const int start = static_cast<int>(del * 0.5 + 0.5);
+  const int start = (del + 1) / 2;
   const int first = start - 1;                       // bin of the first element kept
   cv::Mat kept = cv::Mat::zeros(2, nn + 2, CV_32F);  // counts, sums
-  float* counts = kept.ptr<float>(0);
-  float* sums = kept.ptr<float>(1);
+  auto* counts = kept.ptr<float>(0);
+  auto* sums = kept.ptr<float>(1);
   for (int n = 0; n < npix; ++n) {
     for (int m = 0; m < nlin; ++m) {
       const float place = (static_cast<float>(n) - static_cast<float>(m) / inverse) * scale;

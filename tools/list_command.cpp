@@ -16,7 +16,7 @@ struct KindText {
   std::string operator()(const FloatProperty& p) const { return Format("float      %.9g", p.initial); }
   std::string operator()(const FloatArray& p) const { return "float[9]  " + Values(p.initial, 9); }
   std::string operator()(const MatrixProperty& p) const {
-    return Format("float[%d]  ", p.rows * p.cols) + Values(p.initial, static_cast<std::size_t>(p.rows * p.cols));
+    return Format("float[%d]  ", p.rows * p.cols) + Values(p.initial, p.rows * p.cols);
   }
   std::string operator()(const RegionList& /*kind*/) const { return "records    none; set its count first"; }
   std::string operator()(const SharedTable& p) const {
@@ -25,9 +25,9 @@ struct KindText {
   std::string operator()(const PatchValues& /*kind*/) const { return "float[72]  none"; }
 
  private:
-  static std::string Values(const std::array<float, 9>& values, std::size_t count) {
+  static std::string Values(const std::array<float, 9>& values, int count) {
     std::string text;
-    for (std::size_t i = 0; i < count; ++i) text += Format(" %.9g", values[i]);
+    for (int i = 0; i < count; ++i) text += Format(" %.9g", values[i]);
     return text;
   }
 };

@@ -31,23 +31,25 @@ constexpr char kFooter[] =
 
 int main(int argc, char** argv) {
   std::signal(SIGINT, [](int) { std::_Exit(130); });
-  CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
-  app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
-  app.require_subcommand(1);
-  app.footer(kFooter);
-  app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
-  app.get_formatter()->column_width(32);
-
-  CommandBody body;
-  for (const Command& row : kCommands) {
-    CLI::App* command = app.add_subcommand(row.name, row.purpose);
-    command->callback([&body, chosen = row.declare(*command)] { body = chosen; });
-  }
   try {
-    app.parse(argc, argv);
+    CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
+    app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
+    app.require_subcommand(1);
+    app.footer(kFooter);
+    app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
+    app.get_formatter()->column_width(32);
+
+    CommandBody body;
+    for (const Command& row : kCommands) {
+      CLI::App* command = app.add_subcommand(row.name, row.purpose);
+      command->callback([&body, chosen = row.declare(*command)] { body = chosen; });
+    }
+    try {
+      app.parse(argc, argv);
+    } catch (const CLI::ParseError& e) {
+      return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
+    }
     return body();
-  } catch (const CLI::ParseError& e) {
-    return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
   } catch (const Failure& e) {
     std::fprintf(stderr, "qvtester: %s\n", e.what());
     return e.status;

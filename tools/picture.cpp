@@ -124,7 +124,8 @@ void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area) {
   picture.Text(plot.title, {area.x + area.width / 2, area.y + 16}, kText + 2, kInk, Align::kCentre);
 
   const double x_step = TickStep(plot.x_max, 4);
-  for (double x = 0; x <= plot.x_max * (1 + 1e-9); x += x_step) {
+  for (int i = 0; i * x_step <= plot.x_max * (1 + 1e-9); ++i) {
+    const double x = i * x_step;
     const cv::Point2d foot = place({x, plot.y_min});
     picture.Line({foot, {foot.x, frame.y}}, kFaint, 0.5);
     picture.Text(TickText(x, x_step), {foot.x, foot.y + 16}, kText, kInk, Align::kCentre);
@@ -134,7 +135,8 @@ void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area) {
     }
   }
   const double y_step = TickStep(plot.y_max - plot.y_min, 4);
-  for (double y = plot.y_min; y <= plot.y_max + y_step * 1e-9; y += y_step) {
+  for (int i = 0; plot.y_min + i * y_step <= plot.y_max + y_step * 1e-9; ++i) {
+    const double y = plot.y_min + i * y_step;
     const cv::Point2d left = place({0, y});
     picture.Line({left, {frame.x + frame.width, left.y}}, kFaint, 0.5);
     picture.Text(TickText(y, y_step), {frame.x - 6, left.y + 4}, kText, kInk, Align::kRight);

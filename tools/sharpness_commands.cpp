@@ -5,6 +5,7 @@
 #include "tools/chart_view.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
+#include "tools/method_law.h"
 
 namespace {
 
@@ -12,7 +13,7 @@ constexpr const char* kRegionNames[] = {"vertical", "horizontal"};
 constexpr const char* kMarkNames[] = {"1 corner", "2", "3"};
 
 struct SharpnessOptions : MeasureOptions {
-  std::string photo;
+  std::string photo, truth;
 };
 
 std::vector<double> Widen(const float* values, int count) { return {values, values + count}; }
@@ -33,6 +34,34 @@ std::string ReportSharpness(const Record& record, const ChartView& view, const s
                    LimitText(m).c_str());
   }
   return text;
+}
+
+// Columns across the edge, whose parity bounds what the method can read; from the axis of the curve, 2 k / npix.
+int ColumnsAcross(const Record& record, int otherwise) {
+  const Measurement* curve = record.phase.Find("sfr_vertical");
+  return curve == nullptr ? otherwise : cvRound(2 / curve->axis.at(1));
+}
+
+// True figure, what this method makes of it, and what was measured, side by side.
+std::string CompareWithTruth(const Record& record, const std::string& path) {
+  const std::string content = ReadWholeFile(path, kWrongUsage);
+  try {
+    const Json truth = Json::parse(content);
+    const int npix = ColumnsAcross(record, truth.at("mtf50_expected_of_method").at("npix"));
+    const auto [low, high] = method_law::MeasuredMtf50(truth.at("parameters").at("blur_px"), npix);
+    std::string text = "MTF50, Nyquist       true   expected of the method   measured\n";
+    for (const char* region : kRegionNames) {
+      text +=
+          Format("  %-14s   %.4f      %.4f to %.4f       %.4f\n", region, truth.at("mtf50").at("nyquist").get<double>(),
+                 low, high, record.phase.Find(std::string("mtf50_") + region)->value());
+    }
+    return text + Format(
+                      "  (expected of an upright chart %d pixels wide at the edge; turned ones read lower: they are\n"
+                      "  straightened, which softens by up to a tenth)\n",
+                      npix);
+  } catch (const Json::exception& e) {
+    throw Failure(kWrongUsage, path + ": not the truth of a simulated chart photo (" + e.what() + ")");
+  }
 }
 
 // The photo with its marks in order, both regions where they lie, and each region's curves beside it.
@@ -121,6 +150,7 @@ CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
   command.add_option("--pixel-pitch", options->pixel_pitch_um, "Pixel pitch of the sensor, for figures in lp/mm")
       ->check(CLI::PositiveNumber)
       ->type_name("UM");
+  command.add_option("--truth", options->truth, "Truth of a simulated photo, to compare with")->type_name("FILE");
   options->DeclareOn(command);
   return [options, test] {
     auto view = std::make_shared<ChartView>();
@@ -142,7 +172,8 @@ CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
       }
     };
     m.report = [view, options](const Record& record) {
-      return ReportSharpness(record, *view, options->pixel_pitch_um);
+      const std::string report = ReportSharpness(record, *view, options->pixel_pitch_um);
+      return options->truth.empty() ? report : report + CompareWithTruth(record, options->truth);
     };
     m.annotates_misses = true;
     m.annotate = [view](const Record& record) { return AnnotateSharpness(record, *view); };

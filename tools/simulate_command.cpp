@@ -3,6 +3,7 @@
 #include <iostream>
 #include <memory>
 #include <opencv2/imgcodecs.hpp>
+#include <sstream>
 
 #include "chart/chart_layout.h"
 #include "tools/camera.h"
@@ -24,9 +25,10 @@ struct SimulateOptions {
 cv::Size ParseSize(const std::string& text) {
   int width = 0;
   int height = 0;
-  char rest = 0;
-  if (std::sscanf(text.c_str(), "%dx%d%c", &width, &height, &rest) != 2 || width < 16 || height < 16 || width > 30000 ||
-      height > 30000) {
+  char by = 0;
+  std::istringstream words(text);
+  words >> width >> by >> height;
+  if (!words || !words.eof() || by != 'x' || std::min(width, height) < 16 || std::max(width, height) > 30000) {
     throw Failure(kWrongUsage, "--size " + text + ": give WIDTHxHEIGHT in pixels, 16 to 30000 each, as 4000x3000");
   }
   return {width, height};

@@ -12,7 +12,6 @@
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::HasSubstr;
 
 class Autofocus : public ::testing::Test {
  protected:

@@ -9,9 +9,6 @@
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::EndsWith;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
 

@@ -84,19 +84,23 @@ std::vector<cv::Point2d> MarkCentres(const ChartView& view) {
 }
 
 cv::Mat DrawEdge(const EdgeView& view) {
-  constexpr int kSamples = 4;
+  constexpr int kSamples = 4;  // a side of the pixel
+  std::vector<cv::Point2d> samples;
+  for (int i = 0; i < kSamples; ++i) {
+    for (int j = 0; j < kSamples; ++j) samples.emplace_back((j + 0.5) / kSamples, (i + 0.5) / kSamples);
+  }
   cv::Mat region(view.rows, view.cols, CV_32F);
   const double across = std::cos(std::atan(view.slope));
   for (int r = 0; r < view.rows; ++r) {
     for (int c = 0; c < view.cols; ++c) {
       double sum = 0;
-      for (int s = 0; s < kSamples * kSamples; ++s) {
-        const double y = r + (s / kSamples + 0.5) / kSamples - view.rows / 2.0;
-        const double x = c + (s % kSamples + 0.5) / kSamples - view.cols / 2.0;
+      for (const cv::Point2d& sample : samples) {
+        const double y = r + sample.y - view.rows / 2.0;
+        const double x = c + sample.x - view.cols / 2.0;
         const double distance = (x - view.place - view.slope * y) * across;
         sum += 0.5 * std::erfc(-distance / (view.sigma_px * std::sqrt(2.0)));
       }
-      const double share = sum / (kSamples * kSamples);
+      const double share = sum / static_cast<double>(samples.size());
       region.at<float>(r, c) =
           static_cast<float>(view.dark + (view.light - view.dark) * (view.dark_left ? share : 1 - share));
     }

@@ -13,13 +13,12 @@ using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::Not;
-using ::testing::SizeIs;
 
 class Program : public ::testing::Test {
  protected:
   // A simulated photo of the chart; answers its path.
   std::string Simulate(std::vector<std::string> options = {}) {
-    const std::string photo = folder_.Path("photo.png");
+    std::string photo = folder_.Path("photo.png");
     std::vector<std::string> arguments = {"simulate", "-o", photo, "--size", "1200x900", "--quiet"};
     arguments.insert(arguments.end(), options.begin(), options.end());
     EXPECT_EQ(0, RunProgram(arguments).status);
@@ -95,7 +94,7 @@ TEST_F(Program, LimitsDecideTheVerdict) {
 
   for (const auto& [limits, complaint] :
        {std::pair(R"({"camera_autofocus_mtf51": {"min": 0}})", "camera_autofocus_mtf51: no measurement"),
-        {R"({"camera_autofocus_mtf50_vertical": {"min": 0, "unit": "px"}})", "its unit is \"Nyquist\", not \"px\""},
+        {R"({"camera_autofocus_mtf50_vertical": {"min": 0, "unit": "px"}})", R"(its unit is "Nyquist", not "px")"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": "0"}})", "not a number"},
         {R"({"camera_autofocus_mtf50_vertical": {"minimum": 0}})", "neither a bound nor a unit"},
         {R"([)", "not a limits file"}}) {

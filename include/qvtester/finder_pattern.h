@@ -31,7 +31,7 @@ class QV_API QVFinderPattern {
   float x;                    // column
   float y;                    // row
   float estimatedModuleSize;  // a seventh of the mark's width
-  float average;              // over all candidates; written when the best three are chosen
+  float average = 0;          // over all candidates; written when the best three are chosen
   int count;
 };
 
