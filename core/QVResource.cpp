@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <opencv2/imgcodecs.hpp>
+#include <opencv2/videoio/registry.hpp>
 
 #include "core/slots.h"
 #include "qvtester/log.h"
@@ -41,7 +42,11 @@ int QVResource::SetImage(unsigned char* data, int width, int height) {
 }
 
 int QVResource::SetVideo(char* path) {
-  cv::VideoCapture video(path);
+  cv::VideoCapture video;
+  for (const cv::VideoCaptureAPIs backend : cv::videoio_registry::getStreamBackends()) {
+    if (backend == cv::CAP_GPHOTO2) continue;  // would look for a USB camera of that name, and lose memory doing so
+    if (video.open(path, backend)) break;
+  }
   if (!video.isOpened()) {
     QVDEBUGP("[%s] %s: not a video that can be opened", "SetVideo", path);
     return QV_ERROR_INVALID_ARGUMENT;
