@@ -5,25 +5,20 @@
 #include <cmath>
 #include <opencv2/imgproc.hpp>
 
+#include "chart/points.h"
 #include "qvtester/tester.h"
 
 namespace {
 
 constexpr float kUprightAngle = 315.0f;
 
-float Distance(cv::Point a, cv::Point b) {
-  const double dx = a.x - b.x;
-  const double dy = a.y - b.y;
-  return static_cast<float>(std::sqrt(dx * dx + dy * dy));
-}
-
 }  // namespace
 
 cv::Point QVTester::GetCornerPoint(std::vector<cv::Point> points) {
-  if (points.size() < 3) return {};
-  const float d01 = Distance(points[0], points[1]);
-  const float d12 = Distance(points[1], points[2]);
-  const float d20 = Distance(points[2], points[0]);
+  if (points.size() < kMarks) return {};
+  const auto d01 = static_cast<float>(Distance(points[0], points[1]));
+  const auto d12 = static_cast<float>(Distance(points[1], points[2]));
+  const auto d20 = static_cast<float>(Distance(points[2], points[0]));
   const float longest = std::max({d01, d12, d20});
   if (longest == d01) return points[2];
   if (longest == d12) return points[0];
@@ -47,7 +42,7 @@ void QVTester::SortPatternPoints(std::vector<cv::Point> points, cv::Point& corne
 }
 
 float QVTester::GetPatternAngle(std::vector<cv::Point> points) {
-  if (points.size() != 3) return -1.0f;
+  if (points.size() != kMarks) return -1.0f;
   const cv::Point k = GetCornerPoint(points);
   float sum_row = 0;
   float sum_col = 0;
@@ -67,7 +62,7 @@ void QVTester::NormalizePatternImage(cv::Mat image, std::vector<cv::Point>& poin
   const cv::Point2f centre(static_cast<float>(side) * 0.5f, static_cast<float>(side) * 0.5f);
   cv::Mat turn = cv::getRotationMatrix2D(centre, rotation, 1.0);
   cv::warpAffine(image, normalized, turn, cv::Size(side, side), cv::INTER_LINEAR, cv::BORDER_CONSTANT, cv::Scalar(0));
-  if (points.size() != 3) return;
+  if (points.size() != kMarks) return;
 
   cv::Mat marks(3, 3, CV_32F);  // a column per mark: column, row, 1
   for (int k = 0; k < 3; ++k) {

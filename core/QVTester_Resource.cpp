@@ -28,6 +28,13 @@ bool TakesFiles(int slot) { return KindOfSlot(slot) == SlotKind::kImage || KindO
 
 }  // namespace
 
+void ConvertPreviewFrame(void* data, int width, int height, cv::Mat& converted) {
+  const std::int64_t rows = static_cast<std::int64_t>(height) + height / 2;
+  if (rows > std::numeric_limits<int>::max()) CV_Error(cv::Error::StsBadSize, "the frame is too high");
+  CheckedPixels(width, height, 4);
+  cv::cvtColor(cv::Mat(static_cast<int>(rows), width, CV_8UC1, data), converted, cv::COLOR_YUV2BGR_NV21, 4);
+}
+
 int FetchImage(const QVTester& tester, int slot, cv::Mat& image) {
   const QVResource* resource = tester.resources_[slot].get();
   if (resource == nullptr) return QV_ERROR_SLOT_EMPTY;
@@ -62,11 +69,8 @@ int QVTester::SetResource(QV_RESOURCE_INDEX index, int width, int height, unsign
 
 int QVTester::SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data) {
   if (KindOfSlot(index) == SlotKind::kNone) return QV_ERROR_INVALID_ARGUMENT;
-  const std::int64_t rows = static_cast<std::int64_t>(height) + height / 2;
-  if (rows > std::numeric_limits<int>::max()) CV_Error(cv::Error::StsBadSize, "the frame is too high");
-  CheckedPixels(width, height, 4);
   cv::Mat frame;
-  cv::cvtColor(cv::Mat(static_cast<int>(rows), width, CV_8UC1, data), frame, cv::COLOR_YUV2BGR_NV21, 4);
+  ConvertPreviewFrame(data, width, height, frame);
   return FillSlot(resources_[index], [&](QVResource& resource) { return resource.SetImage(frame); });
 }
 

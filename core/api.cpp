@@ -130,6 +130,22 @@ int CheckMTF(float* mtf50Vertical, float* mtf50Horizontal) {
   return Guarded("CheckMTF", [&](QVTester& tester) { return tester.CheckMTF(mtf50Vertical, mtf50Horizontal); });
 }
 
+int CheckPatternCircles(int cam_id) {
+  return Guarded("CheckPatternCircles", [&](QVTester& tester) { return tester.CheckPatternCircles(cam_id); });
+}
+
+int SavePreview(void* data, int frame, int width, int height) {
+  if (data == nullptr || width < 1 || height < 1) return QV_ERROR_INVALID_ARGUMENT;
+  return Guarded("SavePreview", [&](QVTester& tester) {
+    tester.SavePreview(data, frame, width, height);
+    return QV_SUCCESS;
+  });
+}
+
+int TestCameraCapture(bool front) {
+  return Guarded("TestCameraCapture", [&](QVTester& tester) { return tester.TestCameraCapture(front); });
+}
+
 int setWorkingBinaryThresh(int value) {
   return Guarded("setWorkingBinaryThresh", [&](QVTester& tester) { return tester.setWorkingBinaryThresh(value); });
 }

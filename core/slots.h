@@ -40,6 +40,10 @@ inline std::size_t CheckedPixels(int width, int height, std::size_t bytes_per_pi
   return pixels;
 }
 
+/// Converts a preview frame, NV21 of height + height / 2 rows and width columns, to four 8-bit channels (BGRA).
+/// Throws cv::Exception for a size that NV21 can't have.
+void ConvertPreviewFrame(void* data, int width, int height, cv::Mat& converted);
+
 /// Shares the image of a slot. -98 when the slot is empty; throws cv::Exception when it holds no image.
 int FetchImage(const QVTester& tester, int slot, cv::Mat& image);
 

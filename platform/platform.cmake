@@ -10,6 +10,12 @@ add_library(qvtester_platform INTERFACE)
 target_include_directories(qvtester_platform SYSTEM INTERFACE "${QV_LIBLOG_INCLUDE_DIR}")
 target_link_libraries(qvtester_platform INTERFACE "${QV_LIBLOG_LIBRARY}")
 
+if(ANDROID)
+  set(QV_PLATFORM_SOURCES platform/android.cpp)
+else()
+  set(QV_PLATFORM_SOURCES platform/host.cpp)
+endif()
+
 # Debian keeps liblog outside the loader's path.
 if(NOT ANDROID)
   get_filename_component(QV_PLATFORM_RPATH "${QV_LIBLOG_LIBRARY}" DIRECTORY)

@@ -1,18 +1,16 @@
 // Sharpness of a chart photo: its finder marks, the upright picture, the two slanted-edge regions.
 
-#include <cmath>
 #include <cstdlib>
 #include <opencv2/imgproc.hpp>
 
 #include "chart/chart_image.h"
 #include "chart/chart_layout.h"
+#include "chart/points.h"
 #include "core/slots.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
 
 namespace {
-
-constexpr std::size_t kMarks = 3;
 
 struct UprightChart {
   cv::Mat image;                    // grey
@@ -30,12 +28,6 @@ cv::Mat InFloat(const cv::Mat& region) {
   cv::Mat values;
   region.convertTo(values, CV_32F);
   return values;
-}
-
-double Distance(cv::Point a, cv::Point b) {
-  const double dx = a.x - b.x;
-  const double dy = a.y - b.y;
-  return std::sqrt(dx * dx + dy * dy);
 }
 
 void LogGeometry(const char* name, const UprightChart& chart) {

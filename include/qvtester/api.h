@@ -63,6 +63,18 @@ QV_API int SetStep(int step);
 /// (1.0 = 0.5 cycles/pixel). -91 when three finder marks are not found, -98 when the slot is empty; outputs untouched.
 QV_API int CheckMTF(float* mtf50Vertical, float* mtf50Horizontal);
 
+/// Looks for the chart's three finder marks in the preview frame of slot 17 and publishes what it finds as system
+/// properties (cam_id 0: main camera, 2: second rear camera). 1 when exactly three were found, else 0; -98 without a
+/// frame.
+QV_API int CheckPatternCircles(int cam_id);
+
+/// Saves a preview frame (NV21 of height + height / 2 rows and width columns) as vi_pview_<frame / 3>.jpg in the
+/// preview folder. Answers 1, also when the file can't be written; -95 for a size that NV21 can't have.
+QV_API int SavePreview(void* data, int frame, int width, int height);
+
+/// Test 16 (false) or 20 (true) by its own name: 1, -91, -87 or -98.
+QV_API int TestCameraCapture(bool front);
+
 /// Grey level at which chart photos are binarised (property 93). Setting answers 1, without a range check.
 QV_API int setWorkingBinaryThresh(int value);
 QV_API int getWorkingBinaryThresh();

@@ -186,6 +186,66 @@ class QV_API QVTester {
   int TestCameraFlash();
   int TestCameraFlashVT();
 
+  /// Tests 13 (main camera) and 19 (front): difference of two preview frames, into the preview_ fields.
+  /// Frames of different sizes are logged, and nothing is stored.
+  void TestCameraPreview(bool front);
+  /// Looks for the chart's three finder marks in the preview frame of slot 17 and publishes their number, places and
+  /// the chart's centre as system properties, for cam_id 0 (main) and 2 (second rear camera).
+  /// @return 1 when exactly three were found, else 0; -98 when the slot is empty.
+  int CheckPatternCircles(int cam_id);
+  /// Publishes the points and the middle of the longest side of the closed polygon that they make. 0, always.
+  int GetImageCenter(std::vector<cv::Point>& points, int cam_id);
+  /// Writes an NV21 preview frame as JPEG, three frame numbers to a file. A failed write is silent.
+  /// @throws cv::Exception for a size that NV21 can't have.
+  void SavePreview(void* data, int frame, int width, int height);
+
+  /// Tests 16 (main camera) and 20 (front): L*a*b* of the chart's colour patches in slot 17 or 24, and their CIE 1976
+  /// difference to those of the standard image in slot 18 or 25, which is measured once in the tester's life.
+  /// @return 1; -91 when either photo does not show three finder marks, -87 when fewer than 15 patches were measured,
+  ///         -98 when the slot is empty. Only 1 stores.
+  int TestCameraCapture(bool front);
+  /// Mean colour of the patches around an upright chart: six along the top, six along the bottom, six down the left,
+  /// six down the right; fewer when a patch reaches outside. x, y, z are red, green, blue, 0 to 255, truncated.
+  std::vector<cv::Point3i> GetColorPatchRGB(cv::Mat image, std::vector<cv::Point> finder_points);
+
+  /// Tests 17 (main camera) and 21 (front): dark blobs in a photo of a plain, evenly lit target, and its grey-level
+  /// histogram beside the reference (properties 88 and 87). With fake_mode the blobs are left out. Answers 1.
+  int TestLensDust(bool front, bool fake_mode);
+  /// Finds dark blobs in a grey photo (CV_8UC1) and publishes the places of the first five outside the corners.
+  /// Sees discs of about 5 to 16 pixels where the mean grey level is above 130: tests/camera/QVTester_LensDust.cpp.
+  /// @return the number of places published.
+  int detectBlob(cv::Mat& gray);
+  /// False in the four corner squares of 20 pixels, where the fixture's marks are.
+  bool isValidLocation(int width, int height, cv::Point2f p);
+  /// Appends a place to, or clears, the system property "t82.vi<index>_mung_loc".
+  void save_mung_location(cv::Point2f p, int index);
+  void remove_mung_location(int index);
+  /// Draws the fixture's frame, the outermost pixels of the width x height picture, in this value.
+  void draw_guide_line(cv::Mat& image, int width, int height, int value);
+  /// Counts pixels darker than half the photo's mean in two regions of a grey photo (CV_8UC1), whatever their shape or
+  /// size. @return their number in both regions together. @throws cv::Exception for a region outside the photo.
+  int detectMung(cv::Mat gray, cv::Rect roi1, cv::Rect roi2);
+  /// The blobs of the last detectBlob, drawn in blue onto the picture that they were found in (CV_8UC3); drawn when
+  /// asked for, and empty before the first.
+  const cv::Mat& DrawBlobs();
+
+  // ---- Colour ---------------------------------------------------------------------------------------------------
+
+  /// Transfer function of sRGB (IEC 61966-2-1): an 8-bit value to linear, 0 to 1.
+  float GetLinearRGB(int v);
+  /// sRGB to CIE XYZ (D65), white at Y = 1.
+  void ConvertRGB2XYZ(int r, int g, int b, float& X, float& Y, float& Z);
+  /// Companion function f(t) of L*a*b* (CIE 15).
+  float GetFValue(float t);
+  /// CIE L*a*b* relative to an implicit white of (1, 1, 1): the white point that is passed is not used.
+  void ConvertXYZ2LAB(float X, float Y, float Z, float Xw, float Yw, float Zw, float& L, float& a, float& b);
+  /// prop_color_matrix_ times each of rows x cols RGB triples. The caller frees the result (free); null when memory is
+  /// exhausted.
+  float* rgb2xyz(float* rgb, int rows, int cols);
+  /// Correlated colour temperature in kelvin of each of rows x cols XYZ triples, 0 where there is none. The caller
+  /// frees the result (free); null when memory is exhausted.
+  float* xyz2cct(float* xyz, int rows, int cols);
+
   // ---- State ----------------------------------------------------------------------------------------------------
 
   static constexpr int kSlotCount = 37;
@@ -195,6 +255,19 @@ class QV_API QVTester {
   int hdr_width_ = -1;  // of the last HDR buffer that was loaded, like the two below
   int hdr_height_ = -1;
   bool hdr_flag_ = false;
+
+  // The standard image's patch colours, one set a camera.
+  struct ColorStandard {
+    bool is_extracted = false;
+    int count = 0;                           // patches
+    std::unique_ptr<float[]> standard_lab_;  // triples L*, a*, b*
+  };
+  ColorStandard standard_main_, standard_front_;
+
+  // What the last detectBlob saw.
+  cv::Mat blob_image_;  // CV_8UC1
+  std::vector<cv::KeyPoint> blob_keypoints_;
+  cv::Mat blob_drawing_;
 
   // Search for finder marks; each GetFinderPoints starts anew.
   bool hasSkipped = false;

@@ -1,0 +1,197 @@
+// Tests 16 and 20: colour of a chart photo's patches, beside those of a standard photo of the same chart.
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+#include <optional>
+
+#include "chart/chart_image.h"
+#include "chart/points.h"
+#include "core/slots.h"
+#include "qvtester/log.h"
+#include "qvtester/tester.h"
+
+namespace {
+
+constexpr const char* kName = "TestCameraCapture";
+constexpr int kWhitePatch = 9;
+constexpr std::array<int, 4> kPatchesWithoutStandard = {12, 13, 14, kWhitePatch};
+constexpr std::size_t kFewestPatches = 15;  // up to the last of those
+
+struct Triple {
+  float x, y, z;
+};
+
+using Patches = std::vector<cv::Point3i>;
+
+Triple ToXyz(QVTester& tester, const cv::Point3i& rgb) {
+  Triple xyz = {};
+  tester.ConvertRGB2XYZ(rgb.x, rgb.y, rgb.z, xyz.x, xyz.y, xyz.z);
+  return xyz;
+}
+
+Triple ToLab(QVTester& tester, const Triple& xyz, const Triple& white) {
+  Triple lab = {};
+  tester.ConvertXYZ2LAB(xyz.x, xyz.y, xyz.z, white.x, white.y, white.z, lab.x, lab.y, lab.z);
+  return lab;
+}
+
+// Patches of the upright chart.
+Patches SamplePatches(QVTester& tester, const cv::Mat& photo, std::vector<cv::Point> points) {
+  cv::Mat upright;
+  tester.NormalizePatternImage(photo, points, upright);
+  return tester.GetColorPatchRGB(upright, points);
+}
+
+std::vector<cv::Point> FindMarks(QVTester& tester, const cv::Mat& photo, int threshold) {
+  cv::Mat gray;
+  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  return tester.GetFinderPoints(Binarise(gray, threshold));
+}
+
+Triple WhiteOf(QVTester& tester, const Patches& patches) {
+  return patches.size() > kWhitePatch ? ToXyz(tester, patches[kWhitePatch]) : Triple{};
+}
+
+// L*a*b* of the patches, three floats each.
+std::unique_ptr<float[]> LabOf(QVTester& tester, const Patches& patches, const Triple& white) {
+  auto lab = std::make_unique<float[]>(3 * patches.size());
+  for (std::size_t i = 0; i < patches.size(); ++i) {
+    const Triple value = ToLab(tester, ToXyz(tester, patches[i]), white);
+    lab[3 * i] = value.x;
+    lab[3 * i + 1] = value.y;
+    lab[3 * i + 2] = value.z;
+  }
+  return lab;
+}
+
+// CIE 1976 colour difference of two triples, in single precision.
+float DeltaE(const float* a, const float* b) {
+  const float l = a[0] - b[0];
+  const float u = a[1] - b[1];
+  const float v = a[2] - b[2];
+  return std::sqrt(l * l + u * u + v * v);
+}
+
+// Measures the standard photo, once in the tester's life. 1, or -91.
+int ExtractStandard(QVTester& tester, const cv::Mat& photo, QVTester::ColorStandard& standard) {
+  QVDEBUGP("[%s] !(*ptr_is_extracted) and is_standard_image_exists", kName);
+  const std::vector<cv::Point> points = FindMarks(tester, photo, tester.prop_param_86_);
+  const int count = static_cast<int>(points.size());
+  QVDEBUGP("[%s] finder point : %d", kName, count);
+  if (points.size() != kMarks) {
+    QVDEBUGP("[%s] TestCameraCapture1, finder point : %d \n return PATTERN NOT FOUND!", kName, count);
+    return QV_ERROR_PATTERN_NOT_FOUND;
+  }
+  const Patches patches = SamplePatches(tester, photo, points);
+  standard.standard_lab_ = LabOf(tester, patches, WhiteOf(tester, patches));
+  standard.count = static_cast<int>(patches.size());
+  standard.is_extracted = true;
+  return QV_SUCCESS;
+}
+
+// Half-open range of pixels about a patch's centre along one axis, or nothing where it leaves the image.
+std::optional<cv::Range> PatchRange(const char* axis, int centre, int half, int end, const char* side) {
+  const cv::Range range(centre - half, centre + half);
+  if (range.start >= 0 && range.end >= range.start && range.end <= end) return range;
+  const char* const name = "GetColorPatchRGB";
+  QVDEBUGP("[%s] %sRange.(start,end)=(%d,%d)", name, axis, range.start, range.end);
+  QVDEBUGP("[%s] %s-%s, assert!! before opencv", name, side, axis);
+  return std::nullopt;
+}
+
+}  // namespace
+
+int QVTester::TestCameraCapture(bool front) {
+  QVDEBUGP(front ? "[OKAPI] Is Front Camera!!" : "[OKAPI] Is Main Camera!!");
+  cv::Mat photo;
+  const int slot = front ? QV_RESOURCE_FRONT_CHART_PHOTO : QV_RESOURCE_CHART_PHOTO;
+  if (const int code = FetchImage(*this, slot, photo); code != QV_SUCCESS) return code;
+  cv::Mat standard_photo;
+  if (const QVResource* slot_of_standard =
+          resources_[front ? QV_RESOURCE_FRONT_CHART_STANDARD : QV_RESOURCE_CHART_STANDARD].get())
+    slot_of_standard->GetImage(&standard_photo);
+
+  ColorStandard& standard = front ? standard_front_ : standard_main_;
+  if (!standard.is_extracted) {
+    if (!standard_photo.empty()) {
+      if (const int code = ExtractStandard(*this, standard_photo, standard); code != QV_SUCCESS) return code;
+    } else {
+      QVDEBUGP("[%s] !(*ptr_is_extracted) just", kName);
+    }
+  }
+
+  cv::Mat gray;
+  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  QVDEBUGP("[%s] prop_binary_thr_working_: %d", kName, prop_binary_thr_working_);
+  const std::vector<cv::Point> points = GetFinderPoints(Binarise(gray, prop_binary_thr_working_));
+  if (points.size() != kMarks) {
+    QVDEBUGP("[%s] TestCameraCapture2 finder point : %d \n return PATTERN NOT FOUND!", kName,
+             static_cast<int>(points.size()));
+    return QV_ERROR_PATTERN_NOT_FOUND;
+  }
+  Patches patches = SamplePatches(*this, photo, points);
+  if (patches.size() < kFewestPatches) return QV_ERROR_NO_PATCHES;
+
+  const Triple white = WhiteOf(*this, patches);
+  std::unique_ptr<float[]> differences;
+  int compared = 0;
+  if (standard.is_extracted) {
+    QVDEBUGP("[%s] calculate_differences, true", kName);
+    compared = std::min(static_cast<int>(patches.size()), standard.count);
+    differences = std::make_unique<float[]>(compared);
+  } else {
+    QVDEBUGP("[%s] calculate_differences, false", kName);
+    Patches chosen;
+    for (const int number : kPatchesWithoutStandard) chosen.push_back(patches[number]);
+    patches = chosen;
+  }
+  std::unique_ptr<float[]> lab = LabOf(*this, patches, white);
+  for (int i = 0; i < compared; ++i) differences[i] = DeltaE(&lab[3 * i], &standard.standard_lab_[3 * i]);
+
+  QVCaptureResult& result = front ? Results(*this).capture_front_ : Results(*this).capture_main_;
+  ReleaseTestResult(front ? QV_TEST_CAMERA_CAPTURE_2 : QV_TEST_CAMERA_CAPTURE);
+  result.capture_lab_ = lab.release();
+  result.capture_lab_count_ = static_cast<int>(patches.size());
+  result.capture_delta_e_ = differences.release();
+  result.capture_delta_e_count_ = compared;
+  return QV_SUCCESS;
+}
+
+std::vector<cv::Point3i> QVTester::GetColorPatchRGB(cv::Mat image, std::vector<cv::Point> finder_points) {
+  const char* const name = "GetColorPatchRGB";
+  cv::Point p1;
+  cv::Point p2;
+  cv::Point p3;
+  SortPatternPoints(finder_points, p1, p2, p3);
+  const int distance = static_cast<int>(Distance(p1, p2));
+  QVDEBUGP("[%s] img.(rows,cols)=(%d,%d)", name, image.rows, image.cols);
+  const int half = distance / 21;
+  const int pitch = (p2.y - p1.y) / 7;  // serves all four sides
+
+  // First patch's centre less one step, and the step: row in x, column in y.
+  struct Side {
+    const char* name;
+    cv::Point start, step;
+  };
+  const Side sides[] = {{"top", {p1.x, p1.y}, {0, pitch}},
+                        {"bottom", {p3.x, p1.y}, {0, pitch}},
+                        {"left", {p1.x, p1.y}, {pitch, 0}},
+                        {"right", {p1.x, p2.y}, {pitch, 0}}};
+  std::vector<cv::Point3i> colours;
+  for (const Side& side : sides) {
+    QVDEBUGP("[%s] %s", name, side.name);
+    for (int k = 1; k <= 6; ++k) {
+      const cv::Point centre = side.start + k * side.step;
+      const auto rows = PatchRange("row", centre.x, half, image.rows, side.name);
+      if (!rows) return colours;
+      const auto cols = PatchRange("col", centre.y, half, image.cols, side.name);
+      if (!cols) return colours;
+      const cv::Scalar mean = cv::mean(image.rowRange(*rows).colRange(*cols));
+      // Red, green, blue of a picture that holds blue first, whatever the grey conversions take it for.
+      colours.emplace_back(static_cast<int>(mean[2]), static_cast<int>(mean[1]), static_cast<int>(mean[0]));
+    }
+  }
+  return colours;
+}

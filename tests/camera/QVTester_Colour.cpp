@@ -1,0 +1,112 @@
+// Colour conversions. Single precision throughout, but where a step says double.
+
+#include <algorithm>
+#include <cmath>
+#include <cstdlib>
+
+#include "qvtester/tester.h"
+
+namespace {
+
+// sRGB transfer function (IEC 61966-2-1); the power in double.
+float Linear(int v) {
+  const float c = static_cast<float>(v) / 255.0f;
+  if (c <= 0.04045f) return c / 12.92f;
+  return static_cast<float>(std::pow(static_cast<double>((c + 0.055f) / 1.055f), 2.4));
+}
+
+// Cool side of the Planckian locus, 0 < x <= 0.331; in double, A narrowed to float.
+float CoolTemperature(float xf, float yf) {
+  const double x = xf;
+  const double y = yf;
+  float a = 0;
+  if (xf >= 0.235f && xf <= 0.252f) {
+    const float square = xf * xf;
+    a = static_cast<float>(100000 * (1.6 * square - 0.89553 * x + 0.12932));
+  } else if (xf > 0.252f) {
+    a = static_cast<float>(10000 * (1.8785 * (x * x) - 1.7555 * x + 0.3756));
+  }
+  const double s = y + 0.6886 * x - 0.3993;
+  const double p = 2.4319 * x + 0.3871;
+  if (s < 0) return 0;
+  const double power = std::pow(s, p);
+  return power == 0 ? 0.0f : static_cast<float>(a / power + 5550.0);
+}
+
+// Warm side, 0.331 < x <= 0.61; in double, A and k narrowed to float, the last power in single precision.
+float WarmTemperature(float xf, float yf) {
+  const double x = xf;
+  const auto a = static_cast<float>(xf <= 0.556f ? 2267.8 * x - 1702 : 1167.8 * x - 1080);
+  const double e = std::exp((x - 0.331) / (0.1118 * x - 0.0928));
+  const auto k = static_cast<float>(1282240.0 * std::pow(x - 0.29, 1.664) * std::exp(-15.69 * (x - 0.29)) + 3200.0);
+  const float power = std::pow(yf, static_cast<float>(1 - e));
+  return static_cast<float>(a + static_cast<double>(k) * power);
+}
+
+// Fits to either side of the pivot of 5550 K; breakpoints are held against x in single precision.
+float Temperature(float X, float Y, float Z) {
+  if (X == 0 && Y == 0 && Z == 0) return 0;
+  const float sum = X + Y + Z;
+  const float x = std::clamp(X / sum, 0.0f, 1.0f);
+  const float y = std::clamp(Y / sum, 0.0f, 1.0f);
+  if (!(x > 0 && x <= 0.61f)) return 0;
+  const float cct = x <= 0.331f ? CoolTemperature(x, y) : WarmTemperature(x, y);
+  return cct == 5550.0f || cct <= 0 ? 0 : cct;
+}
+
+float* AllocateFloats(int rows, int cols, std::size_t per_pixel) {
+  const std::size_t pixels = static_cast<std::size_t>(rows) * static_cast<std::size_t>(cols);
+  return static_cast<float*>(std::calloc(pixels, per_pixel * sizeof(float)));  // checks the product, where malloc can't
+}
+
+}  // namespace
+
+float QVTester::GetLinearRGB(int v) { return Linear(v); }
+
+void QVTester::ConvertRGB2XYZ(int r, int g, int b, float& X, float& Y, float& Z) {
+  const float red = Linear(r);
+  const float green = Linear(g);
+  const float blue = Linear(b);
+  X = 0.4124f * red + 0.3576f * green + 0.1805f * blue;
+  Y = 0.2126f * red + 0.7152f * green + 0.0722f * blue;
+  Z = 0.0193f * red + 0.1192f * green + 0.9505f * blue;
+}
+
+float QVTester::GetFValue(float t) {
+  static const float epsilon = 216.0f / 24389.0f;
+  static const float kappa = 24389.0f / 27.0f;
+  if (t > epsilon) return static_cast<float>(std::pow(static_cast<double>(t), 1.0 / 3.0));
+  return static_cast<float>((static_cast<double>(kappa * t) + 16.0) / 116.0);
+}
+
+void QVTester::ConvertXYZ2LAB(float X, float Y, float Z, float /*Xw*/, float /*Yw*/, float /*Zw*/, float& L, float& a,
+                              float& b) {
+  const float fx = GetFValue(X);
+  const float fy = GetFValue(Y);
+  const float fz = GetFValue(Z);
+  L = 116.0f * fy - 16.0f;
+  a = 500.0f * (fx - fy);
+  b = 200.0f * (fy - fz);
+}
+
+float* QVTester::rgb2xyz(float* rgb, int rows, int cols) {
+  float* const xyz = AllocateFloats(rows, cols, 3);
+  if (xyz == nullptr) return nullptr;
+  const float* const m = prop_color_matrix_;
+  // Left to right, and + 0 at the end: as OpenCV's matrix product, which never gives a negative zero.
+  const std::size_t pixels = static_cast<std::size_t>(rows) * static_cast<std::size_t>(cols);
+  for (std::size_t i = 0; i < pixels; ++i) {
+    const float* const in = rgb + 3 * i;
+    float* const out = xyz + 3 * i;
+    for (int k = 0; k < 3; ++k) out[k] = m[3 * k] * in[0] + m[3 * k + 1] * in[1] + m[3 * k + 2] * in[2] + 0.0f;
+  }
+  return xyz;
+}
+
+float* QVTester::xyz2cct(float* xyz, int rows, int cols) {
+  float* const cct = AllocateFloats(rows, cols, 1);
+  if (cct == nullptr) return nullptr;
+  const std::size_t pixels = static_cast<std::size_t>(rows) * static_cast<std::size_t>(cols);
+  for (std::size_t i = 0; i < pixels; ++i) cct[i] = Temperature(xyz[3 * i], xyz[3 * i + 1], xyz[3 * i + 2]);
+  return cct;
+}

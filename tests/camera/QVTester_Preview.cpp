@@ -1,0 +1,112 @@
+// Tests 13 and 19, and what runs on live preview frames: the three-mark target check and saved frames.
+
+#include <algorithm>
+#include <cstdint>
+#include <cstdio>
+#include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
+
+#include "chart/chart_image.h"
+#include "chart/points.h"
+#include "core/slots.h"
+#include "platform/preview_folder.h"
+#include "platform/properties.h"
+#include "qvtester/log.h"
+#include "qvtester/tester.h"
+
+namespace {
+
+constexpr int kMainCamera = 0;
+constexpr int kSecondRearCamera = 2;
+
+// Keys and values are cut to the 31 characters that their readers have room for.
+template <typename... Arguments>
+std::array<char, 32> Short(const char* format, Arguments... arguments) {
+  std::array<char, 32> text = {};
+  std::snprintf(text.data(), text.size(), format, arguments...);
+  return text;
+}
+
+void Publish(const std::array<char, 32>& key, const std::array<char, 32>& value) {
+  platform::property_set(key.data(), value.data());
+}
+
+int Middle(int a, int b) { return static_cast<int>((static_cast<std::int64_t>(a) + b) / 2); }
+
+}  // namespace
+
+void QVTester::TestCameraPreview(bool front) {
+  cv::Mat first;
+  cv::Mat second;
+  const int first_slot = front ? QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME : QV_RESOURCE_PREVIEW_FIRST_FRAME;
+  if (FetchImage(*this, first_slot, first) != QV_SUCCESS || FetchImage(*this, first_slot + 1, second) != QV_SUCCESS) {
+    return;
+  }
+  if (first.size() != second.size()) {
+    QVDEBUGP("[OKAPI] image size does not match");
+    return;
+  }
+  cv::cvtColor(first, first, cv::COLOR_RGB2GRAY);
+  cv::cvtColor(second, second, cv::COLOR_RGB2GRAY);
+  cv::Mat map;
+  cv::Mat(cv::abs(second - first)).convertTo(map, CV_32F);
+  map /= 255.0;
+  double maximum = 0;
+  cv::minMaxLoc(map, nullptr, &maximum);
+  const auto mean = static_cast<float>(cv::mean(map)[0]);
+  map /= maximum;  // identical frames give 0 / 0, and are stored so
+
+  QVPreviewResult& result = front ? Results(*this).preview_front_ : Results(*this).preview_main_;
+  auto copy = std::make_unique<float[]>(map.total());
+  std::copy_n(map.ptr<float>(), map.total(), copy.get());
+  ReleaseTestResult(front ? QV_TEST_CAMERA_PREVIEW_2 : QV_TEST_CAMERA_PREVIEW);
+  result = {map.cols, map.rows, copy.release(), mean};
+}
+
+int QVTester::CheckPatternCircles(int cam_id) {
+  const char* const name = "CheckPatternCircles";
+  cv::Mat frame;
+  if (const int code = FetchImage(*this, QV_RESOURCE_CHART_PHOTO, frame); code != QV_SUCCESS) return code;
+  cv::cvtColor(frame, frame, cv::COLOR_RGB2GRAY);
+  const cv::Mat binary = Binarise(frame, prop_binary_thr_working_);
+  std::vector<cv::Point> points = GetFinderPoints(binary);
+  QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, binary.rows, binary.cols);
+
+  const std::array<char, 32> count = Short("%d", static_cast<int>(points.size()));
+  if (cam_id == kSecondRearCamera) Publish(Short("t82.vi_c_num_mw"), count);
+  if (cam_id == kMainCamera) Publish(Short("t82.vi_c_num_main"), count);
+  if (cam_id == kMainCamera || cam_id == kSecondRearCamera) GetImageCenter(points, cam_id);
+
+  const bool found = points.size() == kMarks;
+  QVDEBUGP(found ? "[%s]Find 3Circles in Preview!!" : "[%s]Cannot find 3Circles in Preview!!", name);
+  return found ? 1 : 0;
+}
+
+int QVTester::GetImageCenter(std::vector<cv::Point>& points, int cam_id) {
+  const char* const name = "GetImageCenter";
+  const int n = static_cast<int>(points.size());
+  QVDEBUGP("[%s] Calculate center point number : %d, cam_id : %d", name, n, cam_id);
+  cv::Point centre(0, 0);
+  double longest = 0;
+  for (int i = 0; i < n; ++i) {
+    const cv::Point a = points[i];
+    const cv::Point b = points[(i + 1) % n];
+    const double length = Distance(a, b);
+    if (length > longest) {
+      longest = length;
+      centre = {Middle(a.x, b.x), Middle(a.y, b.y)};
+    }
+    QVDEBUGP("[%s] %dth temp_length : %f, cal_length : %f, x : %d, y : %d, final x : %d, final y : %d", name, i,
+             longest, length, a.x, a.y, centre.x, centre.y);
+    Publish(Short("t82.vi_circle_loc_%d_%d", cam_id, i), Short("%d,%d", a.x, a.y));
+  }
+  if (n != 3) centre = {0, 0};
+  Publish(Short("t82.vi_center_loc_%d", cam_id), Short("%d,%d", centre.x, centre.y));
+  return 0;
+}
+
+void QVTester::SavePreview(void* data, int frame, int width, int height) {
+  cv::Mat picture;
+  ConvertPreviewFrame(data, width, height, picture);
+  cv::imwrite(platform::PreviewFolder() + "/" + Short("vi_pview_%d.jpg", frame / 3).data(), picture);
+}

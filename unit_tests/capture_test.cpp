@@ -1,0 +1,175 @@
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+
+#include "chart/chart_layout.h"
+#include "qvtester/api.h"
+#include "qvtester/tester.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::Contains;
+using ::testing::Each;
+using ::testing::ElementsAre;
+using ::testing::Not;
+using ::testing::SizeIs;
+
+constexpr double kScale = 0.1;
+
+// The chart's photo with this colour at patch i of the ring, in sampling order.
+template <typename ColourOf>
+cv::Mat DrawPatches(const ColourOf& colour_of) {
+  cv::Mat photo = DrawChart();
+  for (int i = 0; i < 24; ++i) {
+    const cv::Point2d centre = PatchCentre(i) * kScale + cv::Point2d(151.5, 151.5);
+    cv::rectangle(photo, cv::Rect(cvRound(centre.x) - 40, cvRound(centre.y) - 40, 80, 80), colour_of(i), cv::FILLED);
+  }
+  return photo;
+}
+
+cv::Scalar Drawn(int i) { return cv::Scalar(kPatches[i].blue, kPatches[i].green, kPatches[i].red); }
+
+class Capture : public ::testing::Test {
+ protected:
+  void SetUp() override { InitTestModule(); }
+  void TearDown() override { FinalizeTestModule(); }
+  static void Load(int slot, const cv::Mat& image) {
+    theTester->resources_[slot] = std::make_unique<QVResource>();
+    theTester->resources_[slot]->SetImage(image);
+  }
+  static QVCaptureResult& Main() {
+    QVResultData* results = nullptr;
+    GetResult(&results);
+    return results->capture_main_;
+  }
+  static std::vector<float> Lab(const cv::Scalar& bgr) {
+    float X = 0;
+    float Y = 0;
+    float Z = 0;
+    std::vector<float> lab(3);
+    theTester->ConvertRGB2XYZ(static_cast<int>(bgr[2]), static_cast<int>(bgr[1]), static_cast<int>(bgr[0]), X, Y, Z);
+    theTester->ConvertXYZ2LAB(X, Y, Z, 0, 0, 0, lab[0], lab[1], lab[2]);
+    return lab;
+  }
+  static std::vector<float> Triple(int i) { return {Main().capture_lab_ + 3 * i, Main().capture_lab_ + 3 * i + 3}; }
+
+  LogLines log_;
+};
+
+TEST_F(Capture, PatchesComeTopBottomLeftRightAsRedGreenBlue) {
+  const LogLines log;
+  const auto colours = theTester->GetColorPatchRGB(DrawPatches(Drawn), {{151, 151}, {151, 848}, {848, 151}});
+  ASSERT_THAT(colours, SizeIs(24));
+  for (int i = 0; i < 24; ++i) {
+    EXPECT_EQ(cv::Point3i(kPatches[i].red, kPatches[i].green, kPatches[i].blue), colours[i]) << kPatches[i].name;
+  }
+  EXPECT_THAT(LogLines::Texts(),
+              ElementsAre("[GetColorPatchRGB] img.(rows,cols)=(1000,1000)", "[GetColorPatchRGB] top",
+                          "[GetColorPatchRGB] bottom", "[GetColorPatchRGB] left", "[GetColorPatchRGB] right"));
+}
+
+TEST_F(Capture, SamplingStopsAtTheFirstPatchOutside) {
+  const cv::Mat image(700, 1000, CV_8UC3, cv::Scalar::all(50));
+  // D = 210, so the half-size is 10 and the pitch 30; the bottom side lies at row 695.
+  EXPECT_THAT(theTester->GetColorPatchRGB(image, {{20, 20}, {20, 230}, {695, 20}}), SizeIs(6));
+  EXPECT_THAT(LogLines::Texts(), Contains("[GetColorPatchRGB] rowRange.(start,end)=(685,705)"));
+  EXPECT_EQ("[GetColorPatchRGB] bottom-row, assert!! before opencv", LogLines::Texts().back());
+  EXPECT_THAT(theTester->GetColorPatchRGB(image.colRange(0, 120), {{20, 20}, {20, 230}, {400, 20}}), SizeIs(3));
+  EXPECT_EQ("[GetColorPatchRGB] top-col, assert!! before opencv", LogLines::Texts().back());
+  EXPECT_THAT(LogLines::Texts(), Contains("[GetColorPatchRGB] colRange.(start,end)=(130,150)"));
+  EXPECT_THAT(theTester->GetColorPatchRGB(image, {{20, 5}, {20, 215}, {400, 5}}), SizeIs(12));
+  EXPECT_EQ("[GetColorPatchRGB] left-col, assert!! before opencv", LogLines::Texts().back());
+  // A range may end exactly with the image.
+  EXPECT_THAT(theTester->GetColorPatchRGB(image, {{10, 10}, {10, 220}, {690, 10}}), SizeIs(24));
+}
+
+TEST_F(Capture, WithoutAStandardFourPatchesAreKept) {
+  Load(17, DrawPatches(Drawn));
+  ASSERT_EQ(1, TestCameraCapture(false));
+  ASSERT_EQ(4, Main().capture_lab_count_);
+  EXPECT_EQ(0, Main().capture_delta_e_count_);
+  EXPECT_EQ(nullptr, Main().capture_delta_e_);
+  EXPECT_EQ(Lab(Drawn(12)), Triple(0));
+  EXPECT_EQ(Lab(Drawn(13)), Triple(1));
+  EXPECT_EQ(Lab(Drawn(14)), Triple(2));
+  EXPECT_EQ(Lab(Drawn(9)), Triple(3)) << "the white's own values, not 100, 0, 0";
+  EXPECT_THAT(LogLines::Texts(), Contains("[TestCameraCapture] !(*ptr_is_extracted) just"));
+  EXPECT_THAT(LogLines::Texts(), Contains("[TestCameraCapture] calculate_differences, false"));
+}
+
+TEST_F(Capture, DifferencesAreTakenToTheStandard) {
+  Load(18, DrawPatches(Drawn));
+  Load(17, DrawPatches([](int i) { return i == 5 ? cv::Scalar(60, 80, 70) : Drawn(i); }));
+  ASSERT_EQ(1, RunTest(QV_TEST_CAMERA_CAPTURE, false));
+  ASSERT_EQ(24, Main().capture_lab_count_);
+  ASSERT_EQ(24, Main().capture_delta_e_count_);
+  const std::vector<float> seen = Lab(cv::Scalar(60, 80, 70));
+  const std::vector<float> meant = Lab(Drawn(5));
+  const double distance = std::hypot(std::hypot(seen[0] - meant[0], seen[1] - meant[1]), seen[2] - meant[2]);
+  for (int i = 0; i < 24; ++i) {
+    if (i == 5) {
+      EXPECT_NEAR(distance, Main().capture_delta_e_[i], 1e-4 * distance);
+    } else {
+      EXPECT_EQ(0.0f, Main().capture_delta_e_[i]) << i;
+    }
+  }
+
+  // The standard is measured once; a new image in its slot, or Initialize, does not change that.
+  InitTestModule();
+  Load(18, cv::Mat(50, 50, CV_8UC3, cv::Scalar::all(0)));
+  Load(17, DrawPatches(Drawn));
+  const LogLines log;
+  ASSERT_EQ(1, TestCameraCapture(false));
+  EXPECT_THAT(std::vector<float>(Main().capture_delta_e_, Main().capture_delta_e_ + 24), Each(0.0f));
+  EXPECT_THAT(LogLines::Texts(),
+              Not(Contains("[TestCameraCapture] !(*ptr_is_extracted) and is_standard_image_exists")));
+
+  Load(24, DrawPatches(Drawn));
+  ASSERT_EQ(1, RunTest(QV_TEST_CAMERA_CAPTURE_2, false)) << "the front camera has no standard yet";
+  QVResultData* results = nullptr;
+  GetResult(&results);
+  EXPECT_EQ(4, results->capture_front_.capture_lab_count_);
+  EXPECT_EQ(24, Main().capture_lab_count_);
+}
+
+TEST_F(Capture, MissesInEitherPhotoStoreNothing) {
+  const cv::Mat blank(200, 200, CV_8UC3, cv::Scalar::all(255));
+  EXPECT_EQ(-98, TestCameraCapture(true));
+  Load(18, blank);
+  Load(17, DrawPatches(Drawn));
+  EXPECT_EQ(-91, TestCameraCapture(false));
+  EXPECT_THAT(LogLines::Texts(), Contains("[TestCameraCapture] finder point : 0"));
+  EXPECT_EQ("[TestCameraCapture] TestCameraCapture1, finder point : 0 \n return PATTERN NOT FOUND!",
+            LogLines::Texts().back());
+  EXPECT_FALSE(theTester->standard_main_.is_extracted);
+  Load(18, DrawPatches(Drawn));
+  Load(17, blank);
+  EXPECT_EQ(-91, TestCameraCapture(false));
+  EXPECT_EQ("[TestCameraCapture] TestCameraCapture2 finder point : 0 \n return PATTERN NOT FOUND!",
+            LogLines::Texts().back());
+  EXPECT_TRUE(theTester->standard_main_.is_extracted);
+  Load(17, cv::Mat(50, 50, CV_16UC3, cv::Scalar::all(9)));
+  EXPECT_EQ(-95, TestCameraCapture(false));
+  EXPECT_EQ(0, Main().capture_lab_count_);
+}
+
+TEST_F(Capture, TooFewPatchesAreAFailure) {
+  // Marks so near the right border that the ring's right side lies outside: 18 patches; then the left and the top too.
+  cv::Mat photo = DrawPatches(Drawn);
+  Load(17, photo);
+  ASSERT_EQ(1, TestCameraCapture(false));
+  Load(17, photo(cv::Rect(0, 0, 885, 1000)).clone());  // 848 + half of 33 is inside, straightened on a square of 1000
+  EXPECT_EQ(1, TestCameraCapture(false));
+  const float before = Main().capture_lab_[0];
+  Load(17, photo(cv::Rect(116, 116, 884, 884)).clone());  // the top row's patches begin at -1
+  EXPECT_EQ(1, TestCameraCapture(false));
+  Load(17, photo(cv::Rect(116, 119, 884, 881)).clone());
+  EXPECT_EQ(-87, TestCameraCapture(false));
+  EXPECT_EQ(before, Main().capture_lab_[0]);
+  EXPECT_EQ(4, Main().capture_lab_count_);
+}
+
+}  // namespace

@@ -1,0 +1,136 @@
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <random>
+
+#include "qvtester/tester.h"
+
+namespace {
+
+using Buffer = std::unique_ptr<float, decltype(&std::free)>;
+
+float Temperature(float x, float y) {
+  QVTester tester;
+  float xyz[] = {x, y, 1 - x - y};
+  return *Buffer(tester.xyz2cct(xyz, 1, 1), &std::free);
+}
+
+TEST(Colour, TheTransferFunctionIsThatOfSrgb) {
+  QVTester tester;
+  EXPECT_EQ(0.0f, tester.GetLinearRGB(0));
+  EXPECT_EQ(1.0f, tester.GetLinearRGB(255));
+  EXPECT_FLOAT_EQ(10 / 255.0f / 12.92f, tester.GetLinearRGB(10)) << "the straight part";
+  EXPECT_NEAR(0.21586, tester.GetLinearRGB(128), 5e-6);  // published tables of sRGB
+  EXPECT_NEAR(0.0033465, tester.GetLinearRGB(11), 5e-7);
+  for (int v = 1; v < 256; ++v) EXPECT_GT(tester.GetLinearRGB(v), tester.GetLinearRGB(v - 1));
+}
+
+TEST(Colour, PrimariesAndWhiteAreThoseOfD65) {
+  QVTester tester;
+  float X = 0;
+  float Y = 0;
+  float Z = 0;
+  tester.ConvertRGB2XYZ(255, 255, 255, X, Y, Z);
+  EXPECT_NEAR(0.9505f, X, 1e-6f);
+  EXPECT_NEAR(1.0f, Y, 1e-6f);
+  EXPECT_NEAR(1.089f, Z, 1e-6f);
+  tester.ConvertRGB2XYZ(255, 0, 0, X, Y, Z);
+  EXPECT_EQ(0.4124f, X);
+  EXPECT_EQ(0.0193f, Z);
+  tester.ConvertRGB2XYZ(0, 0, 255, X, Y, Z);
+  EXPECT_EQ(0.0722f, Y);
+}
+
+TEST(Colour, TheCompanionFunctionSwitchesAtEpsilon) {
+  QVTester tester;
+  EXPECT_EQ(1.0f, tester.GetFValue(1));
+  EXPECT_FLOAT_EQ(0.5f, tester.GetFValue(0.125f));
+  EXPECT_FLOAT_EQ(16 / 116.0f, tester.GetFValue(0));
+  const float epsilon = 0.008856452f;
+  const auto straight = static_cast<float>((static_cast<double>(24389.0f / 27.0f * epsilon) + 16) / 116);
+  EXPECT_EQ(straight, tester.GetFValue(epsilon));
+  EXPECT_EQ(static_cast<float>(std::cbrt(static_cast<double>(0.0089f))), tester.GetFValue(0.0089f));
+}
+
+TEST(Colour, LabIsRelativeToUnityWhateverTheWhite) {
+  QVTester tester;
+  float L = 0;
+  float a = 0;
+  float b = 0;
+  for (const float white : {1.0f, 0.5f, 0.0f}) {
+    tester.ConvertXYZ2LAB(0.9505f, 1, 1.089f, white, white, white, L, a, b);
+    EXPECT_FLOAT_EQ(100, L);
+    EXPECT_NEAR(500 * (std::cbrt(0.9505) - 1), a, 1e-4);
+    EXPECT_NEAR(200 * (1 - std::cbrt(1.089)), b, 1e-4);
+  }
+}
+
+TEST(Colour, TheMatrixIsAppliedAsOpenCvMultiplies) {
+  QVTester tester;
+  std::mt19937 random(3);
+  std::uniform_real_distribution<float> any(-2, 2);
+  constexpr int kPixels = 3000;
+  std::vector<float> rgb(3 * kPixels);
+  for (float& value : tester.prop_color_matrix_) value = any(random);
+  for (float& value : rgb) value = 100 * any(random);
+  const float odd[] = {0.0f, -0.0f, 1e38f, -1e38f, INFINITY, NAN};
+  for (std::size_t i = 0; i < 300; ++i) rgb[i] = odd[random() % std::size(odd)];
+  const Buffer xyz(tester.rgb2xyz(rgb.data(), kPixels / 100, 100), &std::free);
+  const cv::Mat matrix(3, 3, CV_32F, tester.prop_color_matrix_);
+  for (int i = 0; i < kPixels; ++i) {
+    const cv::Mat product = matrix * cv::Mat(3, 1, CV_32F, rgb.data() + 3 * i);
+    for (int k = 0; k < 3; ++k) {
+      const float expected = product.at<float>(k);
+      const float got = xyz.get()[3 * i + k];
+      if (std::isnan(expected) && std::isnan(got)) continue;  // which NaN is the compiler's choice
+      ASSERT_EQ(0, std::memcmp(&expected, &got, sizeof(float))) << "pixel " << i << ": " << expected << ", " << got;
+    }
+  }
+}
+
+struct Illuminant {
+  const char* name;
+  float x, y;
+  double kelvin;
+};
+
+TEST(Colour, TemperaturesOfIlluminantsArePublished) {  // CIE 15 and the Planckian locus
+  for (const Illuminant& light : {Illuminant{"A", 0.44757f, 0.40745f, 2856},
+                                  {"D50", 0.34567f, 0.35850f, 5003},
+                                  {"D65", 0.31271f, 0.32902f, 6504},
+                                  {"D75", 0.29902f, 0.31485f, 7504},
+                                  {"F2", 0.37208f, 0.37529f, 4230},
+                                  {"2000 K", 0.5267f, 0.4133f, 2000},
+                                  {"1500 K", 0.5857f, 0.3931f, 1500},
+                                  {"25000 K", 0.2525f, 0.2522f, 25000}}) {
+    EXPECT_NEAR(light.kelvin, Temperature(light.x, light.y), 0.005 * light.kelvin)
+        << light.name;  // the fit's own error
+  }
+}
+
+TEST(Colour, TemperaturesEndWhereTheFitsDo) {
+  QVTester tester;
+  EXPECT_EQ(0.0f, Temperature(0.6101f, 0.38f));
+  EXPECT_GT(Temperature(0.61f, 0.38f), 0.0f);
+  EXPECT_EQ(0.0f, Temperature(0.0f, 0.5f));
+  EXPECT_EQ(0.0f, Temperature(0.1f, 0.1f)) << "s is negative";
+  EXPECT_EQ(0.0f, Temperature(0.2f, 0.4f)) << "exactly 5550 is no answer";
+  float black[] = {0, 0, 0};
+  float nothing[] = {NAN, 1, 1};
+  float opposite[] = {1, -1, 0};
+  for (float* xyz : {black, nothing, opposite}) EXPECT_EQ(0.0f, *Buffer(tester.xyz2cct(xyz, 1, 1), &std::free));
+  // x = 0.331 in single precision belongs to the cool side: sums that are exact, so that x is the quotient itself.
+  EXPECT_NEAR(Temperature(0.331f, 0.34f), Temperature(0.33f, 0.34f), 60);
+}
+
+TEST(Colour, BuffersTooLargeAreNull) {
+  QVTester tester;
+  float pixel[3] = {};
+  EXPECT_EQ(nullptr, tester.rgb2xyz(pixel, 1 << 30, 1 << 30));
+  EXPECT_EQ(nullptr, tester.xyz2cct(pixel, 1 << 30, 1 << 30));
+}
+
+}  // namespace

@@ -1,0 +1,179 @@
+#include <gmock/gmock.h>
+
+#include <numeric>
+#include <opencv2/imgproc.hpp>
+
+#include "qvtester/api.h"
+#include "qvtester/host_properties.h"
+#include "qvtester/tester.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::Not;
+
+// A plain photo with dark discs of this diameter.
+cv::Mat DrawDust(const std::vector<cv::Point>& places, int diameter = 9, int level = 180) {
+  cv::Mat photo(480, 640, CV_8UC3, cv::Scalar::all(level));
+  for (const cv::Point& place : places) cv::circle(photo, place, diameter / 2, cv::Scalar::all(60), cv::FILLED);
+  return photo;
+}
+
+class Dust : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    InitTestModule();
+    SetHostPropertyStore(store_.c_str());
+  }
+  void TearDown() override {
+    FinalizeTestModule();
+    SetHostPropertyStore(nullptr);
+  }
+  static int Measure(const cv::Mat& photo, bool front = false, bool fake_mode = false) {
+    const int slot = front ? 26 : 19;
+    theTester->resources_[slot] = std::make_unique<QVResource>();
+    theTester->resources_[slot]->SetImage(photo);
+    return RunTest(front ? QV_TEST_LENS_DUST_2 : QV_TEST_LENS_DUST, fake_mode);
+  }
+  static QVResultData& Results() {
+    QVResultData* results = nullptr;
+    GetResult(&results);
+    return *results;
+  }
+  std::string Property(const std::string& key) const { return ReadFile(store_ + "/" + key); }
+
+  TemporaryFolder folder_;
+  std::string store_ = folder_.Path("properties");
+  LogLines log_;
+};
+
+TEST_F(Dust, SpecksAreCountedAndPublished) {
+  SetStep(7);
+  ASSERT_EQ(1, Measure(DrawDust({{100, 300}, {400, 120}})));
+  EXPECT_EQ(2, Results().dust_blob_count_main_);
+  EXPECT_EQ("[100,300][400,120]", Property("t82.vi7_mung_loc"));
+  EXPECT_THAT(LogLines::Texts(), Contains("[detectBlob] means: 179.96"));
+  EXPECT_THAT(LogLines::Texts(), Contains("[detectBlob] 2 blobs!!!"));
+  EXPECT_THAT(LogLines::Texts(), Contains("[detectBlob] blob(0) point: (100.00, 300.00)"));
+
+  const LogLines log;
+  ASSERT_EQ(1, Measure(DrawDust({})));
+  EXPECT_EQ(0, Results().dust_blob_count_main_);
+  EXPECT_EQ("", Property("t82.vi7_mung_loc"));
+  EXPECT_THAT(LogLines::Texts(),
+              ElementsAre("[OKAPI] RunTest, testindex: 17, fake_mode: 0, step: 7", "[TestLensDust] fake_mode: 0",
+                          "[detectBlob] means: 180.00", "[detectBlob] dj_check1", "[detectBlob] dj_check2",
+                          "[detectBlob] no mung."));
+}
+
+TEST_F(Dust, FivePlacesAreEnough) {
+  std::vector<cv::Point> places;
+  for (int i = 0; i < 7; ++i) places.emplace_back(80 + 70 * i, 200);
+  ASSERT_EQ(1, Measure(DrawDust(places)));
+  EXPECT_EQ(5, Results().dust_blob_count_main_);
+  const std::string published = Property("t82.vi0_mung_loc");
+  EXPECT_EQ(5, std::count(published.begin(), published.end(), '['));
+  EXPECT_THAT(LogLines::Texts(), Contains("[detectBlob] enough!!!! too many mungs!!!").Times(1));
+}
+
+TEST_F(Dust, OnlyTheCornersAreLeftOut) {
+  EXPECT_TRUE(theTester->isValidLocation(640, 480, {10, 300}));
+  EXPECT_TRUE(theTester->isValidLocation(640, 480, {21, 20}));
+  EXPECT_FALSE(theTester->isValidLocation(640, 480, {20, 20}));
+  EXPECT_FALSE(theTester->isValidLocation(640, 480, {10, 470}));
+  EXPECT_FALSE(theTester->isValidLocation(640, 480, {620, 460}));
+  EXPECT_TRUE(theTester->isValidLocation(640, 480, {619.5f, 460}));
+  EXPECT_EQ("[isValidLocation] invalid location!! x: 620.00, y: 460.00", LogLines::Texts().back());
+  ASSERT_EQ(1, Measure(DrawDust({{12, 12}, {12, 240}})));
+  EXPECT_EQ("[12,240]", Property("t82.vi0_mung_loc"));
+  ASSERT_EQ(1, Measure(DrawDust({{12, 12}})));
+  EXPECT_EQ(0, Results().dust_blob_count_main_);
+  EXPECT_EQ("[detectBlob] no mung.", LogLines::Texts().back());
+}
+
+TEST_F(Dust, TheSearchSeesSizesAndLevelsAsTuned) {
+  const auto count = [](const cv::Mat& photo) {
+    EXPECT_EQ(1, Measure(photo));
+    return Results().dust_blob_count_main_;
+  };
+  EXPECT_EQ(0, count(DrawDust({{300, 200}}, 3))) << "under 20 pixels";
+  for (const int diameter : {7, 9, 13}) EXPECT_EQ(1, count(DrawDust({{300, 200}}, diameter))) << diameter;
+  EXPECT_EQ(0, count(DrawDust({{300, 200}}, 31))) << "hollow in the binary picture";
+  EXPECT_EQ(0, count(DrawDust({{300, 200}}, 9, 124))) << "too dark a photo to see any";
+  EXPECT_EQ(0, count(DrawDust({{0, 200}}, 21))) << "one with the frame";
+}
+
+TEST_F(Dust, FakeModeLeavesTheBlobsOut) {
+  ASSERT_EQ(1, Measure(DrawDust({{100, 300}})));
+  ASSERT_EQ(1, Measure(DrawDust({}), false, true));
+  EXPECT_EQ(-1, Results().dust_blob_count_main_);
+  EXPECT_EQ("[100,300]", Property("t82.vi0_mung_loc"));
+  EXPECT_EQ(480 * 640, Results().dust_hist_main_[180]);
+  cv::Mat deep(20, 20, CV_16UC3, cv::Scalar::all(200));
+  EXPECT_EQ(-95, Measure(deep));
+  EXPECT_EQ(1, Measure(deep, false, true));
+  EXPECT_EQ(400, Results().dust_hist_main_[200]);
+}
+
+TEST_F(Dust, HistogramsAreComparedWithTheCamerasReference) {
+  std::array<int, 256> reference = {};
+  reference[180] = 480 * 640 - 50;
+  reference[3] = 7;
+  ASSERT_EQ(1, Measure(DrawDust({}), true));
+  EXPECT_EQ(0, Results().dust_hist_diff_front_) << "no reference, no difference";
+  SetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, reference.data());
+  ASSERT_EQ(1, Measure(DrawDust({}), true));
+  EXPECT_EQ(57, Results().dust_hist_diff_front_);
+  reference[3] = 107;
+  ASSERT_EQ(1, Measure(DrawDust({}), true));
+  EXPECT_EQ(157, Results().dust_hist_diff_front_) << "the table is the caller's";
+  EXPECT_EQ(nullptr, Results().dust_hist_main_);
+  reference.fill(INT_MIN);
+  ASSERT_EQ(1, Measure(DrawDust({}), true));
+  const int* held = Results().dust_hist_front_;
+  EXPECT_EQ(480 * 640, std::accumulate(held, held + 256, 0));
+}
+
+TEST_F(Dust, LongPublicationsStayWholeItems) {
+  for (int i = 0; i < 30; ++i) theTester->save_mung_location({1000.0f + static_cast<float>(i), 2000}, 3);
+  const std::string published = Property("t82.vi3_mung_loc");
+  EXPECT_EQ(88u, published.size());  // eight items of eleven characters; a ninth would pass 91
+  EXPECT_EQ("[1007,2000]", published.substr(77));
+  theTester->save_mung_location({3e38f, -3e38f}, 3);
+  EXPECT_EQ(published, Property("t82.vi3_mung_loc"));
+  theTester->remove_mung_location(3);
+  EXPECT_EQ("", Property("t82.vi3_mung_loc"));
+  theTester->save_mung_location({0.5f, 1.5f}, -2147483647);
+  EXPECT_EQ("[0,2]", Property("t82.vi-2147483647_mung_loc"));
+}
+
+TEST_F(Dust, DarkPixelsAreCountedInTwoRegions) {
+  cv::Mat gray(100, 100, CV_8UC1, cv::Scalar(200));
+  gray(cv::Rect(10, 10, 3, 4)).setTo(20);
+  gray(cv::Rect(50, 50, 40, 40)).setTo(120);  // dim, not dark
+  EXPECT_EQ(12, theTester->detectMung(gray, {0, 0, 50, 100}, {50, 0, 50, 100}));
+  EXPECT_THAT(
+      LogLines::Texts(),
+      ElementsAre("[detectMung] gray_mean: 186.98", "[detectMung] total_pixels: 10000(100, 100), black_pixels: 12",
+                  "[detectMung] (roi1) total_pixels: 5000, black_pixels: 12",
+                  "[detectMung] (roi2) total_pixels: 5000, black_pixels: 0", "[detectMung] detecting black pixel!!!"));
+  EXPECT_EQ(0, theTester->detectMung(gray, {50, 0, 50, 100}, {50, 50, 50, 50}));
+  EXPECT_EQ("[detectMung] no black pixel.", LogLines::Texts().back());
+  EXPECT_THROW(theTester->detectMung(gray, {0, 0, 101, 10}, {0, 0, 1, 1}), cv::Exception);
+}
+
+TEST_F(Dust, BlobsAreDrawnWhenAskedFor) {
+  EXPECT_TRUE(theTester->DrawBlobs().empty());
+  ASSERT_EQ(1, Measure(DrawDust({{100, 300}})));
+  EXPECT_TRUE(theTester->blob_drawing_.empty());
+  const cv::Mat drawing = theTester->DrawBlobs();
+  ASSERT_EQ(CV_8UC3, drawing.type());
+  int blue = 0;
+  for (const auto& pixel : cv::Mat_<cv::Vec3b>(drawing)) blue += pixel[0] > pixel[2] + 50 ? 1 : 0;
+  EXPECT_GT(blue, 10);
+}
+
+}  // namespace

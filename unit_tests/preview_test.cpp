@@ -1,0 +1,200 @@
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cmath>
+#include <filesystem>
+#include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
+
+#include "qvtester/api.h"
+#include "qvtester/host_properties.h"
+#include "qvtester/tester.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+
+class Preview : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    InitTestModule();
+    SetHostPropertyStore(store_.c_str());
+    SetHostPreviewFolder(folder_.Path("").c_str());
+  }
+  void TearDown() override {
+    FinalizeTestModule();
+    SetHostPropertyStore(nullptr);
+    SetHostPreviewFolder(nullptr);
+  }
+  static void Load(int slot, const cv::Mat& image) {
+    theTester->resources_[slot] = std::make_unique<QVResource>();
+    theTester->resources_[slot]->SetImage(image);
+  }
+  std::string Property(const std::string& key) const { return ReadFile(store_ + "/" + key); }
+  static QVResultData& Results() {
+    QVResultData* results = nullptr;
+    GetResult(&results);
+    return *results;
+  }
+
+  TemporaryFolder folder_;
+  std::string store_ = folder_.Path("properties");
+  LogLines log_;
+};
+
+TEST_F(Preview, TheDifferenceIsMeasuredAndScaled) {
+  cv::Mat first(2, 3, CV_8UC3, cv::Scalar::all(100));
+  cv::Mat second = first.clone();
+  second.at<cv::Vec3b>(0, 1) = {49, 49, 49};
+  second.at<cv::Vec3b>(1, 2) = {202, 202, 202};
+  Load(14, first);
+  Load(15, second);
+  ASSERT_EQ(1, RunTest(QV_TEST_CAMERA_PREVIEW, false));
+  const QVPreviewResult& result = Results().preview_main_;
+  EXPECT_EQ(3, result.preview_diff_cols_);
+  EXPECT_EQ(2, result.preview_diff_rows_);
+  EXPECT_FLOAT_EQ((51 + 102) / 255.0f / 6, result.preview_diff_mean_);
+  EXPECT_THAT(std::vector<float>(result.preview_diff_map_, result.preview_diff_map_ + 6),
+              ElementsAre(0, 0.5f, 0, 0, 0, 1));
+  EXPECT_EQ(nullptr, Results().preview_front_.preview_diff_map_);
+
+  Load(15, cv::Mat(2, 4, CV_8UC3, cv::Scalar(1)));
+  const LogLines log;
+  EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_PREVIEW, false));
+  EXPECT_EQ("[OKAPI] image size does not match", LogLines::Texts().back());
+  EXPECT_EQ(3, Results().preview_main_.preview_diff_cols_);
+}
+
+TEST_F(Preview, IdenticalFramesGiveNoNumbers) {
+  cv::Mat frame(4, 4, CV_8UC4, cv::Scalar::all(77));
+  Load(21, frame);
+  Load(22, frame);
+  for (int run = 0; run < 2; ++run) {
+    ASSERT_EQ(1, RunTest(QV_TEST_CAMERA_PREVIEW_2, false));
+    const QVPreviewResult& result = Results().preview_front_;
+    EXPECT_EQ(0.0f, result.preview_diff_mean_);
+    for (int i = 0; i < 16; ++i) EXPECT_TRUE(std::isnan(result.preview_diff_map_[i]));
+  }
+  Load(22, cv::Mat(4, 4, CV_16UC3, cv::Scalar::all(77)));
+  EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_PREVIEW_2, false)) << "frames of different depths";
+}
+
+TEST_F(Preview, ThreeMarksArePublished) {
+  EXPECT_EQ(-98, CheckPatternCircles(0));
+  Load(17, DrawChart());
+  EXPECT_EQ(1, CheckPatternCircles(0));
+  EXPECT_EQ("3", Property("t82.vi_c_num_main"));
+  EXPECT_EQ("151,151", Property("t82.vi_circle_loc_0_0"));
+  EXPECT_EQ("151,848", Property("t82.vi_circle_loc_0_1"));
+  EXPECT_EQ("848,151", Property("t82.vi_circle_loc_0_2"));
+  EXPECT_EQ("499,499", Property("t82.vi_center_loc_0"));
+  EXPECT_THAT(LogLines::Texts(), Contains("[CheckPatternCircles] binary_image.rows :1000 binary_image.cols : 1000"));
+  EXPECT_EQ("[CheckPatternCircles]Find 3Circles in Preview!!", LogLines::Texts().back());
+  EXPECT_EQ(1, CheckPatternCircles(2));
+  EXPECT_EQ("3", Property("t82.vi_c_num_mw"));
+  EXPECT_EQ("499,499", Property("t82.vi_center_loc_2"));
+
+  ChartView two;
+  two.marks = 2;
+  Load(17, DrawChart(two));
+  EXPECT_EQ(0, CheckPatternCircles(0));
+  EXPECT_EQ("2", Property("t82.vi_c_num_main"));
+  EXPECT_EQ("0,0", Property("t82.vi_center_loc_0"));
+  EXPECT_EQ("848,151", Property("t82.vi_circle_loc_0_2")) << "points of an earlier run are not cleared";
+  EXPECT_EQ("[CheckPatternCircles]Cannot find 3Circles in Preview!!", LogLines::Texts().back());
+}
+
+TEST_F(Preview, OtherCamerasPublishNothing) {
+  Load(17, DrawChart());
+  EXPECT_EQ(1, CheckPatternCircles(1));
+  EXPECT_FALSE(std::filesystem::exists(store_));
+  Load(17, cv::Mat(20, 20, CV_16UC3, cv::Scalar::all(9)));
+  EXPECT_EQ(-95, CheckPatternCircles(0));
+}
+
+TEST_F(Preview, TheCentreIsTheMiddleOfTheLongestSide) {
+  std::vector<cv::Point> points = {{0, 0}, {0, 10}, {-11, 10}};
+  const LogLines log;
+  EXPECT_EQ(0, theTester->GetImageCenter(points, 0));
+  EXPECT_EQ("-5,5", Property("t82.vi_center_loc_0")) << "cut toward zero";
+  EXPECT_THAT(
+      LogLines::Texts(),
+      ElementsAre("[GetImageCenter] Calculate center point number : 3, cam_id : 0",
+                  "[GetImageCenter] 0th temp_length : 10.000000, cal_length : 10.000000, x : 0, y : 0, final x : "
+                  "0, final y : 5",
+                  "[GetImageCenter] 1th temp_length : 11.000000, cal_length : 11.000000, x : 0, y : 10, final x "
+                  ": -5, final y : 10",
+                  "[GetImageCenter] 2th temp_length : 14.866069, cal_length : 14.866069, x : -11, y : 10, final "
+                  "x : -5, final y : 5"));
+  points = {{0, 0}, {0, 10}, {10, 10}};
+  points[2] = {0, 20};  // two sides of 10, one of 20
+  theTester->GetImageCenter(points, 0);
+  EXPECT_EQ("0,10", Property("t82.vi_center_loc_0"));
+  points = {{0, 0}, {6, 8}, {0, 16}};
+  points[2] = {-6, 8};  // 10, 12, 10
+  theTester->GetImageCenter(points, 0);
+  EXPECT_EQ("0,8", Property("t82.vi_center_loc_0"));
+  points = {{0, 0}, {0, 10}, {8, 5}, {4, 2}};
+  theTester->GetImageCenter(points, 0);
+  EXPECT_EQ("0,0", Property("t82.vi_center_loc_0")) << "four points have no centre";
+  EXPECT_EQ("4,2", Property("t82.vi_circle_loc_0_3"));
+  points.clear();
+  EXPECT_EQ(0, theTester->GetImageCenter(points, 2));
+  EXPECT_EQ("0,0", Property("t82.vi_center_loc_2"));
+}
+
+TEST_F(Preview, LongKeysAreCutNotOverrun) {
+  std::vector<cv::Point> points = {{INT_MIN, INT_MIN}};
+  theTester->GetImageCenter(points, INT_MIN);
+  EXPECT_EQ("-2147483648,-2147483648", Property("t82.vi_circle_loc_-2147483648_0"));
+  EXPECT_EQ("0,0", Property("t82.vi_center_loc_-2147483648"));
+  points.assign(11, {4, 5});
+  points[10] = {6, 7};
+  theTester->GetImageCenter(points, INT_MIN);
+  EXPECT_EQ("6,7", Property("t82.vi_circle_loc_-2147483648_1")) << "the last digit of 10 has no room";
+}
+
+TEST_F(Preview, SavedFramesShareAFileByThrees) {
+  std::vector<unsigned char> frame(64 * 72, 128);
+  for (const int number : {0, 2, 3, 5}) EXPECT_EQ(1, SavePreview(frame.data(), number, 64, 48));
+  EXPECT_EQ(cv::Size(64, 48), cv::imread(folder_.Path("vi_pview_0.jpg")).size());
+  EXPECT_EQ(cv::Size(64, 48), cv::imread(folder_.Path("vi_pview_1.jpg")).size());
+  EXPECT_FALSE(std::filesystem::exists(folder_.Path("vi_pview_2.jpg")));
+  EXPECT_EQ(-95, SavePreview(frame.data(), 0, 63, 48));
+  EXPECT_EQ(-97, SavePreview(nullptr, 0, 64, 48));
+  EXPECT_EQ(-97, SavePreview(frame.data(), 0, 0, 48));
+  SetHostPreviewFolder(folder_.Path("missing").c_str());
+  EXPECT_EQ(1, SavePreview(frame.data(), 0, 64, 48)) << "a failed write is silent";
+  SetHostPreviewFolder(std::string(200, 'x').c_str());
+  EXPECT_EQ(1, SavePreview(frame.data(), 0, 64, 48));
+}
+
+TEST_F(Preview, TheStoreRefusesWhatIsNotItsOwn) {
+  EXPECT_EQ(-97, SetHostPropertyStore(""));
+  std::filesystem::create_directory(folder_.Path("real"));
+  std::filesystem::create_directory_symlink(folder_.Path("real"), folder_.Path("link"));
+  SetHostPropertyStore(folder_.Path("link").c_str());
+  Load(17, DrawChart());
+  EXPECT_EQ(1, CheckPatternCircles(0)) << "publishing is nobody's failure";
+  EXPECT_TRUE(std::filesystem::is_empty(folder_.Path("real")));
+
+  SetHostPropertyStore(store_.c_str());
+  EXPECT_EQ(1, CheckPatternCircles(0));
+  struct stat status = {};
+  ASSERT_EQ(0, stat(store_.c_str(), &status));
+  EXPECT_EQ(0700u, status.st_mode & 0777u);
+  if (geteuid() == 0) {
+    ASSERT_EQ(0, chown(store_.c_str(), 12345, 12345));
+    std::filesystem::remove(store_ + "/t82.vi_c_num_main");
+    EXPECT_EQ(1, CheckPatternCircles(0));
+    EXPECT_FALSE(std::filesystem::exists(store_ + "/t82.vi_c_num_main"));
+  }
+}
+
+}  // namespace

@@ -1,0 +1,55 @@
+#include <gmock/gmock.h>
+
+#include <filesystem>
+
+#include "platform/properties.h"
+#include "qvtester/host_properties.h"
+#include "unit_tests/drawing.h"
+
+namespace {
+
+class Store : public ::testing::Test {
+ protected:
+  void SetUp() override { SetHostPropertyStore(folder_.Path("p").c_str()); }
+  void TearDown() override { SetHostPropertyStore(nullptr); }
+  static std::string Get(const char* key, const char* fallback = "") {
+    char value[platform::kPropertyValueMax];
+    const int length = platform::property_get(key, value, fallback);
+    EXPECT_EQ(static_cast<std::size_t>(length), std::string(value).size());
+    return value;
+  }
+  TemporaryFolder folder_;
+};
+
+TEST_F(Store, ValuesUpToNinetyOneBytesAreKept) {
+  EXPECT_EQ("none", Get("a.key", "none"));
+  const std::string longest(91, 'v');
+  EXPECT_EQ(0, platform::property_set("a.key", longest.c_str()));
+  EXPECT_EQ(longest, Get("a.key"));
+  EXPECT_EQ(longest, ReadFile(folder_.Path("p/a.key"))) << "the bare value, for `cat`";
+  EXPECT_GT(0, platform::property_set("a.key", std::string(92, 'w').c_str()));
+  EXPECT_EQ(longest, Get("a.key"));
+  EXPECT_EQ(0, platform::property_set("a.key", ""));
+  EXPECT_EQ("default", Get("a.key", "default")) << "an empty value gives the default";
+  EXPECT_EQ(std::string(91, 'd'), Get("b.key", std::string(200, 'd').c_str()));
+}
+
+TEST_F(Store, KeysStayInTheirDirectory) {
+  folder_.Write("outside", std::string("secret"));
+  for (const char* key : {"../outside", "a/b", "..", ".", "", "/etc/passwd", ".fresh-1"}) {
+    EXPECT_GT(0, platform::property_set(key, "x")) << key;
+    EXPECT_EQ("", Get(key)) << key;
+  }
+  EXPECT_EQ("secret", ReadFile(folder_.Path("outside")));
+  EXPECT_EQ(0, platform::property_set("a..b c%d", "odd but harmless"));
+  EXPECT_EQ("odd but harmless", Get("a..b c%d"));
+  EXPECT_GT(0, platform::property_set(std::string(5000, 'k').c_str(), "x"));
+}
+
+TEST_F(Store, NothingIsLeftBesideTheKeys) {
+  for (int i = 0; i < 10; ++i) platform::property_set("k", std::to_string(i).c_str());
+  const std::filesystem::directory_iterator files(folder_.Path("p"));
+  EXPECT_EQ(1, std::distance(begin(files), end(files)));
+}
+
+}  // namespace
