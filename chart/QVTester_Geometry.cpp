@@ -51,7 +51,7 @@ float QVTester::GetPatternAngle(std::vector<cv::Point> points) {
     sum_col += static_cast<float>(point.y - k.y);
   }
   // The sum in single precision and both cut constants decide on which side of a whole degree a boundary case falls.
-  const float turned = std::atan2(sum_row, sum_col) + 6.283184f;
+  const auto turned = static_cast<float>(std::atan2(sum_row, sum_col) + 6.283184);
   const double degrees = turned / 3.141592 * 180.0;
   return static_cast<float>(static_cast<int>(degrees) % 360);
 }

@@ -5,6 +5,8 @@
 #include <cmath>
 #include <opencv2/core.hpp>
 
+#include "chart/points.h"
+
 // Geometry of the sharpness chart, in chart units; the origin is the centre of the corner mark (top left on the upright
 // chart), x to the right, y down. What measures the chart, draws it or simulates it reads it here.
 
@@ -100,6 +102,29 @@ constexpr bool PatchesKeepOffTheThreshold() {
 }
 static_assert(PatchesKeepOffTheThreshold(), "specks near the default threshold of 125 pass for marks");
 
+/// Where the patches are sampled on an upright picture, in sampling order: rows and columns within `half` of a centre.
+struct PatchGrid {
+  int half;
+  std::array<cv::Point, 24> centres;  // row in x, column in y
+};
+
+/// From corner, second and third mark (row in x, column in y). One pitch serves all four sides.
+inline PatchGrid PlacePatches(cv::Point corner, cv::Point second, cv::Point third) {
+  const int pitch = (second.y - corner.y) / 7;
+  PatchGrid grid = {static_cast<int>(Distance(corner, second)) / 21, {}};
+  for (int i = 0; i < 24; ++i) {
+    const int along = (i % 6 + 1) * pitch;
+    switch (i / 6) {
+      case 0: grid.centres[i] = {corner.x, corner.y + along}; break;
+      case 1: grid.centres[i] = {third.x, corner.y + along}; break;
+      case 2: grid.centres[i] = {corner.x + along, corner.y}; break;
+      default: grid.centres[i] = {corner.x + along, second.y}; break;
+    }
+  }
+  return grid;
+}
+
+/// Middle of a patch in chart units.
 inline cv::Point2d PatchCentre(int number) {
   const double along = (number % 6 + 1) * kChartSide / 7.0;
   switch (number / 6) {

@@ -68,7 +68,7 @@ cv::Mat CentredLineSpread(QVTester& tester, const cv::Mat& esf, float* fil) {
   cv::Mat lsf;
   tester.GetFirstDerivative(row, 1, npix, fil, 3, lsf);
   cv::transpose(lsf, lsf);
-  const float mid = tester.GetCentroid(lsf) + 0.5f;
+  const double mid = tester.GetCentroid(lsf) + 0.5;
   // Without a finite centre there is nothing to move to: all moves out of view, and the response is 0 / 0.
   lsf = tester.GetShiftedArray(lsf, std::fabs(mid) < kBeyondAnyArray ? static_cast<int>(mid) : 2 * npix);
   return lsf.mul(tester.GetAHammingWindow(npix, static_cast<float>(npix + 1) * 0.5f));

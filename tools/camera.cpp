@@ -5,6 +5,7 @@
 #include <memory>
 #include <opencv2/imgproc.hpp>
 
+#include "tools/method_law.h"
 #include "tools/program.h"
 
 namespace {
@@ -12,29 +13,28 @@ namespace {
 constexpr int kBandRows = 128;          // of the photo, drawn and blurred at a time
 constexpr double kReach = 5;            // sigmas to which a Gaussian is carried
 constexpr double kSmallestSigma = 1.2;  // in subpixels: a sampled Gaussian narrower than this is not the continuous one
+constexpr double kDistance = 2.5;       // of the camera from the scene's plane, in sides of the scene
 
-// Subpixels a side, so that the blur is well sampled and the drawing's own smoothing does not show.
-int Subpixels(double blur_px) {
-  if (blur_px <= 0) return 4;
-  return std::clamp(static_cast<int>(std::ceil(kSmallestSigma / blur_px)), 2, 8);
+// Subpixels a side, so that every blur is well sampled and the drawing's own smoothing does not show.
+int Subpixels(const CameraModel& camera) {
+  if (camera.defocus_px > 0 || cv::norm(camera.smear_px) > 0) return 4;
+  if (camera.blur_px <= 0) return 4;
+  return std::clamp(static_cast<int>(std::ceil(kSmallestSigma / camera.blur_px)), 2, 8);
 }
 
-// Rows [first, first + rows) of the scene at `subpixels` a pixel, CV_32FC3 in BGR; each value a mean over its subpixel.
-cv::Mat DrawBand(const Scene& scene, const cv::Matx33d& photo_from_scene, int width, int first, int rows,
-                 int subpixels) {
+// A band of the scene at `subpixels` a pixel, CV_32FC3 in BGR; each value a mean over its subpixel.
+cv::Mat DrawBand(const Scene& scene, const cv::Matx33d& band_from_scene, cv::Size size) {
   const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface(
-      cairo_image_surface_create(CAIRO_FORMAT_RGB24, width, rows), cairo_surface_destroy);
+      cairo_image_surface_create(CAIRO_FORMAT_RGB24, size.width, size.height), cairo_surface_destroy);
   const std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr(cairo_create(surface.get()), cairo_destroy);
   if (cairo_status(cr.get()) != CAIRO_STATUS_SUCCESS) throw Failure(kInternalFault, "no memory to draw the scene");
   cairo_set_antialias(cr.get(), CAIRO_ANTIALIAS_BEST);
   cairo_set_source_rgb(cr.get(), scene.paper[0] / 255, scene.paper[1] / 255, scene.paper[2] / 255);
   cairo_paint(cr.get());
-  const double s = subpixels;
-  const cv::Matx33d band_from_photo(s, 0, s * 0.5, 0, s, s * 0.5 - first, 0, 0, 1);
-  Fill(cr.get(), scene, band_from_photo * photo_from_scene);
+  Fill(cr.get(), scene, band_from_scene);
   cairo_surface_flush(surface.get());
 
-  const cv::Mat drawn(rows, width, CV_8UC4, cairo_image_surface_get_data(surface.get()),
+  const cv::Mat drawn(size, CV_8UC4, cairo_image_surface_get_data(surface.get()),
                       static_cast<std::size_t>(cairo_image_surface_get_stride(surface.get())));
   cv::Mat levels;
   cv::cvtColor(drawn, levels, cv::COLOR_BGRA2BGR);
@@ -42,57 +42,142 @@ cv::Mat DrawBand(const Scene& scene, const cv::Matx33d& photo_from_scene, int wi
   return levels;
 }
 
-}  // namespace
-
-cv::Matx33d PhotoFromScene(const CameraModel& camera, const cv::Rect2d& bounds) {
-  const double angle = camera.turn_deg * CV_PI / 180;
-  const double wide = bounds.width * std::fabs(std::cos(angle)) + bounds.height * std::fabs(std::sin(angle));
-  const double high = bounds.width * std::fabs(std::sin(angle)) + bounds.height * std::fabs(std::cos(angle));
-  const double scale = camera.fill * std::min(camera.size.width / wide, camera.size.height / high);
-  const double c = scale * std::cos(angle);
-  const double s = scale * std::sin(angle);
-  const cv::Point2d from = (bounds.tl() + bounds.br()) / 2;
-  const cv::Point2d to((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
-  return {c, s, to.x - c * from.x - s * from.y, -s, c, to.y + s * from.x - c * from.y, 0, 0, 1};
+// Mean of a shape over each cell of a kernel, summed to 1; `covers` says whether a point belongs to it.
+template <typename Covers>
+cv::Mat AreaKernel(int half, const Covers& covers) {
+  constexpr int kSamples = 8;
+  cv::Mat kernel(2 * half + 1, 2 * half + 1, CV_32F, cv::Scalar(0));
+  for (int i = 0; i < kernel.rows * kSamples; ++i) {
+    for (int j = 0; j < kernel.cols * kSamples; ++j) {
+      const cv::Point2d at((j + 0.5) / kSamples - half - 0.5, (i + 0.5) / kSamples - half - 0.5);
+      if (covers(at)) kernel.at<float>(i / kSamples, j / kSamples) += 1;
+    }
+  }
+  return kernel / cv::sum(kernel)[0];
 }
 
-cv::Mat TakePhoto(const CameraModel& camera, const Scene& scene, const cv::Rect2d& bounds) {
-  const cv::Matx33d photo_from_scene = PhotoFromScene(camera, bounds);
-  const int s = Subpixels(camera.blur_px);
-  const double sigma = camera.blur_px * s;
-  // Whole pixels, so that the band's own rows stay on the subpixel grid.
-  const int halo = static_cast<int>(std::ceil(kReach * camera.blur_px));
-  const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
-  const double corner2 = middle.dot(middle);
-  cv::RNG random(camera.seed);
+cv::Mat DiscKernel(double radius) {
+  return AreaKernel(static_cast<int>(std::ceil(radius)), [=](cv::Point2d p) { return cv::norm(p) <= radius; });
+}
 
-  cv::Mat photo(camera.size, CV_8UC3);
+// A straight path through the middle, one subpixel wide.
+cv::Mat PathKernel(cv::Point2d path) {
+  const double length = cv::norm(path);
+  const cv::Point2d along = path / length;
+  return AreaKernel(static_cast<int>(std::ceil(length / 2 + 1)), [=](cv::Point2d p) {
+    return std::fabs(p.dot(along)) <= length / 2 && std::fabs(p.cross(along)) <= 0.5;
+  });
+}
+
+void Blur(cv::Mat& band, const CameraModel& camera, int subpixels) {
+  if (const double sigma = camera.blur_px * subpixels; sigma > 0) {
+    const cv::Mat kernel = cv::getGaussianKernel(2 * static_cast<int>(std::ceil(kReach * sigma)) + 1, sigma, CV_32F);
+    cv::sepFilter2D(band, band, CV_32F, kernel, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
+  }
+  const auto filter = [&](const cv::Mat& kernel) {
+    cv::filter2D(band, band, CV_32F, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
+  };
+  if (camera.defocus_px > 0) filter(DiscKernel(camera.defocus_px * subpixels));
+  if (cv::norm(camera.smear_px) > 0) filter(PathKernel(camera.smear_px * subpixels));
+}
+
+}  // namespace
+
+cv::Vec3d CameraModel::Gains() const { return cast * (gain * std::exp2(exposure_ev)); }
+
+cv::Matx33d PhotoFromScene(const CameraModel& camera, const cv::Rect2d& bounds) {
+  // The plane is turned, panned and tilted about the middle of the bounds and seen from straight ahead.
+  const double side = std::max(bounds.width, bounds.height);
+  const double turn = camera.turn_deg * CV_PI / 180;
+  const double pan = camera.pan_deg * CV_PI / 180;
+  const double tilt = camera.tilt_deg * CV_PI / 180;
+  const cv::Point2d from = (bounds.tl() + bounds.br()) / 2;
+  const cv::Matx33d centre(1, 0, -from.x, 0, 1, -from.y, 0, 0, 1);
+  const cv::Matx33d turned(std::cos(turn), std::sin(turn), 0, -std::sin(turn), std::cos(turn), 0, 0, 0, 1);
+  // (x, y) on the plane goes to (x cos pan, y cos tilt) at a depth of 1 + (x sin pan + y sin tilt) / distance.
+  const double far = 1 / (kDistance * side);
+  const cv::Matx33d seen(std::cos(pan), 0, 0, 0, std::cos(tilt), 0, std::sin(pan) * far, std::sin(tilt) * far, 1);
+  const cv::Matx33d upright = seen * turned * centre;
+
+  double left = 1e300;
+  double top = 1e300;
+  double right = -1e300;
+  double bottom = -1e300;
+  for (const cv::Point2d& corner :
+       {bounds.tl(), bounds.br(), cv::Point2d(bounds.x, bounds.br().y), cv::Point2d(bounds.br().x, bounds.y)}) {
+    const cv::Point2d p = Map(upright, corner);
+    left = std::min(left, p.x);
+    top = std::min(top, p.y);
+    right = std::max(right, p.x);
+    bottom = std::max(bottom, p.y);
+  }
+  const double scale = camera.fill * std::min(camera.size.width / (right - left), camera.size.height / (bottom - top));
+  const cv::Point2d to((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
+  return cv::Matx33d(scale, 0, to.x - scale * (left + right) / 2, 0, scale, to.y - scale * (top + bottom) / 2, 0, 0,
+                     1) *
+         upright;
+}
+
+cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d& photo_from_scene) {
+  const int s = Subpixels(camera);
+  // Whole pixels, so that the band's own rows stay on the subpixel grid.
+  const int halo =
+      static_cast<int>(std::ceil(kReach * camera.blur_px + camera.defocus_px + cv::norm(camera.smear_px) / 2)) + 1;
+  const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
+  const cv::Vec3d gains = camera.Gains();
+  const cv::Vec3f bgr(static_cast<float>(gains[2]), static_cast<float>(gains[1]), static_cast<float>(gains[0]));
+
+  cv::Mat levels(camera.size, CV_32FC3);
   for (int first = 0; first < camera.size.height; first += kBandRows) {
     const int rows = std::min(kBandRows, camera.size.height - first);
-    const int wide = (camera.size.width + 2 * halo) * s;
-    const cv::Matx33d shifted = cv::Matx33d(1, 0, halo, 0, 1, 0, 0, 0, 1) * photo_from_scene;
-    cv::Mat band = DrawBand(scene, shifted, wide, (first - halo) * s, (rows + 2 * halo) * s, s);
-    if (sigma > 0) {
-      const cv::Mat kernel = cv::getGaussianKernel(2 * static_cast<int>(std::ceil(kReach * sigma)) + 1, sigma, CV_32F);
-      cv::sepFilter2D(band, band, CV_32F, kernel, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
-    }
-    cv::resize(band(cv::Rect(halo * s, halo * s, camera.size.width * s, rows * s)), band,
-               cv::Size(camera.size.width, rows), 0, 0, cv::INTER_AREA);
-
+    const cv::Matx33d band_from_photo(s, 0, s * (halo + 0.5), 0, s, s * (halo - first + 0.5), 0, 0, 1);
+    cv::Mat band = DrawBand(scene, band_from_photo * photo_from_scene,
+                            {(camera.size.width + 2 * halo) * s, (rows + 2 * halo) * s});
+    Blur(band, camera, s);
+    cv::Mat part = levels.rowRange(first, first + rows);
+    cv::resize(band(cv::Rect(halo * s, halo * s, camera.size.width * s, rows * s)), part, part.size(), 0, 0,
+               cv::INTER_AREA);
     for (int i = 0; i < rows; ++i) {
-      auto* pixel = band.ptr<cv::Vec3f>(i);
-      for (int j = 0; j < band.cols; ++j) {
+      auto* pixel = part.ptr<cv::Vec3f>(i);
+      for (int j = 0; j < part.cols; ++j) {
         const cv::Point2d off = cv::Point2d(j, first + i) - middle;
-        const double shade = 1 - camera.shading_percent / 100 * off.dot(off) / corner2;
-        pixel[j] *= static_cast<float>(camera.gain * shade);
+        const double shade = 1 - camera.shading_percent / 100 * off.dot(off) / middle.dot(middle);
+        pixel[j] = pixel[j].mul(bgr) * static_cast<float>(shade);
       }
     }
+  }
+  return levels;
+}
+
+cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits) {
+  cv::RNG random(camera.seed);
+  cv::Mat photo(levels.size(), bits == 16 ? CV_16UC3 : CV_8UC3);
+  for (int first = 0; first < levels.rows; first += kBandRows) {
+    const int last = std::min(first + kBandRows, levels.rows);
+    cv::Mat band = levels.rowRange(first, last).clone();
+    cv::Mat noise(band.size(), CV_32FC3);
+    if (camera.full_well > 0) {
+      // Photon counts scatter by their root; at thousands of electrons a Gaussian stands in for Poisson.
+      random.fill(noise, cv::RNG::NORMAL, 0, 1);
+      cv::Mat spread;
+      cv::sqrt(cv::max(band, 0) * (255 / camera.full_well), spread);
+      band += noise.mul(spread);
+    }
     if (camera.noise_percent > 0) {
-      cv::Mat noise(band.size(), CV_32FC3);
       random.fill(noise, cv::RNG::NORMAL, 0, camera.noise_percent / 100 * 255);
       band += noise;
     }
-    band.convertTo(photo.rowRange(first, first + rows), CV_8U);
+    band.convertTo(photo.rowRange(first, last), photo.depth(), bits == 16 ? 257 : 1);
   }
   return photo;
+}
+
+double LensResponse(const CameraModel& camera, double frequency, cv::Point2d direction) {
+  using method_law::Sinc;
+  direction /= cv::norm(direction);
+  const double pi2f = 2 * CV_PI * frequency;
+  double response = std::exp(-pi2f * pi2f * camera.blur_px * camera.blur_px / 2);
+  if (const double x = pi2f * camera.defocus_px; x > 0) response *= std::fabs(2 * std::cyl_bessel_j(1, x) / x);
+  response *= std::fabs(Sinc(frequency * camera.smear_px.dot(direction)));
+  return response * std::fabs(Sinc(frequency * direction.x) * Sinc(frequency * direction.y));
 }

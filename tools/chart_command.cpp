@@ -1,3 +1,4 @@
+#include <filesystem>
 #include <iostream>
 #include <memory>
 #include <opencv2/imgcodecs.hpp>
@@ -28,6 +29,9 @@ CommandBody DeclareChart(CLI::App& command) {
       ->check(CLI::IsMember({"fine", "medium", "coarse"}))
       ->type_name("SIZE");
   return [o] {
+    if (o->output != "-" && std::filesystem::path(o->output).extension() != ".png") {
+      throw Failure(kWrongUsage, o->output + ": name a .png file");
+    }
     for (const MarkSize& size : kMarkSizes) {
       if (o->marks == size.name) o->style.module = size.module;
     }
@@ -36,7 +40,9 @@ CommandBody DeclareChart(CLI::App& command) {
     printer.gain = 1;
     printer.fill = 0.92;
     std::vector<uchar> file;
-    cv::imencode(".png", TakePhoto(printer, SfrChart(o->style), SfrChartBounds()), file);
+    cv::imencode(".png",
+                 Sense(printer, Expose(printer, SfrChart(o->style), PhotoFromScene(printer, SfrChartBounds())), 8),
+                 file);
     WriteWholeFile(o->output, {file.begin(), file.end()});
     if (o->output != "-") std::cout << Format("%s  %d x %d\n", o->output.c_str(), o->pixels, o->pixels);
     return static_cast<int>(kWithinLimits);

@@ -5,6 +5,8 @@
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
+#include "qvtester/api.h"
+
 namespace {
 
 constexpr double kSmallestModulePx = 3;
@@ -75,8 +77,13 @@ ChartView LookAtChart(QVTester& tester) {
   const cv::Point2d down = view.marks[2].centre - view.marks[0].centre;
   view.legs_ratio = cv::norm(right) / cv::norm(down);
   view.legs_angle_deg = std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI;
-  view.turn_deg = std::remainder(tester.GetPatternAngle(points) - 315.0, 360.0);
+  view.turn_deg = std::atan2(-right.y, right.x) * 180 / CV_PI;
+  view.straightened_by_deg = cvRound(std::remainder(tester.GetPatternAngle(points) - 315.0, 360.0));
   return view;
+}
+
+bool ChartView::plausible() const {
+  return legs_ratio >= 0.9 && legs_ratio <= 1.1 && std::fabs(legs_angle_deg - 90) <= 5;
 }
 
 void AddChartFigures(Phase& phase, const ChartView& view) {
@@ -98,6 +105,7 @@ void AddChartFigures(Phase& phase, const ChartView& view) {
   phase.Add("legs_ratio", view.legs_ratio);
   phase.Add("legs_angle", view.legs_angle_deg);
   phase.Add("chart_turn", view.turn_deg);
+  phase.Add("straightened_by", view.straightened_by_deg);
 }
 
 std::vector<std::string> ExplainMiss(const ChartView& view, const cv::Mat& photo) {
@@ -123,36 +131,87 @@ std::vector<std::string> ExplainMiss(const ChartView& view, const cv::Mat& photo
   return reasons;
 }
 
-std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo) {
+ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo) {
+  ChartView view = LookAtChart(*theTester);
+  AddChartFigures(record.phase, view);
+  if (!view.complete()) {
+    std::string sentence = photo_path + ": ";
+    for (const std::string& reason : ExplainMiss(view, photo)) {
+      sentence += (sentence.back() == ' ' ? "" : ", ") + reason;
+    }
+    record.details.push_back(sentence);
+    return view;
+  }
+  if (!view.plausible()) {
+    record.doubtful = true;
+    record.details.push_back(
+        Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "
+               "not as 1 to 1 at 90; is the chart seen straight on, and nothing else like a mark?",
+               photo_path.c_str(), view.legs_ratio, view.legs_angle_deg));
+  }
+  if (view.candidates > 3) {
+    record.details.push_back(Format("%s: %d places passed as finder marks; the three most alike were used",
+                                    photo_path.c_str(), view.candidates));
+  }
+  return view;
+}
+
+std::string ReportChart(const ChartView& view) {
+  double module = 0;
+  for (const Mark& mark : view.marks) module += mark.module_px / static_cast<double>(view.marks.size());
+  return Format("marks      %zu found, %.1f px a module; legs %.3f : 1 at %.1f degrees; threshold %d\n",
+                view.marks.size(), module, view.legs_ratio, view.legs_angle_deg, view.threshold) +
+         Format("chart      turned by %.1f degrees counter-clockwise, straightened by %d\n", view.turn_deg,
+                view.straightened_by_deg);
+}
+
+void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place, Colour colour) {
+  constexpr const char* kNames[] = {"1 corner", "2", "3"};
+  for (std::size_t i = 0; i < view.marks.size(); ++i) {
+    const Mark& mark = view.marks[i];
+    const double radius = std::max(6.0, 5 * mark.module_px * place.scale);
+    picture.Circle(place(mark.centre), radius, colour, 3);
+    picture.Text(view.complete() ? kNames[i] : "candidate", place(mark.centre) + cv::Point2d(0, radius + 20), 16,
+                 colour, Align::kCentre, true);
+  }
+}
+
+std::array<cv::Point2d, 4> UprightPhoto::OnPhoto(const cv::Rect& region) const {
+  const double left = region.x - 0.5;
+  const double top = region.y - 0.5;
+  const cv::Vec3d corners[] = {{left, top, 1},
+                               {left + region.width, top, 1},
+                               {left + region.width, top + region.height, 1},
+                               {left, top + region.height, 1}};
+  std::array<cv::Point2d, 4> outline;
+  for (std::size_t i = 0; i < outline.size(); ++i) {
+    const cv::Vec2d p = photo_from_upright * corners[i];
+    outline[i] = {p[0], p[1]};
+  }
+  return outline;
+}
+
+UprightPhoto Straighten(QVTester& tester, const cv::Mat& photo) {
+  UprightPhoto upright;
   std::vector<cv::Point> points = FoundPoints(tester);
   const float rotation = 315.0f - tester.GetPatternAngle(points);
+  tester.NormalizePatternImage(photo, points, upright.picture);
+  tester.SortPatternPoints(points, upright.corner, upright.second, upright.third);
+  const float middle = static_cast<float>(upright.picture.cols) * 0.5f;
+  cv::invertAffineTransform(cv::getRotationMatrix2D({middle, middle}, rotation, 1.0), upright.photo_from_upright);
+  return upright;
+}
+
+std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo) {
   cv::Mat gray;
   cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-  cv::Mat upright;
-  tester.NormalizePatternImage(gray, points, upright);
-  cv::Point corner;
-  cv::Point second;
-  cv::Point third;
-  tester.SortPatternPoints(points, corner, second, third);
-  const float scale = static_cast<float>(second.y - corner.y) / kChartSide;
-
-  const float middle = static_cast<float>(upright.cols) * 0.5f;
-  cv::Matx23d back;
-  cv::invertAffineTransform(cv::getRotationMatrix2D({middle, middle}, rotation, 1.0), back);
+  const UprightPhoto upright = Straighten(tester, gray);
+  const float scale = static_cast<float>(upright.second.y - upright.corner.y) / kChartSide;
   std::array<RegionView, 2> views;
   for (std::size_t i = 0; i < views.size(); ++i) {
-    const cv::Rect region = PlaceRegion(i == 0 ? kVerticalRegion : kHorizontalRegion, corner, scale);
-    const double left = region.x - 0.5;
-    const double top = region.y - 0.5;
-    const cv::Point2d corners[] = {{left, top},
-                                   {left + region.width, top},
-                                   {left + region.width, top + region.height},
-                                   {left, top + region.height}};
-    for (std::size_t k = 0; k < 4; ++k) {
-      const cv::Vec2d p = back * cv::Vec3d(corners[k].x, corners[k].y, 1);
-      views[i].outline[k] = {p[0], p[1]};
-    }
-    upright(region).convertTo(views[i].pixels, CV_32F);
+    const cv::Rect region = PlaceRegion(i == 0 ? kVerticalRegion : kHorizontalRegion, upright.corner, scale);
+    views[i].outline = upright.OnPhoto(region);
+    upright.picture(region).convertTo(views[i].pixels, CV_32F);
     views[i].pixels = tester.ConvertToVertical(views[i].pixels);
     views[i].edge_profile = EdgeProfile(tester, views[i].pixels);
   }

@@ -8,6 +8,7 @@
 
 #include "chart/chart_layout.h"
 #include "qvtester/tester.h"
+#include "tools/picture.h"
 #include "tools/record.h"
 
 // What the last search for finder marks saw of a chart photo, read back from the tester.
@@ -23,7 +24,11 @@ struct ChartView {
   int threshold = 0;        // grey level
   double legs_ratio = 0;    // the rest only with three marks
   double legs_angle_deg = 0;
-  double turn_deg = 0;  // counter-clockwise, (-180, 180]
+  double turn_deg = 0;          // of the first leg, counter-clockwise
+  int straightened_by_deg = 0;  // clockwise, whole degrees, as the measures turn the photo
+
+  /// Whether the three marks look like a chart's: legs of one length, at a right angle.
+  bool plausible() const;
 
   bool complete() const { return marks.size() == 3; }
 };
@@ -38,7 +43,29 @@ void AddChartFigures(Phase& phase, const ChartView& view);
 /// picture's two grey peaks.
 std::vector<std::string> ExplainMiss(const ChartView& view, const cv::Mat& photo);
 
-/// A measured region in detail, on the straightened picture and on the photo.
+/// Looks at the chart after a test on this photo: adds its figures to the record, and a sentence about a miss or about
+/// more candidates than marks.
+ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo);
+
+/// "marks ..." and "chart ..." lines for a person.
+std::string ReportChart(const ChartView& view);
+
+/// Rings and numbers the marks, or the candidates of a miss.
+void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place, Colour colour);
+
+/// A photo straightened as the measures do it, and the way back.
+struct UprightPhoto {
+  cv::Mat picture;
+  cv::Point corner, second, third;  // row in x, column in y
+  cv::Matx23d photo_from_upright;
+
+  std::array<cv::Point2d, 4> OnPhoto(const cv::Rect& region) const;  // corners, column and row
+};
+
+/// Straightens by the three marks that the last search left in the tester.
+UprightPhoto Straighten(QVTester& tester, const cv::Mat& photo);
+
+/// A measured sharpness region in detail.
 struct RegionView {
   std::array<cv::Point2d, 4> outline;  // on the photo, column and row
   cv::Mat pixels;                      // of the straightened picture, CV_32F, the edge running down the rows

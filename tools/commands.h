@@ -9,10 +9,14 @@ using CommandBody = std::function<int()>;
 
 // Each declares its options on the command-line parser's object and hands back what runs once they are parsed.
 CommandBody DeclareAutofocus(CLI::App& command);
+CommandBody DeclareCapture(CLI::App& command);
 CommandBody DeclareChart(CLI::App& command);
+CommandBody DeclareCircles(CLI::App& command);
+CommandBody DeclareDust(CLI::App& command);
 CommandBody DeclareFlash(CLI::App& command);
 CommandBody DeclareList(CLI::App& command);
 CommandBody DeclareMtf(CLI::App& command);
+CommandBody DeclarePreview(CLI::App& command);
 CommandBody DeclareSimulate(CLI::App& command);
 
 #endif  // QVTESTER_TOOLS_COMMANDS_H_

@@ -35,7 +35,7 @@ CommandBody DeclareFlash(CLI::App& command) {
       picture.Text(Format("Flash: mean of the first channel %.2f of 255 (%s)", record.phase.Find("mean")->value(),
                           Name(record.outcome())),
                    {12, 26}, 16, kInk);
-      picture.Place(photo, 0, 40, scale);
+      picture.PlacePhoto(photo, {0, 40}, scale);
       return picture.Png();
     };
     return Measure(*options, m);

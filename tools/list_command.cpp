@@ -66,8 +66,8 @@ void ListProperties() {
 
 void ListCodes() {
   for (const ResultCode& row : kResultCodes) {
-    std::cout << Format("%4d  %-25s  %s\n", row.code, row.name, row.meaning);
-    if (*row.look_at != '\0') std::cout << Format("%4s  %-25s  %s\n", "", "", row.look_at);
+    std::cout << Format("%4d  %-26s  %s\n", row.code, row.name, row.meaning);
+    if (*row.look_at != '\0') std::cout << Format("%4s  %-26s  %s\n", "", "", row.look_at);
   }
 }
 

@@ -1,7 +1,7 @@
 #include <CLI/CLI.hpp>
-#include <csignal>
 #include <cstdio>
 #include <exception>
+#include <iostream>
 
 #include "tools/commands.h"
 #include "tools/program.h"
@@ -18,6 +18,10 @@ constexpr Command kCommands[] = {
     {"autofocus", "Measure the sharpness of a chart photo (test 14)", DeclareAutofocus},
     {"mtf", "Measure the two MTF50 values of a chart photo, outside the numbered tests", DeclareMtf},
     {"flash", "Measure the mean brightness of a flash photo (tests 15 and 18)", DeclareFlash},
+    {"capture", "Measure the colour patches of a chart photo (tests 16 and 20)", DeclareCapture},
+    {"dust", "Find dust on the lens in a photo of a plain target (tests 17 and 21)", DeclareDust},
+    {"preview", "Measure how much two preview frames differ (tests 13 and 19)", DeclarePreview},
+    {"circles", "Look for the chart's three marks in a preview frame", DeclareCircles},
     {"chart", "Draw the test chart", DeclareChart},
     {"simulate", "Take a photo of the chart with a camera of known faults", DeclareSimulate},
     {"list", "List the library's tests, slots, properties or codes", DeclareList},
@@ -30,8 +34,8 @@ constexpr char kFooter[] =
 }  // namespace
 
 int main(int argc, char** argv) {
-  std::signal(SIGINT, [](int) { std::_Exit(130); });
   try {
+    WatchForInterrupts();
     CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
     app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
     app.require_subcommand(1);
@@ -49,7 +53,9 @@ int main(int argc, char** argv) {
     } catch (const CLI::ParseError& e) {
       return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
     }
-    return body();
+    const int status = body();
+    if (!std::cout.flush()) throw Failure(kInternalFault, "standard output can't be written");
+    return status;
   } catch (const Failure& e) {
     std::fprintf(stderr, "qvtester: %s\n", e.what());
     return e.status;

@@ -7,6 +7,7 @@
 #include <iterator>
 
 #include "core/property_table.h"
+#include "qvtester/host_properties.h"
 #include "tools/codes.h"
 
 namespace {
@@ -15,7 +16,7 @@ namespace {
 class FreshTester {
  public:
   FreshTester() {
-    FinalizeTestModule();
+    if (theTester != nullptr) FinalizeTestModule();
     if (InitTestModule() != QV_SUCCESS) throw Failure(kInternalFault, "the library can't be started");
   }
   ~FreshTester() { FinalizeTestModule(); }
@@ -63,7 +64,7 @@ std::string ReadInput(const std::string& path) {
 }
 
 // Loads one slot. What can't be read becomes the run's code and a sentence; what the decoder says, a warning.
-bool Load(Record& record, const SlotInput& input, const std::string& scratch, SideOutput& side) {
+bool Load(Record& record, const SlotInput& input, ScratchFolder& scratch, SideOutput& side) {
   const std::string shown = input.path == "-" ? "standard input" : input.path;
   const auto refuse = [&](int code, const std::string& why) {
     record.phase.code = code;
@@ -76,23 +77,61 @@ bool Load(Record& record, const SlotInput& input, const std::string& scratch, Si
   } catch (const Failure& e) {
     return refuse(QV_ERROR_INVALID_ARGUMENT, e.what());
   }
+  Input& entry = record.inputs.emplace_back(Input{input.slot, shown, HexDigest(content, "SHA256"), 0, 0});
   if (content.empty()) return refuse(QV_ERROR_INVALID_ARGUMENT, "the file is empty");
 
+  // The library reads a file of its own accord, and a pipe can be read but once.
   std::string path = input.path;
-  if (path == "-") {
-    path = scratch + "/input";
+  if (path == "-" || !std::filesystem::is_regular_file(path)) {
+    path = scratch.path() + "/input";
     WriteWholeFile(path, content);
   }
   const int code = SetResource(input.slot, path.data());
   const std::vector<std::string> chatter = side.TakeChatter();
-  if (code == QV_ERROR_INVALID_ARGUMENT) return refuse(code, "not a picture that can be decoded");
-  if (code != QV_SUCCESS) return refuse(code, FindCode(code).meaning);
-  if (!chatter.empty()) {
-    record.details.push_back(shown + ": the decoder says \"" + chatter.front() + "\"; is the file cut?");
+  const std::string said = chatter.empty() ? "" : "the decoder says \"" + chatter.front() + "\"";
+  if (code == QV_ERROR_INVALID_ARGUMENT) {
+    return refuse(code, "not a picture that can be decoded" + (said.empty() ? "" : "; " + said));
   }
+  if (code != QV_SUCCESS) return refuse(code, FindCode(code).meaning);
+  if (!said.empty()) record.details.push_back(shown + ": " + said + "; is the file cut?");
   const cv::Mat photo = SlotPhoto(input.slot);
-  record.inputs.push_back({input.slot, shown, HexDigest(content, "SHA256"), photo.cols, photo.rows});
+  entry.width = photo.cols;
+  entry.height = photo.rows;
   return true;
+}
+
+// Runs the test on what is loaded and takes its figures.
+void Run(Record& record, const Measuring& measuring) {
+  record.phase.code = measuring.run();
+  record.phase.end_millis = MillisSinceEpoch();
+  if (record.phase.code == QV_SUCCESS && measuring.collect) {
+    QVResultData* results = nullptr;
+    GetResult(&results);
+    measuring.collect(record.phase, *results);
+  }
+  if (measuring.look) measuring.look(record);
+  if (record.phase.code == QV_ERROR_UNUSABLE_INPUT || record.phase.code == QV_ERROR_INTERNAL) {
+    // The library's last line says what was refused.
+    record.details.push_back(record.inputs[0].path + ": " + SideOutput::Lines().back().text);
+  }
+}
+
+// A picture for --annotate, or nothing where there is nothing to show.
+std::string Annotate(const Record& record, const Measuring& measuring) {
+  const int code = record.phase.code;
+  const bool missed = code == QV_ERROR_PATTERN_NOT_FOUND || code == QV_DONE || code == QV_ERROR_UNUSABLE_INPUT;
+  const bool shows = code == QV_SUCCESS || (missed && measuring.annotates_misses);
+  return shows ? measuring.annotate(record) : std::string();
+}
+
+void CheckOutputs(const MeasureOptions& options) {
+  if (options.json == "-" && options.annotate == "-") {
+    throw Failure(kWrongUsage, "--json - and --annotate -: standard output takes one of them");
+  }
+  const std::filesystem::path picture(options.annotate);
+  if (!options.annotate.empty() && options.annotate != "-" && picture.extension() != ".png") {
+    throw Failure(kWrongUsage, "--annotate " + options.annotate + ": name a .png file");
+  }
 }
 
 std::string Verdict(const Record& record) {
@@ -102,13 +141,22 @@ std::string Verdict(const Record& record) {
                 static_cast<long long>(record.phase.end_millis - record.phase.start_millis));
 }
 
+std::string Report(const Record& record, const Measuring& measuring) {
+  std::string text;
+  for (const Input& input : record.inputs)
+    text += Format("%s  %d x %d\n", input.path.c_str(), input.width, input.height);
+  return text + measuring.report(record) + Verdict(record);
+}
+
 // Where, why, which code, what to do about it.
 std::string MissSentence(const Record& record) {
-  const ResultCode& row = FindCode(record.phase.code);
   std::string text;
   for (const std::string& sentence : record.details) text += (text.empty() ? "" : "; ") + sentence;
+  if (record.phase.code == QV_SUCCESS) return text;
+  // The circle check answers a miss with 0.
+  const ResultCode& row = FindCode(record.phase.code == QV_DONE ? QV_ERROR_PATTERN_NOT_FOUND : record.phase.code);
   if (text.empty()) text = row.meaning;
-  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name, row.meaning, row.look_at);
+  return Format("%s (code %d, %s: %s); %s", text.c_str(), record.phase.code, row.name, row.meaning, row.look_at);
 }
 
 }  // namespace
@@ -123,16 +171,26 @@ void MeasureOptions::DeclareOn(CLI::App& command) {
   command.add_flag("--quiet", quiet, "Print nothing but what was asked for and errors");
 }
 
+void MeasureOptions::DeclareThresholdOn(CLI::App& command) {
+  command.add_option("--threshold", threshold, "Grey level above which a pixel is light [125]")
+      ->check(CLI::Range(0, 255))
+      ->type_name("N");
+}
+
+void MeasureOptions::DeclarePublishOn(CLI::App& command) {
+  command.add_flag("--publish", publish, "Write the findings to the system properties that other programs read");
+}
+
 cv::Mat SlotPhoto(QV_RESOURCE_INDEX slot) {
   cv::Mat photo;
   if (theTester->resources_[slot] != nullptr) theTester->resources_[slot]->GetImage(&photo);
   return photo;
 }
 
-std::string FrequencyText(double nyquist, int photo_height, const std::optional<double>& pixel_pitch_um) {
+std::string FrequencyText(double nyquist, int photo_height, double pixel_pitch_um) {
   if (!std::isfinite(nyquist)) return "none (the curve gives no figure)";
   std::string text = Format("%.4f Nyquist  %.4f c/p  %.0f LW/PH", nyquist, nyquist / 2, nyquist * photo_height);
-  if (pixel_pitch_um) text += Format("  %.1f lp/mm", nyquist / 2 * 1000 / *pixel_pitch_um);
+  if (pixel_pitch_um > 0) text += Format("  %.1f lp/mm", nyquist / 2 * 1000 / pixel_pitch_um);
   return text;
 }
 
@@ -145,6 +203,7 @@ std::string LimitText(const Measurement& m) {
 }
 
 int Measure(const MeasureOptions& options, const Measuring& measuring) {
+  CheckOutputs(options);
   Record record;
   record.start_millis = MillisSinceEpoch();
   record.dut_id = options.dut;
@@ -156,52 +215,47 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
 
   std::string picture;
   {
-    const ScratchFolder scratch;
+    ScratchFolder scratch;
     SideOutput side(options.verbose);
     const FreshTester fresh;
+    SetHostPropertyStore(options.publish || !measuring.publishes ? nullptr : (scratch.path() + "/properties").c_str());
     if (options.threshold) setWorkingBinaryThresh(*options.threshold);
+    if (measuring.prepare) measuring.prepare();
     const bool loaded = std::all_of(measuring.inputs.begin(), measuring.inputs.end(),
-                                    [&](const SlotInput& input) { return Load(record, input, scratch.path(), side); });
+                                    [&](const SlotInput& input) { return Load(record, input, scratch, side); });
     record.phase.start_millis = record.phase.end_millis = MillisSinceEpoch();
-    if (loaded) {
-      record.phase.code = measuring.run();
-      record.phase.end_millis = MillisSinceEpoch();
-      if (record.phase.code == QV_SUCCESS && measuring.collect) {
-        QVResultData* results = nullptr;
-        GetResult(&results);
-        measuring.collect(record.phase, *results);
-      }
-      if (measuring.look) measuring.look(record);
-    }
+    if (loaded) Run(record, measuring);
     record.properties = PropertiesOffDefault(*theTester);
     record.Judge();
-    const bool shows = record.phase.code == QV_SUCCESS ||
-                       (record.phase.code == QV_ERROR_PATTERN_NOT_FOUND && measuring.annotates_misses);
-    if (!options.annotate.empty() && loaded && shows) picture = measuring.annotate(record);
+    if (!options.annotate.empty() && loaded) picture = Annotate(record, measuring);
     record.log_lines = SideOutput::Lines();
   }
-
   if (!picture.empty()) {
-    WriteWholeFile(options.annotate, picture);
     record.phase.attachments.push_back({std::filesystem::path(options.annotate).filename().string(), "image/png",
                                         options.annotate, HexDigest(picture, "SHA1")});
   }
   record.end_millis = MillisSinceEpoch();
-  if (!options.json.empty()) WriteWholeFile(options.json, record.ToJson().dump(2) + "\n");
 
-  const bool measured = record.phase.code == QV_SUCCESS;
-  std::ostream& out = options.json == "-" || options.annotate == "-" ? std::cerr : std::cout;
+  const bool measured = record.phase.code == QV_SUCCESS && !record.cannot_judge;
   if (!measured) {
     std::cerr << MissSentence(record) << '\n';
-    return record.phase.code == QV_ERROR_INTERNAL ? kInternalFault : kCouldNotMeasure;
-  }
-  for (const std::string& sentence : record.details) std::cerr << "warning: " << sentence << '\n';
-  if (!options.quiet) {
-    for (const Input& input : record.inputs) {
-      out << Format("%s  %d x %d\n", input.path.c_str(), input.width, input.height);
+  } else {
+    for (const std::string& sentence : record.details) std::cerr << "warning: " << sentence << '\n';
+    if (record.limits.given() && !record.limited()) {
+      std::cerr << "warning: " << options.limits << ": holds no limit for " << record.phase.name << '\n';
     }
-    if (measuring.report) out << measuring.report(record);
-    out << Verdict(record);
+    std::ostream& out = options.json == "-" || options.annotate == "-" ? std::cerr : std::cout;
+    if (!options.quiet) out << Report(record, measuring);
   }
+  if (!options.annotate.empty() && picture.empty()) {
+    std::cerr << "no picture: there is nothing to show\n";
+    std::error_code ignored;
+    std::filesystem::remove(options.annotate, ignored);  // one of an earlier run would be taken for this run's
+  }
+  // What was asked for by name comes last: one that can't be written loses none of the others.
+  if (!options.json.empty()) WriteWholeFile(options.json, record.ToText());
+  if (!picture.empty()) WriteWholeFile(options.annotate, picture);
+
+  if (!measured) return record.phase.code == QV_ERROR_INTERNAL ? kInternalFault : kCouldNotMeasure;
   return record.outcome() == Outcome::kPass ? kWithinLimits : kLimitBroken;
 }

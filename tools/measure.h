@@ -17,11 +17,15 @@
 struct MeasureOptions {
   std::string json, annotate, limits, dut, station;
   std::optional<int> threshold;
-  std::optional<double> pixel_pitch_um;
-  bool verbose = false, quiet = false;
+  double pixel_pitch_um = 0;  // 0: not known
+  bool verbose = false, quiet = false, publish = false;
 
   /// Declares the options that all measuring commands share.
   void DeclareOn(CLI::App& command);
+  /// Declares what commands that look for the chart share.
+  void DeclareThresholdOn(CLI::App& command);
+  /// Declares --publish, for tests that write system properties.
+  void DeclarePublishOn(CLI::App& command);
 };
 
 struct SlotInput {
@@ -34,11 +38,13 @@ struct Measuring {
   std::string phase, test_name;
   std::optional<int> test_index;
   std::vector<SlotInput> inputs;
+  std::function<void()> prepare;                             // before the slots are loaded
   std::function<int()> run;                                  // answers the library's code
   std::function<void(Phase&, const QVResultData&)> collect;  // after code 1
   std::function<void(Record&)> look;                         // after any code, while the search state is fresh
   std::function<std::string(const Record&)> report;          // lines for a person, after code 1
   std::function<std::string(const Record&)> annotate;        // a PNG file's content
+  bool publishes = false;                                    // writes system properties
   bool annotates_misses = false;                             // also when the finder marks were not found
 };
 
@@ -49,7 +55,7 @@ int Measure(const MeasureOptions& options, const Measuring& measuring);
 cv::Mat SlotPhoto(QV_RESOURCE_INDEX slot);
 
 /// "0.3124 Nyquist  0.1562 c/p  937 LW/PH", and lp/mm when the pixel pitch is known.
-std::string FrequencyText(double nyquist, int photo_height, const std::optional<double>& pixel_pitch_um);
+std::string FrequencyText(double nyquist, int photo_height, double pixel_pitch_um);
 
 /// "  (limit 0.38 to 0.6: FAIL)" for a figure with a limit, nothing for one without.
 std::string LimitText(const Measurement& m);

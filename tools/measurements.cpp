@@ -1,60 +1,124 @@
 #include "tools/measurements.h"
 
 #include <algorithm>
-#include <iterator>
+#include <array>
 
 namespace {
 
-constexpr char kSfrMethod[] = "slanted edge, oversampling 1, real part";
-constexpr char kMarkMethod[] = "row scan for 1:1:3:1:1 with three cross-checks";
-constexpr char kMeanMethod[] = "mean over all pixels of the first channel";
+constexpr char kSfr[] = "slanted edge, oversampling 1, real part";
+constexpr char kScan[] = "row scan for 1:1:3:1:1 with three cross-checks";
+constexpr char kMean[] = "mean over all pixels of the first channel";
+constexpr char kLab[] = "mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1";
+constexpr char kDelta[] = "CIE 1976 difference to the standard photo's patch";
+constexpr char kBlob[] = "local threshold 15 x 15, blob detector at levels 0 and 125";
+constexpr char kBins[] = "256 bins of one grey level";
+constexpr char kDifference[] = "mean absolute difference of the grey frames over 255";
 
-// What was seen of the chart is the same for every test that looks for it.
-#define CHART_ROWS(test)                                                                                               \
-  {test "_marks_found", kOne, Shape::kCount, kMarkMethod, "Finder marks that came back; three are needed."},           \
-      {test "_mark_candidates", kOne, Shape::kCount, kMarkMethod,                                                      \
-       "Places that passed as finder marks before the best three were chosen; more than three deserve a look."},       \
-      {test "_marks", kPixel, Shape::kPlaces, kMarkMethod,                                                             \
-       "Centres of the marks that came back, column and row, pixel centres at whole numbers: corner, second, third."}, \
-      {test "_module_size", kPixel, Shape::kValue, kMarkMethod,                                                        \
-       "Mean module of the marks used, a seventh of a mark's width along the scanned rows. Under 3 px marks are "      \
-       "missed."},                                                                                                     \
-      {test "_legs_ratio", kOne, Shape::kValue, kMarkMethod,                                                           \
-       "Distance of corner and second mark over that of corner and third; 1 when the chart is seen straight on."},     \
-      {test "_legs_angle", kDegree, Shape::kValue, kMarkMethod,                                                        \
-       "Angle between the two legs at the corner mark; 90 when the chart is seen straight on."},                       \
-      {test "_chart_turn", kDegree, Shape::kValue, kMarkMethod,                                                        \
-       "Turn of the chart in the photo, counter-clockwise, in whole degrees; the photo is straightened by it."},       \
-  {                                                                                                                    \
-    test "_threshold", kGreyLevel, Shape::kCount, kMarkMethod, "Grey level above which a pixel counts as light."       \
-  }
+constexpr auto kWhole = Number::kWhole;
+constexpr auto kReal = Number::kReal;
 
-#define SFR_ROWS(test)                                                           \
-  {test "_mtf50_vertical", kNyquist, Shape::kValue, kSfrMethod,                  \
-   "Frequency at which the SFR of the vertical region falls to one half."},      \
-  {                                                                              \
-    test "_mtf50_horizontal", kNyquist, Shape::kValue, kSfrMethod,               \
-        "Frequency at which the SFR of the horizontal region falls to one half." \
-  }
-
-constexpr MeasurementInfo kMeasurements[] = {
-    SFR_ROWS("camera_autofocus"),
-    {"camera_autofocus_sfr_vertical", kOne, Shape::kResponse, kSfrMethod,
-     "Spatial frequency response of the vertical region over frequency in units of Nyquist."},
-    {"camera_autofocus_sfr_horizontal", kOne, Shape::kResponse, kSfrMethod,
-     "Spatial frequency response of the horizontal region over frequency in units of Nyquist."},
-    CHART_ROWS("camera_autofocus"),
-    SFR_ROWS("mtf_check"),
-    CHART_ROWS("mtf_check"),
-    {"camera_flash_mean", kGreyLevel, Shape::kValue, kMeanMethod, "Mean brightness of the flash photo, 0 to 255."},
-    {"camera_flash_vt_mean", kGreyLevel, Shape::kValue, kMeanMethod,
-     "Mean brightness of the second camera's flash photo, 0 to 255."},
+struct Row {
+  std::vector<const char*> phases;
+  Figure figure;
 };
+
+const std::vector<const char*> kSfrTests = {"camera_autofocus", "mtf_check"};
+const std::vector<const char*> kChartTests = {"camera_autofocus", "mtf_check", "camera_capture", "camera_capture_front",
+                                              "circle_check"};
+const std::vector<const char*> kCaptureTests = {"camera_capture", "camera_capture_front"};
+const std::vector<const char*> kDustTests = {"lens_dust", "lens_dust_front"};
+
+const std::vector<Row>& Rows() {
+  static const std::vector<Row> rows = {
+      {kSfrTests,
+       {"mtf50_vertical", kNyquist, kReal, nullptr, kSfr,
+        "Frequency at which the SFR of the vertical region falls to one half."}},
+      {kSfrTests,
+       {"mtf50_horizontal", kNyquist, kReal, nullptr, kSfr,
+        "Frequency at which the SFR of the horizontal region falls to one half."}},
+      {{"camera_autofocus"},
+       {"sfr_vertical", kOne, kReal, &kFrequencyAxis, kSfr,
+        "Spatial frequency response of the vertical region over frequency in units of Nyquist."}},
+      {{"camera_autofocus"},
+       {"sfr_horizontal", kOne, kReal, &kFrequencyAxis, kSfr,
+        "Spatial frequency response of the horizontal region over frequency in units of Nyquist."}},
+
+      // What was seen of the chart, by every test that looks for it.
+      {kChartTests, {"marks_found", kOne, kWhole, nullptr, kScan, "Finder marks that came back; three are needed."}},
+      {kChartTests,
+       {"mark_candidates", kOne, kWhole, nullptr, kScan,
+        "Places that passed as finder marks before the best three were chosen; more than three deserve a look."}},
+      {kChartTests,
+       {"marks", kPixel, kReal, &kColumnAxis, kScan,
+        "Centres of the marks that came back, column and row, pixel centres at whole numbers: corner, second, third."}},
+      {kChartTests,
+       {"module_size", kPixel, kReal, nullptr, kScan,
+        "Mean module of the marks, a seventh of a mark's width along the scanned rows. Under 3 px marks may be "
+        "missed."}},
+      {kChartTests,
+       {"legs_ratio", kOne, kReal, nullptr, kScan,
+        "Distance of corner and second mark over that of corner and third; 1 when the chart is seen straight on."}},
+      {kChartTests,
+       {"legs_angle", kDegree, kReal, nullptr, kScan,
+        "Angle between the two legs at the corner mark; 90 when the chart is seen straight on."}},
+      {kChartTests,
+       {"chart_turn", kDegree, kReal, nullptr, kScan,
+        "Turn of the chart in the photo, counter-clockwise: of the leg from the corner to the second mark."}},
+      {kChartTests,
+       {"straightened_by", kDegree, kWhole, nullptr, kScan,
+        "Whole degrees, clockwise, by which the photo was turned upright before it was measured."}},
+      {kChartTests,
+       {"threshold", kGreyLevel, kWhole, nullptr, kScan, "Grey level above which a pixel counts as light."}},
+
+      {kCaptureTests, {"patches", kOne, kWhole, nullptr, kLab, "Patches measured; 24 when the whole ring is in view."}},
+      {kCaptureTests, {"lab_l", kOne, kReal, &kPatchAxis, kLab, "L* of each patch."}},
+      {kCaptureTests, {"lab_a", kOne, kReal, &kPatchAxis, kLab, "a* of each patch."}},
+      {kCaptureTests, {"lab_b", kOne, kReal, &kPatchAxis, kLab, "b* of each patch."}},
+      {kCaptureTests,
+       {"delta_e_76", kOne, kReal, &kPatchAxis, kDelta, "Colour difference of each patch to the standard photo's."}},
+      {kCaptureTests, {"delta_e_76_mean", kOne, kReal, nullptr, kDelta, "Mean colour difference over the patches."}},
+      {kCaptureTests, {"delta_e_76_max", kOne, kReal, nullptr, kDelta, "Largest colour difference of a patch."}},
+
+      {kDustTests,
+       {"blob_count", kOne, kWhole, nullptr, kBlob,
+        "Dark blobs outside the corners, counted up to five. Discs of about 5 to 16 pixels are seen."}},
+      {kDustTests, {"blobs", kPixel, kReal, &kColumnAxis, kBlob, "Places of the counted blobs, column and row."}},
+      {kDustTests,
+       {"mean_level", kGreyLevel, kReal, nullptr, kBins, "Mean grey level of the photo; blobs are seen from 126 up."}},
+      {kDustTests, {"histogram", kOne, kWhole, &kLevelAxis, kBins, "Pixels of each grey level."}},
+      {kDustTests,
+       {"histogram_difference", kOne, kWhole, nullptr, kBins,
+        "Sum of absolute differences to the reference histogram, pixels."}},
+
+      {{"camera_preview", "camera_preview_front"},
+       {"difference_mean", kOne, kReal, nullptr, kDifference,
+        "Mean difference of the two frames, 0 to 1: how much the preview moves."}},
+      {{"circle_check"},
+       {"centre", kPixel, kReal, &kColumnAxis, kScan,
+        "The chart's centre, column and row: the middle of the longest side between the three marks."}},
+      {{"camera_flash", "camera_flash_vt"},
+       {"mean", kGreyLevel, kReal, nullptr, kMean, "Mean brightness of the flash photo, 0 to 255."}},
+  };
+  return rows;
+}
 
 }  // namespace
 
+const std::vector<MeasurementInfo>& AllMeasurements() {
+  static const std::vector<MeasurementInfo> all = [] {
+    std::vector<MeasurementInfo> list;
+    for (const Row& row : Rows()) {
+      for (const char* phase : row.phases) {
+        list.push_back({std::string(phase) + "_" + row.figure.name, phase, &row.figure});
+      }
+    }
+    return list;
+  }();
+  return all;
+}
+
 const MeasurementInfo* FindMeasurement(std::string_view name) {
-  const auto* found = std::find_if(std::begin(kMeasurements), std::end(kMeasurements),
-                                   [&](const MeasurementInfo& info) { return name == info.name; });
-  return found == std::end(kMeasurements) ? nullptr : found;
+  const auto found = std::find_if(AllMeasurements().begin(), AllMeasurements().end(),
+                                  [&](const MeasurementInfo& info) { return info.name == name; });
+  return found == AllMeasurements().end() ? nullptr : &*found;
 }

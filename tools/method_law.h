@@ -22,9 +22,8 @@ inline double TrueResponse(double f, double sigma_px, double angle_deg = 0) {
   return std::exp(-2 * kPi * kPi * sigma_px * sigma_px * f * f) * Sinc(f * std::cos(angle)) * Sinc(f * std::sin(angle));
 }
 
-inline double MeasuredResponse(double f, double sigma_px, double d) {
-  return TrueResponse(f, sigma_px) * Sinc(2 * f) * Sinc(f) * std::fabs(std::cos(2 * kPi * f * d));
-}
+/// What the measure itself multiplies every response with.
+inline double MethodFactor(double f, double d) { return Sinc(2 * f) * Sinc(f) * std::fabs(std::cos(2 * kPi * f * d)); }
 
 /// The lowest frequency at which a response that starts at 1 falls to 0.5; `limit` if it stays above up to there.
 template <typename Response>
@@ -52,13 +51,19 @@ struct Bounds {
   double low, high;
 };
 
-/// What the measure may read, in units of Nyquist, for a region of npix columns.
-inline Bounds MeasuredMtf50(double sigma_px, int npix) {
+/// What the measure may read of a lens of this response, in units of Nyquist, for a region of npix columns.
+template <typename Response>
+Bounds MeasuredMtf50(const Response& response, int npix) {
   const double worst = npix % 2 == 0 ? 0.5 : 1.0;
   const auto at = [&](double d) {
-    return 2 * HalfPoint([&](double f) { return MeasuredResponse(f, sigma_px, d); }, 0.5);
+    return 2 * HalfPoint([&](double f) { return response(f) * MethodFactor(f, d); }, 0.5);
   };
   return {at(worst), at(0)};
+}
+
+/// The same for a Gaussian blur of sigma pixels.
+inline Bounds MeasuredMtf50(double sigma_px, int npix) {
+  return MeasuredMtf50([&](double f) { return TrueResponse(f, sigma_px); }, npix);
 }
 
 }  // namespace method_law

@@ -38,17 +38,20 @@ Picture::Picture(int width, int height)
   cairo_paint(cr_.get());
 }
 
-void Picture::Place(const cv::Mat& image, double x, double y, double scale) {
+PhotoPlace Picture::PlacePhoto(const cv::Mat& image, cv::Point2d origin, double scale) {
   cv::Mat scaled;
   cv::resize(image, scaled, cv::Size(), scale, scale, scale < 1 ? cv::INTER_AREA : cv::INTER_NEAREST);
-  cv::Mat pixels;
-  cv::cvtColor(scaled, pixels, scaled.channels() == 1 ? cv::COLOR_GRAY2BGRA : cv::COLOR_BGR2BGRA);
+  cv::Mat pixels = scaled;
+  if (scaled.channels() != 4) {
+    cv::cvtColor(scaled, pixels, scaled.channels() == 1 ? cv::COLOR_GRAY2BGRA : cv::COLOR_BGR2BGRA);
+  }
   const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> source(
       cairo_image_surface_create_for_data(pixels.data, CAIRO_FORMAT_RGB24, pixels.cols, pixels.rows,
                                           static_cast<int>(pixels.step)),
       cairo_surface_destroy);
-  cairo_set_source_surface(cr_.get(), source.get(), x, y);
+  cairo_set_source_surface(cr_.get(), source.get(), origin.x, origin.y);
   cairo_paint(cr_.get());
+  return {origin, scale};
 }
 
 void Picture::Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed) {
@@ -153,6 +156,9 @@ void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area) {
     if (plot.bars) picture.Line({place({point.x, plot.y_min}), place(point)}, {0.1, 0.35, 0.75}, 1);
     line.push_back(place(point));
   }
+  std::vector<cv::Point2d> second_line;
+  for (const cv::Point2d& point : plot.second_curve) second_line.push_back(place(point));
+  if (!second_line.empty()) picture.Line(second_line, kInk, 1);
   if (!plot.bars) picture.Line(line, {0.1, 0.35, 0.75}, 2);
   for (const Plot::Marker& marker : plot.markers) {
     if (!finite(marker.at) || marker.at.x > plot.x_max) continue;

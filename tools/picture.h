@@ -19,14 +19,21 @@ inline constexpr Colour kGood = {0.0, 0.75, 0.85};      // cyan
 inline constexpr Colour kDoubtful = {0.95, 0.80, 0.0};  // yellow
 inline constexpr Colour kPoor = {0.90, 0.10, 0.10};     // red
 
+/// Where a photo's pixels lie on a picture: pixel centres at whole numbers.
+struct PhotoPlace {
+  cv::Point2d origin;
+  double scale;
+  cv::Point2d operator()(cv::Point2d p) const { return origin + (p + cv::Point2d(0.5, 0.5)) * scale; }
+};
+
 enum class Align { kLeft, kCentre, kRight };
 
 class Picture {
  public:
   Picture(int width, int height);
 
-  /// Puts a CV_8UC3 or CV_8UC1 picture with its top left corner at (x, y), scaled.
-  void Place(const cv::Mat& image, double x, double y, double scale);
+  /// Puts a picture (8 bits; 1, 3 or 4 channels) with its top left corner there, scaled.
+  PhotoPlace PlacePhoto(const cv::Mat& image, cv::Point2d origin, double scale);
   void Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed = false);
   void FillRectangle(const cv::Rect2d& rectangle, Colour colour);
   void Circle(cv::Point2d centre, double radius, Colour colour, double width);
@@ -53,6 +60,7 @@ struct Plot {
   std::string second_x_label;              // above the frame, empty for none
   double second_x_factor = 1;              // second axis = first x factor
   std::vector<cv::Point2d> curve;
+  std::vector<cv::Point2d> second_curve;
   bool bars = false;  // the curve as bars
   std::vector<double> horizontal_lines;
   struct Marker {

@@ -8,6 +8,7 @@
 
 #include <cerrno>
 #include <chrono>
+#include <csignal>
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
@@ -16,12 +17,23 @@
 #include <fstream>
 #include <iostream>
 #include <iterator>
+#include <mutex>
 #include <sstream>
+#include <thread>
 
 namespace {
 
 std::vector<LogLine> log_lines;
 bool show_log_lines = false;
+
+std::mutex scratch_mutex;
+std::string scratch_path;  // empty while there is none
+
+void RemoveScratch() {
+  std::error_code ignored;
+  if (!scratch_path.empty()) std::filesystem::remove_all(scratch_path, ignored);
+  scratch_path.clear();
+}
 
 void CollectLogLine(const __android_logger_data* /*where*/, const char* message) {
   std::string text = message;
@@ -53,12 +65,10 @@ std::int64_t MillisSinceEpoch() {
 }
 
 std::string ReadWholeFile(const std::string& path, ExitStatus status) {
+  if (std::filesystem::is_directory(path)) throw Failure(status, path + ": is a directory");
   std::ifstream file(path, std::ios::binary);
-  std::stringstream content;
-  if (!file || std::filesystem::is_directory(path) || (file.peek() != EOF && !(content << file.rdbuf()))) {
-    throw Failure(status, path + ": can't be read (" + std::strerror(errno != 0 ? errno : EISDIR) + ")");
-  }
-  return content.str();
+  if (!file) throw Failure(status, path + ": can't be read (" + std::strerror(errno) + ")");
+  return {std::istreambuf_iterator<char>(file), {}};
 }
 
 void WriteWholeFile(const std::string& path, const std::string& content) {
@@ -121,15 +131,34 @@ std::vector<std::string> SideOutput::TakeChatter() {
   return lines;
 }
 
-ScratchFolder::ScratchFolder() {
-  std::string pattern = (std::filesystem::temp_directory_path() / "qvtester-XXXXXX").string();
-  if (mkdtemp(pattern.data()) == nullptr) {
-    throw Failure(kInternalFault, pattern + ": no temporary folder can be made (" + std::strerror(errno) + ")");
-  }
-  path_ = pattern;
+ScratchFolder::~ScratchFolder() {
+  const std::lock_guard<std::mutex> lock(scratch_mutex);
+  RemoveScratch();
 }
 
-ScratchFolder::~ScratchFolder() {
-  std::error_code ignored;
-  std::filesystem::remove_all(path_, ignored);
+const std::string& ScratchFolder::path() {
+  const std::lock_guard<std::mutex> lock(scratch_mutex);
+  if (scratch_path.empty()) {
+    std::string pattern = (std::filesystem::temp_directory_path() / "qvtester-XXXXXX").string();
+    if (mkdtemp(pattern.data()) == nullptr) {
+      throw Failure(kInternalFault, pattern + ": no temporary folder can be made (" + std::strerror(errno) + ")");
+    }
+    scratch_path = pattern;
+  }
+  return scratch_path;
+}
+
+void WatchForInterrupts() {
+  static sigset_t interrupts;
+  sigemptyset(&interrupts);
+  sigaddset(&interrupts, SIGINT);
+  sigaddset(&interrupts, SIGTERM);
+  pthread_sigmask(SIG_BLOCK, &interrupts, nullptr);
+  std::thread([] {
+    int signal = 0;
+    sigwait(&interrupts, &signal);
+    const std::lock_guard<std::mutex> lock(scratch_mutex);
+    RemoveScratch();
+    std::_Exit(128 + signal);
+  }).detach();
 }

@@ -54,17 +54,19 @@ class SideOutput {
   std::int64_t taken_ = 0;
 };
 
-/// A directory below the system's temporary one, removed with all it holds.
+/// A directory below the system's temporary one, made when first asked for, removed with all it holds; also when the
+/// program is interrupted. One at a time.
 class ScratchFolder {
  public:
-  ScratchFolder();
+  ScratchFolder() = default;
   ~ScratchFolder();
   ScratchFolder(const ScratchFolder&) = delete;
   ScratchFolder& operator=(const ScratchFolder&) = delete;
-  const std::string& path() const { return path_; }
-
- private:
-  std::string path_;
+  const std::string& path();
 };
+
+/// From here on an interrupt removes the scratch folder and ends the program with status 130. Call before any thread is
+/// started.
+void WatchForInterrupts();
 
 #endif  // QVTESTER_TOOLS_PROGRAM_H_

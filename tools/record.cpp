@@ -13,9 +13,9 @@ Json ToJson(const Unit& unit) {
 
 const char* NonFiniteName(double value) { return std::isnan(value) ? "nan" : value > 0 ? "inf" : "-inf"; }
 
-Json Number(double value, Shape shape) {
+Json ToJson(double value, Number number) {
   if (!std::isfinite(value)) return nullptr;
-  return shape == Shape::kCount ? Json(static_cast<std::int64_t>(value)) : Json(value);
+  return number == Number::kWhole ? Json(static_cast<std::int64_t>(value)) : Json(value);
 }
 
 Json ToJson(const Limit& limit) {
@@ -35,25 +35,25 @@ Json ToJson(const Measurement& m) {
   if (m.marginal) json["marginal"] = true;
   if (m.outcome == Outcome::kUnset) {
     // No value: it was asked for, and not measured.
-  } else if (IsList(m.info->shape)) {
+  } else if (m.info->figure->axis != nullptr) {
     Json& points = json["measured_value"] = Json::array();
+    const bool whole_axis = m.info->figure->axis == &kPatchAxis || m.info->figure->axis == &kLevelAxis;
     for (std::size_t i = 0; i < m.values.size(); ++i) {
-      points.push_back({Number(m.axis[i], m.info->shape), Number(m.values[i], m.info->shape)});
+      points.push_back({ToJson(m.axis[i], whole_axis ? Number::kWhole : Number::kReal),
+                        ToJson(m.values[i], m.info->figure->number)});
     }
-    const bool places = m.info->shape == Shape::kPlaces;
-    Json dimension = ToJson(places ? kPixel : kNyquist);
-    dimension["name"] = places ? "column" : "frequency";
+    Json dimension = ToJson(*m.info->figure->axis);
     dimension["description"] = "";
     json["dimensions"] = {dimension};
   } else {
-    json["measured_value"] = Number(m.value(), m.info->shape);
+    json["measured_value"] = ToJson(m.value(), m.info->figure->number);
   }
   const auto bad = std::find_if(m.values.begin(), m.values.end(), [](double v) { return !std::isfinite(v); });
   if (bad != m.values.end()) json["non_finite"] = NonFiniteName(*bad);
-  json["units"] = ToJson(m.info->unit);
-  json["method"] = m.info->method;
+  json["units"] = ToJson(m.info->figure->unit);
+  json["method"] = m.info->figure->method;
   if (const Json limits = ToJson(m.limit); !limits.empty()) json["limits"] = limits;
-  json["docstring"] = m.info->docstring;
+  json["docstring"] = m.info->figure->docstring;
   return json;
 }
 
@@ -62,27 +62,47 @@ bool Within(double value, const std::optional<double>& min, const std::optional<
 }
 
 Limit ReadLimit(const std::string& where, const std::string& name, const Json& json) {
+  const auto refuse = [&](const std::string& why) { throw Failure(kWrongUsage, where + why); };
   const MeasurementInfo* info = FindMeasurement(name);
-  if (info == nullptr) throw Failure(kWrongUsage, where + "no measurement has this name");
-  if (IsList(info->shape)) throw Failure(kWrongUsage, where + "a list has no limits");
+  if (info == nullptr) refuse("no measurement has this name");
+  if (info->figure->axis != nullptr) refuse("a list has no limits");
+  if (!json.is_object()) refuse("it is " + json.dump() + ", not an object of bounds");
   Limit limit;
   for (const auto& [key, value] : json.items()) {
     if (key == "unit") {
-      if (value != info->unit.suffix) {
-        throw Failure(kWrongUsage, where + "its unit is \"" + info->unit.suffix + "\", not " + value.dump());
-      }
+      const char* const unit = info->figure->unit.suffix;
+      if (value != unit) refuse(std::string("its unit is \"") + unit + "\", not " + value.dump());
       continue;
     }
-    std::optional<double>* bound = key == "min"            ? &limit.min
-                                   : key == "max"          ? &limit.max
-                                   : key == "marginal_min" ? &limit.marginal_min
-                                   : key == "marginal_max" ? &limit.marginal_max
-                                                           : nullptr;
-    if (bound == nullptr) throw Failure(kWrongUsage, where + "\"" + key + "\" is neither a bound nor a unit");
-    if (!value.is_number()) throw Failure(kWrongUsage, where + key + " is " + value.dump() + ", not a number");
+    std::optional<double>* const bound = key == "min"            ? &limit.min
+                                         : key == "max"          ? &limit.max
+                                         : key == "marginal_min" ? &limit.marginal_min
+                                         : key == "marginal_max" ? &limit.marginal_max
+                                                                 : nullptr;
+    if (bound == nullptr) refuse("\"" + key + "\" is neither a bound nor a unit");
+    if (!value.is_number()) refuse(key + " is " + value.dump() + ", not a number");
     *bound = value.get<double>();
   }
+  if (!limit.given()) refuse("it has no bound");
+  if (limit.min && limit.max && *limit.min > *limit.max) refuse("its min lies above its max");
   return limit;
+}
+
+// Refuses what parsers let pass: a name given twice.
+Json ParseLimits(const std::string& text) {
+  std::vector<std::vector<std::string>> names;  // of the objects that are open
+  return Json::parse(text, [&](int /*depth*/, Json::parse_event_t event, Json& parsed) {
+    if (event == Json::parse_event_t::object_start) names.emplace_back();
+    if (event == Json::parse_event_t::object_end) names.pop_back();
+    if (event == Json::parse_event_t::key) {
+      const auto name = parsed.get<std::string>();
+      if (std::find(names.back().begin(), names.back().end(), name) != names.back().end()) {
+        throw std::runtime_error("\"" + name + "\" stands there twice");
+      }
+      names.back().push_back(name);
+    }
+    return true;
+  });
 }
 
 }  // namespace
@@ -99,13 +119,18 @@ const char* Name(Outcome outcome) {
 Limits ReadLimits(const std::string& path) {
   const std::string text = ReadWholeFile(path, kWrongUsage);
   try {
-    const Json json = Json::parse(text);
+    const Json json = ParseLimits(text);
+    if (!json.is_object() || !json.contains("limits") || !json["limits"].is_object()) {
+      throw std::runtime_error("it holds no object \"limits\"");
+    }
     Limits limits = {json.value("name", ""), json.value("revision", ""), {}};
-    for (const auto& [name, limit] : json.at("limits").items()) {
+    for (const auto& [name, limit] : json["limits"].items()) {
       limits.by_name[name] = ReadLimit(path + ": limit of " + name + ": ", name, limit);
     }
     return limits;
-  } catch (const Json::exception& e) {
+  } catch (const Failure&) {
+    throw;
+  } catch (const std::exception& e) {
     throw Failure(kWrongUsage, path + ": not a limits file (" + e.what() + ")");
   }
 }
@@ -134,9 +159,9 @@ const Measurement* Phase::Find(const std::string& figure) const {
 
 void Record::Judge() {
   for (const auto& [name, limit] : limits.by_name) {  // what was asked of this test and not measured is shown as such
-    const std::string prefix = phase.name + "_";
-    if (name.compare(0, prefix.size(), prefix) != 0 || phase.Find(name.substr(prefix.size())) != nullptr) continue;
-    phase.measurements.push_back({FindMeasurement(name), {}, {}, limit, Outcome::kUnset, false});
+    const MeasurementInfo* const info = FindMeasurement(name);
+    if (info->phase != phase.name || phase.Find(info->figure->name) != nullptr) continue;
+    phase.measurements.push_back({info, {}, {}, limit, Outcome::kUnset, false});
   }
   for (Measurement& m : phase.measurements) {
     const auto limit = limits.by_name.find(m.info->name);
@@ -148,11 +173,18 @@ void Record::Judge() {
 }
 
 Outcome Record::outcome() const {
-  if (phase.code != QV_SUCCESS) return Outcome::kError;
+  if (phase.code != QV_SUCCESS || cannot_judge) return Outcome::kError;
   const bool failed = std::any_of(phase.measurements.begin(), phase.measurements.end(),
                                   [](const Measurement& m) { return m.outcome == Outcome::kFail; });
-  return failed ? Outcome::kFail : Outcome::kPass;
+  return failed || doubtful ? Outcome::kFail : Outcome::kPass;
 }
+
+bool Record::limited() const {
+  return std::any_of(phase.measurements.begin(), phase.measurements.end(),
+                     [](const Measurement& m) { return m.limit.given(); });
+}
+
+std::string Record::ToText() const { return ToJson().dump(2, ' ', false, Json::error_handler_t::replace) + "\n"; }
 
 bool Record::marginal() const {
   return std::any_of(phase.measurements.begin(), phase.measurements.end(),

@@ -27,6 +27,8 @@ struct Limit {
 struct Limits {
   std::string name, revision;
   std::map<std::string, Limit> by_name;
+
+  bool given() const { return !by_name.empty(); }
 };
 
 /// Reads a limits file; throws Failure (wrong usage) that names the file and what is wrong with it.
@@ -79,12 +81,17 @@ struct Record {
   std::vector<Input> inputs;
   std::vector<LogLine> log_lines;
   std::vector<std::string> details;  // why a run is an ERROR or what to doubt, a sentence each
+  bool doubtful = false;             // measured, but not to be trusted: never a PASS
+  bool cannot_judge = false;         // the test ran, but its figures say nothing about the unit
 
   /// Holds every figure against its limit. Call once, when all figures are in.
   void Judge();
   Outcome outcome() const;
   bool marginal() const;
+  bool limited() const;  // some figure of this test has a limit
   Json ToJson() const;
+  /// The record as a file's content; what is not UTF-8 is replaced.
+  std::string ToText() const;
 };
 
 #endif  // QVTESTER_TOOLS_RECORD_H_

@@ -1,5 +1,7 @@
 #include "tools/scene.h"
 
+#include <cmath>
+
 #include "chart/chart_layout.h"
 
 namespace {
@@ -40,6 +42,28 @@ Scene SfrChart(const SfrChartStyle& style) {
 
 cv::Rect2d SfrChartBounds() {
   return {-kPatchHalf, -kPatchHalf, kChartSide + 2 * kPatchHalf, kChartSide + 2 * kPatchHalf};
+}
+
+Scene AimingTarget() {
+  Scene scene;
+  for (const auto& [x, y] : kMarkCentres) {
+    AddMark(scene, {static_cast<double>(x), static_cast<double>(y)}, kMarkSizes.back().module);
+  }
+  return scene;
+}
+
+Scene DustyTarget(const std::vector<DustSpeck>& specks, double darkness) {
+  constexpr int kCorners = 96;
+  Scene scene;
+  for (const DustSpeck& speck : specks) {
+    FilledShape disc = {{}, Grey(255 * (1 - darkness))};
+    for (int i = 0; i < kCorners; ++i) {
+      const double angle = 2 * CV_PI * i / kCorners;
+      disc.outline.push_back(speck.centre + cv::Point2d(std::cos(angle), std::sin(angle)) * (speck.diameter_px / 2));
+    }
+    scene.shapes.push_back(disc);
+  }
+  return scene;
 }
 
 cv::Point2d Map(const cv::Matx33d& transform, cv::Point2d point) {

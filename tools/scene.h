@@ -27,8 +27,20 @@ struct SfrChartStyle {
 /// The sharpness chart, in chart units (chart/chart_layout.h).
 Scene SfrChart(const SfrChartStyle& style);
 
-/// What of the scene must be in view: bounds in chart units.
+/// What of the sharpness chart must be in view, in chart units.
 cv::Rect2d SfrChartBounds();
+
+/// The three marks alone, large, for aiming a preview at; in chart units, with bounds as the sharpness chart's.
+Scene AimingTarget();
+
+struct DustSpeck {
+  cv::Point2d centre;  // column, row
+  double diameter_px;
+};
+
+/// A plain target with specks on the lens, in photo pixels; `darkness` is how much darker than the target they are, 0
+/// to 1.
+Scene DustyTarget(const std::vector<DustSpeck>& specks, double darkness);
 
 /// Fills the shapes, each corner mapped by a projective transform to the target's coordinates.
 void Fill(cairo_t* cr, const Scene& scene, const cv::Matx33d& to_target);

@@ -2,15 +2,16 @@
 #include <cmath>
 #include <memory>
 
+#include "tools/camera.h"
 #include "tools/chart_view.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
 #include "tools/method_law.h"
+#include "tools/options.h"
 
 namespace {
 
 constexpr const char* kRegionNames[] = {"vertical", "horizontal"};
-constexpr const char* kMarkNames[] = {"1 corner", "2", "3"};
 
 struct SharpnessOptions : MeasureOptions {
   std::string photo, truth;
@@ -18,16 +19,8 @@ struct SharpnessOptions : MeasureOptions {
 
 std::vector<double> Widen(const float* values, int count) { return {values, values + count}; }
 
-std::string ReportChart(const Record& record, const ChartView& view) {
-  const Phase& phase = record.phase;
-  std::string text =
-      Format("marks      %zu found, %.1f px a module; legs %.3f : 1 at %.1f degrees; threshold %d\n", view.marks.size(),
-             phase.Find("module_size")->value(), view.legs_ratio, view.legs_angle_deg, view.threshold);
-  return text + Format("chart      turned by %.0f degrees counter-clockwise\n", view.turn_deg);
-}
-
-std::string ReportSharpness(const Record& record, const ChartView& view, const std::optional<double>& pitch) {
-  std::string text = ReportChart(record, view);
+std::string ReportSharpness(const Record& record, const ChartView& view, double pitch) {
+  std::string text = ReportChart(view);
   for (const char* region : kRegionNames) {
     const Measurement& m = *record.phase.Find(std::string("mtf50_") + region);
     text += Format("MTF50      %-10s  %s%s\n", region, FrequencyText(m.value(), record.inputs[0].height, pitch).c_str(),
@@ -42,23 +35,38 @@ int ColumnsAcross(const Record& record, int otherwise) {
   return curve == nullptr ? otherwise : cvRound(2 / curve->axis.at(1));
 }
 
-// True figure, what this method makes of it, and what was measured, side by side.
-std::string CompareWithTruth(const Record& record, const std::string& path) {
-  const std::string content = ReadWholeFile(path, kWrongUsage);
+Json ReadTruth(const std::string& path) {
+  const Json truth = Json::parse(ReadWholeFile(path, kWrongUsage), nullptr, false);
+  if (truth.is_discarded()) throw Failure(kWrongUsage, path + ": not the truth of a simulated photo");
+  return truth;
+}
+
+// True figure, what this method makes of it, and what was measured, side by side. Straightening a turned chart
+// interpolates between pixels, which costs a further sinc^2 along the way.
+std::string CompareWithTruth(const Record& record, const ChartView& view, const Json& truth, const std::string& path) {
   try {
-    const Json truth = Json::parse(content);
-    const int npix = ColumnsAcross(record, truth.at("mtf50_expected_of_method").at("npix"));
-    const auto [low, high] = method_law::MeasuredMtf50(truth.at("parameters").at("blur_px"), npix);
+    const int npix = ColumnsAcross(record, truth.at("npix"));
+    const Json& parameters = truth.at("parameters");
+    CameraModel lens;
+    lens.blur_px = parameters.at("blur_px");
+    lens.defocus_px = parameters.at("defocus_px");
+    lens.smear_px = {parameters.at("smear_px").at("x"), parameters.at("smear_px").at("y")};
     std::string text = "MTF50, Nyquist       true   expected of the method   measured\n";
     for (const char* region : kRegionNames) {
-      text +=
-          Format("  %-14s   %.4f      %.4f to %.4f       %.4f\n", region, truth.at("mtf50").at("nyquist").get<double>(),
-                 low, high, record.phase.Find(std::string("mtf50_") + region)->value());
+      const Json& edge = truth.at("mtf50").at(region);
+      const double angle = edge.at("edge_direction_deg").get<double>() * CV_PI / 180;
+      const auto response = [&](double f) {
+        const double interpolated = view.straightened_by_deg == 0 ? 1 : method_law::Sinc(f);
+        return LensResponse(lens, f, {-std::sin(angle), std::cos(angle)}) * interpolated * interpolated;
+      };
+      const auto [low, high] = method_law::MeasuredMtf50(response, npix);
+      text += Format("  %-14s   %.4f      %.4f to %.4f       %.4f\n", region, edge.at("mtf50_nyquist").get<double>(),
+                     low, high, record.phase.Find(std::string("mtf50_") + region)->value());
     }
-    return text + Format(
-                      "  (expected of an upright chart %d pixels wide at the edge; turned ones read lower: they are\n"
-                      "  straightened, which softens by up to a tenth)\n",
-                      npix);
+    return text +
+           Format(
+               "  (expected of a region %d pixels across, straightened by %d degrees; noise moves single readings)\n",
+               npix, view.straightened_by_deg);
   } catch (const Json::exception& e) {
     throw Failure(kWrongUsage, path + ": not the truth of a simulated chart photo (" + e.what() + ")");
   }
@@ -74,23 +82,16 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
   const double width = photo.cols * scale;
   const double height = std::max(photo.rows * scale, 760.0);
   Picture picture(cvRound(width + 2 * kPlotWidth + 16), cvRound(height + kHead));
-  picture.Place(photo, 0, kHead, scale);
-  const auto on_photo = [&](cv::Point2d p) { return cv::Point2d((p.x + 0.5) * scale, (p.y + 0.5) * scale + kHead); };
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHead}, scale);
 
   const bool measured = record.phase.code == QV_SUCCESS;
   const Colour mark_colour = measured ? kGood : kPoor;
-  picture.Text(measured ? Format("%s: %s, chart turned by %.0f degrees, threshold %d", record.test_name.c_str(),
+  picture.Text(measured ? Format("%s: %s, chart turned by %.1f degrees, threshold %d", record.test_name.c_str(),
                                  Name(record.outcome()), view.turn_deg, view.threshold)
                         : Format("%s: code %d, %zu of 3 marks, threshold %d", record.test_name.c_str(),
                                  record.phase.code, view.marks.size(), view.threshold),
                {12, 28}, 18, kInk);
-  for (std::size_t i = 0; i < view.marks.size(); ++i) {
-    const Mark& mark = view.marks[i];
-    const cv::Point2d at = on_photo(mark.centre);
-    picture.Circle(at, std::max(6.0, 5 * mark.module_px * scale), mark_colour, 3);
-    picture.Text(measured ? kMarkNames[i] : "candidate", at + cv::Point2d(0, 5.5 * mark.module_px * scale + 18), 16,
-                 mark_colour, Align::kCentre, true);
-  }
+  DrawMarks(picture, view, place, mark_colour);
   if (!measured) return picture.Png();
 
   const std::array<RegionView, 2> regions = LookAtRegions(*theTester, photo);
@@ -103,7 +104,7 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
                              : mtf50.marginal                  ? ", marginal"
                                                                : ", good";
     std::vector<cv::Point2d> outline;
-    for (const cv::Point2d& corner : region.outline) outline.push_back(on_photo(corner));
+    for (const cv::Point2d& corner : region.outline) outline.push_back(place(corner));
     picture.Line(outline, colour, 3, true);
     const cv::Point2d middle = (outline[0] + outline[2]) / 2;
     picture.Text(kRegionNames[i], middle - cv::Point2d(0, 8), 16, colour, Align::kCentre, true);
@@ -144,36 +145,30 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
 CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
   auto options = std::make_shared<SharpnessOptions>();
   command.add_option("PHOTO", options->photo, "Photo of the sharpness chart; - is standard input")->required();
-  command.add_option("--threshold", options->threshold, "Grey level above which a pixel is light [125]")
-      ->check(CLI::Range(0, 255))
-      ->type_name("N");
-  command.add_option("--pixel-pitch", options->pixel_pitch_um, "Pixel pitch of the sensor, for figures in lp/mm")
-      ->check(CLI::PositiveNumber)
-      ->type_name("UM");
+  options->DeclareThresholdOn(command);
+  AddNumber(command, "--pixel-pitch", options->pixel_pitch_um, "Pixel pitch of the sensor, for figures in lp/mm", 0.01,
+            1000, "UM");
   command.add_option("--truth", options->truth, "Truth of a simulated photo, to compare with")->type_name("FILE");
   options->DeclareOn(command);
   return [options, test] {
+    const Json truth = options->truth.empty() ? Json() : ReadTruth(options->truth);
     auto view = std::make_shared<ChartView>();
     Measuring m = test;
     m.inputs = {{QV_RESOURCE_CHART_PHOTO, options->photo}};
     m.look = [view](Record& record) {
-      if (record.phase.code != QV_SUCCESS && record.phase.code != QV_ERROR_PATTERN_NOT_FOUND) return;
-      *view = LookAtChart(*theTester);
-      AddChartFigures(record.phase, *view);
-      if (record.phase.code == QV_ERROR_PATTERN_NOT_FOUND) {
-        std::string sentence = record.inputs[0].path + ": ";
-        for (const std::string& reason : ExplainMiss(*view, SlotPhoto(QV_RESOURCE_CHART_PHOTO))) {
-          sentence += (sentence.back() == ' ' ? "" : ", ") + reason;
-        }
-        record.details.push_back(sentence);
-      } else if (view->candidates > 3) {
-        record.details.push_back(Format("%s: %d places passed as finder marks; the three most alike were used",
-                                        record.inputs[0].path.c_str(), view->candidates));
+      if (theTester->startSize == 0 && record.phase.code == QV_ERROR_UNUSABLE_INPUT) return;
+      *view = DescribeChart(record, record.inputs[0].path, SlotPhoto(QV_RESOURCE_CHART_PHOTO));
+      for (const char* region : kRegionNames) {
+        const Measurement* mtf50 = record.phase.Find(std::string("mtf50_") + region);
+        if (mtf50 == nullptr || std::isfinite(mtf50->value())) continue;
+        record.cannot_judge = true;
+        record.details.push_back(
+            Format("%s: the %s region gives no MTF50; does it show an edge?", record.inputs[0].path.c_str(), region));
       }
     };
-    m.report = [view, options](const Record& record) {
+    m.report = [view, options, truth](const Record& record) {
       const std::string report = ReportSharpness(record, *view, options->pixel_pitch_um);
-      return options->truth.empty() ? report : report + CompareWithTruth(record, options->truth);
+      return truth.is_null() ? report : report + CompareWithTruth(record, *view, truth, options->truth);
     };
     m.annotates_misses = true;
     m.annotate = [view](const Record& record) { return AnnotateSharpness(record, *view); };

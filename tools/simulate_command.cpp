@@ -1,164 +1,158 @@
+#include <algorithm>
 #include <cmath>
 #include <filesystem>
 #include <iostream>
 #include <memory>
 #include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
 #include <sstream>
 
-#include "chart/chart_layout.h"
-#include "tools/camera.h"
 #include "tools/commands.h"
-#include "tools/method_law.h"
-#include "tools/record.h"
+#include "tools/options.h"
+#include "tools/simulation.h"
 
 namespace {
 
-struct SimulateOptions {
-  CameraModel camera;
-  SfrChartStyle style;
-  std::string output;
-  std::string size = "4000x3000";
-  std::string marks = "auto";
+struct Output {
+  std::string path;
+  int bits = 8;
+  int jpeg_quality = 95;
   bool quiet = false;
 };
 
-cv::Size ParseSize(const std::string& text) {
-  int width = 0;
-  int height = 0;
-  char by = 0;
-  std::istringstream words(text);
-  words >> width >> by >> height;
-  if (!words || !words.eof() || by != 'x' || std::min(width, height) < 16 || std::max(width, height) > 30000) {
-    throw Failure(kWrongUsage, "--size " + text + ": give WIDTHxHEIGHT in pixels, 16 to 30000 each, as 4000x3000");
+std::string Extension(const std::string& path) {
+  std::string extension = std::filesystem::path(path).extension();
+  std::transform(extension.begin(), extension.end(), extension.begin(),
+                 [](unsigned char c) { return std::tolower(c); });
+  return extension;
+}
+
+// A preview frame as a phone delivers it: luma, then half-size chroma, V before U.
+std::string Nv21(const cv::Mat& photo) {
+  if (photo.cols % 2 != 0 || photo.rows % 2 != 0) {
+    throw Failure(kWrongUsage, "an NV21 frame needs an even width and height");
   }
-  return {width, height};
-}
-
-double PixelsPerUnit(const CameraModel& camera) {
-  const cv::Matx33d photo_from_scene = PhotoFromScene(camera, SfrChartBounds());
-  return cv::norm(Map(photo_from_scene, {1, 0}) - Map(photo_from_scene, {0, 0}));
-}
-
-// "auto" suits the marks to an upright photo, so that turning the chart does not change it.
-int ModuleOf(const std::string& marks, CameraModel camera) {
-  for (const MarkSize& size : kMarkSizes) {
-    if (marks == size.name) return size.module;
+  cv::Mat planes;  // luma, U plane, V plane
+  cv::cvtColor(photo, planes, cv::COLOR_BGR2YUV_I420);
+  const std::size_t luma = photo.total();
+  const uchar* const u = planes.data + luma;
+  const uchar* const v = u + luma / 4;
+  std::string frame(reinterpret_cast<const char*>(planes.data), luma);
+  for (std::size_t i = 0; i < luma / 4; ++i) {
+    frame += static_cast<char>(v[i]);
+    frame += static_cast<char>(u[i]);
   }
-  camera.turn_deg = 0;
-  return SuitableMarks(PixelsPerUnit(camera)).module;
+  return frame;
 }
 
-Json PointJson(cv::Point2d p) { return {{"x", p.x}, {"y", p.y}}; }
-
-// What every measure of the photo should read; frequencies in units of Nyquist.
-Json ChartTruth(const SimulateOptions& options) {
-  const CameraModel& camera = options.camera;
-  const cv::Matx33d photo_from_scene = PhotoFromScene(camera, SfrChartBounds());
-  const double scale = PixelsPerUnit(camera);
-  Json truth;
-  truth["schema"] = "qvtester-truth-1";
-  truth["scene"] = "chart";
-  truth["parameters"] = {{"width", camera.size.width},
-                         {"height", camera.size.height},
-                         {"fill", camera.fill},
-                         {"turn_deg", camera.turn_deg},
-                         {"blur_px", camera.blur_px},
-                         {"gain", camera.gain},
-                         {"shading_percent", camera.shading_percent},
-                         {"noise_percent", camera.noise_percent},
-                         {"seed", camera.seed},
-                         {"edge_angle_deg", options.style.edge_angle_deg},
-                         {"module_units", options.style.module},
-                         {"contrast", options.style.contrast}};
-  truth["pixels_per_unit"] = scale;
-  truth["module_px"] = scale * options.style.module;
-  for (const auto& [x, y] : kMarkCentres) {
-    truth["marks"].push_back(PointJson(Map(photo_from_scene, {static_cast<double>(x), static_cast<double>(y)})));
+std::string Encode(const cv::Mat& photo, const Output& output) {
+  const std::string extension = output.path == "-" ? ".png" : Extension(output.path);
+  if (extension == ".nv21") return Nv21(photo);
+  const bool takes_16_bits = extension == ".png" || extension == ".tif" || extension == ".tiff";
+  if (photo.depth() == CV_16U && !takes_16_bits) {
+    throw Failure(kWrongUsage, output.path + ": 16 bits a channel need a .png or .tif file");
   }
-  // Across either edge the pixel's square is seen turned by the edge's angle on the photo.
-  const double edge = std::remainder(options.style.edge_angle_deg + camera.turn_deg, 90);
-  const double mtf50 = method_law::TrueMtf50(camera.blur_px, edge);
-  const int npix = static_cast<int>(kVerticalRegion.height * scale);
-  const method_law::Bounds expected = method_law::MeasuredMtf50(camera.blur_px, npix);
-  truth["edge_angle_deg"] = edge;
-  truth["mtf50"] = {{"nyquist", mtf50}, {"cycles_per_pixel", mtf50 / 2}};
-  truth["mtf50_expected_of_method"] = {{"nyquist_low", expected.low}, {"nyquist_high", expected.high}, {"npix", npix}};
-  for (int i = 0; i < static_cast<int>(kPatches.size()); ++i) {
-    const ChartPatch& patch = kPatches[i];
-    const double level = camera.gain;
-    truth["patches"].push_back({{"number", i},
-                                {"name", patch.name},
-                                {"drawn_srgb", {patch.red, patch.green, patch.blue}},
-                                {"photo_srgb", {patch.red * level, patch.green * level, patch.blue * level}},
-                                {"centre", PointJson(Map(photo_from_scene, PatchCentre(i)))}});
-  }
-  return truth;
-}
-
-std::string TruthPath(const std::string& photo) {
-  return std::filesystem::path(photo).replace_extension(".truth.json");
-}
-
-void WritePhoto(const std::string& path, const cv::Mat& photo) {
   std::vector<uchar> file;
-  const std::string extension = std::filesystem::path(path).extension();
   try {
-    // Fast compression: the noise does not compress anyway.
-    if (!cv::imencode(extension, photo, file, {cv::IMWRITE_PNG_COMPRESSION, 1, cv::IMWRITE_JPEG_QUALITY, 95})) {
-      throw Failure(kWrongUsage, path + ": the photo can't be encoded");
-    }
+    // Fast compression: noise does not compress anyway.
+    cv::imencode(extension, photo, file,
+                 {cv::IMWRITE_PNG_COMPRESSION, 1, cv::IMWRITE_JPEG_QUALITY, output.jpeg_quality});
   } catch (const cv::Exception&) {
-    throw Failure(kWrongUsage, path + ": name a .png, .jpg, .bmp or .tif file");
+    throw Failure(kWrongUsage, output.path + ": name a .png, .jpg, .bmp, .tif or .nv21 file");
   }
-  WriteWholeFile(path, {file.begin(), file.end()});
+  return {file.begin(), file.end()};
+}
+
+// "photo.png" and "photo.second.png"
+std::string NumberedPath(const std::string& path, std::size_t number) {
+  if (number == 0) return path;
+  std::filesystem::path second(path);
+  return second.replace_extension(".second" + second.extension().string());
+}
+
+void DeclareCamera(CLI::App& command, CameraModel& c) {
+  AddNumber(command, "--fill", c.fill, "Share of the photo that the turned scene takes [0.8]", 0.02, 3, "SHARE");
+  AddNumber(command, "--turn", c.turn_deg, "Turn of the scene, counter-clockwise [0]", -360, 360, "DEG");
+  AddNumber(command, "--pan", c.pan_deg, "Turn about the vertical axis: the right side recedes [0]", -60, 60, "DEG");
+  AddNumber(command, "--tilt", c.tilt_deg, "Turn about the horizontal axis: the lower side recedes [0]", -60, 60,
+            "DEG");
+  AddNumber(command, "--blur", c.blur_px, "Gaussian blur, sigma [0]", 0, 50, "PX");
+  AddNumber(command, "--defocus", c.defocus_px, "Defocus disc, radius [0]", 0, 30, "PX");
+  AddNumber(command, "--gain", c.gain, "Level of white paper in the photo, over 255 [0.92]", 0, 4, "FACTOR");
+  AddNumber(command, "--exposure", c.exposure_ev, "Doublings of every level [0]", -8, 8, "EV");
+  AddNumber(command, "--shading", c.shading_percent, "How much darker the photo's corners are [0]", 0, 100, "PERCENT");
+  AddNumber(command, "--noise", c.noise_percent, "Read noise, standard deviation, of 255 [0]", 0, 100, "PERCENT");
+  AddNumber(command, "--full-well", c.full_well, "Electrons at level 255, for shot noise; 0 for none [0]", 0, 1e9, "N");
+  command.add_option("--seed", c.seed, "Seed of the noise [1]")->type_name("N");
 }
 
 }  // namespace
 
 CommandBody DeclareSimulate(CLI::App& command) {
-  auto o = std::make_shared<SimulateOptions>();
-  command.add_option("-o,--output", o->output, "Photo to write; its truth is written beside it")
+  struct Options : SimulationOptions {
+    Output output;
+    std::string size = "4000x3000", cast = "1,1,1", smear = "0,0", motion = "4,0";
+  };
+  auto o = std::make_shared<Options>();
+  command
+      .add_option("-o,--output", o->output.path,
+                  "Photo to write: .png, .jpg, .bmp, .tif, or .nv21 for a raw preview frame; - is standard output, as "
+                  "PNG. Its truth goes beside it, to PHOTO.truth.json")
       ->required()
       ->type_name("PHOTO");
-  command.add_option("--size", o->size, "Pixels of the photo [4000x3000]")->type_name("WxH");
-  command.add_option("--fill", o->camera.fill, "Share of the photo that the turned chart takes [0.8]")
-      ->check(CLI::Range(0.02, 2.0))
-      ->type_name("SHARE");
-  command.add_option("--turn", o->camera.turn_deg, "Turn of the chart, counter-clockwise [0]")->type_name("DEG");
-  command.add_option("--blur", o->camera.blur_px, "Gaussian blur, sigma [0]")
-      ->check(CLI::Range(0.0, 100.0))
-      ->type_name("PX");
-  command.add_option("--gain", o->camera.gain, "Level of white paper in the photo, over 255 [0.92]")
-      ->check(CLI::Range(0.0, 4.0))
-      ->type_name("FACTOR");
-  command.add_option("--shading", o->camera.shading_percent, "How much darker the photo's corners are [0]")
-      ->check(CLI::Range(0.0, 100.0))
-      ->type_name("PERCENT");
-  command.add_option("--noise", o->camera.noise_percent, "Standard deviation of the noise, of 255 [0]")
-      ->check(CLI::Range(0.0, 100.0))
-      ->type_name("PERCENT");
-  command.add_option("--seed", o->camera.seed, "Seed of the noise [1]")->type_name("N");
-  command.add_option("--edge-angle", o->style.edge_angle_deg, "Angle of the slanted edges [5]")
-      ->check(CLI::Range(3.0, 8.0))
-      ->type_name("DEG");
   command
-      .add_option("--contrast", o->style.contrast, "Stored level of the paper over that of the edges' dark side [5]")
-      ->check(CLI::Range(1.1, 100.0))
-      ->type_name("RATIO");
-  command.add_option("--marks", o->marks, "Size of the finder marks [auto: suits the photo's size]")
+      .add_option("--scene", o->scene,
+                  "What stands before the camera: the sharpness chart, the three marks of an "
+                  "aiming target, two preview frames of a moving chart, a plain target seen through dust [chart]")
+      ->check(CLI::IsMember(SceneNames()))
+      ->type_name("SCENE");
+  command.add_option("--size", o->size, "Pixels of the photo [4000x3000]")->type_name("WxH");
+  DeclareCamera(command, o->camera);
+  command.add_option("--smear", o->smear, "Straight motion during the exposure [0,0]")->type_name("DX,DY");
+  command.add_option("--cast", o->cast, "Colour cast: factors on red, green and blue [1,1,1]")->type_name("R,G,B");
+  AddNumber(command, "--edge-angle", o->style.edge_angle_deg, "chart: angle of the slanted edges [5]", 3, 8, "DEG");
+  AddNumber(command, "--contrast", o->style.contrast,
+            "chart: stored level of the paper over that of the edges' dark side [5]", 1.1, 100, "RATIO");
+  command.add_option("--marks", o->marks, "chart: size of the finder marks [auto: suits the photo's size]")
       ->check(CLI::IsMember({"auto", "fine", "medium", "coarse"}))
       ->type_name("SIZE");
-  command.add_flag("--quiet", o->quiet, "Print nothing");
+  command.add_option("--motion", o->motion, "preview: way of the chart to the second frame, PHOTO.second.png [4,0]")
+      ->type_name("DX,DY");
+  command.add_option("--specks", o->specks, "dust: number of specks [5]")->check(CLI::Range(0, 1000))->type_name("N");
+  AddNumber(command, "--speck-size", o->speck_px, "dust: diameter of a speck [10]", 0.5, 500, "PX");
+  AddNumber(command, "--speck-darkness", o->speck_darkness, "dust: how much darker than the target, 0 to 1 [0.6]", 0, 1,
+            "SHARE");
+  command.add_option("--bits", o->output.bits, "Bits a channel, 8 or 16 [8]")
+      ->check(CLI::IsMember({8, 16}))
+      ->type_name("N");
+  command.add_option("--quality", o->output.jpeg_quality, "Quality of a JPEG file [95]")
+      ->check(CLI::Range(1, 100))
+      ->type_name("N");
+  command.add_flag("--quiet", o->output.quiet, "Print nothing");
   return [o] {
-    o->camera.size = ParseSize(o->size);
-    o->style.module = ModuleOf(o->marks, o->camera);
-    const cv::Mat photo = TakePhoto(o->camera, SfrChart(o->style), SfrChartBounds());
-    WritePhoto(o->output, photo);
-    const std::string truth = TruthPath(o->output);
-    WriteWholeFile(truth, ChartTruth(*o).dump(2) + "\n");
-    if (!o->quiet) {
-      std::cout << Format("%s  %d x %d\n%s\n", o->output.c_str(), photo.cols, photo.rows, truth.c_str());
+    o->camera.size = ParseSize("--size", o->size);
+    const std::vector<double> cast = ParseNumbers("--cast", o->cast, 3);
+    const std::vector<double> smear = ParseNumbers("--smear", o->smear, 2);
+    const std::vector<double> motion = ParseNumbers("--motion", o->motion, 2);
+    o->camera.cast = {cast[0], cast[1], cast[2]};
+    o->camera.smear_px = {smear[0], smear[1]};
+    o->motion_px = {motion[0], motion[1]};
+    const Simulation simulation = Simulate(*o);
+    if (o->output.path == "-" && simulation.levels.size() > 1) {
+      throw Failure(kWrongUsage, "-o -: this scene makes two photos; name a file");
     }
+    CameraModel sensor = o->camera;
+    for (std::size_t i = 0; i < simulation.levels.size(); ++i) {
+      const cv::Mat photo = Sense(sensor, simulation.levels[i], o->output.bits);
+      const std::string path = NumberedPath(o->output.path, i);
+      WriteWholeFile(path, Encode(photo, o->output));
+      if (!o->output.quiet && path != "-") std::cout << Format("%s  %d x %d\n", path.c_str(), photo.cols, photo.rows);
+      sensor.seed += 0x9E3779B97F4A7C15;  // the next photo has noise of its own
+    }
+    if (o->output.path == "-") return static_cast<int>(kWithinLimits);
+    const std::string truth = std::filesystem::path(o->output.path).replace_extension(".truth.json");
+    WriteWholeFile(truth, simulation.truth.dump(2) + "\n");
+    if (!o->output.quiet) std::cout << truth << '\n';
     return static_cast<int>(kWithinLimits);
   };
 }

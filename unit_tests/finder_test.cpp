@@ -66,7 +66,7 @@ TEST(FinderRuns, TheRatioIsHalfAModuleWide) {
   QVTester tester;
   for (const auto& [counts, pattern] : {Runs{{2, 2, 6, 2, 2}, true},
                                         {{1, 1, 3, 1, 1}, true},
-                                        {{1, 1, 1, 1, 1}, false},  // under seven pixels
+                                        {{1, 1, 2, 1, 1}, false},  // under seven pixels
                                         {{3, 3, 9, 3, 0}, false},  // a run is missing
                                         {{20, 20, 44, 28, 28}, true},
                                         {{30, 20, 60, 20, 10}, false},  // 10 is exactly half a module off
@@ -107,13 +107,28 @@ TEST_F(CrossCheck, TheSizesMayDifferByDirection) {
   EXPECT_TRUE(tester_.crossCheckDiagonal(image_, 20, 18, 9, 8));
 }
 
-TEST_F(CrossCheck, ASideMayHoldMaxCountBeforeTheCoreButNotBehind) {
-  EXPECT_EQ(20.5f, tester_.crossCheckVertical(image_, 20, 18, 4, 21));
-  EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(image_, 20, 18, 3, 21));
-  image_.rowRange(22, 40).setTo(255);  // what lies behind the core is gone
-  image_.rowRange(25, 27).setTo(0);
-  image_.rowRange(27, 29).setTo(0);
-  EXPECT_EQ(FLT_MAX, tester_.crossCheckVertical(image_, 20, 18, 2, 21)) << "three light pixels before the core";
+// A column of these run lengths, light before and behind, and where its core's middle is.
+std::pair<cv::Mat, int> Column(const std::array<int, 5>& runs) {
+  cv::Mat column(60, 1, CV_8UC1, cv::Scalar(255));
+  int row = 10;
+  for (std::size_t i = 0; i < 5; row += runs[i++]) {
+    if (i % 2 == 0) column.rowRange(row, row + runs[i]).setTo(0);
+  }
+  return {column, 10 + runs[0] + runs[1] + runs[2] / 2};
+}
+
+TEST(CrossCheckRuns, ASideMayHoldMaxCountBeforeTheCoreButNotBehind) {
+  QVTester tester;
+  const auto passes = [&](const std::array<int, 5>& runs, int maxCount) {
+    const auto [column, core] = Column(runs);
+    const int total = runs[0] + runs[1] + runs[2] + runs[3] + runs[4];
+    return tester.crossCheckVertical(column, core, 0, maxCount, total) != FLT_MAX;
+  };
+  EXPECT_TRUE(passes({4, 4, 12, 3, 3}, 4));
+  EXPECT_FALSE(passes({5, 4, 12, 3, 3}, 4));
+  EXPECT_FALSE(passes({4, 5, 12, 3, 3}, 4));
+  EXPECT_FALSE(passes({4, 4, 12, 4, 3}, 4));
+  EXPECT_FALSE(passes({4, 4, 12, 3, 4}, 4));
 }
 
 TEST_F(CrossCheck, MarksAtTheBorderFailInsteadOfReadingOutside) {
@@ -152,6 +167,47 @@ TEST(FinderPoints, AMarkAtTheRightBorderCountsAtTheRowsEnd) {
   const cv::Mat image = DrawMarks({100, 60}, 4, {{10, 72}});
   EXPECT_THAT(tester.GetFinderPoints(image), ElementsAre(Found({10, 72}, 4)));
   EXPECT_GT(tester.possibleCenters[0].count, 1);
+}
+
+std::vector<int> Counts(const QVTester& tester) {
+  std::vector<int> counts;
+  for (const QVFinderPattern& candidate : tester.possibleCenters) counts.push_back(candidate.count);
+  return counts;
+}
+
+TEST(FinderPoints, RowsAreSampledFromTheSecondInThreesThenInTwos) {
+  QVTester tester;
+  tester.GetFinderPoints(DrawMarks({100, 60}, 5, {{10, 20}}));  // the core's rows are 20 to 34
+  EXPECT_THAT(Counts(tester), ElementsAre(8)) << "2, 5 ... 20, then 22, 24 ... 34";
+  tester.GetFinderPoints(DrawMarks({100, 60}, 4, {{10, 72}}));  // at the right border; the core's rows are 18 to 29
+  EXPECT_THAT(Counts(tester), ElementsAre(3)) << "2, 5 ... 20, then by the first run's four: 24, 28";
+}
+
+TEST(FinderPoints, TheScanStopsWhenThreeAgree) {
+  QVTester tester;
+  tester.GetFinderPoints(DrawMarks({200, 200}, 5, {{10, 10}, {10, 100}, {120, 10}}));
+  EXPECT_THAT(Counts(tester), ElementsAre(8, 8, 2)) << "the third is confirmed by its second row";
+  tester.GetFinderPoints(DrawMarks({200, 200}, 5, {{10, 10}, {10, 100}, {120, 165}}));
+  EXPECT_THAT(Counts(tester), ElementsAre(8, 8, 2)) << "also at a row's end";
+  tester.GetFinderPoints(DrawMarks({200, 200}, 5, {{10, 10}}));
+  EXPECT_FALSE(tester.hasSkipped) << "each search starts anew";
+}
+
+TEST(FinderPoints, MarksThatShareADarkRunAreOne) {
+  QVTester tester;
+  cv::Mat image = DrawMarks({100, 60}, 4, {{10, 10}});
+  DrawMark(image, 10, 34, 4);  // its left side is the other's right side
+  EXPECT_THAT(tester.GetFinderPoints(image), ElementsAre(Found({10, 10}, 4))) << "a find starts the counts afresh";
+}
+
+TEST(FinderPoints, TheDiagonalIsAlwaysChecked) {
+  QVTester tester;
+  cv::Mat image = DrawMarks({60, 60}, 4, {{10, 10}});
+  ASSERT_THAT(tester.GetFinderPoints(image), SizeIs(1));
+  for (const cv::Point corner : {cv::Point(10, 10), {30, 10}, {10, 30}, {30, 30}}) {
+    image(cv::Rect(corner, cv::Size(8, 8))).setTo(255);
+  }
+  EXPECT_THAT(tester.GetFinderPoints(image), IsEmpty()) << "a ring without corners";
 }
 
 TEST(FinderPoints, FewerThanThreeAreHandedOutAndLogged) {
@@ -222,8 +278,8 @@ TEST(FinderSelection, ThePatternIsConfirmedBySizes) {
   EXPECT_TRUE(tester.haveMultiplyConfirmedCenters());  // deviations sum to 1.0 of 31.5
   tester.possibleCenters.emplace_back(0.0f, 0.0f, 10.0f, 1);
   EXPECT_FALSE(tester.haveMultiplyConfirmedCenters()) << "an unconfirmed one lowers the average";
-  tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10, 2}, {0, 0, 14, 2}};
-  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters());
+  tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10.9f, 2}, {0, 0, 11.8f, 2}};
+  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters()) << "deviations of 5.5 %";
 }
 
 TEST(FinderSelection, TwoConfirmedMarksOnlyRaiseTheFlag) {
@@ -241,6 +297,10 @@ TEST(FinderSelection, StrayModuleSizesGoFirstThenTheLeastSeen) {
   tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, 30, 9}};
   EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)));
   EXPECT_THAT(ModuleSizes(tester.possibleCenters), ElementsAre(10, 10, 10));
+
+  tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, 13, 9}};
+  EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)))
+      << "2.25 off an average of 10.75: a fifth of the average is the limit";
 
   tester.possibleCenters.clear();
   for (int i = 1; i <= 8; ++i) tester.possibleCenters.emplace_back(0.0f, static_cast<float>(i), 10.0f, i);

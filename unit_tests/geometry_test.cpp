@@ -73,6 +73,24 @@ TEST(Geometry, AnUprightPictureIsCopiedOntoASquare) {
   EXPECT_THAT(points, ElementsAre(kCorner, kRight, kBelow));
 }
 
+TEST(Geometry, ThePictureTurnsAboutTheMiddleOfTheSquare) {
+  QVTester tester;
+  cv::Mat image(480, 640, CV_8UC1);
+  cv::randu(image, 0, 255);
+  // A chart turned by 90 degrees: it comes back about (320, 320), not about the picture's own middle.
+  std::vector<cv::Point> points = {{300, 200}, {200, 200}, {300, 300}};
+  cv::Mat upright;
+  tester.NormalizePatternImage(image, points, upright);
+  EXPECT_THAT(points, ElementsAre(cv::Point(200, 340), cv::Point(200, 440), cv::Point(300, 340)));
+  cv::Mat expected;
+  cv::warpAffine(image, expected, cv::getRotationMatrix2D({320, 320}, -90, 1), {640, 640}, cv::INTER_LINEAR);
+  EXPECT_EQ(0, cv::norm(expected, upright, cv::NORM_INF));
+  points = {{200, 200}, {210, 300}, {300, 190}};  // 6 degrees the other way
+  tester.NormalizePatternImage(image, points, upright);
+  cv::warpAffine(image, expected, cv::getRotationMatrix2D({320, 320}, 315 - 309, 1), {640, 640}, cv::INTER_LINEAR);
+  EXPECT_EQ(0, cv::norm(expected, upright, cv::NORM_INF));
+}
+
 TEST(Geometry, PointsTravelWithThePicture) {
   QVTester tester;
   for (int turn = 0; turn < 360; turn += 7) {

@@ -1,6 +1,5 @@
 #include "unit_tests/program.h"
 
-#include <gtest/gtest.h>
 #include <sys/wait.h>
 
 #include <cstdlib>
@@ -9,8 +8,6 @@
 #include <valijson/schema_parser.hpp>
 #include <valijson/validation_results.hpp>
 #include <valijson/validator.hpp>
-
-#include "unit_tests/drawing.h"
 
 namespace {
 
@@ -51,4 +48,17 @@ nlohmann::json CheckedRecord(const std::string& text) {
 
 nlohmann::json Measured(const nlohmann::json& record, const std::string& name) {
   return record.at("phases").at(0).at("measurements").at(name).at("measured_value");
+}
+
+std::string SimulatedPhotos::Simulate(const std::vector<std::string>& options, const std::string& name) {
+  std::string photo = folder_.Path(name + ".png");
+  std::vector<std::string> arguments = {"simulate", "-o", photo, "--size", "1200x900", "--quiet"};
+  arguments.insert(arguments.end(), options.begin(), options.end());
+  const ProgramRun run = RunProgram(arguments);
+  EXPECT_EQ(0, run.status) << run.err;
+  return photo;
+}
+
+nlohmann::json SimulatedPhotos::Truth(const std::string& name) const {
+  return nlohmann::json::parse(ReadFile(folder_.Path(name + ".truth.json")));
 }

@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include <cstring>
+#include <map>
 
 #include "core/property_table.h"
 #include "qvtester/tester.h"
@@ -47,14 +48,25 @@ TEST(Properties, EveryOneKeepsItsOwnValue) {
 
 TEST(Properties, DefaultsAreTheCalibratedOnes) {
   QVTester tester;
-  EXPECT_EQ(538, Get<int>(tester, 0));
-  EXPECT_EQ(0x40000000u, Get<std::uint32_t>(tester, 51));  // 2.0
-  EXPECT_EQ(0x3f28f5c3u, Get<std::uint32_t>(tester, 79));  // 0.66
-  EXPECT_EQ(125, Get<int>(tester, 86));
-  EXPECT_EQ(125, Get<int>(tester, 93));
-  EXPECT_EQ(25, Get<int>(tester, 94));
-  const auto matrix = Get<std::array<float, 9>>(tester, 63);
-  EXPECT_THAT(matrix, ElementsAre(3528.04f, 0, 1023.5f, 0, 3528.04f, 1223.5f, 0, 0, 1));
+  const std::map<int, int> kInts = {{0, 538}, {1, 1440}, {2, 2560}, {7, 10},   {16, 6},   {26, 5},  {32, 5},  {43, 80},
+                                    {44, 50}, {45, 80},  {46, 50},  {55, 8},   {56, 8},   {57, 4},  {58, 4},  {59, 10},
+                                    {60, 1},  {66, 500}, {67, 200}, {68, 3},   {69, 30},  {71, 4},  {74, 0},  {75, 0},
+                                    {77, 0},  {80, 5},   {81, 7},   {82, 865}, {83, 558}, {84, 70}, {85, 70}, {86, 125},
+                                    {89, 0},  {90, 3},   {93, 125}, {94, 25}};
+  const std::map<int, float> kFloats = {
+      {6, 4500.0f}, {8, 12000.0f}, {9, 8.0f},   {10, 25.0f},   {17, 200.0f}, {18, 300.0f}, {19, 80.0f},
+      {27, 10.0f},  {28, 5000.0f}, {29, 60.0f}, {30, 1.0f},    {31, 1.0f},   {33, 10.0f},  {34, 5000.0f},
+      {35, 60.0f},  {36, 1.0f},    {37, 1.0f},  {47, 5000.0f}, {48, 15.0f},  {49, 1.0f},   {50, 3.0f},
+      {51, 2.0f},   {53, 0.12f},   {54, 0.7f},  {61, 50.0f},   {70, 2.0f},   {79, 0.66f}};
+  for (const auto& [index, value] : kInts) EXPECT_EQ(value, Get<int>(tester, index)) << index;
+  for (const auto& [index, value] : kFloats) EXPECT_EQ(value, Get<float>(tester, index)) << index;
+  using Nine = std::array<float, 9>;
+  EXPECT_THAT(Get<Nine>(tester, 52), ElementsAre(0.34545696f, 0.092805467f, -0.021453569f, 0.17821464f, 0.47477016f,
+                                                 -0.062371522f, 0.23621598f, 0.012985487f, 1.2785896f));
+  EXPECT_THAT(Get<Nine>(tester, 62), ElementsAre(4721.107f, 0, 1023.5f, 0, 4721.107f, 1223.5f, 0, 0, 1));
+  EXPECT_THAT(Get<Nine>(tester, 63), ElementsAre(3528.04f, 0, 1023.5f, 0, 3528.04f, 1223.5f, 0, 0, 1));
+  EXPECT_THAT(Get<Nine>(tester, 64), ElementsAre(-0.192f, 0.8761f, 0, 0, 0.596338f, 0, 0, 0, 0));
+  EXPECT_THAT(Get<Nine>(tester, 65), ElementsAre(-0.129743f, 0.1889f, 0, 0, 0.194117f, 0, 0, 0, 0));
 }
 
 TEST(Properties, UnknownIndicesChangeNothing) {

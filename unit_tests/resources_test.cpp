@@ -171,6 +171,7 @@ TEST_F(Resources, BadArgumentsAreRefused) {
   EXPECT_EQ(-97, SetResource(Slot(20), 2, 2, static_cast<void*>(nullptr)));
   EXPECT_FALSE(Filled(20));
   EXPECT_EQ(-99, SetLDRResource(Slot(20), INT_MAX, INT_MAX, ldr));
+  EXPECT_EQ(-99, SetLDRResource(Slot(20), 1 << 20, 1 << 20, ldr)) << "OpenCV's own out of memory";
 }
 
 TEST_F(Resources, OnlyHdrSlotsAreReleasedOneByOne) {

@@ -7,6 +7,7 @@
 #include <optional>
 
 #include "chart/chart_image.h"
+#include "chart/chart_layout.h"
 #include "chart/points.h"
 #include "core/slots.h"
 #include "qvtester/log.h"
@@ -165,33 +166,21 @@ std::vector<cv::Point3i> QVTester::GetColorPatchRGB(cv::Mat image, std::vector<c
   cv::Point p2;
   cv::Point p3;
   SortPatternPoints(finder_points, p1, p2, p3);
-  const int distance = static_cast<int>(Distance(p1, p2));
   QVDEBUGP("[%s] img.(rows,cols)=(%d,%d)", name, image.rows, image.cols);
-  const int half = distance / 21;
-  const int pitch = (p2.y - p1.y) / 7;  // serves all four sides
+  const PatchGrid grid = PlacePatches(p1, p2, p3);
 
-  // First patch's centre less one step, and the step: row in x, column in y.
-  struct Side {
-    const char* name;
-    cv::Point start, step;
-  };
-  const Side sides[] = {{"top", {p1.x, p1.y}, {0, pitch}},
-                        {"bottom", {p3.x, p1.y}, {0, pitch}},
-                        {"left", {p1.x, p1.y}, {pitch, 0}},
-                        {"right", {p1.x, p2.y}, {pitch, 0}}};
+  constexpr std::array<const char*, 4> kSides = {"top", "bottom", "left", "right"};
   std::vector<cv::Point3i> colours;
-  for (const Side& side : sides) {
-    QVDEBUGP("[%s] %s", name, side.name);
-    for (int k = 1; k <= 6; ++k) {
-      const cv::Point centre = side.start + k * side.step;
-      const auto rows = PatchRange("row", centre.x, half, image.rows, side.name);
-      if (!rows) return colours;
-      const auto cols = PatchRange("col", centre.y, half, image.cols, side.name);
-      if (!cols) return colours;
-      const cv::Scalar mean = cv::mean(image.rowRange(*rows).colRange(*cols));
-      // Red, green, blue of a picture that holds blue first, whatever the grey conversions take it for.
-      colours.emplace_back(static_cast<int>(mean[2]), static_cast<int>(mean[1]), static_cast<int>(mean[0]));
-    }
+  for (std::size_t i = 0; i < grid.centres.size(); ++i) {
+    const char* const side = kSides[i / 6];
+    if (i % 6 == 0) QVDEBUGP("[%s] %s", name, side);
+    const auto rows = PatchRange("row", grid.centres[i].x, grid.half, image.rows, side);
+    if (!rows) return colours;
+    const auto cols = PatchRange("col", grid.centres[i].y, grid.half, image.cols, side);
+    if (!cols) return colours;
+    const cv::Scalar mean = cv::mean(image.rowRange(*rows).colRange(*cols));
+    // Red, green, blue of a picture that holds blue first, whatever the grey conversions take it for.
+    colours.emplace_back(static_cast<int>(mean[2]), static_cast<int>(mean[1]), static_cast<int>(mean[0]));
   }
   return colours;
 }

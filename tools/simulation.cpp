@@ -1,0 +1,218 @@
+#include "tools/simulation.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+
+#include "chart/chart_layout.h"
+#include "tools/method_law.h"
+
+namespace {
+
+Json ToJson(cv::Point2d p) { return {{"x", p.x}, {"y", p.y}}; }
+
+Json ToJson(const cv::Vec3d& v) { return {v[0], v[1], v[2]}; }
+
+Json Parameters(const SimulationOptions& o) {
+  const CameraModel& c = o.camera;
+  return {{"width", c.size.width},
+          {"height", c.size.height},
+          {"fill", c.fill},
+          {"turn_deg", c.turn_deg},
+          {"pan_deg", c.pan_deg},
+          {"tilt_deg", c.tilt_deg},
+          {"blur_px", c.blur_px},
+          {"defocus_px", c.defocus_px},
+          {"smear_px", ToJson(c.smear_px)},
+          {"gain", c.gain},
+          {"exposure_ev", c.exposure_ev},
+          {"cast", ToJson(c.cast)},
+          {"shading_percent", c.shading_percent},
+          {"noise_percent", c.noise_percent},
+          {"full_well", c.full_well},
+          {"seed", c.seed}};
+}
+
+// CIE L*a*b* of stored levels (sRGB transfer function, D65 matrix), relative to an implicit white of 1, 1, 1.
+cv::Vec3d Lab(const cv::Vec3d& rgb) {
+  const auto linear = [](double v) {
+    const double c = std::clamp(v / 255, 0.0, 1.0);
+    return c <= 0.04045 ? c / 12.92 : std::pow((c + 0.055) / 1.055, 2.4);
+  };
+  const auto f = [](double t) { return t > 216.0 / 24389 ? std::cbrt(t) : (24389.0 / 27 * t + 16) / 116; };
+  const cv::Matx33d xyz_from_rgb(0.4124, 0.3576, 0.1805, 0.2126, 0.7152, 0.0722, 0.0193, 0.1192, 0.9505);
+  const cv::Vec3d xyz = xyz_from_rgb * cv::Vec3d(linear(rgb[0]), linear(rgb[1]), linear(rgb[2]));
+  return {116 * f(xyz[1]) - 16, 500 * (f(xyz[0]) - f(xyz[1])), 200 * (f(xyz[1]) - f(xyz[2]))};
+}
+
+// Grey as the tests weigh it: the first channel of a BGR photo is taken for red.
+cv::Mat Gray(const cv::Mat& levels) {
+  cv::Mat gray;
+  cv::transform(levels, gray, cv::Matx13f(0.299f, 0.587f, 0.114f));
+  return gray;
+}
+
+double PixelsPerUnit(const cv::Matx33d& photo_from_scene) {
+  const cv::Point2d middle(kChartSide / 2.0, kChartSide / 2.0);
+  return cv::norm(Map(photo_from_scene, middle + cv::Point2d(1, 0)) - Map(photo_from_scene, middle));
+}
+
+// "auto" suits the marks to an upright photo, so that turning the chart does not change it.
+int ModuleOf(const SimulationOptions& options) {
+  for (const MarkSize& size : kMarkSizes) {
+    if (options.marks == size.name) return size.module;
+  }
+  CameraModel upright = options.camera;
+  upright.turn_deg = upright.pan_deg = upright.tilt_deg = 0;
+  return SuitableMarks(PixelsPerUnit(PhotoFromScene(upright, SfrChartBounds()))).module;
+}
+
+Json MarkTruth(const cv::Matx33d& photo_from_scene) {
+  Json marks = Json::array();
+  for (const auto& [x, y] : kMarkCentres) {
+    marks.push_back(ToJson(Map(photo_from_scene, {static_cast<double>(x), static_cast<double>(y)})));
+  }
+  return marks;
+}
+
+// True figure of one edge and what the measure may read of it, in units of Nyquist.
+Json EdgeTruth(const CameraModel& camera, cv::Point2d from, cv::Point2d to, int npix) {
+  const cv::Point2d along = to - from;
+  const cv::Point2d normal(along.y, -along.x);
+  const auto response = [&](double f) { return LensResponse(camera, f, normal); };
+  const double mtf50 = 2 * method_law::HalfPoint(response, 1.0);
+  const method_law::Bounds expected = method_law::MeasuredMtf50(response, npix);
+  const double direction = std::atan2(along.y, along.x) * 180 / CV_PI;
+  return {{"edge_direction_deg", direction},
+          {"edge_angle_deg", std::remainder(direction, 90)},
+          {"mtf50_nyquist", mtf50},
+          {"mtf50_cycles_per_pixel", mtf50 / 2},
+          {"expected_low_nyquist", expected.low},
+          {"expected_high_nyquist", expected.high}};
+}
+
+Json PatchTruth(const CameraModel& camera, const cv::Matx33d& photo_from_scene) {
+  Json patches = Json::array();
+  const cv::Vec3d gains = camera.Gains();
+  for (int i = 0; i < static_cast<int>(kPatches.size()); ++i) {
+    const cv::Vec3d drawn(kPatches[i].red, kPatches[i].green, kPatches[i].blue);
+    const cv::Vec3d seen = drawn.mul(gains);  // at the photo's middle; shading is not in it
+    patches.push_back({{"number", i},
+                       {"name", kPatches[i].name},
+                       {"drawn_srgb", ToJson(drawn)},
+                       {"photo_srgb", ToJson(seen)},
+                       {"lab", ToJson(Lab(seen))},
+                       {"centre", ToJson(Map(photo_from_scene, PatchCentre(i)))}});
+  }
+  return patches;
+}
+
+Simulation ChartPhoto(const SimulationOptions& options) {
+  const CameraModel& camera = options.camera;
+  SfrChartStyle style = options.style;
+  style.module = ModuleOf(options);
+  const cv::Matx33d map = PhotoFromScene(camera, SfrChartBounds());
+  Simulation s;
+  s.levels = {Expose(camera, SfrChart(style), map)};
+
+  const double scale = PixelsPerUnit(map);
+  const int npix = static_cast<int>(kVerticalRegion.height * scale);
+  const auto target = EdgeTarget(style.edge_angle_deg);
+  s.truth["edge_angle_deg"] = style.edge_angle_deg;
+  s.truth["contrast"] = style.contrast;
+  s.truth["module_units"] = style.module;
+  s.truth["pixels_per_unit"] = scale;
+  s.truth["module_px"] = scale * style.module;
+  s.truth["npix"] = npix;
+  s.truth["marks"] = MarkTruth(map);
+  s.truth["mtf50"] = {{"vertical", EdgeTruth(camera, Map(map, target[0]), Map(map, target[1]), npix)},
+                      {"horizontal", EdgeTruth(camera, Map(map, target[0]), Map(map, target[3]), npix)}};
+  s.truth["patches"] = PatchTruth(camera, map);
+  s.truth["flash_mean"] = cv::mean(cv::min(s.levels[0], 255))[0];
+  return s;
+}
+
+Simulation TargetPhoto(const SimulationOptions& options) {
+  const cv::Matx33d map = PhotoFromScene(options.camera, SfrChartBounds());
+  Simulation s;
+  s.levels = {Expose(options.camera, AimingTarget(), map)};
+  s.truth["module_px"] = PixelsPerUnit(map) * kMarkSizes.back().module;
+  s.truth["marks"] = MarkTruth(map);
+  s.truth["centre"] =
+      ToJson((Map(map, {kMarkCentres[1][0] * 1.0, 0.0}) + Map(map, {0.0, kMarkCentres[2][1] * 1.0})) / 2);
+  return s;
+}
+
+Simulation PreviewFrames(const SimulationOptions& options) {
+  Simulation s = ChartPhoto(options);
+  SfrChartStyle style = options.style;
+  style.module = ModuleOf(options);
+  const cv::Matx33d moved = cv::Matx33d(1, 0, options.motion_px.x, 0, 1, options.motion_px.y, 0, 0, 1) *
+                            PhotoFromScene(options.camera, SfrChartBounds());
+  s.levels.push_back(Expose(options.camera, SfrChart(style), moved));
+  s.truth["motion_px"] = ToJson(options.motion_px);
+  cv::Mat difference;
+  cv::absdiff(Gray(s.levels[0]), Gray(s.levels[1]), difference);
+  s.truth["difference_mean"] = cv::mean(difference)[0] / 255;
+  return s;
+}
+
+// Specks at random places, apart from each other and from the border.
+Simulation DustPhoto(const SimulationOptions& options) {
+  const CameraModel& camera = options.camera;
+  const double apart = 4 * options.speck_px + 40;
+  const double border = std::min(options.speck_px + 25, std::min(camera.size.width, camera.size.height) / 2.0 - 1);
+  cv::RNG random(camera.seed + 12345);
+  std::vector<DustSpeck> specks;
+  for (int tries = 0; static_cast<int>(specks.size()) < options.specks && tries < 1000 * (options.specks + 1);
+       ++tries) {
+    const cv::Point2d at(random.uniform(border, camera.size.width - border),
+                         random.uniform(border, camera.size.height - border));
+    const bool free = std::none_of(specks.begin(), specks.end(),
+                                   [&](const DustSpeck& speck) { return cv::norm(speck.centre - at) < apart; });
+    if (free) specks.push_back({at, options.speck_px});
+  }
+  if (static_cast<int>(specks.size()) < options.specks) {
+    throw Failure(kWrongUsage, Format("--specks %d: only %zu have room in the photo", options.specks, specks.size()));
+  }
+  Simulation s;
+  s.levels = {Expose(camera, DustyTarget(specks, options.speck_darkness), cv::Matx33d::eye())};
+  s.truth["specks"] = Json::array();
+  for (const DustSpeck& speck : specks) {
+    Json json = ToJson(speck.centre);
+    json["diameter_px"] = speck.diameter_px;
+    s.truth["specks"].push_back(json);
+  }
+  s.truth["darkness"] = options.speck_darkness;
+  s.truth["mean_level"] = cv::mean(Gray(cv::min(s.levels[0], 255)))[0];
+  return s;
+}
+
+struct SceneRow {
+  const char* name;
+  Simulation (*simulate)(const SimulationOptions& options);
+};
+
+constexpr SceneRow kScenes[] = {
+    {"chart", ChartPhoto}, {"target", TargetPhoto}, {"preview", PreviewFrames}, {"dust", DustPhoto}};
+
+}  // namespace
+
+std::vector<std::string> SceneNames() {
+  std::vector<std::string> names;
+  for (const SceneRow& row : kScenes) names.emplace_back(row.name);
+  return names;
+}
+
+Simulation Simulate(const SimulationOptions& options) {
+  for (const SceneRow& row : kScenes) {
+    if (options.scene != row.name) continue;
+    Simulation s = row.simulate(options);
+    Json truth = {{"schema", "qvtester-truth-1"}, {"scene", options.scene}, {"parameters", Parameters(options)}};
+    truth.update(s.truth);
+    s.truth = truth;
+    return s;
+  }
+  throw Failure(kWrongUsage, "--scene " + options.scene + ": no such scene");
+}
