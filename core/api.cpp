@@ -79,6 +79,10 @@ int SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data) {
   return Guarded("SetResource", [&](QVTester& tester) { return tester.SetResource(index, width, height, data); });
 }
 
+int SetResourceWithList(QV_RESOURCE_INDEX index, std::vector<std::string> paths) {
+  return Guarded("SetResourceWithList", [&](QVTester& tester) { return tester.SetResource(index, paths); });
+}
+
 int SetResourceWithLDRs(QV_RESOURCE_INDEX index, int width, int height, bool flag, unsigned short* first,
                         unsigned short* second, unsigned short* third, unsigned short* fourth) {
   return Guarded("SetResourceWithLDRs", [&](QVTester& tester) {

@@ -8,6 +8,9 @@
 // QV_ERROR_INVALID_ARGUMENT for a null pointer, a size below 1 or an index out of range (nothing changes),
 // QV_ERROR_UNUSABLE_INPUT when OpenCV refuses what a slot holds, QV_ERROR_INTERNAL for any other failure.
 
+#include <string>
+#include <vector>
+
 #include "qvtester/indices.h"
 #include "qvtester/results.h"
 
@@ -34,6 +37,10 @@ QV_API int SetResource(QV_RESOURCE_INDEX index, char* path);
 /// Converts a preview frame, NV21 of height + height / 2 rows and width columns, to four 8-bit channels.
 /// -95 for a size that NV21 can't have.
 QV_API int SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data);
+/// Reads a list of image files into slot 36: registered onto the first, binarised, taken apart into principal
+/// components. -97 for an empty list or a file that is missing or unreadable, -90 when one can't be registered; nothing
+/// changes then.
+QV_API int SetResourceWithList(QV_RESOURCE_INDEX index, std::vector<std::string> paths);
 /// Inert: answers 1 and does nothing.
 QV_API int SetResourceWithLDRs(QV_RESOURCE_INDEX index, int width, int height, bool flag, unsigned short* first,
                                unsigned short* second, unsigned short* third, unsigned short* fourth);

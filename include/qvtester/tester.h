@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <memory>
 #include <opencv2/core.hpp>
+#include <string>
 #include <vector>
 
 #include "qvtester/finder_pattern.h"
@@ -58,6 +59,13 @@ class QV_API QVTester {
   /// Converts an NV21 preview frame to CV_8UC4 (BGRA), into any slot.
   /// @throws cv::Exception for an odd width or half height.
   int SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data);
+  /// Slot 36 only: reads image files as grey (median of 5 x 5), registers each onto the first, binarises it at its own
+  /// mean and takes the lot apart into principal components, into image_list_. All or nothing.
+  /// -97 for another slot, an empty list or a file that is missing or unreadable; -90 when one can't be registered.
+  int SetResource(QV_RESOURCE_INDEX index, std::vector<std::string> paths);
+  /// Image i of the list, rebuilt from its first principal components (property 80 when the list was set says how
+  /// many): rows x cols of the first image, CV_32F. @throws cv::Exception for an image that the list does not hold.
+  cv::Mat RebuildListImage(int i);
   /// Inert: answers 1.
   int SetResource(QV_RESOURCE_INDEX index, int width, int height, bool flag, unsigned short* first,
                   unsigned short* second, unsigned short* third, unsigned short* fourth);
@@ -122,6 +130,17 @@ class QV_API QVTester {
   /// Turns the image upright about the middle of a square canvas of its longer side, uncovered pixels 0, and carries
   /// the three points along.
   void NormalizePatternImage(cv::Mat image, std::vector<cv::Point>& points, cv::Mat& normalized);
+
+  /// Registers a picture onto a reference and resamples it into the reference's frame and size.
+  ///
+  /// @param reference, image  8 bits; one channel, or colour that is weighed to grey for the search.
+  /// @param[out] unwarped     as image, of the reference's size; edge pixels repeat where the image does not reach.
+  /// @return 1, or -90 when fewer than three good matches exist (unwarped is not touched).
+  /// @throws cv::Exception for an empty picture or another depth.
+  /// SURF (Bay et al. 2006), FLANN, and the affine map of the three best matches: chart/QVTester_Unwarp.cpp.
+  int GetUnwarpedImage(cv::Mat reference, cv::Mat image, cv::Mat& unwarped);
+  /// The good matches of the last registration that succeeded, drawn (CV_8UC3) when asked for; empty before the first.
+  const cv::Mat& DrawUnwarpMatches();
 
   // ---- Sharpness ------------------------------------------------------------------------------------------------
 
@@ -246,6 +265,33 @@ class QV_API QVTester {
   /// frees the result (free); null when memory is exhausted.
   float* xyz2cct(float* xyz, int rows, int cols);
 
+  // ---- LED and touch-panel tests ----------------------------------------------------------------------------------
+
+  /// Flags pixels of a high-dynamic-range capture whose value departs from their local mean by more than a fraction.
+  ///
+  /// @param data       height x width pixels of three floats, rows packed; channel 0 is read.
+  /// @param threshold  relative deviation, 0.1 for 10 %; a pixel beyond it is flagged.
+  /// @param radius     the mean is taken over 2 radius + 1 pixels a side, shifted inward near an edge.
+  /// @param[out] mask  height x width bytes; 1 is set at flagged pixels, nothing else is written.
+  /// The mean comes from a summed-area table in single precision (Crow 1984), whose rounding is part of the result. A
+  /// picture smaller than the window is logged and flags nothing.
+  void DetectDot(float* data, int height, int width, float threshold, int radius, unsigned char* mask);
+  /// Channel 0 of a float picture of several channels, stretched from its least and largest value to 0 and 255,
+  /// CV_8UC1.
+  cv::Mat HDR2UCHAR(cv::Mat& hdr);
+  /// Merges rectangles of defective pixels that lie within a distance, until no two do.
+  ///
+  /// @param distance               pixels; each rectangle grows by half of it (by all of a distance of 1 or less).
+  /// @param width, height          of the image, which bounds the overlap.
+  /// @param[in,out] areas          as many entries as rectangles; then each one's index in the pass before the last.
+  /// @param[in,out] counts         flagged pixels a rectangle; null, or pointing to null, counts from 0.
+  /// @param[in,out] topLeft        column and row, inside; bottomRight likewise. The arrays come from malloc: those
+  /// given
+  ///                               are freed, new ones handed back. Fewer than two rectangles are left as they are.
+  /// @return number of areas.
+  int ErrorAreaClustering(int distance, int width, int height, std::vector<int>* areas, int** counts,
+                          cv::Point** topLeft, cv::Point** bottomRight);
+
   // ---- State ----------------------------------------------------------------------------------------------------
 
   static constexpr int kSlotCount = 37;
@@ -255,6 +301,30 @@ class QV_API QVTester {
   int hdr_width_ = -1;  // of the last HDR buffer that was loaded, like the two below
   int hdr_height_ = -1;
   bool hdr_flag_ = false;
+
+  // The list of slot 36, each picture of the first one's size where not said otherwise.
+  struct ImageList {
+    std::vector<cv::Mat> gray;        // as read and smoothed, CV_8UC1, each of its own size
+    std::vector<cv::Mat> registered;  // onto the first, CV_8UC1
+    cv::Mat combined;                 // mean of the registered pictures, CV_8UC1
+    cv::Mat matrix;                   // images x pixels, CV_32F: 0 or 255
+    cv::Mat mean;                     // 1 x pixels, CV_32F
+    cv::Mat eigenvectors;             // components x pixels, CV_32F
+    cv::Mat eigenvalues;              // components x 1, CV_32F
+    cv::Mat projection;               // images x components, CV_32F
+    int components = 0;               // that a rebuild uses: 1 to the number of images
+  };
+  ImageList image_list_;
+
+  // The last registration that succeeded.
+  struct Unwarp {
+    cv::Mat reference, image;
+    std::vector<cv::KeyPoint> reference_keypoints, image_keypoints;
+    std::vector<cv::DMatch> good;
+    cv::Mat matrix;  // 2 x 3, CV_64F: reference coordinates to image coordinates
+    cv::Mat drawing;
+  };
+  Unwarp unwarp_;
 
   // The standard image's patch colours, one set a camera.
   struct ColorStandard {

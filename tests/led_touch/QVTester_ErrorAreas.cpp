@@ -1,0 +1,98 @@
+// Merging of rectangles of defective pixels that lie close together, until no two are close any more.
+
+#include <algorithm>
+#include <cstdlib>
+#include <memory>
+#include <new>
+
+#include "qvtester/tester.h"
+
+namespace {
+
+struct Area {
+  cv::Point top_left, bottom_right;
+  int count;
+};
+
+// Do both, grown by the margin, overlap inside the image?
+struct Closeness {
+  int margin, width, height;
+
+  bool operator()(const Area& a, const Area& b) const {
+    const int left = std::max(std::max(a.top_left.x, b.top_left.x) - margin, 0);
+    const int right = std::min(width - 1, std::min(a.bottom_right.x, b.bottom_right.x) + margin);
+    const int top = std::max(std::max(a.top_left.y, b.top_left.y) - margin, 0);
+    const int bottom = std::min(height - 1, std::min(a.bottom_right.y, b.bottom_right.y) + margin);
+    return left < right && top < bottom;
+  }
+};
+
+void Absorb(Area& a, const Area& b) {
+  a.top_left = {std::min(a.top_left.x, b.top_left.x), std::min(a.top_left.y, b.top_left.y)};
+  a.bottom_right = {std::max(a.bottom_right.x, b.bottom_right.x), std::max(a.bottom_right.y, b.bottom_right.y)};
+  a.count += b.count;
+}
+
+// One pass: each area in order joins the first output area that it is close to, or becomes a new one, whose index in
+// `in` is kept.
+std::vector<Area> MergeOnce(const std::vector<Area>& in, const Closeness& close, std::vector<int>& kept) {
+  std::vector<Area> out = {in.front()};
+  kept = {0};
+  for (std::size_t k = 1; k < in.size(); ++k) {
+    const auto home = std::find_if(out.begin(), out.end(), [&](const Area& area) { return close(area, in[k]); });
+    if (home != out.end()) {
+      Absorb(*home, in[k]);
+    } else {
+      out.push_back(in[k]);
+      kept.push_back(static_cast<int>(k));
+    }
+  }
+  return out;
+}
+
+struct Free {
+  void operator()(void* array) const { std::free(array); }
+};
+
+template <typename T>
+std::unique_ptr<T[], Free> Allocate(std::size_t count) {
+  void* const array = std::malloc(count * sizeof(T));
+  if (array == nullptr) throw std::bad_alloc();
+  return std::unique_ptr<T[], Free>(static_cast<T*>(array));
+}
+
+}  // namespace
+
+int QVTester::ErrorAreaClustering(int distance, int width, int height, std::vector<int>* areas, int** counts,
+                                  cv::Point** topLeft, cv::Point** bottomRight) {
+  if (areas->size() < 2) return static_cast<int>(areas->size());
+  const Closeness close = {distance > 1 ? distance / 2 : distance, width, height};
+  std::vector<Area> current;
+  for (std::size_t i = 0; i < areas->size(); ++i) {
+    current.push_back({(*topLeft)[i], (*bottomRight)[i], counts != nullptr && *counts != nullptr ? (*counts)[i] : 0});
+  }
+  std::vector<int> kept;
+  for (std::size_t before = 0; before != current.size();) {
+    before = current.size();
+    current = MergeOnce(current, close, kept);
+  }
+
+  auto merged_counts = Allocate<int>(current.size());
+  auto merged_top_left = Allocate<cv::Point>(current.size());
+  auto merged_bottom_right = Allocate<cv::Point>(current.size());
+  for (std::size_t i = 0; i < current.size(); ++i) {
+    merged_counts[i] = current[i].count;
+    new (&merged_top_left[i]) cv::Point(current[i].top_left);
+    new (&merged_bottom_right[i]) cv::Point(current[i].bottom_right);
+  }
+  *areas = kept;
+  std::free(*topLeft);
+  std::free(*bottomRight);
+  *topLeft = merged_top_left.release();
+  *bottomRight = merged_bottom_right.release();
+  if (counts != nullptr) {
+    std::free(*counts);
+    *counts = merged_counts.release();
+  }
+  return static_cast<int>(current.size());
+}

@@ -1,0 +1,233 @@
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <cstdlib>
+#include <random>
+
+#include "qvtester/tester.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+// Channel 0 of a capture; the other channels must not matter.
+struct Capture {
+  int height, width;
+  std::vector<float> data;
+
+  Capture(int height, int width, float level) : height(height), width(width), data(3 * height * width, NAN) {
+    for (int i = 0; i < height * width; ++i) data[3 * i] = level;
+  }
+  float& at(int row, int column) { return data[3 * (row * width + column)]; }
+  std::vector<cv::Point> Flagged(float threshold, int radius) {
+    QVTester tester;
+    std::vector<unsigned char> mask(height * width, 0);
+    tester.DetectDot(data.data(), height, width, threshold, radius, mask.data());
+    std::vector<cv::Point> flagged;
+    for (int i = 0; i < height * width; ++i) {
+      EXPECT_LE(mask[i], 1);
+      if (mask[i] == 1) flagged.emplace_back(i % width, i / width);
+    }
+    return flagged;
+  }
+};
+
+class Dots : public ::testing::Test {
+ protected:
+  LogLines log_;
+};
+
+TEST_F(Dots, APixelIsHeldAgainstItsLocalMean) {
+  Capture capture(20, 30, 4);
+  EXPECT_THAT(capture.Flagged(1e-6f, 2), IsEmpty()) << "small whole numbers sum exactly";
+  EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] OpenMP #1 Start", "[OKAPI] OpenMP #1 End"));
+  capture.at(7, 11) = 8;  // mean 4.16: the dot is 92 % off, its neighbours 3.8 %
+  EXPECT_THAT(capture.Flagged(0.5f, 2), ElementsAre(cv::Point(11, 7)));
+  EXPECT_THAT(capture.Flagged(0.93f, 2), IsEmpty());
+  EXPECT_THAT(capture.Flagged(0.03f, 2), SizeIs(25)) << "all whose window holds the dot";
+}
+
+TEST_F(Dots, WindowsAreShiftedInwardAtTheEdges) {
+  for (const cv::Point corner : {cv::Point(0, 0), {29, 0}, {0, 19}, {29, 19}}) {
+    Capture capture(20, 30, 4);
+    capture.at(corner.y, corner.x) = 8;
+    EXPECT_THAT(capture.Flagged(0.5f, 2), ElementsAre(corner));
+    // A window of its full size holds 25 pixels, so the mean is 4.16 and the dot 12/13 off; a cropped one would be
+    // 9/13.
+    EXPECT_THAT(capture.Flagged(0.92f, 2), ElementsAre(corner));
+  }
+}
+
+TEST_F(Dots, TheLimitIsStrict) {
+  Capture capture(3, 3, 1);
+  capture.at(1, 1) = 10;  // mean 2: the dot is 4 off, the others a half
+  EXPECT_THAT(capture.Flagged(4, 1), IsEmpty());
+  EXPECT_THAT(capture.Flagged(std::nextafter(4.0f, 0.0f), 1), ElementsAre(cv::Point(1, 1)));
+  EXPECT_THAT(capture.Flagged(0.5f, 1), SizeIs(1));
+  EXPECT_THAT(capture.Flagged(std::nextafter(0.5f, 0.0f), 1), SizeIs(9));
+  EXPECT_THAT(Capture(5, 5, 3).Flagged(0, 0), IsEmpty()) << "radius 0: each pixel is its own mean";
+}
+
+TEST_F(Dots, SmallPicturesAreLoggedAndLeftAlone) {
+  EXPECT_THAT(Capture(4, 30, 4).Flagged(0, 2), IsEmpty());
+  EXPECT_THAT(LogLines::Texts(), ElementsAre("[DetectDot] a picture of 30 x 4 is smaller than the window of radius 2"));
+  EXPECT_THAT(Capture(30, 4, 4).Flagged(0, 2), IsEmpty());
+  EXPECT_THAT(Capture(5, 5, 4).Flagged(0, INT_MAX), IsEmpty());
+  EXPECT_THAT(Capture(5, 5, 4).Flagged(0, -1), IsEmpty());
+}
+
+TEST_F(Dots, OddNumbersHarmOnlyTheirWindows) {
+  for (const float odd : {NAN, INFINITY}) {
+    Capture capture(20, 30, 4);
+    capture.at(3, 3) = 8;
+    capture.at(12, 20) = odd;  // every sum below and to the right of it is spoiled, those above are not
+    EXPECT_THAT(capture.Flagged(0.5f, 1), ::testing::Contains(cv::Point(3, 3)));
+  }
+  Capture zero(9, 9, 0);  // 0 / 0 compares as no departure
+  EXPECT_THAT(zero.Flagged(0.5f, 1), IsEmpty());
+}
+
+TEST_F(Dots, HdrPicturesAreStretchedForTheEye) {
+  QVTester tester;
+  const cv::Mat channels[] = {(cv::Mat_<float>(1, 3) << -2, 8, 3), cv::Mat::zeros(1, 3, CV_32F),
+                              cv::Mat::ones(1, 3, CV_32F)};
+  cv::Mat hdr;
+  cv::merge(channels, 3, hdr);
+  const cv::Mat before = hdr.clone();
+  const cv::Mat seen = tester.HDR2UCHAR(hdr);
+  EXPECT_EQ(CV_8UC1, seen.type());
+  EXPECT_EQ(0, seen.at<uchar>(0));
+  EXPECT_EQ(255, seen.at<uchar>(1));
+  EXPECT_EQ(128, seen.at<uchar>(2));  // 127.5, to the even one
+  EXPECT_EQ(0, cv::norm(before, hdr, cv::NORM_INF));
+  cv::Mat constant(2, 2, CV_32FC3, cv::Scalar::all(7));
+  EXPECT_EQ(0, cv::countNonZero(tester.HDR2UCHAR(constant)));
+}
+
+// The caller's arrays, from malloc, and what comes back; the address sanitizer watches who frees them.
+class Areas : public ::testing::Test {
+ protected:
+  ~Areas() override {
+    std::free(counts_);
+    std::free(top_left_);
+    std::free(bottom_right_);
+  }
+  void Add(cv::Rect area, int count = 1) { given_.emplace_back(area, count); }
+  int Cluster(int distance, bool with_counts = true) {
+    const std::size_t n = given_.size();
+    areas_.resize(n);
+    counts_ = static_cast<int*>(std::malloc((n + 1) * sizeof(int)));
+    top_left_ = static_cast<cv::Point*>(std::malloc((n + 1) * sizeof(cv::Point)));
+    bottom_right_ = static_cast<cv::Point*>(std::malloc((n + 1) * sizeof(cv::Point)));
+    for (std::size_t i = 0; i < n; ++i) {
+      areas_[i] = static_cast<int>(i);
+      counts_[i] = given_[i].second;
+      top_left_[i] = given_[i].first.tl();
+      bottom_right_[i] = given_[i].first.br() - cv::Point(1, 1);
+    }
+    QVTester tester;
+    return tester.ErrorAreaClustering(distance, size_.width, size_.height, &areas_, with_counts ? &counts_ : nullptr,
+                                      &top_left_, &bottom_right_);
+  }
+  cv::Rect Result(int i) const { return {top_left_[i], bottom_right_[i] + cv::Point(1, 1)}; }
+
+  cv::Size size_ = {100, 80};
+  std::vector<std::pair<cv::Rect, int>> given_;
+  std::vector<int> areas_;
+  int* counts_ = nullptr;
+  cv::Point* top_left_ = nullptr;
+  cv::Point* bottom_right_ = nullptr;
+};
+
+TEST_F(Areas, PixelsThreeApartMergeWithinEight) {
+  Add({10, 10, 1, 1}, 2);
+  Add({13, 10, 1, 1}, 5);
+  EXPECT_EQ(1, Cluster(8));
+  EXPECT_EQ(cv::Rect(10, 10, 4, 1), Result(0));
+  EXPECT_EQ(7, counts_[0]);
+  EXPECT_THAT(areas_, ElementsAre(0));
+}
+
+TEST_F(Areas, TheyStayApartWithinTwo) {
+  Add({10, 10, 1, 1});
+  Add({13, 10, 1, 1});
+  EXPECT_EQ(2, Cluster(2));
+  EXPECT_THAT(areas_, ElementsAre(0, 1));
+  EXPECT_EQ(cv::Rect(13, 10, 1, 1), Result(1));
+}
+
+TEST_F(Areas, ChainsCollapseOverSeveralPasses) {
+  // In this order no area is close to the one before it; the last joins two that are kept apart until then.
+  for (const int x : {0, 20, 40, 60, 30, 10, 50}) Add({x, 40, 8, 8}, 1);
+  EXPECT_EQ(1, Cluster(12));
+  EXPECT_EQ(cv::Rect(0, 40, 68, 8), Result(0));
+  EXPECT_EQ(7, counts_[0]);
+}
+
+TEST_F(Areas, TheFirstCloseOneTakesAll) {
+  Add({0, 0, 4, 4}, 1);
+  Add({20, 0, 4, 4}, 10);
+  Add({10, 0, 4, 4}, 100);  // close to both; joins the first, which then reaches the second
+  Add({90, 70, 4, 4}, 1000);
+  EXPECT_EQ(2, Cluster(16));
+  EXPECT_EQ(111, counts_[0]);
+  EXPECT_EQ(1000, counts_[1]);
+  EXPECT_THAT(areas_, ElementsAre(0, 1)) << "indices in the pass before the last";
+}
+
+TEST_F(Areas, GrowthEndsAtTheImage) {
+  size_ = {1, 80};  // grown rectangles share no more than the one column, and that is not enough
+  Add({0, 10, 1, 1});
+  Add({0, 11, 1, 1});
+  EXPECT_EQ(2, Cluster(20));
+}
+
+TEST_F(Areas, WithoutCountsNothingIsCounted) {
+  Add({10, 10, 1, 1}, 2);
+  Add({11, 10, 1, 1}, 5);
+  EXPECT_EQ(1, Cluster(4, false));
+  EXPECT_EQ(2, counts_[0]) << "the caller's array is left alone";
+  int* none = nullptr;
+  QVTester tester;
+  areas_ = {0, 1};
+  std::free(top_left_);
+  std::free(bottom_right_);
+  top_left_ = static_cast<cv::Point*>(std::calloc(2, sizeof(cv::Point)));
+  bottom_right_ = static_cast<cv::Point*>(std::calloc(2, sizeof(cv::Point)));
+  EXPECT_EQ(1, tester.ErrorAreaClustering(4, 100, 80, &areas_, &none, &top_left_, &bottom_right_));
+  EXPECT_EQ(0, none[0]);
+  std::free(none);
+}
+
+TEST_F(Areas, FewerThanTwoAreLeftAsTheyAre) {
+  Add({10, 10, 1, 1}, 2);
+  EXPECT_EQ(1, Cluster(8));
+  EXPECT_EQ(2, counts_[0]);
+  areas_.clear();
+  QVTester tester;
+  EXPECT_EQ(0, tester.ErrorAreaClustering(8, 10, 10, &areas_, nullptr, nullptr, nullptr));
+}
+
+TEST_F(Areas, NoTwoOfManyAreCloseInTheEnd) {
+  std::mt19937 random(4);
+  int total = 0;
+  for (int i = 0; i < 10000; ++i) {
+    Add(cv::Rect(static_cast<int>(random() % 98), static_cast<int>(random() % 78), 1, 1), i % 7);
+    total += i % 7;
+  }
+  const int n = Cluster(0);
+  int sum = 0;
+  for (int i = 0; i < n; ++i) sum += counts_[i];
+  EXPECT_EQ(total, sum);
+  for (int i = 0; i < n; ++i) {
+    for (int j = 0; j < i; ++j) {
+      const cv::Rect both = (Result(i) & Result(j));
+      EXPECT_FALSE(both.width > 1 && both.height > 1) << Result(i) << Result(j);
+    }
+  }
+}
+
+}  // namespace

@@ -1,0 +1,180 @@
+#include <gmock/gmock.h>
+
+#include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
+
+#include "qvtester/api.h"
+#include "qvtester/tester.h"
+#include "unit_tests/drawing.h"
+#include "unit_tests/log_lines.h"
+
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::SizeIs;
+
+// A textured scene with few repeats, and a view of it: the part that a camera shifted by (dx, dy) sees.
+cv::Mat DrawScene(unsigned seed) {
+  cv::RNG random(seed);
+  cv::Mat scene(520, 680, CV_8UC1, cv::Scalar(128));
+  for (int i = 0; i < 500; ++i) {
+    const cv::Point at(random.uniform(0, scene.cols), random.uniform(0, scene.rows));
+    std::vector<cv::Point> corners;
+    for (int k = 0; k < 5; ++k) corners.push_back(at + cv::Point(random.uniform(-40, 40), random.uniform(-40, 40)));
+    cv::fillConvexPoly(scene, corners, cv::Scalar(random.uniform(0, 256)), cv::LINE_AA);
+  }
+  cv::GaussianBlur(scene, scene, {}, 1);
+  return scene;
+}
+
+cv::Mat View(const cv::Mat& scene, cv::Point shift) {
+  return scene(cv::Rect(20 + shift.x, 20 + shift.y, 640, 480)).clone();
+}
+
+// Mean distance over a grid between where the registration puts a point and where a shift does.
+double GridError(const cv::Mat& matrix, cv::Point shift) {
+  double sum = 0;
+  int points = 0;
+  for (int y = 0; y <= 480; y += 60, ++points) {
+    for (int x = 0; x <= 640; x += 80) {
+      const cv::Mat at = matrix * (cv::Mat_<double>(3, 1) << x, y, 1);
+      sum += std::hypot(at.at<double>(0) - x + shift.x, at.at<double>(1) - y + shift.y);
+    }
+  }
+  return sum / (9.0 * points);
+}
+
+TEST(Unwarp, AnIdenticalPictureComesBackItself) {
+  QVTester tester;
+  const cv::Mat scene = View(DrawScene(1), {0, 0});
+  cv::Mat unwarped;
+  ASSERT_EQ(1, tester.GetUnwarpedImage(scene, scene, unwarped));
+  EXPECT_EQ(0, cv::norm(scene, unwarped, cv::NORM_INF));
+}
+
+TEST(Unwarp, ShiftedPicturesAreBroughtBack) {
+  QVTester tester;
+  std::vector<double> errors;
+  for (unsigned seed = 1; seed <= 8; ++seed) {
+    const cv::Mat scene = DrawScene(seed);
+    const cv::Point shift(static_cast<int>(seed * 7 % 31) - 15, static_cast<int>(seed * 5 % 23) - 11);
+    cv::Mat colour;
+    cv::cvtColor(View(scene, shift), colour, cv::COLOR_GRAY2BGR);
+    cv::Mat unwarped;
+    ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), colour, unwarped));
+    EXPECT_EQ(cv::Size(640, 480), unwarped.size());
+    EXPECT_EQ(CV_8UC3, unwarped.type());
+    errors.push_back(GridError(tester.unwarp_.matrix, shift));
+  }
+  // The method fixes the map by three matches: some pairs go wrong, most do not.
+  std::sort(errors.begin(), errors.end());
+  EXPECT_LT(errors[errors.size() / 2], 3) << ::testing::PrintToString(errors);
+  EXPECT_LT(errors[errors.size() * 3 / 4 - 1], 10);
+}
+
+TEST(Unwarp, SearchesAreRepeatableAndLeaveTheCallersRandomNumbersAlone) {
+  QVTester tester;
+  const cv::Mat scene = DrawScene(3);
+  cv::Mat first;
+  cv::Mat second;
+  cv::theRNG().state = 99;
+  ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), View(scene, {9, 4}), first));
+  EXPECT_EQ(99u, cv::theRNG().state);
+  cv::theRNG().state = 7;
+  ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), View(scene, {9, 4}), second));
+  EXPECT_EQ(0, cv::norm(first, second, cv::NORM_INF));
+}
+
+TEST(Unwarp, TooLittleToSeeIsNoRegistration) {
+  QVTester tester;
+  const cv::Mat scene = View(DrawScene(1), {0, 0});
+  const cv::Mat blank(480, 640, CV_8UC1, cv::Scalar(90));
+  cv::Mat unwarped(3, 3, CV_8UC1, cv::Scalar(7));
+  EXPECT_EQ(-90, tester.GetUnwarpedImage(scene, blank, unwarped));
+  EXPECT_EQ(-90, tester.GetUnwarpedImage(blank, scene, unwarped));
+  EXPECT_EQ(-90, tester.GetUnwarpedImage(scene, cv::Mat(1, 1, CV_8UC1, cv::Scalar(0)), unwarped));
+  EXPECT_EQ(cv::Size(3, 3), unwarped.size());
+  EXPECT_TRUE(tester.DrawUnwarpMatches().empty());
+  EXPECT_THROW(tester.GetUnwarpedImage(scene, cv::Mat(9, 9, CV_16UC1, cv::Scalar(0)), unwarped), cv::Exception);
+  EXPECT_THROW(tester.GetUnwarpedImage(cv::Mat(), scene, unwarped), cv::Exception);
+  ASSERT_EQ(1, tester.GetUnwarpedImage(scene, scene, unwarped));
+  EXPECT_EQ(cv::Size(1280, 480), tester.DrawUnwarpMatches().size());
+}
+
+class ImageList : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    InitTestModule();
+    for (int i = 0; i < 4; ++i) {
+      files_.push_back(folder_.Write(std::to_string(i) + ".png", View(scene_, {3 * i, -2 * i})));
+    }
+  }
+  void TearDown() override { FinalizeTestModule(); }
+  static const QVTester::ImageList& Held() { return theTester->image_list_; }
+
+  TemporaryFolder folder_;
+  cv::Mat scene_ = DrawScene(5);
+  std::vector<std::string> files_;
+  LogLines log_;
+};
+
+TEST_F(ImageList, PicturesAreRegisteredBinarisedAndTakenApart) {
+  int components = 9;
+  SetProperty(QV_PROPERTY_LIST_COMPONENTS, &components);
+  ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, files_));
+  EXPECT_EQ(4, Held().components) << "no more components than images";
+  ASSERT_EQ(cv::Size(640 * 480, 4), Held().matrix.size());
+  cv::Mat levels;
+  Held().matrix.convertTo(levels, CV_8U);
+  EXPECT_EQ(levels.total(), static_cast<std::size_t>(cv::countNonZero(levels == 0) + cv::countNonZero(levels == 255)));
+
+  cv::Mat smoothed;
+  cv::medianBlur(View(scene_, {0, 0}), smoothed, 5);
+  EXPECT_EQ(0, cv::norm(smoothed, Held().gray[0], cv::NORM_INF));
+  const cv::Mat light = smoothed > cv::mean(smoothed)[0];
+  EXPECT_EQ(0, cv::norm(light.reshape(1, 1), levels.row(0), cv::NORM_INF));
+  // Registered pictures agree with the first but near edges, where the grey levels cross the mean.
+  for (int i = 1; i < 4; ++i) EXPECT_LT(cv::countNonZero(levels.row(i) != levels.row(0)), 0.08 * 640 * 480) << i;
+
+  // Each image is its mean and its components: rebuilt from all of them it is itself, within single precision.
+  for (int i = 0; i < 4; ++i) {
+    const cv::Mat rebuilt = theTester->RebuildListImage(i);
+    ASSERT_EQ(cv::Size(640, 480), rebuilt.size());
+    EXPECT_LT(cv::norm(rebuilt.reshape(1, 1), Held().matrix.row(i), cv::NORM_INF), 0.1) << i;
+  }
+  EXPECT_THROW(theTester->RebuildListImage(4), cv::Exception);
+  EXPECT_NE(nullptr, theTester->resources_[36]);
+  EXPECT_EQ(CV_8UC1, Held().combined.type());
+  theTester->resources_[32] = std::make_unique<QVResource>();
+  EXPECT_EQ(1, theTester->ValidateTest(QV_TEST_TOUCH_PANEL_PRINT));
+}
+
+TEST_F(ImageList, AFailureChangesNothing) {
+  EXPECT_EQ(-97, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {}));
+  EXPECT_EQ(-97, SetResourceWithList(QV_RESOURCE_CHART_PHOTO, files_));
+  EXPECT_EQ(nullptr, theTester->resources_[36]);
+  ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[0], files_[1]}));
+  const cv::Mat held = Held().matrix.clone();
+
+  for (const std::string& bad : {folder_.Path("missing.png"), folder_.Write("words.png", std::string("words"))}) {
+    const LogLines log;
+    EXPECT_EQ(-97, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[2], bad}));
+    ASSERT_THAT(LogLines::Texts(), SizeIs(1));
+    EXPECT_THAT(LogLines::Texts()[0], HasSubstr(bad));
+  }
+  const std::string blank = folder_.Write("blank.png", cv::Mat(480, 640, CV_8UC1, cv::Scalar(9)));
+  EXPECT_EQ(-90, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[2], blank}));
+  EXPECT_EQ(0, cv::norm(held, Held().matrix, cv::NORM_INF));
+}
+
+TEST_F(ImageList, OtherSizesComeIntoTheFirstOnesFrame) {
+  const std::string wide = folder_.Write("wide.png", scene_);
+  ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[0], wide}));
+  EXPECT_EQ(cv::Size(640, 480), Held().registered[1].size());
+  ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {wide})) << "a list of one";
+  EXPECT_EQ(1, Held().matrix.rows);
+  EXPECT_EQ(1, Held().components);
+  EXPECT_EQ(cv::Size(680, 520), theTester->RebuildListImage(0).size());
+}
+
+}  // namespace
