@@ -2,9 +2,9 @@
 // matches fix exactly. There is no outlier rejection beyond the distance limit: where one of the three is false, or
 // they lie nearly in one line, the map is wrong.
 
-#include <opencv2/flann.hpp>
 #include <algorithm>
 #include <array>
+#include <opencv2/flann.hpp>
 #include <opencv2/imgproc.hpp>
 
 #include "chart/registration.h"
