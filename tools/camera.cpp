@@ -149,24 +149,28 @@ cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d&
   return levels;
 }
 
+void AddNoise(const CameraModel& camera, cv::Mat& levels, cv::RNG& random) {
+  cv::Mat noise(levels.size(), CV_32FC3);
+  if (camera.full_well > 0) {
+    // Photon counts scatter by their root; at thousands of electrons a Gaussian stands in for Poisson.
+    random.fill(noise, cv::RNG::NORMAL, 0, 1);
+    cv::Mat spread;
+    cv::sqrt(cv::max(levels, 0) * (255 / camera.full_well), spread);
+    levels += noise.mul(spread);
+  }
+  if (camera.noise_percent > 0) {
+    random.fill(noise, cv::RNG::NORMAL, 0, camera.noise_percent / 100 * 255);
+    levels += noise;
+  }
+}
+
 cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits) {
   cv::RNG random(camera.seed);
   cv::Mat photo(levels.size(), bits == 16 ? CV_16UC3 : CV_8UC3);
   for (int first = 0; first < levels.rows; first += kBandRows) {
     const int last = std::min(first + kBandRows, levels.rows);
     cv::Mat band = levels.rowRange(first, last).clone();
-    cv::Mat noise(band.size(), CV_32FC3);
-    if (camera.full_well > 0) {
-      // Photon counts scatter by their root; at thousands of electrons a Gaussian stands in for Poisson.
-      random.fill(noise, cv::RNG::NORMAL, 0, 1);
-      cv::Mat spread;
-      cv::sqrt(cv::max(band, 0) * (255 / camera.full_well), spread);
-      band += noise.mul(spread);
-    }
-    if (camera.noise_percent > 0) {
-      random.fill(noise, cv::RNG::NORMAL, 0, camera.noise_percent / 100 * 255);
-      band += noise;
-    }
+    AddNoise(camera, band, random);
     band.convertTo(photo.rowRange(first, last), photo.depth(), bits == 16 ? 257 : 1);
   }
   return photo;

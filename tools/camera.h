@@ -38,6 +38,9 @@ cv::Matx33d PhotoFromScene(const CameraModel& camera, const cv::Rect2d& bounds);
 /// shaded.
 cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d& photo_from_scene);
 
+/// Adds the camera's shot and read noise to levels of 255.
+void AddNoise(const CameraModel& camera, cv::Mat& levels, cv::RNG& random);
+
 /// The photo that the sensor makes of it, noise added, rounded: CV_8UC3, or CV_16UC3 with levels times 257.
 cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits);
 

@@ -12,11 +12,13 @@ CommandBody DeclareAutofocus(CLI::App& command);
 CommandBody DeclareCapture(CLI::App& command);
 CommandBody DeclareChart(CLI::App& command);
 CommandBody DeclareCircles(CLI::App& command);
+CommandBody DeclareDots(CLI::App& command);
 CommandBody DeclareDust(CLI::App& command);
 CommandBody DeclareFlash(CLI::App& command);
 CommandBody DeclareList(CLI::App& command);
 CommandBody DeclareMtf(CLI::App& command);
 CommandBody DeclarePreview(CLI::App& command);
+CommandBody DeclareRegister(CLI::App& command);
 CommandBody DeclareSimulate(CLI::App& command);
 
 #endif  // QVTESTER_TOOLS_COMMANDS_H_

@@ -1,5 +1,6 @@
 #include <CLI/CLI.hpp>
 #include <cstdio>
+#include <cstdlib>
 #include <exception>
 #include <iostream>
 
@@ -22,6 +23,8 @@ constexpr Command kCommands[] = {
     {"dust", "Find dust on the lens in a photo of a plain target (tests 17 and 21)", DeclareDust},
     {"preview", "Measure how much two preview frames differ (tests 13 and 19)", DeclarePreview},
     {"circles", "Look for the chart's three marks in a preview frame", DeclareCircles},
+    {"dots", "Find bright and dark dots in a high-dynamic-range picture of a lit panel", DeclareDots},
+    {"register", "Bring a picture into the frame of a reference", DeclareRegister},
     {"chart", "Draw the test chart", DeclareChart},
     {"simulate", "Take a photo of the chart with a camera of known faults", DeclareSimulate},
     {"list", "List the library's tests, slots, properties or codes", DeclareList},
@@ -36,6 +39,7 @@ constexpr char kFooter[] =
 int main(int argc, char** argv) {
   try {
     WatchForInterrupts();
+    setenv("OPENCV_IO_ENABLE_OPENEXR", "1", 0);  // NOLINT(concurrency-mt-unsafe): no other thread reads it yet
     CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
     app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
     app.require_subcommand(1);

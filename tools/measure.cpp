@@ -63,8 +63,23 @@ std::string ReadInput(const std::string& path) {
   return ReadWholeFile(path, kCouldNotMeasure);
 }
 
+// Width and height of what a slot holds.
+cv::Size SlotSize(QV_RESOURCE_INDEX slot) {
+  cv::Size size;
+  if (const auto& held = theTester->resources_[slot]; held != nullptr) {
+    if (slot <= QV_RESOURCE_HDR_LAST) {
+      held->GetHDRWidth(&size.width);
+      held->GetHDRHeight(&size.height);
+    } else {
+      size = SlotPhoto(slot).size();
+    }
+  }
+  return size;
+}
+
 // Loads one slot. What can't be read becomes the run's code and a sentence; what the decoder says, a warning.
-bool Load(Record& record, const SlotInput& input, ScratchFolder& scratch, SideOutput& side) {
+bool Load(Record& record, const Measuring& measuring, const SlotInput& input, ScratchFolder& scratch,
+          SideOutput& side) {
   const std::string shown = input.path == "-" ? "standard input" : input.path;
   const auto refuse = [&](int code, const std::string& why) {
     record.phase.code = code;
@@ -86,7 +101,12 @@ bool Load(Record& record, const SlotInput& input, ScratchFolder& scratch, SideOu
     path = scratch.path() + "/input";
     WriteWholeFile(path, content);
   }
-  const int code = SetResource(input.slot, path.data());
+  int code = QV_SUCCESS;
+  try {
+    code = measuring.load ? measuring.load(path) : SetResource(input.slot, path.data());
+  } catch (const Failure& e) {
+    return refuse(QV_ERROR_INVALID_ARGUMENT, e.what());
+  }
   const std::vector<std::string> chatter = side.TakeChatter();
   const std::string said = chatter.empty() ? "" : "the decoder says \"" + chatter.front() + "\"";
   if (code == QV_ERROR_INVALID_ARGUMENT) {
@@ -94,9 +114,9 @@ bool Load(Record& record, const SlotInput& input, ScratchFolder& scratch, SideOu
   }
   if (code != QV_SUCCESS) return refuse(code, FindCode(code).meaning);
   if (!said.empty()) record.details.push_back(shown + ": " + said + "; is the file cut?");
-  const cv::Mat photo = SlotPhoto(input.slot);
-  entry.width = photo.cols;
-  entry.height = photo.rows;
+  const cv::Size size = SlotSize(input.slot);
+  entry.width = size.width;
+  entry.height = size.height;
   return true;
 }
 
@@ -126,11 +146,11 @@ std::string Annotate(const Record& record, const Measuring& measuring) {
 
 void CheckOutputs(const MeasureOptions& options) {
   if (options.json == "-" && options.annotate == "-") {
-    throw Failure(kWrongUsage, "--json - and --annotate -: standard output takes one of them");
+    throw Failure(kWrongUsage, "the record and the picture: standard output takes one of them");
   }
   const std::filesystem::path picture(options.annotate);
   if (!options.annotate.empty() && options.annotate != "-" && picture.extension() != ".png") {
-    throw Failure(kWrongUsage, "--annotate " + options.annotate + ": name a .png file");
+    throw Failure(kWrongUsage, options.annotate + ": the picture is a PNG: name a .png file");
   }
 }
 
@@ -161,9 +181,9 @@ std::string MissSentence(const Record& record) {
 
 }  // namespace
 
-void MeasureOptions::DeclareOn(CLI::App& command) {
+void MeasureOptions::DeclareOn(CLI::App& command, const char* picture, const char* shows) {
   command.add_option("--json", json, "Write the record to FILE; - is standard output")->type_name("FILE");
-  command.add_option("--annotate", annotate, "Write a picture of what was measured")->type_name("PNG");
+  command.add_option(picture, annotate, shows)->type_name("PNG");
   command.add_option("--limits", limits, "Judge the figures by this limits file")->type_name("FILE");
   command.add_option("--dut", dut, "Serial number of the unit, for the record")->type_name("ID");
   command.add_option("--station", station, "Name of the station, for the record")->type_name("ID");
@@ -221,8 +241,9 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
     SetHostPropertyStore(options.publish || !measuring.publishes ? nullptr : (scratch.path() + "/properties").c_str());
     if (options.threshold) setWorkingBinaryThresh(*options.threshold);
     if (measuring.prepare) measuring.prepare();
-    const bool loaded = std::all_of(measuring.inputs.begin(), measuring.inputs.end(),
-                                    [&](const SlotInput& input) { return Load(record, input, scratch, side); });
+    const bool loaded = std::all_of(measuring.inputs.begin(), measuring.inputs.end(), [&](const SlotInput& input) {
+      return Load(record, measuring, input, scratch, side);
+    });
     record.phase.start_millis = record.phase.end_millis = MillisSinceEpoch();
     if (loaded) Run(record, measuring);
     record.properties = PropertiesOffDefault(*theTester);

@@ -20,8 +20,9 @@ struct MeasureOptions {
   double pixel_pitch_um = 0;  // 0: not known
   bool verbose = false, quiet = false, publish = false;
 
-  /// Declares the options that all measuring commands share.
-  void DeclareOn(CLI::App& command);
+  /// Declares the options that all measuring commands share; the picture's may go by a name of its own.
+  void DeclareOn(CLI::App& command, const char* picture = "--annotate",
+                 const char* shows = "Write a picture of what was measured");
   /// Declares what commands that look for the chart share.
   void DeclareThresholdOn(CLI::App& command);
   /// Declares --publish, for tests that write system properties.
@@ -39,6 +40,7 @@ struct Measuring {
   std::optional<int> test_index;
   std::vector<SlotInput> inputs;
   std::function<void()> prepare;                             // before the slots are loaded
+  std::function<int(const std::string& path)> load;          // for inputs that SetResource does not take
   std::function<int()> run;                                  // answers the library's code
   std::function<void(Phase&, const QVResultData&)> collect;  // after code 1
   std::function<void(Record&)> look;                         // after any code, while the search state is fresh

@@ -12,6 +12,9 @@ constexpr char kLab[] = "mean over the patch, sRGB to L*a*b* relative to an impl
 constexpr char kDelta[] = "CIE 1976 difference to the standard photo's patch";
 constexpr char kBlob[] = "local threshold 15 x 15, blob detector at levels 0 and 125";
 constexpr char kBins[] = "256 bins of one grey level";
+constexpr char kDots[] = "relative difference to the mean of a square window, single precision";
+constexpr char kAreas[] = "connected dots, then rectangles closer than the distance, merged until none are";
+constexpr char kSurf[] = "SURF key points, the affine map of the three best of the good matches";
 constexpr char kDifference[] = "mean absolute difference of the grey frames over 255";
 
 constexpr auto kWhole = Number::kWhole;
@@ -89,6 +92,36 @@ const std::vector<Row>& Rows() {
       {kDustTests,
        {"histogram_difference", kOne, kWhole, nullptr, kBins,
         "Sum of absolute differences to the reference histogram, pixels."}},
+
+      {{"hdr_dots"}, {"dot_count", kOne, kWhole, nullptr, kDots, "Pixels that depart from their local mean."}},
+      {{"hdr_dots"}, {"area_count", kOne, kWhole, nullptr, kAreas, "Areas that the dots make."}},
+      {{"hdr_dots"},
+       {"areas", kPixel, kReal, &kColumnAxis, kAreas, "Middle of each area's rectangle, column and row."}},
+      {{"hdr_dots"}, {"area_pixels", kPixel, kWhole, &kAreaAxis, kAreas, "Dots in each area."}},
+      {{"hdr_dots"}, {"area_width", kPixel, kWhole, &kAreaAxis, kAreas, "Columns of each area's rectangle."}},
+      {{"hdr_dots"}, {"area_height", kPixel, kWhole, &kAreaAxis, kAreas, "Rows of each area's rectangle."}},
+
+      {{"registration"},
+       {"good_matches", kOne, kWhole, nullptr, kSurf, "Feature matches within the distance limit; three are needed."}},
+      {{"registration"},
+       {"agreeing_matches", kOne, kWhole, nullptr, kSurf,
+        "Good matches that the map explains to within 3 px. The three that make the map always agree: a map that few "
+        "others agree with is doubtful."}},
+      {{"registration"},
+       {"matrix", kOne, kReal, &kMatrixAxis, kSurf,
+        "a, b, c, d, e, f: column = a x + b y + c and row = d x + e y + f in the image, for column x and row y of the "
+        "reference."}},
+      {{"registration"},
+       {"shift_columns", kPixel, kReal, nullptr, kSurf, "How far the reference's middle has moved to the right."}},
+      {{"registration"},
+       {"shift_rows", kPixel, kReal, nullptr, kSurf, "How far the reference's middle has moved down."}},
+      {{"registration"},
+       {"turn", kDegree, kReal, nullptr, kSurf, "Turn of the image against the reference, counter-clockwise."}},
+      {{"registration"},
+       {"scale", kOne, kReal, nullptr, kSurf, "Size of the scene in the image over that in the reference."}},
+      {{"registration"},
+       {"stretch", kOne, kReal, nullptr, kSurf,
+        "Largest over smallest enlargement along any direction; 1 when the map keeps shapes."}},
 
       {{"camera_preview", "camera_preview_front"},
        {"difference_mean", kOne, kReal, nullptr, kDifference,

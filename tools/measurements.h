@@ -24,6 +24,8 @@ inline constexpr Unit kGreyLevel = {"grey level", nullptr, "level"};
 inline constexpr Unit kFrequencyAxis = {"frequency", nullptr, "Nyquist"};
 inline constexpr Unit kColumnAxis = {"column", "E37", "px"};
 inline constexpr Unit kPatchAxis = {"patch", "C62", "1"};
+inline constexpr Unit kAreaAxis = {"area", "C62", "1"};
+inline constexpr Unit kMatrixAxis = {"element", "C62", "1"};
 inline constexpr Unit kLevelAxis = {"grey level", nullptr, "level"};
 
 enum class Number { kWhole, kReal };

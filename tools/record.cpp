@@ -37,7 +37,8 @@ Json ToJson(const Measurement& m) {
     // No value: it was asked for, and not measured.
   } else if (m.info->figure->axis != nullptr) {
     Json& points = json["measured_value"] = Json::array();
-    const bool whole_axis = m.info->figure->axis == &kPatchAxis || m.info->figure->axis == &kLevelAxis;
+    const std::string axis_suffix = m.info->figure->axis->suffix;
+    const bool whole_axis = axis_suffix == "1" || axis_suffix == "level";
     for (std::size_t i = 0; i < m.values.size(); ++i) {
       points.push_back({ToJson(m.axis[i], whole_axis ? Number::kWhole : Number::kReal),
                         ToJson(m.values[i], m.info->figure->number)});

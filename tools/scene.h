@@ -3,6 +3,7 @@
 
 #include <cairo.h>
 
+#include <cstdint>
 #include <opencv2/core.hpp>
 #include <vector>
 
@@ -41,6 +42,10 @@ struct DustSpeck {
 /// A plain target with specks on the lens, in photo pixels; `darkness` is how much darker than the target they are, 0
 /// to 1.
 Scene DustyTarget(const std::vector<DustSpeck>& specks, double darkness);
+
+/// A textured scene with few repeats, for registration: overlapping polygons of random grey on mid grey, over a square
+/// of this side. The same seed gives the same scene.
+Scene TexturedScene(double side, std::uint64_t seed);
 
 /// Fills the shapes, each corner mapped by a projective transform to the target's coordinates.
 void Fill(cairo_t* cr, const Scene& scene, const cv::Matx33d& to_target);

@@ -46,7 +46,11 @@ std::string Nv21(const cv::Mat& photo) {
 }
 
 std::string Encode(const cv::Mat& photo, const Output& output) {
-  const std::string extension = output.path == "-" ? ".png" : Extension(output.path);
+  const bool is_hdr = photo.depth() == CV_32F;
+  const std::string extension = output.path == "-" ? (is_hdr ? ".pfm" : ".png") : Extension(output.path);
+  if (is_hdr && extension != ".exr" && extension != ".tif" && extension != ".tiff" && extension != ".pfm") {
+    throw Failure(kWrongUsage, output.path + ": floats are kept without loss in an .exr, .tif or .pfm file");
+  }
   if (extension == ".nv21") return Nv21(photo);
   const bool takes_16_bits = extension == ".png" || extension == ".tif" || extension == ".tiff";
   if (photo.depth() == CV_16U && !takes_16_bits) {
@@ -54,9 +58,11 @@ std::string Encode(const cv::Mat& photo, const Output& output) {
   }
   std::vector<uchar> file;
   try {
-    // Fast compression: noise does not compress anyway.
+    // Fast compression: noise does not compress anyway. A float TIFF would be written as LogLuv unless told not to.
+    constexpr int kLzw = 5;
     cv::imencode(extension, photo, file,
-                 {cv::IMWRITE_PNG_COMPRESSION, 1, cv::IMWRITE_JPEG_QUALITY, output.jpeg_quality});
+                 {cv::IMWRITE_PNG_COMPRESSION, 1, cv::IMWRITE_JPEG_QUALITY, output.jpeg_quality,
+                  cv::IMWRITE_TIFF_COMPRESSION, kLzw});
   } catch (const cv::Exception&) {
     throw Failure(kWrongUsage, output.path + ": name a .png, .jpg, .bmp, .tif or .nv21 file");
   }
@@ -96,14 +102,16 @@ CommandBody DeclareSimulate(CLI::App& command) {
   auto o = std::make_shared<Options>();
   command
       .add_option("-o,--output", o->output.path,
-                  "Photo to write: .png, .jpg, .bmp, .tif, or .nv21 for a raw preview frame; - is standard output, as "
-                  "PNG. Its truth goes beside it, to PHOTO.truth.json")
+                  "Photo to write: .png, .jpg, .bmp, .tif, or .nv21 for a raw preview frame; .exr, .tif or .pfm for "
+                  "hdr; - is standard output, as PNG or PFM. Its truth goes beside it, to PHOTO.truth.json")
       ->required()
       ->type_name("PHOTO");
   command
-      .add_option("--scene", o->scene,
-                  "What stands before the camera: the sharpness chart, the three marks of an "
-                  "aiming target, two preview frames of a moving chart, a plain target seen through dust [chart]")
+      .add_option(
+          "--scene", o->scene,
+          "What stands before the camera: the sharpness chart, the three marks of an "
+          "aiming target, two preview frames of a moving chart, a plain target seen through dust, two photos of "
+          "a textured scene, a lit panel with dots in high dynamic range [chart]")
       ->check(CLI::IsMember(SceneNames()))
       ->type_name("SCENE");
   command.add_option("--size", o->size, "Pixels of the photo [4000x3000]")->type_name("WxH");
@@ -116,11 +124,24 @@ CommandBody DeclareSimulate(CLI::App& command) {
   command.add_option("--marks", o->marks, "chart: size of the finder marks [auto: suits the photo's size]")
       ->check(CLI::IsMember({"auto", "fine", "medium", "coarse"}))
       ->type_name("SIZE");
-  command.add_option("--motion", o->motion, "preview: way of the chart to the second frame, PHOTO.second.png [4,0]")
+  command
+      .add_option("--motion", o->motion, "preview, pair: way of the scene to the second photo, PHOTO.second.png [4,0]")
       ->type_name("DX,DY");
   command.add_option("--specks", o->specks, "dust: number of specks [5]")->check(CLI::Range(0, 1000))->type_name("N");
   AddNumber(command, "--speck-size", o->speck_px, "dust: diameter of a speck [10]", 0.5, 500, "PX");
   AddNumber(command, "--speck-darkness", o->speck_darkness, "dust: how much darker than the target, 0 to 1 [0.6]", 0, 1,
+            "SHARE");
+  AddNumber(command, "--second-turn", o->second_turn_deg, "pair: turn of the second photo, counter-clockwise [0]", -180,
+            180, "DEG");
+  AddNumber(command, "--second-scale", o->second_scale, "pair: size of the scene in the second photo [1]", 0.2, 2,
+            "FACTOR");
+  AddNumber(command, "--second-gain", o->second_gain, "pair: levels of the second photo over the first's [1]", 0, 4,
+            "FACTOR");
+  command.add_option("--dots", o->dots, "hdr: number of dots, half of them bright, half dark [100]")
+      ->check(CLI::Range(0, 100'000))
+      ->type_name("N");
+  command.add_option("--dot-size", o->dot_px, "hdr: side of a dot [1]")->check(CLI::Range(1, 1000))->type_name("PX");
+  AddNumber(command, "--dot-contrast", o->dot_contrast, "hdr: how much brighter or darker than the panel [0.5]", 0, 1,
             "SHARE");
   command.add_option("--bits", o->output.bits, "Bits a channel, 8 or 16 [8]")
       ->check(CLI::IsMember({8, 16}))
@@ -143,7 +164,8 @@ CommandBody DeclareSimulate(CLI::App& command) {
     }
     CameraModel sensor = o->camera;
     for (std::size_t i = 0; i < simulation.levels.size(); ++i) {
-      const cv::Mat photo = Sense(sensor, simulation.levels[i], o->output.bits);
+      const cv::Mat photo =
+          simulation.is_hdr ? simulation.levels[i] : Sense(sensor, simulation.levels[i], o->output.bits);
       const std::string path = NumberedPath(o->output.path, i);
       WriteWholeFile(path, Encode(photo, o->output));
       if (!o->output.quiet && path != "-") std::cout << Format("%s  %d x %d\n", path.c_str(), photo.cols, photo.rows);

@@ -189,13 +189,81 @@ Simulation DustPhoto(const SimulationOptions& options) {
   return s;
 }
 
+// The second photo is the first one's view turned and scaled about its middle, then moved.
+Simulation PhotoPair(const SimulationOptions& options) {
+  const CameraModel& camera = options.camera;
+  const double side = 1.6 * std::hypot(camera.size.width, camera.size.height);  // beyond both views
+  const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
+  const cv::Matx33d first(1, 0, middle.x - side / 2, 0, 1, middle.y - side / 2, 0, 0, 1);
+  const double turn = options.second_turn_deg * CV_PI / 180;
+  const double c = options.second_scale * std::cos(turn);
+  const double s = options.second_scale * std::sin(turn);
+  const cv::Point2d to = middle + options.motion_px;
+  const cv::Matx33d move(c, s, to.x - c * middle.x - s * middle.y, -s, c, to.y + s * middle.x - c * middle.y, 0, 0, 1);
+  const Scene scene = TexturedScene(side, camera.seed);
+  CameraModel second = camera;
+  second.gain *= options.second_gain;
+  Simulation pair;
+  pair.levels = {Expose(camera, scene, first), Expose(second, scene, move * first)};
+  pair.truth["matrix"] = {move(0, 0), move(0, 1), move(0, 2), move(1, 0), move(1, 1), move(1, 2)};
+  pair.truth["shift_px"] = ToJson(options.motion_px);
+  pair.truth["turn_deg"] = options.second_turn_deg;
+  pair.truth["scale"] = options.second_scale;
+  pair.truth["gain"] = options.second_gain;
+  return pair;
+}
+
+// The first four dots lie in the corners, the next four at the middle of the edges, the rest anywhere; by turns bright
+// and dark.
+Simulation HdrCapture(const SimulationOptions& options) {
+  const CameraModel& camera = options.camera;
+  const int right = camera.size.width - options.dot_px;
+  const int bottom = camera.size.height - options.dot_px;
+  const int apart = options.dot_px + 8;
+  if (right < 0 || bottom < 0) throw Failure(kWrongUsage, "--dot-size: larger than the photo");
+  cv::Mat factors(camera.size, CV_32FC3, cv::Scalar::all(1));
+  cv::RNG random(camera.seed + 12345);
+  std::vector<cv::Rect> dots;
+  Simulation s;
+  s.truth["dots"] = Json::array();
+  const std::vector<cv::Point> first = {{0, 0},         {right, 0},          {0, bottom},         {right, bottom},
+                                        {right / 2, 0}, {right, bottom / 2}, {right / 2, bottom}, {0, bottom / 2}};
+  for (int tries = 0; static_cast<int>(dots.size()) < options.dots && tries < 1000 * options.dots; ++tries) {
+    const cv::Point at = tries < static_cast<int>(first.size())
+                             ? first[tries]
+                             : cv::Point(random.uniform(0, right + 1), random.uniform(0, bottom + 1));
+    const bool free = std::none_of(dots.begin(), dots.end(), [&](const cv::Rect& dot) {
+      return std::abs(dot.x - at.x) < apart && std::abs(dot.y - at.y) < apart;
+    });
+    if (!free) continue;
+    const double contrast = dots.size() % 2 == 0 ? options.dot_contrast : -options.dot_contrast;
+    dots.emplace_back(at, cv::Size(options.dot_px, options.dot_px));
+    factors(dots.back()).setTo(cv::Scalar::all(1 + contrast));
+    s.truth["dots"].push_back({{"column", at.x}, {"row", at.y}, {"side_px", options.dot_px}, {"contrast", contrast}});
+  }
+  if (static_cast<int>(dots.size()) < options.dots) {
+    throw Failure(kWrongUsage, Format("--dots %d: only %zu have room in the photo", options.dots, dots.size()));
+  }
+  if (camera.blur_px > 0) {
+    cv::GaussianBlur(factors, factors, {}, camera.blur_px, camera.blur_px, cv::BORDER_REPLICATE);
+  }
+  CameraModel panel = camera;
+  panel.blur_px = panel.defocus_px = 0;  // an even panel
+  cv::Mat levels = Expose(panel, Scene(), cv::Matx33d::eye()).mul(factors);
+  cv::RNG noise(camera.seed);
+  AddNoise(camera, levels, noise);
+  s.levels = {levels / 255};
+  s.is_hdr = true;
+  return s;
+}
+
 struct SceneRow {
   const char* name;
   Simulation (*simulate)(const SimulationOptions& options);
 };
 
-constexpr SceneRow kScenes[] = {
-    {"chart", ChartPhoto}, {"target", TargetPhoto}, {"preview", PreviewFrames}, {"dust", DustPhoto}};
+constexpr SceneRow kScenes[] = {{"chart", ChartPhoto}, {"target", TargetPhoto}, {"preview", PreviewFrames},
+                                {"dust", DustPhoto},   {"pair", PhotoPair},     {"hdr", HdrCapture}};
 
 }  // namespace
 

@@ -18,11 +18,18 @@ struct SimulationOptions {
   int specks = 5;        // dust
   double speck_px = 10;  // diameter
   double speck_darkness = 0.6;
-  cv::Point2d motion_px = {4, 0};  // preview: the scene's way between the two frames
+  cv::Point2d motion_px = {4, 0};  // preview, pair: the scene's way between the two photos
+  double second_turn_deg = 0;      // pair: of the scene in the second photo, counter-clockwise about its middle
+  double second_scale = 1;         // pair
+  double second_gain = 1;          // pair: levels of the second photo over those of the first
+  int dots = 100;                  // hdr
+  int dot_px = 1;                  // side of a dot
+  double dot_contrast = 0.5;       // how much brighter, or darker, than the panel
 };
 
 struct Simulation {
   std::vector<cv::Mat> levels;  // CV_32FC3 in BGR, what falls on the sensor; a photo each
+  bool is_hdr = false;          // the levels are the picture: noise is in them, and they are written as floats
   Json truth;
 };
 

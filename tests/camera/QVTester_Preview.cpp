@@ -73,8 +73,8 @@ int QVTester::CheckPatternCircles(int cam_id) {
   QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, binary.rows, binary.cols);
 
   const std::array<char, 32> count = Short("%d", static_cast<int>(points.size()));
-  if (cam_id == kSecondRearCamera) Publish(Short("t82.vi_c_num_mw"), count);
-  if (cam_id == kMainCamera) Publish(Short("t82.vi_c_num_main"), count);
+  if (cam_id == kSecondRearCamera) Publish(Short("%s", "t82.vi_c_num_mw"), count);
+  if (cam_id == kMainCamera) Publish(Short("%s", "t82.vi_c_num_main"), count);
   if (cam_id == kMainCamera || cam_id == kSecondRearCamera) GetImageCenter(points, cam_id);
 
   const bool found = points.size() == kMarks;
