@@ -36,7 +36,7 @@ int ColumnsAcross(const Record& record, int otherwise) {
 }
 
 Json ReadTruth(const std::string& path) {
-  const Json truth = Json::parse(ReadWholeFile(path, kWrongUsage), nullptr, false);
+  Json truth = Json::parse(ReadWholeFile(path, kWrongUsage), nullptr, false);
   if (truth.is_discarded()) throw Failure(kWrongUsage, path + ": not the truth of a simulated photo");
   return truth;
 }

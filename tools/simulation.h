@@ -27,7 +27,7 @@ struct SimulationOptions {
   double dot_contrast = 0.5;       // how much brighter, or darker, than the panel
 };
 
-struct Simulation {
+struct Simulation {             // NOLINT(bugprone-exception-escape): moving Json does not throw
   std::vector<cv::Mat> levels;  // CV_32FC3 in BGR, what falls on the sensor; a photo each
   bool is_hdr = false;          // the levels are the picture: noise is in them, and they are written as floats
   Json truth;

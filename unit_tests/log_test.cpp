@@ -13,12 +13,12 @@ int last_priority = 0;
 }  // namespace
 
 // Stands in for liblog's, which cuts lines at about a thousand characters before anybody sees them.
-extern "C" int __android_log_print(int priority, const char* tag, const char* format,
+extern "C" int __android_log_print(int priority, const char* tag, const char* fmt,
                                    ...) {  // NOLINT(bugprone-reserved-identifier,cert-dcl*): liblog's name
   EXPECT_STREQ("QVTEST", tag);
-  EXPECT_STREQ("[OKAPI] %s", format);
+  EXPECT_STREQ("[OKAPI] %s", fmt);
   va_list arguments;
-  va_start(arguments, format);
+  va_start(arguments, fmt);
   last_line = va_arg(arguments, const char*);
   va_end(arguments);
   last_priority = priority;
