@@ -159,7 +159,13 @@ void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area) {
   std::vector<cv::Point2d> second_line;
   for (const cv::Point2d& point : plot.second_curve) second_line.push_back(place(point));
   if (!second_line.empty()) picture.Line(second_line, kInk, 1);
-  if (!plot.bars) picture.Line(line, {0.1, 0.35, 0.75}, 2);
+  if (!plot.bars && !line.empty()) picture.Line(line, {0.1, 0.35, 0.75}, 2);
+  for (const Plot::Curve& curve : plot.more_curves) {
+    std::vector<cv::Point2d> points;
+    for (const cv::Point2d& point : curve.points) points.push_back(place(point));
+    picture.Line(points, curve.colour, 2.5);
+    for (const cv::Point2d& point : points) picture.Circle(point, 2.5, curve.colour, 2);
+  }
   for (const Plot::Marker& marker : plot.markers) {
     if (!finite(marker.at) || marker.at.x > plot.x_max) continue;
     const cv::Point2d at = place(marker.at);

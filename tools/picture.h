@@ -61,6 +61,11 @@ struct Plot {
   double second_x_factor = 1;              // second axis = first x factor
   std::vector<cv::Point2d> curve;
   std::vector<cv::Point2d> second_curve;
+  struct Curve {
+    std::vector<cv::Point2d> points;
+    Colour colour;
+  };
+  std::vector<Curve> more_curves;
   bool bars = false;  // the curve as bars
   std::vector<double> horizontal_lines;
   struct Marker {

@@ -1,0 +1,616 @@
+// Measures the measures: simulated photos whose truth is known, and how far each figure lies from it. Prints the tables
+// that README and docs quote; everything is drawn from fixed seeds, so two runs print the same.
+//   qvtester_accuracy [--curves FILE.png] [SECTION...]
+
+#include <android/log.h>
+
+#include <algorithm>
+#include <array>
+#include <atomic>
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <functional>
+#include <map>
+#include <opencv2/aruco.hpp>
+#include <opencv2/imgproc.hpp>
+#include <opencv2/objdetect.hpp>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "chart/chart_layout.h"
+#include "qvtester/tester.h"
+#include "tools/chart_view.h"
+#include "tools/method_law.h"
+#include "tools/picture.h"
+#include "tools/simulation.h"
+
+namespace {
+
+constexpr int kThreshold = 125;
+
+// Runs trials on all cores; each writes only its own results.
+void ForEachTrial(int trials, const std::function<void(int)>& run) {
+  std::atomic<int> next = 0;
+  std::vector<std::thread> threads;
+  for (unsigned i = 0; i < std::max(1U, std::thread::hardware_concurrency()); ++i) {
+    threads.emplace_back([&] {
+      for (int trial = next++; trial < trials; trial = next++) run(trial);
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+}
+
+double Quantile(std::vector<double> values, double share) {
+  if (values.empty()) return NAN;
+  std::sort(values.begin(), values.end());
+  return values[static_cast<std::size_t>(share * static_cast<double>(values.size() - 1) + 0.5)];
+}
+
+double Mean(const std::vector<double>& values) {
+  double sum = 0;
+  for (const double value : values) sum += value;
+  return sum / static_cast<double>(values.size());
+}
+
+double ShareBelow(const std::vector<double>& values, double limit) {
+  return 100.0 * static_cast<double>(std::count_if(values.begin(), values.end(), [=](double v) { return v < limit; })) /
+         static_cast<double>(values.size());
+}
+
+SimulationOptions ChartOptions(cv::Size size, double blur_px) {
+  SimulationOptions options;
+  options.camera.size = size;
+  options.camera.fill = 0.9;
+  options.camera.blur_px = blur_px;
+  return options;
+}
+
+struct Reading {
+  bool found = false;
+  double vertical = NAN, horizontal = NAN;
+};
+
+Reading MeasureSharpness(const cv::Mat& photo) {
+  QVTester tester;
+  std::vector<float> freq;
+  std::vector<float> vertical;
+  std::vector<float> horizontal;
+  float v = NAN;
+  float h = NAN;
+  Reading reading;
+  reading.found = tester.GetSFRFromImage(photo, freq, vertical, horizontal, v, h) == QV_SUCCESS;
+  reading.vertical = v;
+  reading.horizontal = h;
+  return reading;
+}
+
+// How far outside of the law's bounds a reading lies, in percent; 0 inside.
+double Departure(double reading, const Json& edge) {
+  const double low = edge.at("expected_low_nyquist");
+  const double high = edge.at("expected_high_nyquist");
+  return 100 * std::max({0.0, reading / high - 1, 1 - reading / low});
+}
+
+void PrintMtf50() {
+  const std::vector<double> blurs = {0.3, 0.5, 0.8, 1.2, 1.6, 2.0, 2.5, 3.0};
+  const std::vector<double> slopes = {3, 4, 5, 6, 7, 8};
+  std::printf("\nMTF50 without noise, upright, edges at 3 to 8 degrees; units of Nyquist, 12 readings a row\n\n");
+  std::printf("| blur px | true | law from | to | measured from | to | mean error | furthest beyond the law |\n");
+  std::printf("|---|---|---|---|---|---|---|---|\n");
+  std::vector<std::vector<Reading>> readings(blurs.size(), std::vector<Reading>(slopes.size()));
+  std::vector<std::vector<Json>> truths(blurs.size(), std::vector<Json>(slopes.size()));
+  ForEachTrial(static_cast<int>(blurs.size() * slopes.size()), [&](int trial) {
+    const std::size_t b = trial / slopes.size();
+    const std::size_t s = trial % slopes.size();
+    SimulationOptions options = ChartOptions({2000, 1500}, blurs[b]);
+    options.style.edge_angle_deg = slopes[s];
+    const Simulation simulation = Simulate(options);
+    truths[b][s] = simulation.truth;
+    readings[b][s] = MeasureSharpness(Sense(options.camera, simulation.levels[0], 8));
+  });
+  double worst = 0;
+  for (std::size_t b = 0; b < blurs.size(); ++b) {
+    std::vector<double> values;
+    std::vector<double> errors;
+    double low = 1;
+    double high = 0;
+    double truth = 0;
+    double departure = 0;
+    for (std::size_t s = 0; s < slopes.size(); ++s) {
+      for (const bool vertical : {true, false}) {
+        const Json& edge = truths[b][s].at("mtf50").at(vertical ? "vertical" : "horizontal");
+        const double reading = vertical ? readings[b][s].vertical : readings[b][s].horizontal;
+        truth = edge.at("mtf50_nyquist");
+        low = std::min<double>(low, edge.at("expected_low_nyquist"));
+        high = std::max<double>(high, edge.at("expected_high_nyquist"));
+        values.push_back(reading);
+        errors.push_back(100 * (reading / truth - 1));
+        departure = std::max(departure, Departure(reading, edge));
+      }
+    }
+    worst = std::max(worst, departure);
+    std::printf("| %.1f | %.4f | %.4f | %.4f | %.4f | %.4f | %+.1f %% | %.2f %% |\n", blurs[b], truth, low, high,
+                Quantile(values, 0), Quantile(values, 1), Mean(errors), departure);
+  }
+  std::printf("\nFurthest beyond the law's bounds: %.2f %% (promised: 2 %%)\n", worst);
+}
+
+void PrintStraightening() {
+  const std::vector<double> turns = {0, 1, 2, 3, 5, 10, 20, 30, 45, 60, 90};
+  const std::vector<double> blurs = {0.5, 0.8, 1.2, 2.0};
+  std::printf(
+      "\nWhat straightening costs: MTF50 of a turned chart over the upright one's, mean of both regions, percent\n\n");
+  std::printf("| turn, degrees |");
+  for (const double blur : blurs) std::printf(" blur %.1f px |", blur);
+  std::printf("\n|---|---|---|---|---|\n");
+  std::vector<double> means(turns.size() * blurs.size());
+  ForEachTrial(static_cast<int>(means.size()), [&](int trial) {
+    SimulationOptions options = ChartOptions({2000, 1500}, blurs[trial % blurs.size()]);
+    options.camera.turn_deg = turns[trial / blurs.size()];
+    options.camera.fill = 0.65;  // room for every turn at one scale
+    const double turn = options.camera.turn_deg * CV_PI / 180;
+    options.camera.fill *= std::fabs(std::cos(turn)) + std::fabs(std::sin(turn));
+    const Reading reading = MeasureSharpness(Sense(options.camera, Simulate(options).levels[0], 8));
+    means[trial] = reading.found ? (reading.vertical + reading.horizontal) / 2 : NAN;
+  });
+  for (std::size_t t = 0; t < turns.size(); ++t) {
+    std::printf("| %.0f |", turns[t]);
+    for (std::size_t b = 0; b < blurs.size(); ++b) {
+      std::printf(" %+.1f |", 100 * (means[t * blurs.size() + b] / means[b] - 1));
+    }
+    std::printf("\n");
+  }
+}
+
+void PrintNoise() {
+  constexpr int kSeeds = 50;
+  const std::vector<double> blurs = {0.5, 0.8, 1.2, 2.0};
+  const std::vector<double> noises = {0.5, 1, 1.5, 2};
+  std::printf("\nMTF50 under noise, upright, 5 degrees; against the noiseless reading; %d readings a row\n\n",
+              2 * kSeeds);
+  std::printf(
+      "| blur px | noise | median | 5th percentile | 95th | outside the law by over 2 %% "
+      "|\n|---|---|---|---|---|---|\n");
+  for (const double blur : blurs) {
+    SimulationOptions options = ChartOptions({2000, 1500}, blur);
+    const Simulation simulation = Simulate(options);
+    const Reading clean = MeasureSharpness(Sense(options.camera, simulation.levels[0], 8));
+    for (const double noise : noises) {
+      std::vector<double> errors(2 * kSeeds);
+      std::vector<double> departures(2 * kSeeds);
+      ForEachTrial(kSeeds, [&](int seed) {
+        CameraModel camera = options.camera;
+        camera.noise_percent = noise;
+        camera.seed = seed + 1;
+        const Reading reading = MeasureSharpness(Sense(camera, simulation.levels[0], 8));
+        errors[2 * seed] = 100 * (reading.vertical / clean.vertical - 1);
+        errors[2 * seed + 1] = 100 * (reading.horizontal / clean.horizontal - 1);
+        departures[2 * seed] = Departure(reading.vertical, simulation.truth.at("mtf50").at("vertical"));
+        departures[2 * seed + 1] = Departure(reading.horizontal, simulation.truth.at("mtf50").at("horizontal"));
+      });
+      std::printf("| %.1f | %.1f %% | %+.2f %% | %+.2f %% | %+.2f %% | %.0f %% |\n", blur, noise, Quantile(errors, 0.5),
+                  Quantile(errors, 0.05), Quantile(errors, 0.95), 100 - ShareBelow(departures, 2));
+    }
+  }
+}
+
+std::vector<Mark> FindMarks(const cv::Mat& photo) {
+  QVTester tester;
+  cv::Mat gray;
+  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  cv::threshold(gray, gray, kThreshold, 255, cv::THRESH_BINARY);
+  if (tester.GetFinderPoints(gray).size() != 3) return {};
+  return LookAtChart(tester).marks;
+}
+
+double LargestMarkError(const std::vector<Mark>& marks, const Json& truth) {
+  double largest = 0;
+  for (const Mark& mark : marks) {
+    double nearest = 1e9;
+    for (const Json& centre : truth.at("marks")) {
+      nearest = std::min(nearest, std::hypot(centre.at("x").get<double>() - mark.centre.x,
+                                             centre.at("y").get<double>() - mark.centre.y));
+    }
+    largest = std::max(largest, nearest);
+  }
+  return largest;
+}
+
+void PrintMarks() {
+  constexpr int kSeeds = 20;
+  std::printf(
+      "\nMark positions, 2000 x 1500, blur 1 px, noise 1 %%; the furthest of a photo's three marks, %d photos a "
+      "row\n\n",
+      kSeeds);
+  std::printf("| turn, degrees | found | median px | 95th percentile px | largest, modules |\n|---|---|---|---|---|\n");
+  for (const double turn : {0.0, 5.0, 15.0, 30.0, 45.0}) {
+    std::vector<double> errors(kSeeds, -1);
+    std::vector<double> modules(kSeeds, 0);
+    ForEachTrial(kSeeds, [&](int seed) {
+      SimulationOptions options = ChartOptions({2000, 1500}, 1);
+      options.camera.turn_deg = turn + 0.13 * seed;
+      options.camera.noise_percent = 1;
+      options.camera.seed = seed + 1;
+      const Simulation simulation = Simulate(options);
+      const std::vector<Mark> marks = FindMarks(Sense(options.camera, simulation.levels[0], 8));
+      if (marks.size() != 3) return;
+      errors[seed] = LargestMarkError(marks, simulation.truth);
+      modules[seed] = errors[seed] / simulation.truth.at("module_px").get<double>();
+    });
+    errors.erase(std::remove(errors.begin(), errors.end(), -1), errors.end());
+    std::printf("| %.0f | %zu of %d | %.2f | %.2f | %.2f |\n", turn, errors.size(), kSeeds, Quantile(errors, 0.5),
+                Quantile(errors, 0.95), Quantile(modules, 1));
+  }
+}
+
+void PrintPatches() {
+  std::printf("\nPatch colours, 1600 x 1200: CIE 1976 difference to the colour as photographed\n\n");
+  std::printf("| turn | noise | mean | largest |\n|---|---|---|---|\n");
+  for (const double turn : {0.0, 10.0}) {
+    for (const double noise : {0.0, 2.0}) {
+      SimulationOptions options = ChartOptions({1600, 1200}, 1);
+      options.camera.gain = 0.85;
+      options.camera.turn_deg = turn;
+      options.camera.noise_percent = noise;
+      const Simulation simulation = Simulate(options);
+      cv::Mat photo = Sense(options.camera, simulation.levels[0], 8);
+      QVTester tester;
+      auto slot = std::make_unique<QVResource>();
+      slot->SetImage(photo);
+      tester.resources_[QV_RESOURCE_CHART_PHOTO] = std::move(slot);
+      slot = std::make_unique<QVResource>();
+      slot->SetImage(photo);
+      tester.resources_[QV_RESOURCE_CHART_STANDARD] = std::move(slot);
+      if (tester.TestCameraCapture(false) != QV_SUCCESS) continue;
+      QVResultData* results = nullptr;
+      tester.GetResult(&results);
+      std::vector<double> differences;
+      for (int i = 0; i < results->capture_main_.capture_lab_count_; ++i) {
+        double square = 0;
+        for (int k = 0; k < 3; ++k) {
+          const double truth = simulation.truth.at("patches").at(i).at("lab").at(k);
+          square += std::pow(results->capture_main_.capture_lab_[3 * i + k] - truth, 2);
+        }
+        differences.push_back(std::sqrt(square));
+      }
+      std::printf("| %.0f | %.0f %% | %.2f | %.2f |\n", turn, noise, Mean(differences), Quantile(differences, 1));
+    }
+  }
+}
+
+void PrintDust() {
+  constexpr int kPhotos = 10;
+  constexpr int kSpecks = 3;
+  std::printf(
+      "\nDust, blur 0.7 px: specks found of %d, by diameter and by how much darker than the target they are\n\n",
+      kPhotos * kSpecks);
+  std::printf("| diameter px | darkness 0.6 | 0.3 | 0.15 |\n|---|---|---|---|\n");
+  for (const double diameter : {3.0, 4.0, 5.0, 6.0, 8.0, 10.0, 12.0, 14.0, 16.0, 18.0, 20.0, 24.0}) {
+    std::printf("| %.0f |", diameter);
+    for (const double darkness : {0.6, 0.3, 0.15}) {
+      std::vector<int> found(kPhotos, 0);
+      ForEachTrial(kPhotos, [&](int trial) {
+        SimulationOptions options;
+        options.scene = "dust";
+        options.camera.size = {800, 600};
+        options.camera.blur_px = 0.7;
+        options.camera.noise_percent = 0.5;
+        options.camera.seed = trial + 1;
+        options.specks = kSpecks;
+        options.speck_px = diameter;
+        options.speck_darkness = darkness;
+        const Simulation simulation = Simulate(options);
+        cv::Mat gray;
+        cv::cvtColor(Sense(options.camera, simulation.levels[0], 8), gray, cv::COLOR_RGB2GRAY);
+        QVTester tester;
+        tester.detectBlob(gray);
+        for (const Json& speck : simulation.truth.at("specks")) {
+          found[trial] += static_cast<int>(
+              std::any_of(tester.blob_keypoints_.begin(), tester.blob_keypoints_.end(), [&](const cv::KeyPoint& blob) {
+                return std::hypot(blob.pt.x - speck.at("x").get<double>(), blob.pt.y - speck.at("y").get<double>()) < 2;
+              }));
+        }
+      });
+      int sum = 0;
+      for (const int count : found) sum += count;
+      std::printf(" %d |", sum);
+    }
+    std::printf("\n");
+  }
+}
+
+void PrintRegistration() {
+  constexpr int kPairs = 50;
+  std::vector<double> errors(kPairs, 1e9);
+  ForEachTrial(kPairs, [&](int trial) {
+    cv::RNG random(trial + 1);
+    SimulationOptions options;
+    options.scene = "pair";
+    options.camera.size = {640, 480};
+    options.camera.blur_px = 0.8;
+    options.camera.noise_percent = 3;
+    options.camera.gain = 0.75;
+    options.camera.seed = trial + 1;
+    options.motion_px = {random.uniform(-40.0, 40.0), random.uniform(-40.0, 40.0)};
+    options.second_turn_deg = random.uniform(-10.0, 10.0);
+    options.second_scale = random.uniform(0.9, 1.1);
+    options.second_gain = random.uniform(0.7, 1.3);
+    const Simulation simulation = Simulate(options);
+    const cv::Mat first = Sense(options.camera, simulation.levels[0], 8);
+    CameraModel other = options.camera;
+    other.seed += 1000;
+    const cv::Mat second = Sense(other, simulation.levels[1], 8);
+    QVTester tester;
+    cv::Mat unwarped;
+    if (tester.GetUnwarpedImage(first, second, unwarped) != QV_SUCCESS) return;
+    const cv::Matx23d found(tester.unwarp_.matrix);
+    double sum = 0;
+    for (int y = 0; y <= 480; y += 60) {
+      for (int x = 0; x <= 640; x += 80) {
+        const cv::Vec3d at(x, y, 1);
+        const Json& m = simulation.truth.at("matrix");
+        const cv::Vec2d is = found * at;
+        sum += std::hypot(is[0] - (m[0].get<double>() * x + m[1].get<double>() * y + m[2].get<double>()),
+                          is[1] - (m[3].get<double>() * x + m[4].get<double>() * y + m[5].get<double>()));
+      }
+    }
+    errors[trial] = sum / 81;
+  });
+  std::printf(
+      "\nRegistration, %d pairs of 640 x 480: shift to 40 px, turn to 10 degrees, scale 0.9 to 1.1, gain 0.7 to 1.3, "
+      "noise 3 %%\n\n",
+      kPairs);
+  std::printf(
+      "| median grid error px | under 1 px | under 3 px | under 10 px |\n|---|---|---|---|\n| %.2f | %.0f %% | %.0f %% "
+      "| %.0f %% |\n",
+      Quantile(errors, 0.5), ShareBelow(errors, 1), ShareBelow(errors, 3), ShareBelow(errors, 10));
+}
+
+void PrintDots() {
+  constexpr int kPictures = 10;
+  std::printf(
+      "\nHDR dots: 1,000 of contrast 0.2 (bright and dark) at threshold 0.1, noise 0.5 %%, shading 20 %%, 1200 x "
+      "900\n\n");
+  std::printf("| radius px | corners | edges | elsewhere | false dots |\n|---|---|---|---|---|\n");
+  struct Count {
+    int found = 0, drawn = 0;
+  };
+  for (const int radius : {1, 2, 5, 10, 20, 50, 100}) {
+    std::vector<std::map<std::string, Count>> counts(kPictures);
+    ForEachTrial(kPictures, [&](int trial) {
+      SimulationOptions options;
+      options.scene = "hdr";
+      options.camera.size = {1200, 900};
+      options.camera.noise_percent = 0.5;
+      options.camera.shading_percent = 20;
+      options.camera.seed = trial + 1;
+      options.dot_contrast = 0.2;
+      const Simulation simulation = Simulate(options);
+      cv::Mat picture = simulation.levels[0].clone();
+      cv::Mat mask = cv::Mat::zeros(picture.size(), CV_8U);
+      QVTester tester;
+      tester.DetectDot(picture.ptr<float>(), picture.rows, picture.cols, 0.1f, radius, mask.data);
+      for (const Json& dot : simulation.truth.at("dots")) {
+        const cv::Point at(dot.at("column"), dot.at("row"));
+        const bool side = at.x == 0 || at.x == picture.cols - 1;
+        const bool end = at.y == 0 || at.y == picture.rows - 1;
+        Count& count = counts[trial][side && end ? "corners" : side || end ? "edges" : "elsewhere"];
+        ++count.drawn;
+        count.found += mask.at<uchar>(at);
+        mask.at<uchar>(at) = 0;
+      }
+      counts[trial]["false"].found = cv::countNonZero(mask);
+    });
+    std::map<std::string, Count> sum;
+    for (const auto& picture : counts) {
+      for (const auto& [place, count] : picture) {
+        sum[place].found += count.found;
+        sum[place].drawn += count.drawn;
+      }
+    }
+    std::printf("| %d | %d of %d | %d of %d | %d of %d | %d |\n", radius, sum["corners"].found, sum["corners"].drawn,
+                sum["edges"].found, sum["edges"].drawn, sum["elsewhere"].found, sum["elsewhere"].drawn,
+                sum["false"].found);
+  }
+}
+
+// ---- Detection beside the detectors of other targets ------------------------------------------------------------
+
+// Cells of a target as squares about the chart's middle, the outermost of them `module` wide.
+Scene CellScene(const cv::Mat& cells, double module) {
+  Scene scene;
+  const cv::Point2d from = cv::Point2d(1, 1) * (kChartSide / 2.0) - cv::Point2d(cells.cols, cells.rows) * (module / 2);
+  for (int i = 0; i < cells.rows; ++i) {
+    for (int j = 0; j < cells.cols; ++j) {
+      if (cells.at<uchar>(i, j) > 127) continue;
+      const cv::Point2d at = from + cv::Point2d(j, i) * module;
+      scene.shapes.push_back(
+          {{at, at + cv::Point2d(module, 0), at + cv::Point2d(module, module), at + cv::Point2d(0, module)},
+           {0, 0, 0}});
+    }
+  }
+  return scene;
+}
+
+cv::Mat QrCells() {
+  cv::Mat code;
+  cv::QRCodeEncoder::Params parameters;
+  parameters.version = 1;
+  cv::QRCodeEncoder::create(parameters)->encode("QVTESTER", code);
+  return code;
+}
+
+cv::Mat ArucoCells(int id) {
+  cv::Mat cells;
+  cv::aruco::drawMarker(cv::aruco::getPredefinedDictionary(cv::aruco::DICT_4X4_50), id, 6, cells, 1);
+  return cells;
+}
+
+bool IsNear(const std::vector<cv::Point2f>& corners, cv::Point2d centre, double limit) {
+  if (corners.size() != 4) return false;
+  const cv::Point2f middle = (corners[0] + corners[1] + corners[2] + corners[3]) / 4;
+  return cv::norm(cv::Point2d(middle) - centre) < limit;
+}
+
+struct Detections {
+  bool chart = false, qr = false, aruco = false;
+};
+
+Detections Detect(const SimulationOptions& options) {
+  constexpr int kId = 7;
+  const CameraModel& camera = options.camera;
+  Detections found;
+  const Simulation simulation = Simulate(options);
+  const double module_px = simulation.truth.at("module_px");
+  const std::vector<Mark> marks = FindMarks(Sense(camera, simulation.levels[0], 8));
+  found.chart = marks.size() == 3 && LargestMarkError(marks, simulation.truth) < 1.5 * module_px;
+
+  const double module = simulation.truth.at("module_units");
+  const cv::Matx33d map = PhotoFromScene(camera, SfrChartBounds());
+  const cv::Point2d centre = Map(map, cv::Point2d(1, 1) * (kChartSide / 2.0));
+  std::vector<cv::Point2f> corners;
+  const cv::Mat qr = Sense(camera, Expose(camera, CellScene(QrCells(), module), map), 8);
+  found.qr = cv::QRCodeDetector().detect(qr, corners) && IsNear(corners, centre, 2 * module_px);
+  const cv::Mat aruco = Sense(camera, Expose(camera, CellScene(ArucoCells(kId), module), map), 8);
+  std::vector<std::vector<cv::Point2f>> markers;
+  std::vector<int> ids;
+  cv::aruco::detectMarkers(aruco, cv::aruco::getPredefinedDictionary(cv::aruco::DICT_4X4_50), markers, ids);
+  for (std::size_t i = 0; i < ids.size(); ++i) {
+    found.aruco = found.aruco || (ids[i] == kId && IsNear(markers[i], centre, 2 * module_px));
+  }
+  return found;
+}
+
+struct Sweep {
+  const char* name;
+  const char* axis;
+  std::vector<double> values;
+  void (*apply)(SimulationOptions& options, double value);
+};
+
+const std::vector<Sweep>& Sweeps() {
+  static const std::vector<Sweep> sweeps = {
+      {"blur",
+       "Gaussian blur, sigma, px",
+       {0, 1, 2, 3, 4, 5, 6, 8},
+       [](SimulationOptions& o, double v) { o.camera.blur_px = v; }},
+      {"tilt", "tilt, degrees", {0, 10, 20, 30, 40, 50}, [](SimulationOptions& o, double v) { o.camera.tilt_deg = v; }},
+      {"noise",
+       "noise, % of 255",
+       {0, 2, 5, 10, 15, 20, 30},
+       [](SimulationOptions& o, double v) { o.camera.noise_percent = v; }},
+      {"shading",
+       "shading at the corners, %",
+       {0, 20, 40, 50, 60, 80},
+       [](SimulationOptions& o, double v) { o.camera.shading_percent = v; }},
+      {"size",
+       "width of the photo, px",
+       {240, 320, 480, 640, 960, 1600},
+       [](SimulationOptions& o, double v) {
+         o.camera.size = {static_cast<int>(v), static_cast<int>(v * 3 / 4)};
+       }},
+      {"turn",
+       "turn, degrees",
+       {0, 10, 20, 30, 40, 45, 60, 75, 90},
+       [](SimulationOptions& o, double v) { o.camera.turn_deg = v; }},
+  };
+  return sweeps;
+}
+
+std::string curves_file;
+
+void PrintDetection() {
+  constexpr int kPhotos = 12;
+  std::printf(
+      "\nDetection, share of %d photos: 960 x 720, any turn, blur 0.8 px, noise 1 %% where not varied. QR code "
+      "(version 1) "
+      "and ArUco\nmarker (4 x 4) stand at the chart's middle with cells as large as the marks' modules; OpenCV %s's "
+      "detectors\n",
+      kPhotos, CV_VERSION);
+  constexpr double kWidth = 420;
+  constexpr double kHeight = 300;
+  Picture picture(static_cast<int>(3 * kWidth), static_cast<int>(2 * kHeight + 40));
+  picture.Text("Share found: chart cyan, QR code yellow, ArUco marker red", {12, 26}, 16, kInk);
+  int place = 0;
+  for (const Sweep& sweep : Sweeps()) {
+    std::printf("\n| %s | chart | QR code | ArUco |\n|---|---|---|---|\n", sweep.axis);
+    std::vector<Detections> found(sweep.values.size() * kPhotos);
+    ForEachTrial(static_cast<int>(found.size()), [&](int trial) {
+      cv::RNG random(trial % kPhotos + 1);
+      SimulationOptions options = ChartOptions({960, 720}, 0.8);
+      options.camera.fill = 0.85;
+      options.camera.turn_deg = random.uniform(0.0, 360.0);
+      options.camera.noise_percent = 1;
+      options.camera.seed = trial % kPhotos + 1;
+      sweep.apply(options, sweep.values[trial / kPhotos]);
+      found[trial] = Detect(options);
+    });
+    Plot plot;
+    plot.title = std::string("Detection against ") + sweep.name;
+    plot.x_label = sweep.axis;
+    plot.y_label = "share found";
+    plot.x_max = sweep.values.back();
+    plot.y_max = 1.05;
+    plot.more_curves = {{{}, kDoubtful}, {{}, kPoor}, {{}, kGood}};
+    for (std::size_t i = 0; i < sweep.values.size(); ++i) {
+      const auto share = [&](bool Detections::*target) {
+        const auto first = found.begin() + static_cast<std::ptrdiff_t>(i * kPhotos);
+        return std::count_if(first, first + kPhotos, [=](const Detections& d) { return d.*target; }) /
+               static_cast<double>(kPhotos);
+      };
+      const std::array<double, 3> shares = {share(&Detections::qr), share(&Detections::aruco),
+                                            share(&Detections::chart)};
+      std::printf("| %g | %.0f %% | %.0f %% | %.0f %% |\n", sweep.values[i], 100 * shares[2], 100 * shares[0],
+                  100 * shares[1]);
+      for (int k = 0; k < 3; ++k) plot.more_curves[k].points.emplace_back(sweep.values[i], shares[k]);
+    }
+    DrawPlot(picture, plot, {place % 3 * kWidth, 40.0 + place / 3 * kHeight, kWidth, kHeight});
+    ++place;
+  }
+  if (!curves_file.empty()) WriteWholeFile(curves_file, picture.Png());
+}
+
+struct Section {
+  const char* name;
+  void (*print)();
+};
+
+constexpr Section kSections[] = {
+    {"mtf50", PrintMtf50},
+    {"straightening", PrintStraightening},
+    {"noise", PrintNoise},
+    {"marks", PrintMarks},
+    {"patches", PrintPatches},
+    {"dust", PrintDust},
+    {"registration", PrintRegistration},
+    {"dots", PrintDots},
+    {"detection", PrintDetection},
+};
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  std::vector<std::string> wanted;
+  for (int i = 1; i < argc; ++i) {
+    if (std::strcmp(argv[i], "--curves") == 0 && i + 1 < argc) {
+      curves_file = argv[++i];
+    } else if (std::any_of(std::begin(kSections), std::end(kSections),
+                           [&](const Section& section) { return std::strcmp(section.name, argv[i]) == 0; })) {
+      wanted.emplace_back(argv[i]);
+    } else {
+      std::fprintf(stderr, "usage: %s [--curves FILE.png] [SECTION...]\nsections:", argv[0]);
+      for (const Section& section : kSections) std::fprintf(stderr, " %s", section.name);
+      std::fprintf(stderr, "\n");
+      return 2;
+    }
+  }
+  __android_log_set_minimum_priority(ANDROID_LOG_SILENT);
+  cv::setNumThreads(1);  // the trials take the cores
+  for (const Section& section : kSections) {
+    if (wanted.empty() || std::find(wanted.begin(), wanted.end(), section.name) != wanted.end()) section.print();
+    std::fflush(stdout);
+  }
+  return 0;
+}
