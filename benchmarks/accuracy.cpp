@@ -257,6 +257,7 @@ void PrintPatches() {
       const Simulation simulation = Simulate(options);
       cv::Mat photo = Sense(options.camera, simulation.levels[0], 8);
       QVTester tester;
+      tester.Initialize();
       auto slot = std::make_unique<QVResource>();
       slot->SetImage(photo);
       tester.resources_[QV_RESOURCE_CHART_PHOTO] = std::move(slot);
