@@ -13,6 +13,9 @@
 /// Side of the square whose corners the three finder marks take: the reference of every scale.
 inline constexpr int kChartSide = 6970;
 
+/// Goes up when anything below changes: photos of charts of different revisions don't compare.
+inline constexpr int kChartRevision = 1;
+
 /// Finder marks come in three sizes; a module is a seventh of a mark's width, in chart units. The search misses modules
 /// under 3 pixels, and on a chart turned by some 30 degrees places a mark up to a quarter of a module off: so the marks
 /// should be the smallest whose modules still take 6 pixels.

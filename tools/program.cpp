@@ -6,6 +6,7 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+#include <cctype>
 #include <cerrno>
 #include <chrono>
 #include <csignal>
@@ -62,6 +63,12 @@ std::string Format(const char* format, ...) {
 std::int64_t MillisSinceEpoch() {
   using std::chrono::system_clock;
   return std::chrono::duration_cast<std::chrono::milliseconds>(system_clock::now().time_since_epoch()).count();
+}
+
+std::string LowerExtension(const std::string& path) {
+  std::string extension = std::filesystem::path(path).extension();
+  for (char& c : extension) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+  return extension;
 }
 
 std::string ReadWholeFile(const std::string& path, ExitStatus status) {

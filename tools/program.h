@@ -22,6 +22,9 @@ std::string Format(const char* format, ...) __attribute__((format(printf, 1, 2))
 
 std::int64_t MillisSinceEpoch();
 
+/// "photo.JPG" gives ".jpg".
+std::string LowerExtension(const std::string& path);
+
 /// Whole content of a file; throws Failure(status) with a sentence when it can't be read.
 std::string ReadWholeFile(const std::string& path, ExitStatus status);
 /// Writes a file as a whole ("-" is standard output); throws Failure when it can't.

@@ -1,5 +1,3 @@
-#include <algorithm>
-#include <cmath>
 #include <filesystem>
 #include <iostream>
 #include <memory>
@@ -19,13 +17,6 @@ struct Output {
   int jpeg_quality = 95;
   bool quiet = false;
 };
-
-std::string Extension(const std::string& path) {
-  std::string extension = std::filesystem::path(path).extension();
-  std::transform(extension.begin(), extension.end(), extension.begin(),
-                 [](unsigned char c) { return std::tolower(c); });
-  return extension;
-}
 
 // A preview frame as a phone delivers it: luma, then half-size chroma, V before U.
 std::string Nv21(const cv::Mat& photo) {
@@ -47,7 +38,7 @@ std::string Nv21(const cv::Mat& photo) {
 
 std::string Encode(const cv::Mat& photo, const Output& output) {
   const bool is_hdr = photo.depth() == CV_32F;
-  const std::string extension = output.path == "-" ? (is_hdr ? ".pfm" : ".png") : Extension(output.path);
+  const std::string extension = output.path == "-" ? (is_hdr ? ".pfm" : ".png") : LowerExtension(output.path);
   if (is_hdr && extension != ".exr" && extension != ".tif" && extension != ".tiff" && extension != ".pfm") {
     throw Failure(kWrongUsage, output.path + ": floats are kept without loss in an .exr, .tif or .pfm file");
   }
