@@ -4,6 +4,7 @@
 #include <cmath>
 #include <memory>
 #include <opencv2/imgproc.hpp>
+#include <vector>
 
 #include "tools/method_law.h"
 #include "tools/program.h"
@@ -42,31 +43,52 @@ cv::Mat DrawBand(const Scene& scene, const cv::Matx33d& band_from_scene, cv::Siz
   return levels;
 }
 
-// Mean of a shape over each cell of a kernel, summed to 1; `covers` says whether a point belongs to it.
-template <typename Covers>
-cv::Mat AreaKernel(int half, const Covers& covers) {
-  constexpr int kSamples = 8;
+constexpr int kKernelSamples = 8;  // a subpixel
+
+// Weight of a point at a distance of x cells: Keys' cubic convolution, which keeps mean and variance of what it
+// samples.
+double CellWeight(double x) {
+  x = std::fabs(x);
+  if (x < 1) return (1.5 * x - 2.5) * x * x + 1;
+  return x < 2 ? ((2.5 - 0.5 * x) * x - 4) * x + 2 : 0;
+}
+
+// The points shared out among the cells about them, summed to 1.
+cv::Mat PointsKernel(const std::vector<cv::Point2d>& points, double reach) {
+  const int half = static_cast<int>(std::ceil(reach)) + 2;
   cv::Mat kernel(2 * half + 1, 2 * half + 1, CV_32F, cv::Scalar(0));
-  for (int i = 0; i < kernel.rows * kSamples; ++i) {
-    for (int j = 0; j < kernel.cols * kSamples; ++j) {
-      const cv::Point2d at((j + 0.5) / kSamples - half - 0.5, (i + 0.5) / kSamples - half - 0.5);
-      if (covers(at)) kernel.at<float>(i / kSamples, j / kSamples) += 1;
+  for (const cv::Point2d& p : points) {
+    const int row = half + cvFloor(p.y) - 1;
+    const int column = half + cvFloor(p.x) - 1;
+    for (int i = row; i < row + 4; ++i) {
+      for (int j = column; j < column + 4; ++j) {
+        kernel.at<float>(i, j) += static_cast<float>(CellWeight(i - half - p.y) * CellWeight(j - half - p.x));
+      }
     }
   }
-  return kernel / cv::sum(kernel)[0];
+  return kernel / static_cast<double>(points.size());
 }
 
 cv::Mat DiscKernel(double radius) {
-  return AreaKernel(static_cast<int>(std::ceil(radius)), [=](cv::Point2d p) { return cv::norm(p) <= radius; });
+  std::vector<cv::Point2d> points;
+  const int half = static_cast<int>(std::ceil(radius * kKernelSamples));
+  for (int i = -half; i < half; ++i) {
+    for (int j = -half; j < half; ++j) {
+      const cv::Point2d p = cv::Point2d(j + 0.5, i + 0.5) / kKernelSamples;
+      if (cv::norm(p) <= radius) points.push_back(p);
+    }
+  }
+  if (points.empty()) points.emplace_back(0, 0);
+  return PointsKernel(points, radius);
 }
 
-// A straight path through the middle, one subpixel wide.
+// A straight path through the middle.
 cv::Mat PathKernel(cv::Point2d path) {
   const double length = cv::norm(path);
-  const cv::Point2d along = path / length;
-  return AreaKernel(static_cast<int>(std::ceil(length / 2 + 1)), [=](cv::Point2d p) {
-    return std::fabs(p.dot(along)) <= length / 2 && std::fabs(p.cross(along)) <= 0.5;
-  });
+  const int count = static_cast<int>(std::ceil(length * kKernelSamples));
+  std::vector<cv::Point2d> points;
+  for (int i = 0; i < count; ++i) points.push_back(path * ((i + 0.5) / count - 0.5));
+  return PointsKernel(points, length / 2);
 }
 
 void Blur(cv::Mat& band, const CameraModel& camera, int subpixels) {

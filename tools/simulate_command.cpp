@@ -149,7 +149,10 @@ CommandBody DeclareSimulate(CLI::App& command) {
     o->camera.cast = {cast[0], cast[1], cast[2]};
     o->camera.smear_px = {smear[0], smear[1]};
     o->motion_px = {motion[0], motion[1]};
-    const Simulation simulation = Simulate(*o);
+    Simulation simulation = Simulate(*o);
+    simulation.truth["parameters"]["bits"] = o->output.bits;
+    if (LowerExtension(o->output.path) == ".jpg")
+      simulation.truth["parameters"]["jpeg_quality"] = o->output.jpeg_quality;
     if (o->output.path == "-" && simulation.levels.size() > 1) {
       throw Failure(kWrongUsage, "-o -: this scene makes two photos; name a file");
     }

@@ -68,12 +68,20 @@ int ModuleOf(const SimulationOptions& options) {
   return SuitableMarks(PixelsPerUnit(PhotoFromScene(upright, SfrChartBounds()))).module;
 }
 
-Json MarkTruth(const cv::Matx33d& photo_from_scene) {
-  Json marks = Json::array();
-  for (const auto& [x, y] : kMarkCentres) {
-    marks.push_back(ToJson(Map(photo_from_scene, {static_cast<double>(x), static_cast<double>(y)})));
+// Marks and what the tests read of their places.
+Json MarkTruth(const cv::Matx33d& photo_from_scene, double module) {
+  std::array<cv::Point2d, 3> marks;
+  for (std::size_t i = 0; i < marks.size(); ++i) {
+    const auto& [x, y] = kMarkCentres[i];
+    marks[i] = Map(photo_from_scene, {static_cast<double>(x), static_cast<double>(y)});
   }
-  return marks;
+  const cv::Point2d right = marks[1] - marks[0];
+  const cv::Point2d down = marks[2] - marks[0];
+  return {{"marks", {ToJson(marks[0]), ToJson(marks[1]), ToJson(marks[2])}},
+          {"module_px", PixelsPerUnit(photo_from_scene) * module},
+          {"legs_ratio", cv::norm(right) / cv::norm(down)},
+          {"legs_angle_deg", std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI},
+          {"chart_turn_deg", std::atan2(-right.y, right.x) * 180 / CV_PI}};
 }
 
 // True figure of one edge and what the measure may read of it, in units of Nyquist.
@@ -83,9 +91,12 @@ Json EdgeTruth(const CameraModel& camera, cv::Point2d from, cv::Point2d to, int 
   const auto response = [&](double f) { return LensResponse(camera, f, normal); };
   const double mtf50 = 2 * method_law::HalfPoint(response, 1.0);
   const method_law::Bounds expected = method_law::MeasuredMtf50(response, npix);
+  Json sfr = Json::array();
+  for (int i = 0; i <= 20; ++i) sfr.push_back({i / 20.0, response(i / 40.0)});
   const double direction = std::atan2(along.y, along.x) * 180 / CV_PI;
   return {{"edge_direction_deg", direction},
           {"edge_angle_deg", std::remainder(direction, 90)},
+          {"sfr", sfr},  // frequency in units of Nyquist, response
           {"mtf50_nyquist", mtf50},
           {"mtf50_cycles_per_pixel", mtf50 / 2},
           {"expected_low_nyquist", expected.low},
@@ -123,9 +134,8 @@ Simulation ChartPhoto(const SimulationOptions& options) {
   s.truth["contrast"] = style.contrast;
   s.truth["module_units"] = style.module;
   s.truth["pixels_per_unit"] = scale;
-  s.truth["module_px"] = scale * style.module;
   s.truth["npix"] = npix;
-  s.truth["marks"] = MarkTruth(map);
+  s.truth.update(MarkTruth(map, style.module));
   s.truth["mtf50"] = {{"vertical", EdgeTruth(camera, Map(map, target[0]), Map(map, target[1]), npix)},
                       {"horizontal", EdgeTruth(camera, Map(map, target[0]), Map(map, target[3]), npix)}};
   s.truth["patches"] = PatchTruth(camera, map);
@@ -137,8 +147,7 @@ Simulation TargetPhoto(const SimulationOptions& options) {
   const cv::Matx33d map = PhotoFromScene(options.camera, SfrChartBounds());
   Simulation s;
   s.levels = {Expose(options.camera, AimingTarget(), map)};
-  s.truth["module_px"] = PixelsPerUnit(map) * kMarkSizes.back().module;
-  s.truth["marks"] = MarkTruth(map);
+  s.truth.update(MarkTruth(map, kMarkSizes.back().module));
   s.truth["centre"] =
       ToJson((Map(map, {kMarkCentres[1][0] * 1.0, 0.0}) + Map(map, {0.0, kMarkCentres[2][1] * 1.0})) / 2);
   return s;
@@ -185,7 +194,11 @@ Simulation DustPhoto(const SimulationOptions& options) {
     s.truth["specks"].push_back(json);
   }
   s.truth["darkness"] = options.speck_darkness;
-  s.truth["mean_level"] = cv::mean(Gray(cv::min(s.levels[0], 255)))[0];
+  const cv::Mat gray = Gray(cv::min(s.levels[0], 255));
+  s.truth["mean_level"] = cv::mean(gray)[0];
+  std::vector<int> histogram(256);
+  for (const float level : cv::Mat_<float>(gray)) ++histogram[cvRound(level)];
+  s.truth["histogram"] = histogram;  // without noise
   return s;
 }
 

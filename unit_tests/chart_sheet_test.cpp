@@ -205,6 +205,7 @@ TEST_F(ChartSheets, APhotoOfTheWholeSheetShowsThreeMarks) {
     const json record = CheckedRecord(run.out);
     EXPECT_EQ(3, Measured(record, "camera_autofocus_mark_candidates"));
     const double turn_deg = Measured(record, "camera_autofocus_chart_turn");
+    EXPECT_EQ(sheet.facts, ReadCode(cv::imread(photo))) << "light as the code is, readers see it";
     EXPECT_NEAR(0, std::remainder(view.turn_deg - turn_deg, 360), 0.2);  // marks come in whole pixels
   }
 }
