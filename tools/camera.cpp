@@ -11,7 +11,8 @@
 
 namespace {
 
-constexpr int kBandRows = 128;          // of the photo, drawn and blurred at a time
+constexpr int kTileRows = 128;          // of the photo, drawn and blurred at a time
+constexpr int kTileColumns = 1024;      // a drawing is at most 32767 wide
 constexpr double kReach = 5;            // sigmas to which a Gaussian is carried
 constexpr double kSmallestSigma = 1.2;  // in subpixels: a sampled Gaussian narrower than this is not the continuous one
 constexpr double kDistance = 2.5;       // of the camera from the scene's plane, in sides of the scene
@@ -23,8 +24,8 @@ int Subpixels(const CameraModel& camera) {
   return std::clamp(static_cast<int>(std::ceil(kSmallestSigma / camera.blur_px)), 2, 8);
 }
 
-// A band of the scene at `subpixels` a pixel, CV_32FC3 in BGR; each value a mean over its subpixel.
-cv::Mat DrawBand(const Scene& scene, const cv::Matx33d& band_from_scene, cv::Size size) {
+// A tile of the photo at `subpixels` a pixel, CV_32FC3 in BGR; each value a mean over its subpixel.
+cv::Mat DrawTile(const Scene& scene, const cv::Matx33d& tile_from_scene, cv::Size size) {
   const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface(
       cairo_image_surface_create(CAIRO_FORMAT_RGB24, size.width, size.height), cairo_surface_destroy);
   const std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr(cairo_create(surface.get()), cairo_destroy);
@@ -32,7 +33,7 @@ cv::Mat DrawBand(const Scene& scene, const cv::Matx33d& band_from_scene, cv::Siz
   cairo_set_antialias(cr.get(), CAIRO_ANTIALIAS_BEST);
   cairo_set_source_rgb(cr.get(), scene.paper[0] / 255, scene.paper[1] / 255, scene.paper[2] / 255);
   cairo_paint(cr.get());
-  Fill(cr.get(), scene, band_from_scene);
+  Fill(cr.get(), scene, tile_from_scene);
   cairo_surface_flush(surface.get());
 
   const cv::Mat drawn(size, CV_8UC4, cairo_image_surface_get_data(surface.get()),
@@ -91,13 +92,13 @@ cv::Mat PathKernel(cv::Point2d path) {
   return PointsKernel(points, length / 2);
 }
 
-void Blur(cv::Mat& band, const CameraModel& camera, int subpixels) {
+void Blur(cv::Mat& tile, const CameraModel& camera, int subpixels) {
   if (const double sigma = camera.blur_px * subpixels; sigma > 0) {
     const cv::Mat kernel = cv::getGaussianKernel(2 * static_cast<int>(std::ceil(kReach * sigma)) + 1, sigma, CV_32F);
-    cv::sepFilter2D(band, band, CV_32F, kernel, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
+    cv::sepFilter2D(tile, tile, CV_32F, kernel, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
   }
   const auto filter = [&](const cv::Mat& kernel) {
-    cv::filter2D(band, band, CV_32F, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
+    cv::filter2D(tile, tile, CV_32F, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
   };
   if (camera.defocus_px > 0) filter(DiscKernel(camera.defocus_px * subpixels));
   if (cv::norm(camera.smear_px) > 0) filter(PathKernel(camera.smear_px * subpixels));
@@ -142,29 +143,32 @@ cv::Matx33d PhotoFromScene(const CameraModel& camera, const cv::Rect2d& bounds) 
 
 cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d& photo_from_scene) {
   const int s = Subpixels(camera);
-  // Whole pixels, so that the band's own rows stay on the subpixel grid.
+  // Whole pixels, so that the tile's own pixels stay on the subpixel grid.
   const int halo =
-      static_cast<int>(std::ceil(kReach * camera.blur_px + camera.defocus_px + cv::norm(camera.smear_px) / 2)) + 1;
+      static_cast<int>(std::ceil(kReach * camera.blur_px + camera.defocus_px + cv::norm(camera.smear_px) / 2)) + 2;
   const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
   const cv::Vec3d gains = camera.Gains();
   const cv::Vec3f bgr(static_cast<float>(gains[2]), static_cast<float>(gains[1]), static_cast<float>(gains[0]));
 
   cv::Mat levels(camera.size, CV_32FC3);
-  for (int first = 0; first < camera.size.height; first += kBandRows) {
-    const int rows = std::min(kBandRows, camera.size.height - first);
-    const cv::Matx33d band_from_photo(s, 0, s * (halo + 0.5), 0, s, s * (halo - first + 0.5), 0, 0, 1);
-    cv::Mat band = DrawBand(scene, band_from_photo * photo_from_scene,
-                            {(camera.size.width + 2 * halo) * s, (rows + 2 * halo) * s});
-    Blur(band, camera, s);
-    cv::Mat part = levels.rowRange(first, first + rows);
-    cv::resize(band(cv::Rect(halo * s, halo * s, camera.size.width * s, rows * s)), part, part.size(), 0, 0,
-               cv::INTER_AREA);
-    for (int i = 0; i < rows; ++i) {
-      auto* pixel = part.ptr<cv::Vec3f>(i);
-      for (int j = 0; j < part.cols; ++j) {
-        const cv::Point2d off = cv::Point2d(j, first + i) - middle;
-        const double shade = 1 - camera.shading_percent / 100 * off.dot(off) / middle.dot(middle);
-        pixel[j] = pixel[j].mul(bgr) * static_cast<float>(shade);
+  const cv::Rect whole({0, 0}, camera.size);
+  for (int top = 0; top < whole.height; top += kTileRows) {
+    for (int left = 0; left < whole.width; left += kTileColumns) {
+      const cv::Rect tile = cv::Rect(left, top, kTileColumns, kTileRows) & whole;
+      const cv::Matx33d tile_from_photo(s, 0, s * (halo - left + 0.5), 0, s, s * (halo - top + 0.5), 0, 0, 1);
+      cv::Mat drawn = DrawTile(scene, tile_from_photo * photo_from_scene,
+                               {(tile.width + 2 * halo) * s, (tile.height + 2 * halo) * s});
+      Blur(drawn, camera, s);
+      cv::Mat part = levels(tile);
+      cv::resize(drawn(cv::Rect(halo * s, halo * s, tile.width * s, tile.height * s)), part, part.size(), 0, 0,
+                 cv::INTER_AREA);
+      for (int i = 0; i < part.rows; ++i) {
+        auto* pixel = part.ptr<cv::Vec3f>(i);
+        for (int j = 0; j < part.cols; ++j) {
+          const cv::Point2d off = cv::Point2d(left + j, top + i) - middle;
+          const double shade = 1 - camera.shading_percent / 100 * off.dot(off) / middle.dot(middle);
+          pixel[j] = pixel[j].mul(bgr) * static_cast<float>(shade);
+        }
       }
     }
   }
@@ -189,8 +193,8 @@ void AddNoise(const CameraModel& camera, cv::Mat& levels, cv::RNG& random) {
 cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits) {
   cv::RNG random(camera.seed);
   cv::Mat photo(levels.size(), bits == 16 ? CV_16UC3 : CV_8UC3);
-  for (int first = 0; first < levels.rows; first += kBandRows) {
-    const int last = std::min(first + kBandRows, levels.rows);
+  for (int first = 0; first < levels.rows; first += kTileRows) {
+    const int last = std::min(first + kTileRows, levels.rows);
     cv::Mat band = levels.rowRange(first, last).clone();
     AddNoise(camera, band, random);
     band.convertTo(photo.rowRange(first, last), photo.depth(), bits == 16 ? 257 : 1);

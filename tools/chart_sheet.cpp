@@ -214,10 +214,10 @@ void Draw(cairo_t* cr, const ChartSheet& sheet) {
   const cv::Rect2d& label = sheet.label_mm;
   Ruler(cr, {label.x + kRulerInsetMm, label.y});
   std::string all;
-  double baseline = label.br().y - 1;
-  for (auto fact = sheet.facts.rbegin(); fact != sheet.facts.rend(); ++fact, baseline -= kLineMm) {
-    Text(cr, *fact, {label.x, baseline}, kTextMm, kTextWidthMm);
-    all = all.empty() ? *fact : *fact + "\n" + all;
+  const auto lines = static_cast<int>(sheet.facts.size());
+  for (int i = 0; i < lines; ++i) {
+    Text(cr, sheet.facts[i], {label.x, label.br().y - 1 - (lines - 1 - i) * kLineMm}, kTextMm, kTextWidthMm);
+    all += (i > 0 ? "\n" : "") + sheet.facts[i];
   }
   QrCode(cr, all, {label.br().x - kQrMm, label.y});
 }
