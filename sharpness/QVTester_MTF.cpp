@@ -3,9 +3,15 @@
 //   - the response is |Re(DFT)| / |Re(DFT)[0]| of the centred line spread; the imaginary part is dropped;
 //   - MTF50 is interpolated between the two samples nearest to 0.5, wherever they lie.
 // All working arrays are single precision; where a step is held in double it says so.
+//
+// The plain form, equal to the last bit, is unit_tests/plain/sfr.h. Here derivative and window of a row are one loop
+// without matrices of its own, and the window's cosine is a polynomial wherever that provably rounds to the same float.
+// A derivative of halves of whole grey levels, and sums of such levels, are exact in any order; other regions take the
+// plain order.
 
 #include <algorithm>
 #include <array>
+#include <cfloat>
 #include <cmath>
 #include <cstdlib>
 #include <opencv2/imgproc.hpp>
@@ -33,30 +39,116 @@ struct EdgeLine {
 
 constexpr float kBeyondAnyArray = 1e9f;  // such values, and NaN, are never converted to an integer
 
-float EdgeInRow(QVTester& tester, const cv::Mat& derivative, int row, const cv::Mat& window) {
-  cv::Mat profile;
-  cv::transpose(derivative.row(row), profile);
-  return tester.GetCentroid(profile.mul(window)) - 0.5f;
+// Whether each value is a grey level of 8 bits, and no bin's sum of them can reach 2^24.
+constexpr float kNoFractions = 1 << 23;  // floats from here on are whole
+bool HoldsWholeLevels(const cv::Mat& region) {
+  if (region.type() != CV_32FC1 || region.rows > (1 << 14)) return false;
+  for (int m = 0; m < region.rows; ++m) {
+    const auto* values = region.ptr<float>(m);
+    int others = 0;
+    for (int n = 0; n < region.cols; ++n) {
+      const float whole = (values[n] + kNoFractions) - kNoFractions;
+      others |= static_cast<int>(values[n] != whole) | static_cast<int>(!(std::fabs(whole - 127.5f) < 128));
+    }
+    if (others != 0) return false;
+  }
+  return true;
+}
+
+// Whether ceil(n - shift) in single precision grows by one from column to column: n - shift is rounded, but no integer
+// is within reach of that, unless every difference is one.
+bool KeepsStep(float shift, int npix) {
+  const float to_integer = std::fabs(shift - std::nearbyint(shift));
+  return to_integer == 0 || to_integer > (static_cast<float>(npix) + std::fabs(shift)) * FLT_EPSILON;
+}
+
+// 0.54 + 0.46 cos(x) for |x| <= kReach, from x squared: the least greatest error, 0.8e-12, that eight powers allow.
+constexpr double kReach = 3.25;
+constexpr double kMargin = 1e-12;
+double ApproximateWindow(double z) {
+  double w = 1.881097988438079e-14;
+  w = w * z - 5.215239945610941e-12;
+  w = w * z + 9.596845573037727e-10;
+  w = w * z - 1.26759678215741e-07;
+  w = w * z + 1.1408715652038327e-05;
+  w = w * z - 0.0006388888592246493;
+  w = w * z + 0.019166666636258493;
+  w = w * z - 0.22999999998799472;
+  return w * z + 0.9999999999992197;
+}
+
+// w[i] = 0.54 + 0.46 cos(pi (i - mid) / wid): double inside, stored as float.
+// Pi is cut to 3.141592, and i starts at 0, so the peak leans half a sample to the right. Both are meant.
+// The cosine itself is called only where the approximation's error could reach the next float.
+void FillHammingWindow(int n, float mid, float* window) {
+  const float wid = std::max(mid - 1, static_cast<float>(n) - mid);
+  const auto exact = [&](int i) {
+    return static_cast<float>(0.54 + 0.46 * std::cos((static_cast<float>(i) - mid) * 3.141592 / wid));
+  };
+  const double step = 3.141592 / wid;
+  const bool in_reach = std::max(std::fabs(mid), std::fabs(static_cast<float>(n - 1) - mid)) * step < kReach;
+  constexpr int kBlock = 64;
+  std::array<float, kBlock> above;
+  for (int first = 0; first < n; first += kBlock) {
+    const int count = std::min(kBlock, n - first);
+    float* const below = window + first;
+    int doubtful = in_reach ? 0 : 1;
+    for (int i = 0; i < count; ++i) {
+      const double x = (static_cast<float>(first + i) - mid) * step;
+      const double w = ApproximateWindow(x * x);
+      below[i] = static_cast<float>(w - kMargin);
+      above[i] = static_cast<float>(w + kMargin);
+      doubtful |= static_cast<int>(below[i] != above[i]);
+    }
+    for (int i = 0; doubtful != 0 && i < count; ++i) {
+      if (!in_reach || below[i] != above[i]) below[i] = exact(first + i);
+    }
+  }
+}
+
+constexpr int kTogether = 8;
+
+// The centroid of each row, half a column less. A sum has to wait for its last addition, so the sums of several rows
+// advance side by side.
+void EdgesInRows(const cv::Mat& rows, int count, float* loc) {
+  const int npix = rows.cols;
+  const auto* x = rows.ptr<float>();
+  std::array<float, kTogether> moments = {};
+  for (int i = 0; i < npix; ++i) {
+    for (int r = 0; r < kTogether; ++r) moments[r] += static_cast<float>(i) * x[r * npix + i];
+  }
+  for (int r = 0; r < count; ++r) loc[r] = static_cast<float>(moments[r] / cv::sum(rows.row(r))[0]) - 0.5f;
 }
 
 // Two passes of windowed centroids and a straight line; the second pass centres each row's window on the first line.
-EdgeLine LocateEdge(QVTester& tester, const cv::Mat& region, float* fil) {
+EdgeLine LocateEdge(QVTester& tester, const cv::Mat& region, bool whole_levels, float* fil) {
   const int nlin = region.rows;
   const int npix = region.cols;
   cv::Mat derivative;
-  tester.GetFirstDerivative(region, nlin, npix, fil, 2, derivative);
+  if (!whole_levels) tester.GetFirstDerivative(region, nlin, npix, fil, 2, derivative);
 
   EdgeLine line = {};
   cv::Mat loc(nlin, 1, CV_32F);
-  const cv::Mat centred = tester.GetAHammingWindow(npix, static_cast<float>(npix + 1) * 0.5f);
-  for (int n = 0; n < nlin; ++n) loc.at<float>(n) = EdgeInRow(tester, derivative, n, centred);
-  tester.FindEdge(loc, nlin, &line.slope, &line.offset);
-
-  for (int n = 0; n < nlin; ++n) {
-    const float place = line.offset + line.slope * static_cast<float>(n);
-    loc.at<float>(n) = EdgeInRow(tester, derivative, n, tester.GetAHammingWindow(npix, place));
+  std::vector<float> window(npix);
+  cv::Mat profiles(kTogether, npix, CV_32F, cv::Scalar(0));
+  FillHammingWindow(npix, static_cast<float>(npix + 1) * 0.5f, window.data());
+  for (const bool moving : {false, true}) {
+    for (int n = 0; n < nlin; ++n) {
+      if (moving) FillHammingWindow(npix, line.offset + line.slope * static_cast<float>(n), window.data());
+      const int r = n % kTogether;
+      auto* profile = profiles.ptr<float>(r);
+      if (whole_levels) {
+        const auto* row = region.ptr<float>(n);
+        for (int i = 1; i < npix; ++i) profile[i] = (row[i - 1] - row[i]) * fil[0] * window[i];
+        profile[0] = (row[0] - row[1]) * fil[0] * window[0];
+      } else {
+        const auto* row = derivative.ptr<float>(n);
+        for (int i = 0; i < npix; ++i) profile[i] = row[i] * window[i];
+      }
+      if (r == kTogether - 1 || n == nlin - 1) EdgesInRows(profiles, r + 1, loc.ptr<float>(n - r));
+    }
+    tester.FindEdge(loc, nlin, &line.slope, &line.offset);
   }
-  tester.FindEdge(loc, nlin, &line.slope, &line.offset);
   return line;
 }
 
@@ -119,7 +211,7 @@ bool QVTester::CalculateSFR(cv::Mat roi, std::vector<float>& freq, std::vector<f
   if (roi.depth() != CV_32F) roi.convertTo(roi, CV_32F);
   cv::Mat region = ConvertToVertical(roi);  // nlin x npix, the edge runs down the rows
   const Kernels fil(*this, region);
-  const EdgeLine edge = LocateEdge(*this, region, fil.fil1.get());
+  const EdgeLine edge = LocateEdge(*this, region, HoldsWholeLevels(region), fil.fil1.get());
   const cv::Mat esf = ProjectData(region, edge.slope, edge.offset, 1);  // npix x 1, edge spread
   const cv::Mat lsf = CentredLineSpread(*this, esf, fil.fil2.get());    // npix x 1, line spread
   const std::size_t first = sfr.size();
@@ -153,14 +245,9 @@ void QVTester::CalculateFilterValue(cv::Mat* roi, float** fil1, float** fil2) {
   *fil1 = two_taps.release();
 }
 
-// w[i] = 0.54 + 0.46 cos(pi (i - mid) / wid): double inside, stored as float.
-// Pi is cut to 3.141592, and i starts at 0, so the peak leans half a sample to the right. Both are meant.
 cv::Mat QVTester::GetAHammingWindow(int n, float mid) {
-  const float wid = std::max(mid - 1, static_cast<float>(n) - mid);
   cv::Mat window(n, 1, CV_32F);
-  for (int i = 0; i < n; ++i) {
-    window.at<float>(i) = static_cast<float>(0.54 + 0.46 * std::cos((static_cast<float>(i) - mid) * 3.141592 / wid));
-  }
+  FillHammingWindow(n, mid, window.ptr<float>());
   return window;
 }
 
@@ -246,14 +333,35 @@ cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
   cv::Mat kept = cv::Mat::zeros(2, nn + 2, CV_32F);  // counts, sums
   auto* counts = kept.ptr<float>(0);
   auto* sums = kept.ptr<float>(1);
-  for (int n = 0; n < npix; ++n) {
+  const double last = std::min(bins, first + nn + 2.0);  // bin past the last element kept
+  const auto add = [&](int m, int n) {
+    const float place = (static_cast<float>(n) - static_cast<float>(m) / inverse) * scale;
+    const double bin = std::ceil(place) - static_cast<float>(offset);
+    if (!(bin >= std::max(first, 0) && bin < last)) return;
+    const int k = static_cast<int>(bin) - first;
+    counts[k] += 1;
+    sums[k] += bb.at<float>(m, n);
+  };
+  if (HoldsWholeLevels(bb)) {
+    const bool in_pixels = fac == 1 && std::fabs(slant) < 1e6f;  // so that bins are exact in single precision
     for (int m = 0; m < nlin; ++m) {
-      const float place = (static_cast<float>(n) - static_cast<float>(m) / inverse) * scale;
-      const double bin = std::ceil(place) - static_cast<float>(offset);
-      if (!(bin >= 0 && bin < bins && bin >= first && bin < first + nn + 2)) continue;
-      const int k = static_cast<int>(bin) - first;
-      counts[k] += 1;
-      sums[k] += bb.at<float>(m, n);
+      const float shift = static_cast<float>(m) / inverse;
+      if (!in_pixels || !KeepsStep(shift, npix)) {
+        for (int n = 0; n < npix; ++n) add(m, n);
+        continue;
+      }
+      const int k = static_cast<int>(std::ceil(-shift)) - offset - first;  // of column 0
+      const int from = std::max(std::max(first, 0) - first - k, 0);
+      const int to = static_cast<int>(std::min(last - first - k, static_cast<double>(npix)));
+      const auto* row = bb.ptr<float>(m);
+      for (int n = from; n < to; ++n) {
+        counts[k + n] += 1;
+        sums[k + n] += row[n];
+      }
+    }
+  } else {
+    for (int n = 0; n < npix; ++n) {
+      for (int m = 0; m < nlin; ++m) add(m, n);
     }
   }
 

@@ -1,11 +1,14 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
+#include <cstring>
+#include <limits>
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"
 #include "tools/method_law.h"
 #include "unit_tests/drawing.h"
+#include "unit_tests/plain/sfr.h"
 
 namespace {
 
@@ -221,6 +224,134 @@ TEST(SfrSteps, PixelsFallIntoBinsAlongTheEdge) {
 TEST(SfrSteps, ASlantWithoutEndNeedsNoMemory) {
   QVTester tester;
   EXPECT_EQ(4u, Values(tester.ProjectData(cv::Mat::ones(3, 4, CV_32F), 4e8f, 0, 1)).size());
+}
+
+// What a measurement gives to the last bit, any NaN as one, or the error that it ends with.
+template <typename Call>
+std::string Outcome(Call&& calculate) {
+  Sfr result;
+  try {
+    EXPECT_TRUE(calculate(result));
+  } catch (const cv::Exception& e) {
+    return e.what();
+  }
+  result.sfr.push_back(result.mtf50);
+  std::string text = std::to_string(result.freq.size()) + ":";
+  for (const std::vector<float>& values : {result.freq, result.sfr}) {
+    for (const float value : values) text += cv::format(" %a", std::isnan(value) ? NAN : value);
+  }
+  return text;
+}
+
+std::string FastOutcome(const cv::Mat& region) {
+  return Outcome([&](Sfr& s) { return QVTester().CalculateSFR(region, s.freq, s.sfr, s.mtf50); });
+}
+
+std::string PlainOutcome(const cv::Mat& region) {
+  QVTester tester;
+  return Outcome([&](Sfr& s) { return plain::CalculateSFR(tester, region, s.freq, s.sfr, s.mtf50); });
+}
+
+// Blurred edges of any slant, direction and polarity, noise, stripes and plain grey; part of a larger matrix.
+cv::Mat RandomRegion(cv::RNG& random) {
+  const bool large = random.uniform(0, 10) == 0;
+  cv::Mat_<float> region(random.uniform(1, large ? 400 : 60), random.uniform(1, large ? 180 : 60));
+  const float slope = random.uniform(0, 4) == 0 ? 0 : static_cast<float>(random.gaussian(0.2));
+  const float place = static_cast<float>(region.cols) * random.uniform(0.2f, 0.8f);
+  const float blur = random.uniform(0.1f, 6.0f);
+  const cv::Vec2f levels(random.uniform(0.0f, 255.0f), random.uniform(0.0f, 255.0f));
+  const double noise = random.uniform(0, 3) == 0 ? 0 : random.uniform(0.0, 60.0);
+  const int kind = random.uniform(0, 8);
+  for (int m = 0; m < region.rows; ++m) {
+    for (int n = 0; n < region.cols; ++n) {
+      const float t = (static_cast<float>(n) - place - slope * static_cast<float>(m)) / blur;
+      region(m, n) = levels[0] + (levels[1] - levels[0]) * std::clamp(t + 0.5f, 0.0f, 1.0f);
+      if (kind == 0) region(m, n) = levels[0];
+      if (noise > 0) region(m, n) += static_cast<float>(random.gaussian(noise));
+    }
+  }
+  if (kind == 1) cv::repeat(region.row(0).clone(), region.rows, 1, region);
+  if (random.uniform(0, 2) == 0) region = region.t();
+  cv::Mat sheet(region.rows + 3, region.cols + 5, CV_32F, cv::Scalar(random.uniform(0, 256)));
+  const cv::Mat part = sheet(cv::Rect(2, 1, region.cols, region.rows));
+  region.copyTo(part);
+  return part;
+}
+
+TEST(SfrForms, AgreeOnGreyLevels) {
+  cv::RNG random(7);
+  for (int round = 0; round < 3000; ++round) {
+    cv::Mat region = RandomRegion(random);
+    cv::Mat levels;
+    region.convertTo(levels, round % 7 == 0 ? CV_16U : CV_8U, round % 14 == 0 ? 200 : 1);
+    ASSERT_EQ(PlainOutcome(levels), FastOutcome(levels)) << "round " << round << " " << region.size;
+    levels.convertTo(region, CV_32F);
+    ASSERT_EQ(PlainOutcome(region), FastOutcome(region)) << "round " << round << " " << region.size;
+  }
+}
+
+TEST(SfrForms, AgreeOnAnyFloats) {
+  cv::RNG random(8);
+  const float limits[] = {NAN, INFINITY, -INFINITY, 1e38f, -3e38f, 1e-38f, 1e-45f, -1, 256, 255.5f, 8388609, -0.0f};
+  for (int round = 0; round < 2000; ++round) {
+    cv::Mat region = RandomRegion(random);
+    if (round % 2 == 0) {
+      cv::Mat(region * std::pow(10.0, random.uniform(-44.0, 36.0))).copyTo(region);
+    } else {
+      for (float& value : cv::Mat_<float>(region)) value = std::round(std::clamp(value, 0.0f, 255.0f));
+      for (int i = round % 3; i >= 0; --i) {
+        region.at<float>(random.uniform(0, region.rows), random.uniform(0, region.cols)) =
+            limits[random.uniform(0, 12)];
+      }
+    }
+    ASSERT_EQ(PlainOutcome(region), FastOutcome(region)) << "round " << round << " " << region.size;
+  }
+  EXPECT_EQ(PlainOutcome({}), FastOutcome({}));
+}
+
+std::vector<std::uint32_t> Bits(const cv::Mat& matrix) {
+  std::vector<std::uint32_t> bits;
+  for (const float value : Values(matrix)) {
+    const float one_nan = std::isnan(value) ? NAN : value;
+    std::memcpy(&bits.emplace_back(), &one_nan, sizeof one_nan);
+  }
+  return bits;
+}
+
+TEST(SfrForms, TheWindowIsTheCosineToTheLastBit) {
+  QVTester tester;
+  cv::RNG random(9);
+  for (int round = 0; round < 20000; ++round) {
+    const int n = round % 20 == 0 ? random.uniform(1, 3000) : random.uniform(1, 300);
+    const float mid = round % 5 == 0 ? random.uniform(-1e3f, 3e3f) : static_cast<float>(n) * random.uniform(0.0f, 1.0f);
+    ASSERT_EQ(Bits(plain::GetAHammingWindow(n, mid)), Bits(tester.GetAHammingWindow(n, mid))) << n << " " << mid;
+  }
+  for (const float mid : {NAN, INFINITY, -INFINITY, 3e38f, -1e9f, 0.0f, 1.0f, 100.5f}) {
+    for (const int n : {1, 2, 200}) {
+      ASSERT_EQ(Bits(plain::GetAHammingWindow(n, mid)), Bits(tester.GetAHammingWindow(n, mid))) << n << " " << mid;
+    }
+  }
+}
+
+TEST(SfrForms, AgreeOnBinsOfAnySlope) {
+  QVTester tester;
+  cv::RNG random(10);
+  cv::Mat levels(300, 90, CV_8U);
+  cv::randu(levels, 0, 256);
+  cv::Mat region;
+  levels.convertTo(region, CV_32F);
+  std::vector<float> slopes = {0, -0.0f, 1, -1, 0.5f, -0.25f, 1.0f / 3, 1e-7f, -1e-7f, 1e-38f, NAN, INFINITY};
+  for (int round = 0; round < 1000; ++round) {  // from slants lost in rounding to such that no bin has its own float
+    const auto size = static_cast<float>(std::pow(10.0, random.uniform(-9.0, 7.0)));
+    slopes.push_back(round % 2 == 0 ? size : -size);
+  }
+  for (const float slope : slopes) {
+    for (const int fac : {1, 2, 4}) {
+      const cv::Mat part = region(cv::Rect(0, 0, random.uniform(1, 91), random.uniform(1, 301)));
+      ASSERT_EQ(Bits(plain::ProjectData(part, slope, fac)), Bits(tester.ProjectData(part, slope, 0, fac)))
+          << slope << " " << fac << " " << part.size;
+    }
+  }
 }
 
 }  // namespace
