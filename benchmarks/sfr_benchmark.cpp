@@ -72,7 +72,9 @@ const Ratios kRatios = {
     {"SFR, region 400 x 1200", "CalculateSFR/400/1200", {"PlainSFR/400/1200"}, 0.30},
     {"SFR, region 400 x 1200", "CalculateSFR/400/1200", {"SlantedEdgeMtfOfVigra/400/1200"}, 1.0 / 14},
     {"MTF50, region 200 x 600", "CalculateMTF/200/600", {"PlainSFR/200/600"}, 0.30},
+    {"MTF50, region 200 x 600", "CalculateMTF/200/600", {"SlantedEdgeMtfOfVigra/200/600"}, 1.0 / 14},
     {"MTF50, region 400 x 1200", "CalculateMTF/400/1200", {"PlainSFR/400/1200"}, 0.30},
+    {"MTF50, region 400 x 1200", "CalculateMTF/400/1200", {"SlantedEdgeMtfOfVigra/400/1200"}, 1.0 / 14},
 };
 
 }  // namespace

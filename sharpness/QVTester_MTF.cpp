@@ -39,8 +39,9 @@ struct EdgeLine {
 
 constexpr float kBeyondAnyArray = 1e9f;  // such values, and NaN, are never converted to an integer
 
-// Whether each value is a grey level of 8 bits, and no bin's sum of them can reach 2^24.
 constexpr float kNoFractions = 1 << 23;  // floats from here on are whole
+
+// Whether each value is a grey level of 8 bits, and no bin's sum of them can reach 2^24.
 bool HoldsWholeLevels(const cv::Mat& region) {
   if (region.type() != CV_32FC1 || region.rows > (1 << 14)) return false;
   for (int m = 0; m < region.rows; ++m) {
@@ -313,8 +314,8 @@ bool QVTester::FindEdge(cv::Mat loc, int nlin, float* slope, float* offset) {
   return true;
 }
 
-// Pixel (row m, column n) falls into bin ceil((n - m slope) fac) - offset of an array with room for the slant and a
-// hundredfold margin. Only npix fac bins from `start` are read, so only those and their two neighbours are kept.
+// Pixel (row m, column n) falls into bin ceil((n - m slope) fac) - offset of an array with room for the slant. Only the
+// npix fac bins in its middle are read, so only those and their two neighbours are kept.
 cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
   const int nlin = bb.rows;
   const int npix = bb.cols;
@@ -327,17 +328,14 @@ cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
 
   const int offset = std::min(static_cast<int>(slant), 0);
   const int del = std::abs(static_cast<int>(slant));
-  const double bins = nn + 100.0 * del;
-  const int start = (del + 1) / 2;
-  const int first = start - 1;                       // bin of the first element kept
+  const int first = (del + 1) / 2 - 1;               // bin of the first element kept
   cv::Mat kept = cv::Mat::zeros(2, nn + 2, CV_32F);  // counts, sums
   auto* counts = kept.ptr<float>(0);
   auto* sums = kept.ptr<float>(1);
-  const double last = std::min(bins, first + nn + 2.0);  // bin past the last element kept
   const auto add = [&](int m, int n) {
     const float place = (static_cast<float>(n) - static_cast<float>(m) / inverse) * scale;
     const double bin = std::ceil(place) - static_cast<float>(offset);
-    if (!(bin >= std::max(first, 0) && bin < last)) return;
+    if (!(bin >= first && bin < first + nn + 2.0)) return;
     const int k = static_cast<int>(bin) - first;
     counts[k] += 1;
     sums[k] += bb.at<float>(m, n);
@@ -351,10 +349,8 @@ cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
         continue;
       }
       const int k = static_cast<int>(std::ceil(-shift)) - offset - first;  // of column 0
-      const int from = std::max(std::max(first, 0) - first - k, 0);
-      const int to = static_cast<int>(std::min(last - first - k, static_cast<double>(npix)));
       const auto* row = bb.ptr<float>(m);
-      for (int n = from; n < to; ++n) {
+      for (int n = std::max(-k, 0); n < std::min(nn + 2 - k, npix); ++n) {
         counts[k + n] += 1;
         sums[k + n] += row[n];
       }

@@ -273,7 +273,7 @@ cv::Mat RandomRegion(cv::RNG& random) {
   if (kind == 1) cv::repeat(region.row(0).clone(), region.rows, 1, region);
   if (random.uniform(0, 2) == 0) region = region.t();
   cv::Mat sheet(region.rows + 3, region.cols + 5, CV_32F, cv::Scalar(random.uniform(0, 256)));
-  const cv::Mat part = sheet(cv::Rect(2, 1, region.cols, region.rows));
+  cv::Mat part = sheet(cv::Rect(2, 1, region.cols, region.rows));
   region.copyTo(part);
   return part;
 }
