@@ -78,8 +78,9 @@ struct ChartPatch {
   int red, green, blue;  // sRGB
 };
 
-/// Patches are sampled over D / 21 to each side of their middle and drawn somewhat larger.
-inline constexpr double kPatchHalf = 420;
+/// Patches are sampled over D / 21 to each side of their middle. They are drawn larger by what a straightening that is a
+/// degree off moves the furthest of them.
+inline constexpr double kPatchHalf = 470;
 
 // In sampling order: six along the top, six along the bottom, six down the left side, six down the right. The white is
 // number 9; 12, 13 and 14 are the three that are measured without a standard.

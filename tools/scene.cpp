@@ -7,7 +7,7 @@
 
 namespace {
 
-constexpr double kPatchFrame = 20;  // chart units
+constexpr double kPatchFrame = 10;  // chart units
 
 FilledShape Square(cv::Point2d centre, double half, cv::Vec3d colour) {
   return {{centre + cv::Point2d(-half, -half), centre + cv::Point2d(half, -half), centre + cv::Point2d(half, half),
