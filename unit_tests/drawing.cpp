@@ -45,6 +45,14 @@ void FillMark(cv::Mat& canvas, const ChartView& view, double x, double y, double
   FillSquare(canvas, view, x, y, 1.5 * module, 10);
 }
 
+// Integral of the integral of a Gaussian's distribution function: a ramp from t = 0 with a soft start.
+double BlurredRamp(double t, double sigma) {
+  const double z = t / sigma;
+  const double below = 0.5 * std::erfc(-z / std::sqrt(2.0));
+  const double density = std::exp(-z * z / 2) / std::sqrt(2 * CV_PI);
+  return ((t * t + sigma * sigma) * below + t * sigma * density) / 2;
+}
+
 }  // namespace
 
 void DrawMark(cv::Mat& image, int row, int column, int module, int dark, int light) {
@@ -106,6 +114,36 @@ cv::Mat DrawEdge(const EdgeView& view) {
     }
   }
   return region;
+}
+
+cv::Mat DrawEdgePhoto(const EdgePhoto& view) {
+  const double angle = view.normal_deg * CV_PI / 180;
+  const cv::Point2d normal(std::cos(angle), std::sin(angle));
+  // Along the normal the pixel's square is two boxes, one after the other; none is let shrink to nothing.
+  const double a = std::max(std::fabs(normal.x), 1e-3);
+  const double b = std::max(std::fabs(normal.y), 1e-3);
+  const double far = 8 * view.sigma_px + 1;
+  cv::Mat photo(view.size, CV_32F);
+  for (int row = 0; row < photo.rows; ++row) {
+    for (int column = 0; column < photo.cols; ++column) {
+      const double d = (cv::Point2d(column, row) - view.through).dot(normal);
+      double share = d > 0 ? 1 : 0;
+      if (std::fabs(d) < far) {
+        const auto ramp = [&](double t) { return BlurredRamp(t, view.sigma_px); };
+        share =
+            (ramp(d + (a + b) / 2) - ramp(d + (a - b) / 2) - ramp(d - (a - b) / 2) + ramp(d - (a + b) / 2)) / (a * b);
+      }
+      photo.at<float>(row, column) = static_cast<float>(view.dark + (view.light - view.dark) * share);
+    }
+  }
+  return photo;
+}
+
+std::array<cv::Point2d, 4> TurnedRectangle(cv::Point2d middle, double length, double width, double turn_deg) {
+  const double angle = turn_deg * CV_PI / 180;
+  const cv::Point2d across = cv::Point2d(std::cos(angle), std::sin(angle)) * (width / 2);
+  const cv::Point2d along = cv::Point2d(-std::sin(angle), std::cos(angle)) * (length / 2);
+  return {middle - across - along, middle + across - along, middle + across + along, middle - across + along};
 }
 
 TemporaryFolder::TemporaryFolder() {

@@ -1,6 +1,7 @@
 #ifndef QVTESTER_UNIT_TESTS_DRAWING_H_
 #define QVTESTER_UNIT_TESTS_DRAWING_H_
 
+#include <array>
 #include <opencv2/core.hpp>
 #include <string>
 #include <vector>
@@ -37,6 +38,21 @@ struct EdgeView {
 
 /// A region with one slanted edge, each pixel the mean of the blurred edge over its square. CV_32F, not rounded.
 cv::Mat DrawEdge(const EdgeView& view);
+
+struct EdgePhoto {
+  cv::Size size = {300, 300};
+  cv::Point2d through = {150, 150};  // a point of the edge, column and row
+  double normal_deg = 5;             // from the columns' direction towards the rows': that way it gets lighter
+  double sigma_px = 1.0;
+  double dark = 47, light = 235;
+};
+
+/// One edge at any turn, each pixel the exact integral of the blurred edge over its square. CV_32F, not rounded.
+cv::Mat DrawEdgePhoto(const EdgePhoto& view);
+
+/// Corners of a rectangle in order, its longer side turned by turn_deg from the rows' direction of counting (down),
+/// clockwise as seen.
+std::array<cv::Point2d, 4> TurnedRectangle(cv::Point2d middle, double length, double width, double turn_deg);
 
 /// A new directory below the system's one for temporary files; removed with all it holds when it goes.
 class TemporaryFolder {
