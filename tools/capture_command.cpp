@@ -23,6 +23,12 @@ struct CaptureOptions : MeasureOptions {
   }
 };
 
+// Whether the test ended at the standard photo, before it looked at the other.
+bool MissedStandard(const CaptureOptions& options) {
+  const auto& standard = options.front ? theTester->standard_front_ : theTester->standard_main_;
+  return !options.standard.empty() && !standard.is_extracted;
+}
+
 void CollectPatches(Phase& phase, const QVCaptureResult& result) {
   std::vector<double> numbers;
   std::array<std::vector<double>, 3> lab;
@@ -87,13 +93,13 @@ std::string Annotate(const Record& record, const ChartView& view, const CaptureO
   constexpr double kHead = 44;
   constexpr double kRow = 62;
   constexpr double kColumn = 230;
-  const cv::Mat photo = SlotPhoto(options.photo_slot());
+  const cv::Mat photo = SlotPhoto(MissedStandard(options) ? options.standard_slot() : options.photo_slot());
   const double scale = std::min(1.0, kPhoto / std::max(photo.cols, photo.rows));
   const double width = photo.cols * scale;
   Picture picture(cvRound(width + 2 * kColumn + 20), cvRound(std::max(photo.rows * scale, 12 * kRow) + kHead));
   picture.Text(Format("%s: %s", record.test_name.c_str(), Name(record.outcome())), {12, 28}, 18, kInk);
   const PhotoPlace place = picture.PlacePhoto(photo, {0, kHead}, scale);
-  DrawMarks(picture, view, place, view.complete() ? kGood : kPoor);
+  DrawMarks(picture, view, place);
   if (record.phase.code != QV_SUCCESS) return picture.Png();
 
   const UprightPhoto upright = Straighten(*theTester, photo);
@@ -147,10 +153,10 @@ CommandBody DeclareCapture(CLI::App& command) {
     m.look = [view, options](Record& record) {
       const int code = record.phase.code;
       if (code != QV_SUCCESS && code != QV_ERROR_PATTERN_NOT_FOUND && code != QV_ERROR_NO_PATCHES) return;
-      const auto& standard = options->front ? theTester->standard_front_ : theTester->standard_main_;
-      const bool missed_standard = !options->standard.empty() && !standard.is_extracted;
-      *view = DescribeChart(record, record.inputs[missed_standard ? 1 : 0].path,
-                            SlotPhoto(missed_standard ? options->standard_slot() : options->photo_slot()));
+      *view = MissedStandard(*options)
+                  ? DescribeChart(record, record.inputs[1].path, SlotPhoto(options->standard_slot()),
+                                  QV_PROPERTY_STANDARD_BINARY_THR)
+                  : DescribeChart(record, record.inputs[0].path, SlotPhoto(options->photo_slot()));
     };
     m.report = [view](const Record& record) { return Report(record, *view); };
     m.annotates_misses = true;

@@ -10,6 +10,7 @@
 namespace {
 
 constexpr double kSmallestModulePx = 3;
+constexpr double kLeastContrast = 20;  // grey levels between the two peaks
 
 // The points that the search handed out: row in x, column in y.
 std::vector<cv::Point> FoundPoints(const QVTester& tester) {
@@ -30,17 +31,54 @@ Mark MarkAt(const QVTester& tester, cv::Point point) {
   return {};
 }
 
-struct GreyPeaks {
-  double dark, light;
-};
-
-// Means of the two classes that Otsu's threshold makes of the picture.
-GreyPeaks FindGreyPeaks(const cv::Mat& photo) {
+// Levels of the photo as the tests weigh them: the first channel is taken for red.
+cv::Mat Gray(const cv::Mat& photo) {
   cv::Mat gray;
   cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  return gray;
+}
+
+// The commonest level, neighbours counted in, on each side of the level that parts dark from light best (Otsu's).
+struct GreyHistogram {
+  GreyPeaks peaks;
+  int parting;
+};
+
+GreyHistogram LookAtLevels(const cv::Mat& gray) {
   cv::Mat light;
-  cv::threshold(gray, light, 0, 255, cv::THRESH_BINARY | cv::THRESH_OTSU);
-  return {cv::mean(gray, light == 0)[0], cv::mean(gray, light)[0]};
+  const int parting = cvRound(cv::threshold(gray, light, 0, 255, cv::THRESH_BINARY | cv::THRESH_OTSU));
+  std::array<double, 256> counts = {};
+  for (int i = 0; i < gray.rows; ++i) {
+    const auto* row = gray.ptr<uchar>(i);
+    for (int j = 0; j < gray.cols; ++j) ++counts[row[j]];
+  }
+  const auto commonest = [&](int first, int last) {
+    constexpr int kNeighbours = 4;  // to each side, nearer ones weigh more
+    int best = -1;                  // nothing there
+    double most = 0;
+    for (int level = first; level <= last; ++level) {
+      double sum = 0;
+      for (int k = std::max(first, level - kNeighbours); k <= std::min(last, level + kNeighbours); ++k) {
+        sum += counts[k] * (1 + kNeighbours - std::abs(k - level));
+      }
+      if (sum <= most) continue;
+      most = sum;
+      best = level;
+    }
+    return static_cast<double>(best);
+  };
+  const double dark = commonest(0, parting);
+  const double bright = commonest(std::min(parting + 1, 255), 255);
+  return {{dark < 0 ? bright : dark, bright < 0 ? dark : bright}, parting};  // one level alone is both
+}
+
+std::string MissSentence(const Miss& miss, const std::string& photo_path, QV_PROPERTY_INDEX threshold_property) {
+  std::string sentence = photo_path + ": ";
+  for (const std::string& reason : miss.reasons) sentence += (sentence.back() == ' ' ? "" : ", ") + reason;
+  if (!miss.threshold) return sentence;
+  return sentence + (threshold_property == QV_PROPERTY_BINARY_THR_WORKING
+                         ? Format("; tried: --threshold %d finds all three", *miss.threshold)
+                         : Format("; tried: property %d at %d finds all three", threshold_property, *miss.threshold));
 }
 
 std::vector<double> EdgeProfile(QVTester& tester, const cv::Mat& region) {
@@ -61,10 +99,10 @@ std::vector<double> EdgeProfile(QVTester& tester, const cv::Mat& region) {
 
 }  // namespace
 
-ChartView LookAtChart(QVTester& tester) {
+ChartView LookAtChart(QVTester& tester, int threshold) {
   ChartView view;
   view.candidates = tester.startSize;
-  view.threshold = tester.prop_binary_thr_working_;
+  view.threshold = threshold;
   std::vector<cv::Point> points = FoundPoints(tester);
   if (points.size() != 3) {
     for (const cv::Point& point : points) view.marks.push_back(MarkAt(tester, point));
@@ -108,38 +146,55 @@ void AddChartFigures(Phase& phase, const ChartView& view) {
   phase.Add("straightened_by", view.straightened_by_deg);
 }
 
-std::vector<std::string> ExplainMiss(const ChartView& view, const cv::Mat& photo) {
-  std::vector<std::string> reasons;
+Miss ExplainMiss(const ChartView& view, const cv::Mat& photo) {
+  Miss miss;
   const char* const counts[] = {"no finder mark was", "1 of 3 finder marks was", "2 of 3 finder marks were"};
-  reasons.push_back(Format("%s found", counts[std::min<std::size_t>(view.marks.size(), 2)]));
+  miss.reasons.push_back(Format("%s found", counts[std::min<std::size_t>(view.marks.size(), 2)]));
 
-  const GreyPeaks peaks = FindGreyPeaks(photo);
-  const double margin = (peaks.light - peaks.dark) / 8;
-  if (peaks.light - peaks.dark < 20) {
-    reasons.push_back(
-        Format("the picture has hardly any contrast (grey peaks at %.0f and %.0f)", peaks.dark, peaks.light));
-  } else if (view.threshold < peaks.dark + margin || view.threshold > peaks.light - margin) {
-    reasons.push_back(Format("the threshold of %d is far from the middle of the picture's grey peaks at %.0f and %.0f",
-                             view.threshold, peaks.dark, peaks.light));
+  const cv::Mat gray = Gray(photo);
+  const GreyHistogram levels = LookAtLevels(gray);
+  miss.peaks = levels.peaks;
+  const auto [dark, light] = levels.peaks;
+  const double margin = (light - dark) / 8;
+  if (light - dark < kLeastContrast) {
+    miss.reasons.push_back(Format("the picture has hardly any contrast (grey peaks at %.0f and %.0f)", dark, light));
+  } else if (view.threshold < dark + margin || view.threshold > light - margin) {
+    miss.reasons.push_back(
+        Format("the threshold of %d is far from the middle of the picture's grey peaks at %.0f and %.0f",
+               view.threshold, dark, light));
   }
   for (const Mark& mark : view.marks) {
     if (mark.module_px >= kSmallestModulePx) continue;
-    reasons.push_back(
+    miss.reasons.push_back(
         Format("the marks are small (%.1f pixels a module; %.0f are needed)", mark.module_px, kSmallestModulePx));
     break;
   }
-  return reasons;
+
+  for (const int threshold : {cvRound((dark + light) / 2), levels.parting}) {
+    if (threshold == view.threshold) continue;
+    QVTester trial;
+    trial.GetFinderPoints(gray > threshold);
+    const ChartView found = LookAtChart(trial, threshold);
+    if (!found.complete() || !found.plausible()) continue;
+    miss.threshold = threshold;
+    miss.marks = found.marks;
+    break;
+  }
+  return miss;
 }
 
-ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo) {
-  ChartView view = LookAtChart(*theTester);
+ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo,
+                        QV_PROPERTY_INDEX threshold_property) {
+  int threshold = 0;
+  theTester->GetProperty(threshold_property, &threshold);
+  ChartView view = LookAtChart(*theTester, threshold);
   AddChartFigures(record.phase, view);
   if (!view.complete()) {
-    std::string sentence = photo_path + ": ";
-    for (const std::string& reason : ExplainMiss(view, photo)) {
-      sentence += (sentence.back() == ' ' ? "" : ", ") + reason;
-    }
-    record.details.push_back(sentence);
+    view.miss = ExplainMiss(view, photo);
+    record.phase.Add("grey_peak_dark", view.miss->peaks.dark);
+    record.phase.Add("grey_peak_light", view.miss->peaks.light);
+    if (view.miss->threshold) record.phase.Add("suggested_threshold", *view.miss->threshold);
+    record.details.push_back(MissSentence(*view.miss, photo_path, threshold_property));
     return view;
   }
   if (!view.plausible()) {
@@ -165,14 +220,29 @@ std::string ReportChart(const ChartView& view) {
                 view.straightened_by_deg);
 }
 
-void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place, Colour colour) {
-  constexpr const char* kNames[] = {"1 corner", "2", "3"};
-  for (std::size_t i = 0; i < view.marks.size(); ++i) {
-    const Mark& mark = view.marks[i];
+void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place) {
+  const auto ring = [&](const Mark& mark, const std::string& name, Colour colour) {
     const double radius = std::max(6.0, 5 * mark.module_px * place.scale);
     picture.Circle(place(mark.centre), radius, colour, 3);
-    picture.Text(view.complete() ? kNames[i] : "candidate", place(mark.centre) + cv::Point2d(0, radius + 20), 16,
-                 colour, Align::kCentre, true);
+    picture.Text(name, place(mark.centre) + cv::Point2d(0, radius + 20), 16, colour, Align::kCentre, true);
+  };
+  if (view.complete()) {
+    constexpr const char* kNames[] = {"1 corner", "2", "3"};
+    for (std::size_t i = 0; i < view.marks.size(); ++i) {
+      ring(view.marks[i], std::string(kNames[i]) + (view.plausible() ? "" : " doubtful"),
+           view.plausible() ? kGood : kDoubtful);
+    }
+    return;
+  }
+  if (!view.miss) return;
+  for (const Mark& mark : view.miss->marks) {
+    ring(mark, Format("found at threshold %d", *view.miss->threshold), kDoubtful);
+  }
+  for (const Mark& mark : view.marks) ring(mark, "candidate", kPoor);
+  cv::Point2d line = place.origin + cv::Point2d(10, 24);
+  for (const std::string& reason : view.miss->reasons) {
+    picture.Text(reason, line, 16, kPoor, Align::kLeft, true);
+    line.y += 24;
   }
 }
 
@@ -202,16 +272,18 @@ UprightPhoto Straighten(QVTester& tester, const cv::Mat& photo) {
   return upright;
 }
 
-std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo) {
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-  const UprightPhoto upright = Straighten(tester, gray);
+std::array<cv::Rect, 2> MeasuredRegions(const UprightPhoto& upright) {
   const float scale = static_cast<float>(upright.second.y - upright.corner.y) / kChartSide;
+  return {PlaceRegion(kVerticalRegion, upright.corner, scale), PlaceRegion(kHorizontalRegion, upright.corner, scale)};
+}
+
+std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo) {
+  const UprightPhoto upright = Straighten(tester, Gray(photo));
+  const std::array<cv::Rect, 2> regions = MeasuredRegions(upright);
   std::array<RegionView, 2> views;
   for (std::size_t i = 0; i < views.size(); ++i) {
-    const cv::Rect region = PlaceRegion(i == 0 ? kVerticalRegion : kHorizontalRegion, upright.corner, scale);
-    views[i].outline = upright.OnPhoto(region);
-    upright.picture(region).convertTo(views[i].pixels, CV_32F);
+    views[i].outline = upright.OnPhoto(regions[i]);
+    upright.picture(regions[i]).convertTo(views[i].pixels, CV_32F);
     views[i].pixels = tester.ConvertToVertical(views[i].pixels);
     views[i].edge_profile = EdgeProfile(tester, views[i].pixels);
   }

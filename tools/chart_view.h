@@ -3,6 +3,7 @@
 
 #include <array>
 #include <opencv2/core.hpp>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -18,11 +19,25 @@ struct Mark {
   double module_px;
 };
 
+/// The two commonest grey levels of a picture: what is dark in it, and what is light.
+struct GreyPeaks {
+  double dark, light;
+};
+
+/// Why three marks did not come back, and what would help.
+struct Miss {
+  std::vector<std::string> reasons;  // a phrase each
+  GreyPeaks peaks;
+  std::optional<int> threshold;  // a search at it finds three marks that look like a chart's
+  std::vector<Mark> marks;       // which it finds there
+};
+
 struct ChartView {
-  std::vector<Mark> marks;  // with three: corner, second, third; otherwise the candidates, in the order found
-  int candidates = 0;       // before the best three were chosen
-  int threshold = 0;        // grey level
-  double legs_ratio = 0;    // the rest only with three marks
+  std::vector<Mark> marks;   // with three: corner, second, third; otherwise the candidates, in the order found
+  int candidates = 0;        // before the best three were chosen
+  int threshold = 0;         // grey level
+  std::optional<Miss> miss;  // after DescribeChart, without three marks
+  double legs_ratio = 0;     // the rest only with three marks
   double legs_angle_deg = 0;
   double turn_deg = 0;          // of the first leg, counter-clockwise
   int straightened_by_deg = 0;  // clockwise, whole degrees, as the measures turn the photo
@@ -33,25 +48,27 @@ struct ChartView {
   bool complete() const { return marks.size() == 3; }
 };
 
-/// Looks at the tester's search state; call right after the test that searched.
-ChartView LookAtChart(QVTester& tester);
+/// Looks at the tester's search state; call right after the test that searched, at this threshold.
+ChartView LookAtChart(QVTester& tester, int threshold);
 
 /// Adds marks, module size, legs, turn and threshold to the phase.
 void AddChartFigures(Phase& phase, const ChartView& view);
 
-/// Why three marks did not come back, a sentence each: how many were found, marks too small, a threshold off the
-/// picture's two grey peaks.
-std::vector<std::string> ExplainMiss(const ChartView& view, const cv::Mat& photo);
+/// Why three marks did not come back: how many did, a threshold off the picture's two grey peaks, marks too small. A
+/// threshold between the peaks is suggested only when a search at it succeeds.
+Miss ExplainMiss(const ChartView& view, const cv::Mat& photo);
 
-/// Looks at the chart after a test on this photo: adds its figures to the record, and a sentence about a miss or about
-/// more candidates than marks.
-ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo);
+/// Looks at the chart after a test on this photo: adds its figures to the record, and a sentence about a miss, a
+/// doubtful find or more candidates than marks. `threshold_property` is the one that the test's search read.
+ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo,
+                        QV_PROPERTY_INDEX threshold_property = QV_PROPERTY_BINARY_THR_WORKING);
 
 /// "marks ..." and "chart ..." lines for a person.
 std::string ReportChart(const ChartView& view);
 
-/// Rings and numbers the marks, or the candidates of a miss.
-void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place, Colour colour);
+/// Rings and numbers the marks: good, or doubtful ones in words. Of a miss the candidates, what another threshold
+/// finds, and the reasons.
+void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place);
 
 /// A photo straightened as the measures do it, and the way back.
 struct UprightPhoto {
@@ -64,6 +81,9 @@ struct UprightPhoto {
 
 /// Straightens by the three marks that the last search left in the tester.
 UprightPhoto Straighten(QVTester& tester, const cv::Mat& photo);
+
+/// Where the sharpness measures cut their two regions from the upright picture, vertical first.
+std::array<cv::Rect, 2> MeasuredRegions(const UprightPhoto& upright);
 
 /// A measured sharpness region in detail.
 struct RegionView {

@@ -6,6 +6,7 @@
 namespace {
 
 constexpr char kSfr[] = "slanted edge, oversampling 1, real part";
+constexpr char kIso[] = "slanted edge (ISO 12233), oversampling 4, magnitude, derivative and bin width corrected";
 constexpr char kScan[] = "row scan for 1:1:3:1:1 with three cross-checks";
 constexpr char kMean[] = "mean over all pixels of the first channel";
 constexpr char kLab[] = "mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1";
@@ -39,6 +40,12 @@ const std::vector<Row>& Rows() {
       {kSfrTests,
        {"mtf50_horizontal", kNyquist, kReal, nullptr, kSfr,
         "Frequency at which the SFR of the horizontal region falls to one half."}},
+      {kSfrTests,
+       {"mtf50_iso_vertical", kNyquist, kReal, nullptr, kIso,
+        "MTF50 of the vertical region after ISO 12233, from the photo as it was taken."}},
+      {kSfrTests,
+       {"mtf50_iso_horizontal", kNyquist, kReal, nullptr, kIso,
+        "MTF50 of the horizontal region after ISO 12233, from the photo as it was taken."}},
       {{"camera_autofocus"},
        {"sfr_vertical", kOne, kReal, &kFrequencyAxis, kSfr,
         "Spatial frequency response of the vertical region over frequency in units of Nyquist."}},
@@ -72,6 +79,15 @@ const std::vector<Row>& Rows() {
         "Whole degrees, clockwise, by which the photo was turned upright before it was measured."}},
       {kChartTests,
        {"threshold", kGreyLevel, kWhole, nullptr, kScan, "Grey level above which a pixel counts as light."}},
+      {kChartTests,
+       {"grey_peak_dark", kGreyLevel, kWhole, nullptr, kBins,
+        "After a miss: the commonest level of what is dark in the photo."}},
+      {kChartTests,
+       {"grey_peak_light", kGreyLevel, kWhole, nullptr, kBins,
+        "After a miss: the commonest level of what is light in the photo."}},
+      {kChartTests,
+       {"suggested_threshold", kGreyLevel, kWhole, nullptr, kScan,
+        "After a miss: a threshold between the grey peaks at which a search found three marks."}},
 
       {kCaptureTests, {"patches", kOne, kWhole, nullptr, kLab, "Patches measured; 24 when the whole ring is in view."}},
       {kCaptureTests, {"lab_l", kOne, kReal, &kPatchAxis, kLab, "L* of each patch."}},

@@ -147,7 +147,7 @@ CommandBody DeclareCircles(CLI::App& command) {
       picture.Text(Format("Target check: %zu of 3 marks, threshold %d", view->marks.size(), view->threshold), {12, 28},
                    18, kInk);
       const PhotoPlace place = picture.PlacePhoto(frame, {0, kHead}, scale);
-      DrawMarks(picture, *view, place, view->complete() ? kGood : kPoor);
+      DrawMarks(picture, *view, place);
       if (const Measurement* m = record.phase.Find("centre")) {
         const cv::Point2d at = place({m->axis[0], m->values[0]});
         picture.Line({at - cv::Point2d(14, 0), at + cv::Point2d(14, 0)}, kGood, 3);

@@ -1,7 +1,9 @@
 #include <algorithm>
 #include <cmath>
 #include <memory>
+#include <opencv2/imgproc.hpp>
 
+#include "qvtester/iso_mtf.h"
 #include "tools/camera.h"
 #include "tools/chart_view.h"
 #include "tools/commands.h"
@@ -26,7 +28,30 @@ std::string ReportSharpness(const Record& record, const ChartView& view, double 
     text += Format("MTF50      %-10s  %s%s\n", region, FrequencyText(m.value(), record.inputs[0].height, pitch).c_str(),
                    LimitText(m).c_str());
   }
+  for (const char* region : kRegionNames) {
+    const Measurement& m = *record.phase.Find(std::string("mtf50_iso_") + region);
+    text += Format("MTF50 ISO  %-10s  %s%s\n", region, FrequencyText(m.value(), record.inputs[0].height, pitch).c_str(),
+                   LimitText(m).c_str());
+  }
   return text;
+}
+
+// The standard's figures of the same two regions, in the photo as it was taken.
+void AddIsoFigures(Record& record, const cv::Mat& photo) {
+  cv::Mat gray;
+  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  const UprightPhoto upright = Straighten(*theTester, gray);
+  const std::array<cv::Rect, 2> regions = MeasuredRegions(upright);
+  for (std::size_t i = 0; i < regions.size(); ++i) {
+    QVIsoMtf iso = {};
+    if (MeasureIsoMtf50(gray, upright.OnPhoto(regions[i]), &iso) != QV_SUCCESS) {
+      throw Failure(kInternalFault, "no memory for the figures of ISO 12233");
+    }
+    record.phase.Add(std::string("mtf50_iso_") + kRegionNames[i], iso.mtf50);
+    if (iso.reason == nullptr) continue;
+    record.details.push_back(Format("%s: no MTF50 after ISO 12233 of the %s region: %s", record.inputs[0].path.c_str(),
+                                    kRegionNames[i], iso.reason));
+  }
 }
 
 // Columns across the edge, whose parity bounds what the method can read; from the axis of the curve, 2 k / npix.
@@ -51,7 +76,7 @@ std::string CompareWithTruth(const Record& record, const ChartView& view, const 
     lens.blur_px = parameters.at("blur_px");
     lens.defocus_px = parameters.at("defocus_px");
     lens.smear_px = {parameters.at("smear_px").at("x"), parameters.at("smear_px").at("y")};
-    std::string text = "MTF50, Nyquist       true   expected of the method   measured\n";
+    std::string text = "MTF50, Nyquist       true   expected of the method   measured   by ISO 12233\n";
     for (const char* region : kRegionNames) {
       const Json& edge = truth.at("mtf50").at(region);
       const double angle = edge.at("edge_direction_deg").get<double>() * CV_PI / 180;
@@ -60,8 +85,10 @@ std::string CompareWithTruth(const Record& record, const ChartView& view, const 
         return LensResponse(lens, f, {-std::sin(angle), std::cos(angle)}) * interpolated * interpolated;
       };
       const auto [low, high] = method_law::MeasuredMtf50(response, npix);
-      text += Format("  %-14s   %.4f      %.4f to %.4f       %.4f\n", region, edge.at("mtf50_nyquist").get<double>(),
-                     low, high, record.phase.Find(std::string("mtf50_") + region)->value());
+      text += Format("  %-14s   %.4f      %.4f to %.4f       %.4f         %.4f\n", region,
+                     edge.at("mtf50_nyquist").get<double>(), low, high,
+                     record.phase.Find(std::string("mtf50_") + region)->value(),
+                     record.phase.Find(std::string("mtf50_iso_") + region)->value());
     }
     return text +
            Format(
@@ -77,21 +104,22 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
   constexpr double kPhoto = 1080;
   constexpr double kPlotWidth = 420;
   constexpr double kHead = 44;
+  constexpr double kLeastWidth = 760;  // that a miss's reasons have room in
   const cv::Mat photo = SlotPhoto(QV_RESOURCE_CHART_PHOTO);
   const double scale = std::min(1.0, kPhoto / std::max(photo.cols, photo.rows));
   const double width = photo.cols * scale;
   const double height = std::max(photo.rows * scale, 760.0);
-  Picture picture(cvRound(width + 2 * kPlotWidth + 16), cvRound(height + kHead));
+  const bool measured = record.phase.code == QV_SUCCESS;
+  Picture picture(cvRound(measured ? width + 2 * kPlotWidth + 16 : std::max(width, kLeastWidth)),
+                  cvRound(height + kHead));
   const PhotoPlace place = picture.PlacePhoto(photo, {0, kHead}, scale);
 
-  const bool measured = record.phase.code == QV_SUCCESS;
-  const Colour mark_colour = measured ? kGood : kPoor;
   picture.Text(measured ? Format("%s: %s, chart turned by %.1f degrees, threshold %d", record.test_name.c_str(),
                                  Name(record.outcome()), view.turn_deg, view.threshold)
                         : Format("%s: code %d, %zu of 3 marks, threshold %d", record.test_name.c_str(),
                                  record.phase.code, view.marks.size(), view.threshold),
                {12, 28}, 18, kInk);
-  DrawMarks(picture, view, place, mark_colour);
+  DrawMarks(picture, view, place);
   if (!measured) return picture.Png();
 
   const std::array<RegionView, 2> regions = LookAtRegions(*theTester, photo);
@@ -110,6 +138,9 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
     picture.Text(kRegionNames[i], middle - cv::Point2d(0, 8), 16, colour, Align::kCentre, true);
     picture.Text(Format("MTF50 %.3f Nyquist%s", mtf50.value(), word), middle + cv::Point2d(0, 14), 16, colour,
                  Align::kCentre, true);
+    const double iso = record.phase.Find(std::string("mtf50_iso_") + kRegionNames[i])->value();
+    picture.Text(std::isfinite(iso) ? Format("ISO 12233: %.3f", iso) : "ISO 12233: none", middle + cv::Point2d(0, 36),
+                 16, colour, Align::kCentre, true);
 
     const double left = width + 16 + static_cast<double>(i) * kPlotWidth;
     Plot profile;
@@ -157,7 +188,9 @@ CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
     m.inputs = {{QV_RESOURCE_CHART_PHOTO, options->photo}};
     m.look = [view](Record& record) {
       if (theTester->startSize == 0 && record.phase.code == QV_ERROR_UNUSABLE_INPUT) return;
-      *view = DescribeChart(record, record.inputs[0].path, SlotPhoto(QV_RESOURCE_CHART_PHOTO));
+      const cv::Mat photo = SlotPhoto(QV_RESOURCE_CHART_PHOTO);
+      *view = DescribeChart(record, record.inputs[0].path, photo);
+      if (record.phase.code == QV_SUCCESS) AddIsoFigures(record, photo);
       for (const char* region : kRegionNames) {
         const Measurement* mtf50 = record.phase.Find(std::string("mtf50_") + region);
         if (mtf50 == nullptr || std::isfinite(mtf50->value())) continue;

@@ -16,6 +16,16 @@ using ::testing::Not;
 
 class Program : public SimulatedPhotos {};
 
+const cv::Vec3b kRed(26, 26, 230);
+const cv::Vec3b kYellow(0, 204, 242);
+
+int PixelsOf(const cv::Vec3b& colour, const std::string& picture) {
+  const cv::Scalar slack = cv::Scalar::all(2);
+  cv::Mat same;
+  cv::inRange(cv::imread(picture), cv::Scalar(colour) - slack, cv::Scalar(colour) + slack, same);
+  return cv::countNonZero(same);
+}
+
 TEST_F(Program, AutofocusReportsRecordsAndDraws) {
   const std::string photo = Simulate({"--turn", "3", "--blur", "0.8", "--noise", "1"});
   const std::string picture = folder_.Path("annotated.png");
@@ -56,6 +66,28 @@ TEST_F(Program, MarksLieWhereTheyWereDrawn) {
       EXPECT_NEAR(truth[i]["y"], marks[i][1], 1.5) << "mark " << i << ", turned by " << turn;
     }
   }
+}
+
+TEST_F(Program, TheStandardsFigureIsTheTrueOneAtAnyTurn) {
+  for (const std::string turn : {"0", "3", "-62", "90", "31"}) {
+    const std::string photo = Simulate({"--turn", turn, "--blur", "0.8", "--size", "2000x1500"});
+    for (const auto& [command, phase] : {std::pair("autofocus", "camera_autofocus"), {"mtf", "mtf_check"}}) {
+      const json record = CheckedRecord(RunProgram({command, photo, "--json", "-"}).out);
+      for (const std::string region : {"vertical", "horizontal"}) {
+        const double truth = Truth()["mtf50"][region]["mtf50_nyquist"];
+        // 1 % is the method's, without noise.
+        EXPECT_NEAR(truth, Measured(record, std::string(phase) + "_mtf50_iso_" + region), 0.01 * truth) << turn;
+      }
+    }
+  }
+}
+
+TEST_F(Program, AnEdgeAlongThePixelGridHasNoStandardFigureAndSaysSo) {
+  const std::string photo = Simulate({"--turn", "-5"});  // against the edges' own slant
+  const ProgramRun run = RunProgram({"autofocus", photo, "--json", "-"});
+  EXPECT_EQ(0, run.status) << "the test's own figure stands";
+  EXPECT_THAT(run.err, HasSubstr("no MTF50 after ISO 12233 of the vertical region: the edge follows the pixel grid"));
+  EXPECT_EQ(nullptr, Measured(CheckedRecord(run.out), "camera_autofocus_mtf50_iso_vertical"));
 }
 
 TEST_F(Program, LimitsDecideTheVerdict) {
@@ -111,17 +143,47 @@ TEST_F(Program, MissesSayWhy) {
   two.marks = 2;
   run = RunProgram({"mtf", folder_.Write("two.png", DrawChart(two)), "--annotate", folder_.Path("two-seen.png")});
   EXPECT_EQ(3, run.status);
-  EXPECT_THAT(run.err, HasSubstr("two.png: 2 of 3 finder marks were found"));
-  EXPECT_FALSE(cv::imread(folder_.Path("two-seen.png")).empty());
+  EXPECT_THAT(run.err, AllOf(HasSubstr("two.png: 2 of 3 finder marks were found"), Not(HasSubstr("--threshold"))));
+  EXPECT_GT(PixelsOf(kRed, folder_.Path("two-seen.png")), 100) << "the candidates are ringed";
+
+  const std::string small = folder_.Write("small.png", DrawMarks({300, 300}, 2, {{50, 50}, {50, 200}}));
+  EXPECT_THAT(RunProgram({"circles", small}).err, HasSubstr("the marks are small (2.0 pixels a module"));
+}
+
+TEST_F(Program, AThresholdIsSuggestedOnceItHasWorked) {
+  const std::string dark = Simulate({"--exposure", "-2", "--blur", "0.5"});
+  const std::string picture = folder_.Path("seen.png");
+  const ProgramRun run = RunProgram({"autofocus", dark, "--json", "-", "--annotate", picture});
+  EXPECT_EQ(3, run.status);
+  const json record = CheckedRecord(run.out);
+  // White paper at 0.92 of 255 and the edges' dark side at a fifth of it, both two stops down.
+  EXPECT_NEAR(59, Measured(record, "camera_autofocus_grey_peak_light").get<int>(), 1);
+  EXPECT_NEAR(12, Measured(record, "camera_autofocus_grey_peak_dark").get<int>(), 1);
+  const std::string threshold = Measured(record, "camera_autofocus_suggested_threshold").dump();
+  EXPECT_THAT(run.err, HasSubstr("tried: --threshold " + threshold + " finds all three"));
+  EXPECT_GT(PixelsOf(kYellow, picture), 300) << "the three are ringed";
+  EXPECT_EQ(0, RunProgram({"autofocus", dark, "--threshold", threshold}).status);
+
+  const std::string flat = folder_.Write("flat.png", cv::Mat(300, 300, CV_8UC1, cv::Scalar(90)));
+  EXPECT_THAT(RunProgram({"autofocus", flat}).err, AllOf(HasSubstr("hardly any contrast"), Not(HasSubstr("tried"))));
+  // The standard photo is searched at a threshold of its own, which --threshold does not reach.
+  EXPECT_THAT(RunProgram({"capture", Simulate({}, "good"), "--standard", dark}).err,
+              AllOf(HasSubstr(dark + ": no finder mark"), HasSubstr("tried: property 86 at " + threshold)));
 }
 
 TEST_F(Program, DoubtfulFindsNeverPass) {
-  const cv::Mat marks = DrawMarks({900, 900}, 8, {{50, 50}, {50, 800}, {500, 50}});
-  const std::string photo = folder_.Write("stretched.png", marks);
-  const ProgramRun run = RunProgram({"circles", photo, "--json", "-"});
-  EXPECT_EQ(1, run.status);
-  EXPECT_THAT(run.err, HasSubstr("the find is doubtful: the legs between the marks are as 1.667 to 1"));
-  EXPECT_EQ("FAIL", CheckedRecord(run.out)["outcome"]);
+  const auto check = [&](cv::Point third) {
+    const cv::Mat marks = DrawMarks({900, 900}, 8, {{50, 50}, {50, 800}, third});
+    return RunProgram({"circles", folder_.Write("marks.png", marks), "--json", "-"});
+  };
+  for (const auto& [third, finding] : {std::pair(cv::Point(500, 50), "the legs between the marks are as 1.667 to 1"),
+                                       {cv::Point(795, 120), "at 84.6 degrees"}}) {
+    const ProgramRun run = check(third);
+    EXPECT_EQ(1, run.status);
+    EXPECT_THAT(run.err, AllOf(HasSubstr("the find is doubtful"), HasSubstr(finding)));
+    EXPECT_EQ("FAIL", CheckedRecord(run.out)["outcome"]);
+  }
+  EXPECT_EQ(0, check({740, 105}).status) << "as 1.08 to 1, at 85.4 degrees: within bounds";
 }
 
 TEST_F(Program, ARegionWithoutAnEdgeGivesNoFigure) {
