@@ -3,7 +3,7 @@
 //   2. all pixels of the region are binned by their distance from that line, four bins a pixel: the edge spread;
 //   3. the central difference of the edge spread is the line spread, under a Hamming window about its centroid;
 //   4. the response is |DFT| / |DFT(0)|, divided by what the difference and the bins take away;
-//   5. MTF50 is the lowest frequency at which it falls to one half.
+//   5. MTF50 is the lowest frequency at which it falls to one half, less what the window adds to it.
 // Distances are taken along the edge's normal, so the frequencies need no correction for the slant, and a region may
 // lie in the photo at any turn. Where the standard leaves a choice: the window reaches as far as the blur asks for, no
 // further, since what lies beyond adds noise only. All in double precision.
@@ -20,16 +20,17 @@
 namespace {
 
 constexpr int kBinsPerPixel = 4;
-constexpr int kFewestRows = 16;          // that show the edge from side to side
+constexpr std::size_t kFewestRows = 16;  // that show the edge from side to side
 constexpr double kSmallestReach = 6;     // pixels to each side of the edge
+constexpr double kLeastContrast = 0.5;   // of a row, over that of the row that shows most
 constexpr double kSurelyAnEdge = 3;      // mean contrast of the rows over its scatter
 constexpr double kHighest = 1.0;         // cycles/pixel; a square pixel's own response is 0.5 at 0.603
 constexpr double kMostEmptyBins = 0.02;  // share that may be filled from the neighbours
 
-// The window reaches kWindow / (frequency of response 0.5) to each side, which narrows a Gaussian line spread by 0.3 %,
-// and never less than kNarrowest pixels.
-constexpr double kWindow = 4.5;
-constexpr double kNarrowest = 16;
+// The window reaches kWindow / (frequency of response 0.5) to each side, and never less than kNarrowest pixels.
+constexpr double kWindow = 4;
+constexpr double kNarrowest = 12;
+constexpr double kMostNarrowing = 0.2;
 
 const double kNone = std::numeric_limits<double>::quiet_NaN();
 
@@ -54,11 +55,11 @@ struct EdgeLine {
 };
 
 struct RowEdge {
-  double row, place, contrast;
+  int row;
+  double place, contrast;
 };
 
-// Mean level and mean place of the pixels in each bin, bin `middle` about distance 0. The bins are kBinsPerPixel to a
-// pixel.
+// Mean level of the pixels in each bin; bin `middle` lies about distance 0.
 struct EdgeSpread {
   int middle;
   std::vector<double> levels;
@@ -100,10 +101,10 @@ Span SpanOf(const Region& region, int row, int columns) {
   double low = -1e9;
   double high = 1e9;
   Clip(start.dot(region.across), region.across.x, region.half_width, low, high);
-  const double full = high - low;
+  const Span whole = {cvCeil(low), cvFloor(high), true};
   Clip(start.dot(region.along), region.along.x, region.half_length, low, high);
-  Clip(-(columns - 1) / 2.0, 1, (columns - 1) / 2.0, low, high);
-  return {static_cast<int>(std::ceil(low)), static_cast<int>(std::floor(high)), high - low > full - 1e-6};
+  const Span span = {std::max(cvCeil(low), 0), std::min(cvFloor(high), columns - 1), false};
+  return {span.first, span.last, span.first == whole.first && span.last == whole.last};
 }
 
 // The edge in each row that shows it from side to side: centroid of the derivative under a window about `centre`.
@@ -123,7 +124,7 @@ std::vector<RowEdge> LocateInRows(const cv::Mat& picture, const Region& region, 
       sum += weight;
       moment += weight * (i + 0.5);
     }
-    edges.push_back({static_cast<double>(row), moment / sum, sum});
+    edges.push_back({row, moment / sum, sum});
   }
   return edges;
 }
@@ -145,25 +146,43 @@ EdgeLine FitLine(const std::vector<RowEdge>& edges) {
   return {place - slope * row, slope};
 }
 
-bool ShowsAnEdge(const std::vector<RowEdge>& edges) {
+// Drops rows that the edge is not in, after the row that shows it best. Answers whether it is in most of them, by more
+// than they scatter.
+bool ShowAnEdge(std::vector<RowEdge>& edges) {
+  const std::size_t rows = edges.size();
+  double best = 0;
+  for (const RowEdge& edge : edges) {
+    if (std::fabs(edge.contrast) > std::fabs(best)) best = edge.contrast;
+  }
+  edges.erase(std::remove_if(edges.begin(), edges.end(),
+                             [&](const RowEdge& edge) { return !(edge.contrast / best > kLeastContrast); }),
+              edges.end());
+  if (edges.size() < std::max(rows / 2, kFewestRows)) return false;
+  const auto n = static_cast<double>(edges.size());
   double mean = 0;
   double square = 0;
   for (const RowEdge& edge : edges) {
-    mean += edge.contrast / static_cast<double>(edges.size());
-    square += edge.contrast * edge.contrast / static_cast<double>(edges.size());
+    mean += edge.contrast / n;
+    square += edge.contrast * edge.contrast / n;
   }
   return std::fabs(mean) > kSurelyAnEdge * std::sqrt(std::max(square - mean * mean, 0.0)) && std::fabs(mean) > 1e-6;
 }
 
-// Distances up to `reach` pixels from the line. Empty when too many bins see no pixel.
-EdgeSpread Project(const cv::Mat& picture, const Region& region, const EdgeLine& line, double reach) {
+// Distances up to `reach` pixels from the line, without rows that the edge was looked for and not found in. Empty when
+// too many bins see no pixel.
+EdgeSpread Project(const cv::Mat& picture, const Region& region, const std::vector<RowEdge>& edges,
+                   const EdgeLine& line, double reach) {
   EdgeSpread spread = {static_cast<int>(reach * kBinsPerPixel), {}};
   const int count = 2 * spread.middle + 1;
   std::vector<double> sums(count);
   std::vector<int> pixels(count);
   const double across = 1 / std::hypot(1, line.slope);
+  auto edge = edges.begin();
   for (int row = 0; row < picture.rows; ++row) {
     const Span span = SpanOf(region, row, picture.cols);
+    const bool found = edge != edges.end() && edge->row == row;
+    if (found) ++edge;
+    if (span.side_to_side && !found) continue;
     const auto* levels = picture.ptr<double>(row);
     for (int i = span.first; i <= span.last; ++i) {
       const double distance = (i - line.offset - line.slope * row) * across;
@@ -244,6 +263,15 @@ double HalfPoint(const LineSpread& line) {
   return kNone;
 }
 
+// What the window takes from the square of a line spread's width, as a share of it. About its middle the window is
+// 1 - c x^2, which narrows a Gaussian of sigma to 1 / sqrt(1 / sigma^2 + 2 c); the Gaussian that has a response of 0.5
+// at this frequency stands in for whatever the line spread is.
+double Narrowing(double half, double reach) {
+  const double c = 0.46 * CV_PI * CV_PI / 2 / (reach * reach);
+  const double sigma_squared = std::log(2) / 2 / (CV_PI * CV_PI * half * half);  // as narrowed
+  return 2 * c * sigma_squared;
+}
+
 QVIsoMtf Measure(const cv::Mat& gray, Region region) {
   const auto refuse = [](const char* reason) { return QVIsoMtf{kNone, kNone, reason}; };
   if (!(region.half_width >= kSmallestReach) || region.half_length > 1e6) return refuse("the region is too small");
@@ -263,24 +291,29 @@ QVIsoMtf Measure(const cv::Mat& gray, Region region) {
 
   std::vector<RowEdge> edges =
       LocateInRows(picture, region, 1, [](int /*row*/, Span span) { return (span.first + span.last) / 2.0; });
-  if (static_cast<int>(edges.size()) < kFewestRows) return refuse("too few rows show the edge from side to side");
-  if (!ShowsAnEdge(edges)) return refuse("the region does not show one edge from end to end");
+  if (edges.size() < kFewestRows) return refuse("too few rows show the edge from side to side");
+  if (!ShowAnEdge(edges)) return refuse("the region does not show one edge along its length");
   EdgeLine line = FitLine(edges);
   edges = LocateInRows(picture, region, 0.5, [&](int row, Span) { return line.offset + line.slope * row; });
-  if (!ShowsAnEdge(edges)) return refuse("the region does not show one edge from end to end");
+  if (!ShowAnEdge(edges)) return refuse("the region does not show one edge along its length");
   line = FitLine(edges);
 
   const double off = (line.offset + line.slope * region.middle.y - region.middle.x) / std::hypot(1, line.slope);
   const double room = region.half_width - std::fabs(off);
   if (!(room >= kSmallestReach)) return refuse("the edge runs too near to the region's side");
-  const EdgeSpread spread = Project(picture, region, line, room);
+  const EdgeSpread spread = Project(picture, region, edges, line, room);
   if (spread.levels.empty()) return refuse("the edge follows the pixel grid, which leaves bins empty");
 
-  double half = HalfPoint(Differentiate(spread, room));
-  if (std::isfinite(half))
-    half = HalfPoint(Differentiate(spread, std::clamp(kWindow / half, std::min(kNarrowest, room), room)));
+  constexpr char kNoFall[] = "the response does not fall to one half";
+  const double seen = HalfPoint(Differentiate(spread, room));
+  if (!std::isfinite(seen)) return refuse(kNoFall);
+  const double window = std::clamp(kWindow / seen, std::min(kNarrowest, room), room);
+  const double half = HalfPoint(Differentiate(spread, window));
+  if (!std::isfinite(half)) return refuse(kNoFall);
+  const double narrowing = Narrowing(half, window);
+  if (narrowing > kMostNarrowing) return refuse("the blur is too wide for the region");
   const double angle = std::atan(line.slope) * 180 / CV_PI;
-  return {2 * half, lying ? -angle : angle, std::isfinite(half) ? nullptr : "the response does not fall to one half"};
+  return {2 * half * std::sqrt(1 - narrowing), lying ? -angle : angle, nullptr};
 }
 
 }  // namespace

@@ -136,11 +136,11 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
     picture.Line(outline, colour, 3, true);
     const cv::Point2d middle = (outline[0] + outline[2]) / 2;
     picture.Text(kRegionNames[i], middle - cv::Point2d(0, 8), 16, colour, Align::kCentre, true);
-    picture.Text(Format("MTF50 %.3f Nyquist%s", mtf50.value(), word), middle + cv::Point2d(0, 14), 16, colour,
-                 Align::kCentre, true);
+    const auto figure = [](double value) { return std::isfinite(value) ? Format("%.3f", value) : "none"; };
+    picture.Text(Format("MTF50 %s Nyquist%s", figure(mtf50.value()).c_str(), word), middle + cv::Point2d(0, 14), 16,
+                 colour, Align::kCentre, true);
     const double iso = record.phase.Find(std::string("mtf50_iso_") + kRegionNames[i])->value();
-    picture.Text(std::isfinite(iso) ? Format("ISO 12233: %.3f", iso) : "ISO 12233: none", middle + cv::Point2d(0, 36),
-                 16, colour, Align::kCentre, true);
+    picture.Text("ISO 12233: " + figure(iso), middle + cv::Point2d(0, 36), 16, colour, Align::kCentre, true);
 
     const double left = width + 16 + static_cast<double>(i) * kPlotWidth;
     Plot profile;
