@@ -115,7 +115,8 @@ std::string Annotate(const Record& record, const ChartView& view, const CaptureO
     picture.Line(outline, kGood, 2, true);
     picture.Text(std::to_string(i), (outline[0] + outline[2]) / 2 + cv::Point2d(0, 6), 15, kGood, Align::kCentre, true);
 
-    const cv::Point2d at(width + 16 + static_cast<double>(i >= 12) * kColumn,
+    const std::size_t column = i / 12;
+    const cv::Point2d at(width + 16 + static_cast<double>(column) * kColumn,
                          kHead + static_cast<double>(i % 12) * kRow);
     picture.Text(std::to_string(i), at + cv::Point2d(18, 34), 14, kInk, Align::kRight);
     const bool compared = delta != nullptr && i < standard.size() && i < delta->values.size();
