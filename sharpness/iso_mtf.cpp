@@ -21,6 +21,7 @@ namespace {
 
 constexpr int kBinsPerPixel = 4;
 constexpr std::size_t kFewestRows = 16;  // that show the edge from side to side
+constexpr double kFarthest = 1e6;        // pixels from the photo's origin
 constexpr double kSmallestReach = 6;     // pixels to each side of the edge
 constexpr double kLeastContrast = 0.5;   // of a row, over that of the row that shows most
 constexpr double kSurelyAnEdge = 3;      // mean contrast of the rows over its scatter
@@ -274,7 +275,8 @@ double Narrowing(double half, double reach) {
 
 QVIsoMtf Measure(const cv::Mat& gray, Region region) {
   const auto refuse = [](const char* reason) { return QVIsoMtf{kNone, kNone, reason}; };
-  if (!(region.half_width >= kSmallestReach) || region.half_length > 1e6) return refuse("the region is too small");
+  if (!(region.half_width >= kSmallestReach)) return refuse("the region is too small");
+  if (!(cv::norm(region.middle) + region.half_length < kFarthest)) return refuse("the region lies outside the photo");
   // The part of the photo about the region, in double.
   const cv::Point2d reach = {
       std::fabs(region.along.x) * region.half_length + std::fabs(region.across.x) * region.half_width,

@@ -117,6 +117,11 @@ TEST(IsoMtf, WhereThereIsNoFigureItSaysWhy) {
   const auto beyond = TurnedRectangle({5000, -3}, kLength, kWidth, 0);
   EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8U), beyond, &result));
   EXPECT_THAT(result.reason, HasSubstr("outside the photo"));
+  for (const double nowhere : {1e300, -1e12, std::nan("")}) {
+    const auto corners = TurnedRectangle({nowhere, 0}, kLength, kWidth, 0);
+    EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8U), corners, &result));
+    EXPECT_TRUE(std::isnan(result.mtf50) && result.reason != nullptr) << nowhere;
+  }
   EXPECT_EQ(QV_ERROR_UNUSABLE_INPUT, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8UC3), beyond, &result));
   EXPECT_EQ(QV_ERROR_UNUSABLE_INPUT, MeasureIsoMtf50(cv::Mat(), beyond, &result));
   EXPECT_EQ(QV_ERROR_INVALID_ARGUMENT, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8U), beyond, nullptr));
