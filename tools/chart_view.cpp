@@ -170,7 +170,8 @@ Miss ExplainMiss(const ChartView& view, const cv::Mat& photo) {
     break;
   }
 
-  for (const int threshold : {cvRound((dark + light) / 2), levels.parting}) {
+  for (const int threshold : {cvRound((dark + light) / 2), levels.parting, cvRound((3 * dark + light) / 4),
+                              cvRound((dark + 3 * light) / 4)}) {
     if (threshold == view.threshold) continue;
     QVTester trial;
     trial.GetFinderPoints(gray > threshold);

@@ -103,13 +103,14 @@ std::string CompareWithTruth(const Record& record, const ChartView& view, const 
 std::string AnnotateSharpness(const Record& record, const ChartView& view) {
   constexpr double kPhoto = 1080;
   constexpr double kPlotWidth = 420;
+  constexpr double kPlotsHeight = 760;
   constexpr double kHead = 44;
   constexpr double kLeastWidth = 760;  // that a miss's reasons have room in
   const cv::Mat photo = SlotPhoto(QV_RESOURCE_CHART_PHOTO);
   const double scale = std::min(1.0, kPhoto / std::max(photo.cols, photo.rows));
   const double width = photo.cols * scale;
-  const double height = std::max(photo.rows * scale, 760.0);
   const bool measured = record.phase.code == QV_SUCCESS;
+  const double height = std::max(photo.rows * scale, measured ? kPlotsHeight : 0);
   Picture picture(cvRound(measured ? width + 2 * kPlotWidth + 16 : std::max(width, kLeastWidth)),
                   cvRound(height + kHead));
   const PhotoPlace place = picture.PlacePhoto(photo, {0, kHead}, scale);
