@@ -13,6 +13,7 @@
 #include <numeric>
 #include <optional>
 
+#include "chart/dark_runs.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
 
@@ -24,15 +25,6 @@ constexpr int kRowStepAfterFind = 2;
 constexpr int kNoLimit = INT_MAX - 1;
 
 int Total(const int* counts) { return std::accumulate(counts, counts + 5, 0); }
-
-// The last three runs of a failed match may be the first three of the next.
-void ShiftTwoRuns(int* counts) {
-  counts[0] = counts[2];
-  counts[1] = counts[3];
-  counts[2] = counts[4];
-  counts[3] = 1;
-  counts[4] = 0;
-}
 
 cv::Point RowColumn(const QVFinderPattern& mark) { return {mark.getY(), mark.getX()}; }
 
@@ -46,16 +38,15 @@ void SetAverage(std::vector<QVFinderPattern>& candidates, float average) {
   for (QVFinderPattern& candidate : candidates) candidate.setAverage(average);
 }
 
-// A walk over the image, one pixel at a time.
+// A walk over the image, one pixel at a time; `left` pixels lie ahead of it.
 struct Walk {
-  const cv::Mat& image;
-  int i, j, di, dj;
-
-  bool Inside() const { return i >= 0 && i < image.rows && j >= 0 && j < image.cols; }
+  const uchar* start;
+  std::ptrdiff_t at, step;
+  int left;
 
   // Counts pixels of one kind while they last, the image lasts, and the count is at most `most`.
   void Count(bool dark, int most, int& count) {
-    for (; Inside() && (image.ptr<uchar>(i)[j] == 0) == dark && count <= most; i += di, j += dj) ++count;
+    for (; left > 0 && (start[at] == 0) == dark && count <= most; at += step, --left) ++count;
   }
 };
 
@@ -63,22 +54,27 @@ struct Walk {
 // maxCount pixels and end at the border, the second stays below maxCount and ends before it, but for its last run.
 // Answers where counting ended, or nothing when a run is too long or leaves the image.
 std::optional<cv::Point> CountRuns(const cv::Mat& image, int i, int j, int di, int dj, int maxCount, int* counts) {
-  Walk back{image, i, j, -di, -dj};
+  if (i < 0 || i >= image.rows || j < 0 || j >= image.cols) return std::nullopt;
+  const uchar* const core = image.ptr<uchar>(i, j);
+  const std::ptrdiff_t step = di * static_cast<std::ptrdiff_t>(image.step) + dj;
+  Walk back{core, 0, -step, std::min(di == 0 ? INT_MAX : i + 1, dj == 0 ? INT_MAX : j + 1)};
   back.Count(true, kNoLimit, counts[2]);
-  if (!back.Inside()) return std::nullopt;
+  if (back.left == 0) return std::nullopt;
   back.Count(false, maxCount, counts[1]);
-  if (!back.Inside() || counts[1] > maxCount) return std::nullopt;
+  if (back.left == 0 || counts[1] > maxCount) return std::nullopt;
   back.Count(true, maxCount, counts[0]);
   if (counts[0] > maxCount) return std::nullopt;
 
-  Walk ahead{image, i + di, j + dj, di, dj};
+  const int ahead_left = std::min(di == 0 ? INT_MAX : image.rows - 1 - i, dj == 0 ? INT_MAX : image.cols - 1 - j);
+  Walk ahead{core, step, step, ahead_left};
   ahead.Count(true, kNoLimit, counts[2]);
-  if (!ahead.Inside()) return std::nullopt;
+  if (ahead.left == 0) return std::nullopt;
   ahead.Count(false, maxCount - 1, counts[3]);
-  if (!ahead.Inside() || counts[3] >= maxCount) return std::nullopt;
+  if (ahead.left == 0 || counts[3] >= maxCount) return std::nullopt;
   ahead.Count(true, maxCount - 1, counts[4]);
   if (counts[4] >= maxCount) return std::nullopt;
-  return cv::Point(ahead.i, ahead.j);
+  const int walked = 1 + ahead_left - ahead.left;
+  return cv::Point(i + di * walked, j + dj * walked);
 }
 
 }  // namespace
@@ -89,36 +85,28 @@ std::vector<cv::Point> QVTester::GetFinderPoints(cv::Mat image) {
   possibleCenters.clear();
   if (image.rows < 3) return selectBestPatterns();
 
+  DarkRuns runs(image.cols);
   int iSkip = kRowStep;
   bool done = false;
   for (int i = kFirstRow; i < image.rows && !done; i += iSkip) {
-    const uchar* row = image.ptr<uchar>(i);
-    int counts[5] = {};
-    int s = 0;
-    for (int j = 0; j < image.cols; ++j) {
-      if (row[j] == 0) {
-        if (s % 2 == 1) ++s;
-        ++counts[s];
-      } else if (s != 4) {
-        if (s % 2 == 0) ++s;
-        ++counts[s];
-      } else if (foundPatternCross(counts) && handlePossibleCenter(image, counts, i, j)) {
-        iSkip = kRowStepAfterFind;
-        if (hasSkipped) {
-          done = haveMultiplyConfirmedCenters();
-        } else {
-          findRowSkip();  // called for hasSkipped; the skip itself is always 0
-        }
-        std::fill_n(counts, 5, 0);
-        s = 0;
-      } else {
-        ShiftTwoRuns(counts);
-        s = 3;
+    runs.Read(image.ptr<uchar>(i), image.ptr<uchar>(std::min(i + iSkip, image.rows - 1)));
+    const int* bounds = runs.Begin();
+    while ((bounds = runs.NextMark(bounds)) != nullptr) {
+      int counts[5];
+      for (int k = 0; k < 5; ++k) counts[k] = bounds[k + 1] - bounds[k];
+      const int j = bounds[5];
+      if (!foundPatternCross(counts) || !handlePossibleCenter(image, counts, i, j)) {
+        bounds += 2;  // the last two dark runs of a failed match may be the first two of the next
+        continue;
       }
-    }
-    if (foundPatternCross(counts) && handlePossibleCenter(image, counts, i, image.cols)) {
-      iSkip = counts[0];
-      if (hasSkipped) done = haveMultiplyConfirmedCenters();
+      const bool at_row_end = j == image.cols;
+      iSkip = at_row_end ? counts[0] : kRowStepAfterFind;
+      if (hasSkipped) {
+        done = haveMultiplyConfirmedCenters();
+      } else if (!at_row_end) {
+        findRowSkip();  // called for hasSkipped; the skip itself is always 0
+      }
+      bounds += 6;  // a find starts the counts afresh
     }
   }
   return selectBestPatterns();
