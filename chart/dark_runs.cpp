@@ -1,3 +1,7 @@
+// Plain form: the scan in unit_tests/plain/finder.h, pixel by pixel. Here a row becomes the bounds of its dark runs:
+// masks of 64 pixels, in which counting trailing zeros goes from one bound to the next. Marks are looked for where a
+// dark run ends, four ends at a time.
+
 #include "chart/dark_runs.h"
 
 #include <algorithm>
@@ -20,8 +24,8 @@ std::uint64_t DarkMask(const uchar* pixels) {
 }
 
 // Bit k is set when the three runs from bounds[2 k] may be a mark's: outer runs strictly between a half and one and a
-// half modules of total / 7, the core between three times as much. Here all is times 14, with a fourteenth of a pixel of
-// slack and a thousandth of the total, far above what rounding does to this test or to the exact one.
+// half modules of total / 7, the core between three times as much. Here all is times 14, with a fourteenth of a pixel
+// of slack and a thousandth of the total, far above what rounding does to this test or to the exact one.
 int MayBeMarks(const int* bounds) {
   cv::v_int32x4 b[6];
   for (int k = 0; k < 6; k += 2) cv::v_load_deinterleave(bounds + k, b[k], b[k + 1]);
@@ -41,8 +45,8 @@ int MayBeMarks(const int* bounds) {
 
 }  // namespace
 
-// A block's mask, exclusive-or itself moved up by a pixel, has a bit wherever dark and light meet. Counting trailing
-// zeros goes from one to the next, so a block of one kind costs no more than its reading.
+// A block's mask, exclusive-or itself moved up by a pixel, has a bit wherever dark and light meet, so a block of one
+// kind costs no more than its reading. Rows lie far apart: the processor would not fetch the next one by itself.
 void DarkRuns::Read(const uchar* row, const uchar* next) {
   int* bound = bounds_.data();
   std::uint64_t last = 0;  // of the block before: light before the row

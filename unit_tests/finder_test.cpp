@@ -1,12 +1,14 @@
 #include <gmock/gmock.h>
 
 #include <cfloat>
+#include <functional>
 #include <opencv2/imgproc.hpp>
 #include <random>
 
 #include "qvtester/tester.h"
 #include "unit_tests/drawing.h"
 #include "unit_tests/log_lines.h"
+#include "unit_tests/plain/finder.h"
 
 namespace {
 
@@ -252,20 +254,130 @@ TEST(FinderPoints, OtherDepthsAreAnError) {
   }
 }
 
-TEST(FinderPoints, GarbageIsSurvived) {
-  std::mt19937 random(7);
-  QVTester tester;
-  const LogLines log;
-  for (int round = 0; round < 2000; ++round) {
-    const int rows = 1 + static_cast<int>(random() % 40);
-    const int cols = 1 + static_cast<int>(random() % 60);
-    const unsigned dark = 1 + random() % 9;
-    cv::Mat image(rows, cols, CV_8UC1);
-    for (uchar& pixel : cv::Mat_<uchar>(image)) pixel = random() % 10 < dark ? 0 : 255;
-    cv::resize(image, image, {}, 1 + random() % 3, 1 + random() % 3, cv::INTER_NEAREST);
-    for (const cv::Point& point : tester.GetFinderPoints(image)) {
-      EXPECT_TRUE(cv::Rect(0, 0, image.rows, image.cols).contains(point));
+// All that a search answers and leaves; the cross checks' counts tell of its last call, also of one that failed.
+std::vector<float> Traces(QVTester& tester, const std::function<std::vector<cv::Point>()>& search) {
+  std::fill_n(tester.crossCheckStateCount, 5, -1);
+  std::vector<float> traces;
+  for (const cv::Point& point : search()) {
+    traces.push_back(static_cast<float>(point.x));
+    traces.push_back(static_cast<float>(point.y));
+  }
+  traces.push_back(static_cast<float>(tester.startSize));
+  traces.push_back(tester.hasSkipped ? 1 : 0);
+  traces.insert(traces.end(), tester.crossCheckStateCount, tester.crossCheckStateCount + 5);
+  for (const QVFinderPattern& candidate : tester.possibleCenters) {
+    const float count = static_cast<float>(candidate.count);
+    for (const float value : {candidate.x, candidate.y, candidate.estimatedModuleSize, candidate.average, count}) {
+      traces.push_back(value);
     }
+  }
+  return traces;
+}
+
+class Pictures {
+ public:
+  explicit Pictures(unsigned seed) : random_(seed) {}
+
+  int Any(int from, int to) { return std::uniform_int_distribution<int>(from, to)(random_); }
+
+  // Garbage of any density and grain; sizes around and below a block of 64 pixels.
+  cv::Mat Garbage() {
+    cv::Mat image(Any(1, 50), Any(0, 2) == 0 ? 64 * Any(1, 3) : Any(1, 200), CV_8UC1);
+    const int dark = Any(0, 100);
+    for (uchar& pixel : cv::Mat_<uchar>(image)) pixel = Any(0, 99) < dark ? 0 : 255;
+    cv::resize(image, image, {}, Any(1, 3), Any(1, 3), cv::INTER_NEAREST);
+    return image;
+  }
+  // Blocks as of a two-dimensional code, with marks among them.
+  cv::Mat Blocks() {
+    cv::Mat image(Any(10, 60), Any(10, 60), CV_8UC1);
+    for (uchar& pixel : cv::Mat_<uchar>(image)) pixel = Any(0, 1) == 0 ? 0 : 255;
+    const int module = Any(1, 5);
+    cv::resize(image, image, {}, module, module, cv::INTER_NEAREST);
+    DrawAnyMarks(image, Any(0, 6), module);
+    return image;
+  }
+  // Whole and cut marks, specked or clean.
+  cv::Mat Marks() {
+    const int module = Any(1, 8);
+    cv::Mat image(Any(7, 30) * module, Any(7, 30) * module, CV_8UC1, cv::Scalar(255));
+    DrawAnyMarks(image, Any(1, 6), module);
+    for (int speck = Any(0, 1) * Any(0, image.rows * image.cols / 50); speck > 0; --speck) {
+      image.at<uchar>(Any(0, image.rows - 1), Any(0, image.cols - 1)) ^= 255;
+    }
+    return image;
+  }
+  // One sampled row of runs near the limits of the ratio.
+  cv::Mat Limits() {
+    std::vector<uchar> row(static_cast<std::size_t>(Any(0, 3)), 255);
+    const int total = Any(7, 90);
+    for (int mark = 0; mark < 3; ++mark) {
+      for (const int modules : {1, 1, 3, 1, 1, 1}) {
+        const int ideal = modules * total * std::array<int, 3>{1, 2, 3}[Any(0, 2)] / 14;
+        row.insert(row.end(), std::max(0, ideal + Any(-1, 1)), row.empty() || row.back() != 0 ? 0 : 255);
+      }
+    }
+    return cv::repeat(cv::Mat(1, static_cast<int>(row.size()), CV_8UC1, row.data()), 3, 1);
+  }
+  // In a wider picture of other pixels, and with any value but 0 for light.
+  cv::Mat Disguised(const cv::Mat& image) {
+    cv::Mat around(image.rows + 3, image.cols + Any(1, 70), CV_8UC1, cv::Scalar(0));
+    cv::Mat view = around(cv::Rect({Any(0, around.cols - image.cols), 2}, image.size()));
+    for (int i = 0; i < image.rows; ++i) {
+      for (int j = 0; j < image.cols; ++j) {
+        view.at<uchar>(i, j) = image.at<uchar>(i, j) == 0 ? 0 : static_cast<uchar>(Any(1, 255));
+      }
+    }
+    return view;
+  }
+
+ private:
+  // Of about this module, some of them cut by the border.
+  void DrawAnyMarks(cv::Mat& image, int marks, int module) {
+    const int margin = 7 * (module + 1);
+    cv::Mat canvas;
+    cv::copyMakeBorder(image, canvas, margin, margin, margin, margin, cv::BORDER_CONSTANT);
+    for (; marks > 0; --marks) {
+      DrawMark(canvas, Any(margin / 2, image.rows + margin / 2), Any(margin / 2, image.cols + margin / 2),
+               std::max(1, module + Any(-1, 1)));
+    }
+    canvas({margin, margin, image.cols, image.rows}).copyTo(image);
+  }
+
+  std::mt19937 random_;
+};
+
+void ExpectPlainSearch(const cv::Mat& image, unsigned seed) {
+  QVTester tester;
+  const std::vector<float> plain = Traces(tester, [&] { return plain::GetFinderPoints(tester, image); });
+  ASSERT_EQ(plain, Traces(tester, [&] { return tester.GetFinderPoints(image); })) << "seed " << seed;
+}
+
+TEST(FinderPoints, TheScanByRunsEqualsTheScanByPixels) {
+  const LogLines log;
+  for (unsigned seed = 0; seed < 1500; ++seed) {
+    Pictures pictures(seed);
+    for (const cv::Mat& image : {pictures.Garbage(), pictures.Blocks(), pictures.Marks(), pictures.Limits()}) {
+      ExpectPlainSearch(image, seed);
+      ExpectPlainSearch(pictures.Disguised(image), seed);
+      if (HasFatalFailure()) return;
+    }
+  }
+}
+
+TEST(FinderPoints, ChartPhotosAreScannedAlikeAtAnyThreshold) {
+  const LogLines log;
+  ChartView view;
+  view.size = {700, 600};
+  view.scale = 0.06;
+  for (const double turn : {0.0, 3.0, 45.0, 118.0}) {
+    view.turn_deg = turn;
+    cv::Mat photo;
+    cv::cvtColor(DrawChart(view), photo, cv::COLOR_BGR2GRAY);
+    cv::Mat noise(photo.size(), CV_8UC1);
+    cv::randn(noise, 20, 8);
+    photo -= noise;  // specks wherever the threshold is near a grey level
+    for (int threshold = 5; threshold < 255; threshold += 10) ExpectPlainSearch(photo > threshold, threshold);
   }
 }
 
