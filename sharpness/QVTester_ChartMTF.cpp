@@ -1,4 +1,5 @@
-// Sharpness of a chart photo: its finder marks, the upright picture, the two slanted-edge regions.
+// Sharpness of a chart photo: its finder marks, the upright picture, the two slanted-edge regions. The chain with the
+// whole upright picture is in unit_tests/plain/chart_mtf.h.
 
 #include <cstdlib>
 #include <opencv2/imgproc.hpp>
@@ -6,20 +7,26 @@
 #include "chart/chart_image.h"
 #include "chart/chart_layout.h"
 #include "chart/points.h"
+#include "chart/region_warp.h"
+#include "chart/upright.h"
 #include "core/slots.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
 
 namespace {
 
+// The upright picture, of which only the regions are drawn.
 struct UprightChart {
-  cv::Mat image;                    // grey
+  const cv::Mat& gray;  // as photographed
+  UprightTurn turn;
   cv::Point corner, second, third;  // rows in x, columns in y
+
+  cv::Mat Cut(const cv::Rect& region) const { return WarpRegion(gray, turn.map, turn.canvas, region); }
 };
 
 UprightChart Straighten(QVTester& tester, const cv::Mat& gray, std::vector<cv::Point> points) {
-  UprightChart chart;
-  tester.NormalizePatternImage(gray, points, chart.image);
+  UprightChart chart = {gray, TurnUpright(gray.size(), tester.GetPatternAngle(points)), {}, {}, {}};
+  CarryMarks(chart.turn, points);
   tester.SortPatternPoints(points, chart.corner, chart.second, chart.third);
   return chart;
 }
@@ -47,10 +54,9 @@ void LogGeometry(const char* name, const UprightChart& chart) {
 int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vector<float>& sfrVertical,
                               std::vector<float>& sfrHorizontal, float& mtf50Vertical, float& mtf50Horizontal) {
   const char* const name = "GetSFRFromImage";
-  cv::Mat gray;
-  cv::cvtColor(image, gray, cv::COLOR_RGB2GRAY);
+  const cv::Mat& gray = ConvertToGray(*this, image);
   QVDEBUGP("[%s] prop_binary_thr_working_: %d", name, prop_binary_thr_working_);
-  const std::vector<cv::Point> points = GetFinderPoints(Binarise(gray, prop_binary_thr_working_));
+  const std::vector<cv::Point> points = GetFinderPoints(Binarise(*this, prop_binary_thr_working_));
   if (points.size() != kMarks) {
     QVDEBUGP("[%s] GetSFRFromImage, finder point : %d \n return PATTERN NOT FOUND!", name,
              static_cast<int>(points.size()));
@@ -59,8 +65,8 @@ int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vect
 
   const UprightChart chart = Straighten(*this, gray, points);
   const float scale = static_cast<float>(chart.second.y - chart.corner.y) / kChartSide;
-  const cv::Mat vertical = InFloat(chart.image(PlaceRegion(kVerticalRegion, chart.corner, scale)));
-  const cv::Mat horizontal = InFloat(chart.image(PlaceRegion(kHorizontalRegion, chart.corner, scale)));
+  const cv::Mat vertical = InFloat(chart.Cut(PlaceRegion(kVerticalRegion, chart.corner, scale)));
+  const cv::Mat horizontal = InFloat(chart.Cut(PlaceRegion(kHorizontalRegion, chart.corner, scale)));
   CalculateSFR(vertical, freq, sfrVertical, mtf50Vertical);
   std::vector<float> same_freq;  // both regions have the same smaller side, so one axis serves both
   CalculateSFR(horizontal, same_freq, sfrHorizontal, mtf50Horizontal);
@@ -69,10 +75,9 @@ int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vect
 
 int QVTester::GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50Horizontal) {
   const char* const name = "GetMTFFromImage";
-  cv::Mat gray;
-  cv::cvtColor(image, gray, cv::COLOR_RGB2GRAY);
+  const cv::Mat& gray = ConvertToGray(*this, image);
   QVDEBUGP("[%s] prop_binary_thr_working_: %d", name, prop_binary_thr_working_);
-  const std::vector<cv::Point> points = GetFinderPoints(Binarise(gray, prop_binary_thr_working_));
+  const std::vector<cv::Point> points = GetFinderPoints(Binarise(*this, prop_binary_thr_working_));
   const int count = static_cast<int>(points.size());
   QVDEBUGP("%s %d circle is detected using finder_point algorithm!", name, count);
   if (points.size() != kMarks) {
@@ -86,11 +91,11 @@ int QVTester::GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50H
   const float scale = static_cast<float>(std::abs(chart.second.y - chart.corner.y)) / kChartSide;
 
   const cv::Rect v = PlaceRegion(kVerticalRegion, chart.corner, scale);
-  const cv::Mat vertical = chart.image(v);
+  const cv::Mat vertical = chart.Cut(v);
   QVDEBUGP("%s vertical roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, v.x, v.y,
            v.width, v.height, vertical.rows, vertical.cols);
   const cv::Rect h = PlaceRegion(kHorizontalRegion, chart.corner, scale);
-  const cv::Mat horizontal = chart.image(h);
+  const cv::Mat horizontal = chart.Cut(h);
   QVDEBUGP("%s horizontal roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, h.x, h.y,
            h.width, h.height, horizontal.rows, horizontal.cols);
   CalculateMTF(InFloat(vertical), mtf50Vertical);

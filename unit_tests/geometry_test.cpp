@@ -1,5 +1,8 @@
 #include <gmock/gmock.h>
 
+#include <climits>
+#include <cmath>
+#include <cstring>
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
@@ -71,6 +74,33 @@ TEST(Geometry, AnUprightPictureIsCopiedOntoASquare) {
   EXPECT_EQ(0, cv::norm(image, upright.rowRange(0, 480), cv::NORM_INF));
   EXPECT_EQ(0, cv::countNonZero(upright.rowRange(480, 640)));
   EXPECT_THAT(points, ElementsAre(kCorner, kRight, kBelow));
+}
+
+TEST(Geometry, AnUprightPictureOfAnyKindIsWhatTheWarpGives) {
+  QVTester tester;
+  for (const int type : {CV_8UC1, CV_8UC3, CV_8UC4, CV_16UC1, CV_16SC3, CV_32FC1}) {
+    for (const cv::Size& size : {cv::Size(64, 48), cv::Size(31, 77), cv::Size(50, 50)}) {
+      cv::Mat image(size, type);
+      cv::randu(image, 0, 256);
+      if (image.depth() == CV_32F) image.at<float>(5, 5) = INFINITY;  // its neighbours become NaN
+      const int side = std::max(size.width, size.height);
+      cv::Mat expected;
+      const cv::Point2f middle(static_cast<float>(side) * 0.5f, static_cast<float>(side) * 0.5f);
+      cv::warpAffine(image, expected, cv::getRotationMatrix2D(middle, 0, 1), {side, side}, cv::INTER_LINEAR);
+      cv::Mat upright(side, side, type, cv::Scalar::all(7));  // as a picture before it would be
+      for (cv::Mat* normalized : {&upright, &image}) {
+        std::vector<cv::Point> points = {kCorner, kRight, kBelow};
+        tester.NormalizePatternImage(image, points, *normalized);
+        ASSERT_EQ(cv::Size(side, side), normalized->size());
+        const std::size_t bytes = expected.total() * expected.elemSize();
+        EXPECT_EQ(0, std::memcmp(expected.data, normalized->data, bytes)) << type << ' ' << size;
+      }
+    }
+  }
+  std::vector<cv::Point> points = {kCorner, kRight, kBelow};
+  cv::Mat upright;
+  EXPECT_THROW(tester.NormalizePatternImage(cv::Mat(), points, upright), cv::Exception);
+  EXPECT_THROW(tester.NormalizePatternImage(cv::Mat(1, SHRT_MAX, CV_8UC1), points, upright), cv::Exception);
 }
 
 TEST(Geometry, ThePictureTurnsAboutTheMiddleOfTheSquare) {

@@ -334,6 +334,10 @@ class QV_API QVTester {
   };
   ColorStandard standard_main_, standard_front_;
 
+  // Work images of the chart tests: kept, since new pages cost more than what is written to them. The next test
+  // overwrites them, so nothing that is handed out shares them.
+  cv::Mat gray_, binary_;  // CV_8UC1
+
   // What the last detectBlob saw.
   cv::Mat blob_image_;  // CV_8UC1
   std::vector<cv::KeyPoint> blob_keypoints_;

@@ -46,9 +46,8 @@ Patches SamplePatches(QVTester& tester, const cv::Mat& photo, std::vector<cv::Po
 }
 
 std::vector<cv::Point> FindMarks(QVTester& tester, const cv::Mat& photo, int threshold) {
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-  return tester.GetFinderPoints(Binarise(gray, threshold));
+  ConvertToGray(tester, photo);
+  return tester.GetFinderPoints(Binarise(tester, threshold));
 }
 
 Triple WhiteOf(QVTester& tester, const Patches& patches) {
@@ -123,10 +122,9 @@ int QVTester::TestCameraCapture(bool front) {
     }
   }
 
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  ConvertToGray(*this, photo);
   QVDEBUGP("[%s] prop_binary_thr_working_: %d", kName, prop_binary_thr_working_);
-  const std::vector<cv::Point> points = GetFinderPoints(Binarise(gray, prop_binary_thr_working_));
+  const std::vector<cv::Point> points = GetFinderPoints(Binarise(*this, prop_binary_thr_working_));
   if (points.size() != kMarks) {
     QVDEBUGP("[%s] TestCameraCapture2 finder point : %d \n return PATTERN NOT FOUND!", kName,
              static_cast<int>(points.size()));

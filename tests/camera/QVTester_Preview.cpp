@@ -67,8 +67,8 @@ int QVTester::CheckPatternCircles(int cam_id) {
   const char* const name = "CheckPatternCircles";
   cv::Mat frame;
   if (const int code = FetchImage(*this, QV_RESOURCE_CHART_PHOTO, frame); code != QV_SUCCESS) return code;
-  cv::cvtColor(frame, frame, cv::COLOR_RGB2GRAY);
-  const cv::Mat binary = Binarise(frame, prop_binary_thr_working_);
+  ConvertToGray(*this, frame);
+  const cv::Mat& binary = Binarise(*this, prop_binary_thr_working_);
   std::vector<cv::Point> points = GetFinderPoints(binary);
   QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, binary.rows, binary.cols);
 

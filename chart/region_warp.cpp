@@ -1,0 +1,67 @@
+// Plain form: cv::warpAffine of the whole canvas. It rounds a pixel's place in two steps, from its absolute row and
+// column, so a map shifted to the region's origin would change some pixels by a level. Here the same fixed-point places
+// are formed for the region alone, and cv::remap is called with them, as cv::warpAffine does. OpenCV 4.6 is meant;
+// should another compute places otherwise (its build may fuse multiply and add), region_warp_test.cpp says so, and
+// warping the whole is always right.
+
+#include "chart/region_warp.h"
+
+#include <algorithm>
+#include <opencv2/imgproc.hpp>
+#include <vector>
+
+namespace {
+
+constexpr int kPlaceBits = 10;  // fraction of a place before it is cut to cv::INTER_BITS
+constexpr int kPlaceScale = 1 << kPlaceBits;
+constexpr int kHalfStep = kPlaceScale / cv::INTER_TAB_SIZE / 2;
+constexpr int kBandRows = 16;
+
+int FixedPoint(double place) { return cv::saturate_cast<int>(place * kPlaceScale); }
+
+// Inverse of an affine map, in the order of operations of cv::warpAffine.
+cv::Matx23d Inverse(const cv::Matx23d& m) {
+  const double determinant = m(0, 0) * m(1, 1) - m(0, 1) * m(1, 0);
+  const double d = determinant != 0 ? 1 / determinant : 0;
+  cv::Matx23d inverse(m(1, 1) * d, m(0, 1) * -d, 0, m(1, 0) * -d, m(0, 0) * d, 0);
+  for (int k = 0; k < 2; ++k) inverse(k, 2) = -inverse(k, 0) * m(0, 2) - inverse(k, 1) * m(1, 2);
+  return inverse;
+}
+
+}  // namespace
+
+cv::Mat WarpRegion(const cv::Mat& image, const cv::Mat& map, cv::Size canvas_size, cv::Rect region) {
+  CV_Assert(0 <= region.x && 0 <= region.width && region.x + region.width <= canvas_size.width && 0 <= region.y &&
+            0 <= region.height && region.y + region.height <= canvas_size.height);
+  if (region.empty()) return {};
+  const cv::Matx23d m = Inverse(map);
+  std::vector<cv::Point> columns(static_cast<std::size_t>(region.width));  // what a column adds to a row's place
+  for (int j = 0; j < region.width; ++j) {
+    const int x = region.x + j;
+    columns[j] = {FixedPoint(m(0, 0) * x), FixedPoint(m(1, 0) * x)};
+  }
+
+  cv::Mat warped(region.size(), image.type());
+  cv::Mat places(kBandRows, region.width, CV_16SC2);     // whole pixels of the picture
+  cv::Mat fractions(kBandRows, region.width, CV_16UC1);  // 32nds of a pixel: row, column
+  for (int first = 0; first < region.height; first += kBandRows) {
+    const int rows = std::min(kBandRows, region.height - first);
+    for (int i = 0; i < rows; ++i) {
+      const int y = region.y + first + i;
+      const cv::Point row(FixedPoint(m(0, 1) * y + m(0, 2)) + kHalfStep, FixedPoint(m(1, 1) * y + m(1, 2)) + kHalfStep);
+      auto* place = places.ptr<cv::Vec2s>(i);
+      auto* fraction = fractions.ptr<ushort>(i);
+      for (int j = 0; j < region.width; ++j) {
+        const int x32 = (row.x + columns[j].x) >> (kPlaceBits - cv::INTER_BITS);
+        const int y32 = (row.y + columns[j].y) >> (kPlaceBits - cv::INTER_BITS);
+        place[j] = {cv::saturate_cast<short>(x32 >> cv::INTER_BITS), cv::saturate_cast<short>(y32 >> cv::INTER_BITS)};
+        fraction[j] = static_cast<ushort>((y32 & (cv::INTER_TAB_SIZE - 1)) * cv::INTER_TAB_SIZE +
+                                          (x32 & (cv::INTER_TAB_SIZE - 1)));
+      }
+    }
+    cv::Mat band = warped.rowRange(first, first + rows);
+    cv::remap(image, band, places.rowRange(0, rows), fractions.rowRange(0, rows), cv::INTER_LINEAR, cv::BORDER_CONSTANT,
+              cv::Scalar(0));
+  }
+  return warped;
+}
