@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
+#include <cstring>
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/api.h"
@@ -8,6 +9,7 @@
 #include "tools/method_law.h"
 #include "unit_tests/drawing.h"
 #include "unit_tests/log_lines.h"
+#include "unit_tests/plain/chart_mtf.h"
 
 namespace {
 
@@ -163,6 +165,75 @@ TEST_F(Autofocus, TheMtfMeasuresAgree) {
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[GetMTFFromImage] prop_binary_thr_working_: 125", "[OKAPI] startSize : 0",
                                              "GetMTFFromImage 0 circle is detected using finder_point algorithm!",
                                              "[GetMTFFromImage] finder point : 0 \n return PATTERN NOT FOUND!"));
+}
+
+struct Measured {
+  int code = 0;
+  std::vector<float> freq, sfr_vertical, sfr_horizontal;
+  float mtf50_vertical = 0, mtf50_horizontal = 0;
+
+  // Bit for bit, so that NaN equals itself.
+  bool operator==(const Measured& other) const {
+    const auto same = [](float a, float b) { return std::memcmp(&a, &b, sizeof(a)) == 0; };
+    return code == other.code && freq == other.freq && sfr_vertical == other.sfr_vertical &&
+           sfr_horizontal == other.sfr_horizontal && same(mtf50_vertical, other.mtf50_vertical) &&
+           same(mtf50_horizontal, other.mtf50_horizontal);
+  }
+};
+
+TEST(ChartMtf, WorkImagesAndRegionsGiveWhatTheLiteralChainGives) {
+  QVTester tester;  // one for all photos: what it keeps must not be seen
+  const LogLines log;
+  int measured = 0;
+  for (const double turn : {0.0, 2.0, 31.0, 90.0, 143.0, 200.0, 317.0, 359.0}) {
+    for (const cv::Size& size : {cv::Size(900, 700), cv::Size(640, 800), cv::Size(500, 500)}) {
+      ChartView view;
+      view.turn_deg = turn;
+      view.size = size;
+      view.scale = 0.05;
+      view.marks = size.width == 500 && turn < 3 ? 2 : 3;
+      const cv::Mat photo = DrawChart(view);
+      const cv::Mat untouched = photo.clone();
+      Measured fast;
+      fast.code = tester.GetSFRFromImage(photo, fast.freq, fast.sfr_vertical, fast.sfr_horizontal, fast.mtf50_vertical,
+                                         fast.mtf50_horizontal);
+      EXPECT_EQ(0, cv::norm(photo, untouched, cv::NORM_INF));
+      Measured plain;
+      plain.code = plain::GetSFRFromImage(tester, photo, plain.freq, plain.sfr_vertical, plain.sfr_horizontal,
+                                          plain.mtf50_vertical, plain.mtf50_horizontal);
+      EXPECT_TRUE(plain == fast) << turn << ' ' << size;
+      measured += plain.code == QV_SUCCESS ? 1 : 0;
+      if (plain.code != QV_SUCCESS) continue;
+      float vertical = 0;
+      float horizontal = 0;
+      EXPECT_EQ(QV_SUCCESS, tester.GetMTFFromImage(photo, vertical, horizontal));
+      EXPECT_EQ(plain.mtf50_vertical, vertical);
+      EXPECT_EQ(plain.mtf50_horizontal, horizontal);
+    }
+  }
+  EXPECT_GT(measured, 15) << "of 22 with three marks";
+}
+
+TEST(ChartMtf, ARegionOutsideTheUprightPictureIsTheSameError) {
+  QVTester tester;
+  const LogLines log;
+  // A chart turned by 45 degrees at the upper right: the vertical region is out of view.
+  cv::Mat photo = DrawMarks({1000, 1000}, 6, {{279, 679}, {19, 939}, {539, 939}});
+  cv::cvtColor(photo, photo, cv::COLOR_GRAY2BGR);
+  std::vector<float> freq;
+  std::vector<float> sfr;
+  float mtf50 = 0;
+  const auto code = [](const auto& measure) {
+    try {
+      return measure();
+    } catch (const cv::Exception& e) {
+      return e.code;
+    }
+  };
+  const int plain = code([&] { return plain::GetSFRFromImage(tester, photo, freq, sfr, sfr, mtf50, mtf50); });
+  EXPECT_EQ(cv::Error::StsAssert, plain);
+  EXPECT_EQ(plain, code([&] { return tester.GetSFRFromImage(photo, freq, sfr, sfr, mtf50, mtf50); }));
+  EXPECT_EQ(plain, code([&] { return tester.GetMTFFromImage(photo, mtf50, mtf50); }));
 }
 
 TEST_F(Autofocus, MarksInOneColumnGiveNoRegion) {
