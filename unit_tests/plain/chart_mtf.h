@@ -8,6 +8,7 @@
 
 #include "chart/chart_layout.h"
 #include "unit_tests/plain/finder.h"
+#include "unit_tests/plain/sfr.h"
 
 // The sharpness of a chart photo step by step, each picture whole and in new memory.
 namespace plain {
@@ -64,9 +65,9 @@ inline int GetSFRFromImage(QVTester& tester, const cv::Mat& photo, std::vector<f
                            float& mtf50Horizontal) {
   const EdgeRegions regions = CutEdgeRegions(tester, photo);
   if (regions.vertical.empty()) return QV_ERROR_PATTERN_NOT_FOUND;
-  tester.CalculateSFR(regions.vertical, freq, sfrVertical, mtf50Vertical);
+  CalculateSFR(tester, regions.vertical, freq, sfrVertical, mtf50Vertical);
   std::vector<float> same_freq;
-  tester.CalculateSFR(regions.horizontal, same_freq, sfrHorizontal, mtf50Horizontal);
+  CalculateSFR(tester, regions.horizontal, same_freq, sfrHorizontal, mtf50Horizontal);
   return QV_SUCCESS;
 }
 
