@@ -56,7 +56,7 @@ struct Walk {
 // Answers where counting ended, or nothing when a run is too long or leaves the image.
 std::optional<cv::Point> CountRuns(const cv::Mat& image, int i, int j, int di, int dj, int maxCount, int* counts) {
   if (i < 0 || i >= image.rows || j < 0 || j >= image.cols) return std::nullopt;
-  const uchar* const core = image.ptr<uchar>(i, j);
+  const auto* const core = image.ptr<uchar>(i, j);
   const std::ptrdiff_t step = di * static_cast<std::ptrdiff_t>(image.step) + dj;
   Walk back{core, 0, -step, std::min(di == 0 ? INT_MAX : i + 1, dj == 0 ? INT_MAX : j + 1)};
   back.Count(true, kNoLimit, counts[2]);

@@ -266,7 +266,7 @@ std::vector<float> Traces(QVTester& tester, const std::function<std::vector<cv::
   traces.push_back(tester.hasSkipped ? 1 : 0);
   traces.insert(traces.end(), tester.crossCheckStateCount, tester.crossCheckStateCount + 5);
   for (const QVFinderPattern& candidate : tester.possibleCenters) {
-    const float count = static_cast<float>(candidate.count);
+    const auto count = static_cast<float>(candidate.count);
     for (const float value : {candidate.x, candidate.y, candidate.estimatedModuleSize, candidate.average, count}) {
       traces.push_back(value);
     }

@@ -115,7 +115,7 @@ inline std::vector<cv::Point> GetFinderPoints(QVTester& tester, const cv::Mat& i
   int iSkip = 3;
   bool done = false;
   for (int i = 2; i < image.rows && !done; i += iSkip) {
-    const uchar* row = image.ptr<uchar>(i);
+    const auto* row = image.ptr<uchar>(i);
     int counts[5] = {};
     int s = 0;
     for (int j = 0; j < image.cols; ++j) {
