@@ -4,7 +4,6 @@
 
 #include "chart/dark_runs.h"
 
-#include <algorithm>
 #include <cstdint>
 #include <cstring>
 #include <opencv2/core/hal/intrin.hpp>

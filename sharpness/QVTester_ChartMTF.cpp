@@ -2,7 +2,6 @@
 // whole upright picture is in unit_tests/plain/chart_mtf.h.
 
 #include <cstdlib>
-#include <opencv2/imgproc.hpp>
 
 #include "chart/chart_image.h"
 #include "chart/chart_layout.h"
