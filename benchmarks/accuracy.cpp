@@ -202,7 +202,7 @@ std::vector<Mark> FindMarks(const cv::Mat& photo) {
   cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
   cv::threshold(gray, gray, kThreshold, 255, cv::THRESH_BINARY);
   if (tester.GetFinderPoints(gray).size() != 3) return {};
-  return LookAtChart(tester).marks;
+  return LookAtChart(tester, kThreshold).marks;
 }
 
 double LargestMarkError(const std::vector<Mark>& marks, const Json& truth) {
