@@ -27,6 +27,8 @@ constexpr Command kCommands[] = {
     {"register", "Bring a picture into the frame of a reference", DeclareRegister},
     {"chart", "Draw the test chart", DeclareChart},
     {"simulate", "Take a photo of the chart with a camera of known faults", DeclareSimulate},
+    {"verify", "Measure golden photos again and tell which number moved", DeclareVerify},
+    {"explain", "Say what a number means, how true it is and what moves it", DeclareExplain},
     {"list", "List the library's tests, slots, properties or codes", DeclareList},
 };
 
@@ -36,30 +38,36 @@ constexpr char kFooter[] =
 
 }  // namespace
 
+int RunCommand(const std::vector<std::string>& words) {
+  CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
+  app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
+  app.require_subcommand(1);
+  app.footer(kFooter);
+  app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
+  app.get_formatter()->column_width(32);
+
+  CommandBody body;
+  for (const Command& row : kCommands) {
+    CLI::App* command = app.add_subcommand(row.name, row.purpose);
+    command->callback([&body, chosen = row.declare(*command)] { body = chosen; });
+  }
+  try {
+    std::vector<std::string> backwards(words.rbegin(), words.rend());  // the parser takes them from the back
+    app.parse(backwards);
+  } catch (const CLI::ParseError& e) {
+    return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
+  }
+  SetCommandLine(words);
+  const int status = body();
+  if (!std::cout.flush()) throw Failure(kInternalFault, "standard output can't be written");
+  return status;
+}
+
 int main(int argc, char** argv) {
   try {
     WatchForInterrupts();
     setenv("OPENCV_IO_ENABLE_OPENEXR", "1", 0);  // NOLINT(concurrency-mt-unsafe): no other thread reads it yet
-    CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
-    app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
-    app.require_subcommand(1);
-    app.footer(kFooter);
-    app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
-    app.get_formatter()->column_width(32);
-
-    CommandBody body;
-    for (const Command& row : kCommands) {
-      CLI::App* command = app.add_subcommand(row.name, row.purpose);
-      command->callback([&body, chosen = row.declare(*command)] { body = chosen; });
-    }
-    try {
-      app.parse(argc, argv);
-    } catch (const CLI::ParseError& e) {
-      return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
-    }
-    const int status = body();
-    if (!std::cout.flush()) throw Failure(kInternalFault, "standard output can't be written");
-    return status;
+    return RunCommand({argv + 1, argv + argc});
   } catch (const Failure& e) {
     std::fprintf(stderr, "qvtester: %s\n", e.what());
     return e.status;

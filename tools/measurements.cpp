@@ -5,18 +5,51 @@
 
 namespace {
 
-constexpr char kSfr[] = "slanted edge, oversampling 1, real part";
-constexpr char kIso[] = "slanted edge (ISO 12233), oversampling 4, magnitude, derivative and bin width corrected";
-constexpr char kScan[] = "row scan for 1:1:3:1:1 with three cross-checks";
-constexpr char kMean[] = "mean over all pixels of the first channel";
-constexpr char kLab[] = "mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1";
-constexpr char kDelta[] = "CIE 1976 difference to the standard photo's patch";
-constexpr char kBlob[] = "local threshold 15 x 15, blob detector at levels 0 and 125";
-constexpr char kBins[] = "256 bins of one grey level";
-constexpr char kDots[] = "relative difference to the mean of a square window, single precision";
-constexpr char kAreas[] = "connected dots, then rectangles closer than the distance, merged until none are";
-constexpr char kSurf[] = "SURF key points, the affine map of the three best of the good matches";
-constexpr char kDifference[] = "mean absolute difference of the grey frames over 255";
+constexpr Method kSfr = {
+    "slanted edge, oversampling 1, real part",
+    "Reads low by a known law, 40 % at a blur of 0.5 px to 4 % at 3 px, and lies within that law by 2 % without noise; "
+    "with 1 to 2 % noise single readings jump upwards by up to half in blurs under 1.2 px.",
+    "Moved by focus, motion, sharpening and denoising; by the turn of the chart, whose straightening costs up to 12 %; "
+    "by the parity of the region's width, hence by the distance."};
+constexpr Method kIso = {"slanted edge (ISO 12233), oversampling 4, magnitude, derivative and bin width corrected",
+                         "Mean error 0.1 % without noise and under 0.8 % with 2 % noise, at blurs of 0.3 to 3 px.",
+                         "Moved by focus, motion, sharpening and denoising; reads far too high where the paper is "
+                         "clipped at level 255; there is none where the edge lies along the pixel grid."};
+constexpr Method kScan = {
+    "row scan for 1:1:3:1:1 with three cross-checks",
+    "Centres are good to 0.3 to 0.9 px, at most a fifth of a module on charts turned by about 30 degrees.",
+    "Moved by threshold and light where they reach a mark's edges, and by modules under 3 px."};
+constexpr Method kMean = {
+    "mean over all pixels of the first channel", "Exact for the photo as stored.",
+    "Moved by exposure, flash, shading and clipping; the first channel of a photo read from a file is blue."};
+constexpr Method kLab = {"mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1",
+                         "Within 0.3 of the colour as photographed in the mean, 0.7 at most on an upright chart; patch "
+                         "means are cut to whole levels.",
+                         "Moved by exposure, white balance, light and shading; by clipping."};
+constexpr Method kDelta = {"CIE 1976 difference to the standard photo's patch",
+                           "As good as the two L*a*b* readings: about 0.4 in the mean.",
+                           "Moved by whatever makes the photo's light or colour unlike the standard's."};
+constexpr Method kBlob = {
+    "local threshold 15 x 15, blob detector at levels 0 and 125",
+    "Of discs 0.3 or more darker than the target, all of 4 to 16 px are found, none of 20 px and more.",
+    "Moved by focus on the target, by light (photos of mean level under 126 show none), by noise near the local "
+    "threshold."};
+constexpr Method kBins = {"256 bins of one grey level", "Exact for the photo as stored.",
+                          "Moved by exposure, shading and noise."};
+constexpr Method kDots = {
+    "relative difference to the mean of a square window, single precision",
+    "All of 1,000 dots of contrast 0.2 are found at a threshold of 0.1 and 0.5 % noise, corners included; the means "
+    "are single precision, whose rounding counts on large pictures with small windows.",
+    "Moved by the picture's noise, by neighbouring dots in the same window, by formats that round."};
+constexpr Method kAreas = {"connected dots, then rectangles closer than the distance, merged until none are",
+                           "Exact for the dots that were found.", "Moved by the dots and by the distance."};
+constexpr Method kSurf = {"SURF key points, the affine map of the three best of the good matches",
+                          "Median error 1.4 px on textured pairs with shift, turn, scale, gain and 3 % noise; 30 in "
+                          "100 are off by over 3 px, 14 by over 10.",
+                          "Moved by false matches among the three best: repeated texture, noise, blur."};
+constexpr Method kDifference = {"mean absolute difference of the grey frames over 255",
+                                "Exact for the frames as delivered.",
+                                "Moved by motion, noise, flicker and exposure between the frames."};
 
 constexpr auto kWhole = Number::kWhole;
 constexpr auto kReal = Number::kReal;
@@ -152,6 +185,12 @@ const std::vector<Row>& Rows() {
 }
 
 }  // namespace
+
+std::string Explanation(const Figure& figure) {
+  return std::string(figure.docstring) + " " + figure.method.accuracy + " " + figure.method.moved_by;
+}
+
+double Repeatability(const Figure& figure) { return figure.number == Number::kWhole ? 0 : figure.unit.repeatability; }
 
 const std::vector<MeasurementInfo>& AllMeasurements() {
   static const std::vector<MeasurementInfo> all = [] {

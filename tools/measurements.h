@@ -12,13 +12,14 @@ struct Unit {
   const char* name;
   const char* code;
   const char* suffix;
+  double repeatability = 0;  // how much a real figure of one photo may differ from one machine to another
 };
 
-inline constexpr Unit kNyquist = {"fraction of Nyquist", nullptr, "Nyquist"};
-inline constexpr Unit kPixel = {"pixel", "E37", "px"};
-inline constexpr Unit kDegree = {"degree [unit of angle]", "DD", "deg"};
-inline constexpr Unit kOne = {"one", "C62", "1"};
-inline constexpr Unit kGreyLevel = {"grey level", nullptr, "level"};
+inline constexpr Unit kNyquist = {"fraction of Nyquist", nullptr, "Nyquist", 1e-4};
+inline constexpr Unit kPixel = {"pixel", "E37", "px", 0.01};
+inline constexpr Unit kDegree = {"degree [unit of angle]", "DD", "deg", 0.001};
+inline constexpr Unit kOne = {"one", "C62", "1", 1e-3};
+inline constexpr Unit kGreyLevel = {"grey level", nullptr, "level", 1e-3};
 
 // What the values of a list stand over.
 inline constexpr Unit kFrequencyAxis = {"frequency", nullptr, "Nyquist"};
@@ -30,20 +31,33 @@ inline constexpr Unit kLevelAxis = {"grey level", nullptr, "level"};
 
 enum class Number { kWhole, kReal };
 
+/// How figures are taken: the sentences stand in records and are what `explain` prints.
+struct Method {
+  const char* name;
+  const char* accuracy;  // how true they are
+  const char* moved_by;  // what changes them
+};
+
 /// One kind of figure; the measurement's name is that of the test (its phase), "_", and the figure's.
 struct Figure {
   const char* name;
   const Unit& unit;
   Number number;
   const Unit* axis;  // null for a single value; otherwise the figure is a list of [axis, value]
-  const char* method;
-  const char* docstring;
+  const Method& method;
+  const char* docstring;  // what it means
 };
 
 struct MeasurementInfo {
   std::string name, phase;
   const Figure* figure;
 };
+
+/// Meaning, accuracy and what moves it, as one text.
+std::string Explanation(const Figure& figure);
+
+/// The largest difference that the same photo may show; whole numbers show none.
+double Repeatability(const Figure& figure);
 
 /// All of them, by test.
 const std::vector<MeasurementInfo>& AllMeasurements();

@@ -24,6 +24,8 @@
 
 namespace {
 
+std::vector<std::string> command_line;
+
 std::vector<LogLine> log_lines;
 bool show_log_lines = false;
 
@@ -88,6 +90,10 @@ void WriteWholeFile(const std::string& path, const std::string& content) {
   file << content << std::flush;
   if (!file) throw Failure(kWrongUsage, path + ": can't be written (" + std::strerror(errno) + ")");
 }
+
+const std::vector<std::string>& CommandLine() { return command_line; }
+
+void SetCommandLine(std::vector<std::string> words) { command_line = std::move(words); }
 
 std::string HexDigest(const std::string& content, const char* algorithm) {
   unsigned char digest[EVP_MAX_MD_SIZE];

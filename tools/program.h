@@ -30,6 +30,10 @@ std::string ReadWholeFile(const std::string& path, ExitStatus status);
 /// Writes a file as a whole ("-" is standard output); throws Failure when it can't.
 void WriteWholeFile(const std::string& path, const std::string& content);
 
+/// The words after the program's name.
+const std::vector<std::string>& CommandLine();
+void SetCommandLine(std::vector<std::string> words);
+
 /// Lower-case hexadecimal digest; `algorithm` as OpenSSL names it ("SHA256", "SHA1").
 std::string HexDigest(const std::string& content, const char* algorithm);
 

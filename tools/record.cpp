@@ -52,9 +52,9 @@ Json ToJson(const Measurement& m) {
   const auto bad = std::find_if(m.values.begin(), m.values.end(), [](double v) { return !std::isfinite(v); });
   if (bad != m.values.end()) json["non_finite"] = NonFiniteName(*bad);
   json["units"] = ToJson(m.info->figure->unit);
-  json["method"] = m.info->figure->method;
+  json["method"] = m.info->figure->method.name;
   if (const Json limits = ToJson(m.limit); !limits.empty()) json["limits"] = limits;
-  json["docstring"] = m.info->figure->docstring;
+  json["docstring"] = Explanation(*m.info->figure);
   return json;
 }
 
@@ -208,6 +208,7 @@ Json Record::ToJson() const {
   json["metadata"] = {{"test_name", test_name},
                       {"test_index", test_index ? Json(*test_index) : Json()},
                       {"library_version", QVTESTER_VERSION},
+                      {"command", CommandLine()},
                       {"limits", {{"name", limits.name}, {"revision", limits.revision}}},
                       {"properties", properties}};
 

@@ -108,11 +108,12 @@ CommandBody DeclareRegister(CLI::App& command) {
   command.add_option("REFERENCE", options->reference, "Picture whose frame is taken; - is standard input")->required();
   command.add_option("IMAGE", options->image, "Picture of the same scene, brought into that frame")->required();
   command.add_option("-o,--output", options->output, "Where the resampled picture goes: .png, .jpg, .bmp or .tif")
-      ->required()
       ->type_name("OUT");
   options->DeclareOn(command, "--matches", "Draw the good matches between both pictures");
   return [options] {
-    Encode(cv::Mat(1, 1, CV_8UC3, cv::Scalar::all(0)), options->output);  // a name that can't be written is told first
+    if (!options->output.empty()) {
+      Encode(cv::Mat(1, 1, CV_8UC3, cv::Scalar::all(0)), options->output);  // a name of no format is told first
+    }
     if (options->output == "-") {
       if (options->json == "-" || options->annotate == "-") {
         throw Failure(kWrongUsage, "standard output takes one of picture, record and drawing");
@@ -133,7 +134,8 @@ CommandBody DeclareRegister(CLI::App& command) {
     m.report = Report;
     m.annotate = [](const Record& /*record*/) { return Png(theTester->DrawUnwarpMatches()); };
     const int status = Measure(*options, m);
-    if (!unwarped->empty()) WriteWholeFile(options->output, Encode(*unwarped, options->output));
+    if (!options->output.empty() && !unwarped->empty())
+      WriteWholeFile(options->output, Encode(*unwarped, options->output));
     return status;
   };
 }
