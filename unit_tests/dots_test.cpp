@@ -1,11 +1,15 @@
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <cstdlib>
+#include <cstring>
 #include <random>
 
 #include "qvtester/tester.h"
 #include "unit_tests/log_lines.h"
+#include "unit_tests/plain/hdr_dots.h"
 
 namespace {
 
@@ -88,6 +92,84 @@ TEST_F(Dots, OddNumbersHarmOnlyTheirWindows) {
   }
   Capture zero(9, 9, 0);  // 0 / 0 compares as no departure
   EXPECT_THAT(zero.Flagged(0.5f, 1), IsEmpty());
+}
+
+// Levels from the smallest to the largest, so that every guard of the undivided test is met.
+float RandomLevel(std::mt19937& random) {
+  constexpr float kLevels[] = {0, 1e-45f, 1e-38f, 3e-37f, 1e-6f, 1, 100, 1e6f, 1e30f, 3e38f};
+  return kLevels[random() % std::size(kLevels)];
+}
+
+TEST_F(Dots, AreThoseOfTheWholeTable) {
+  constexpr float kOdd[] = {0, -0.0f, NAN, INFINITY, -INFINITY, 3e38f, -3e38f, 1e-45f, -1};
+  constexpr float kThresholds[] = {0, -1, 1e-7f, 1.1e-6f, 0.01f, 0.1f, 0.5f, 1, 3, 10, 1e38f, NAN, INFINITY};
+  std::size_t flagged = 0;
+  std::size_t pixels = 0;
+  for (unsigned seed = 0; seed < 4000; ++seed) {
+    std::mt19937 random(seed);
+    const int radius = static_cast<int>(random() % 7);
+    const int height = 2 * radius + 1 + static_cast<int>(random() % 24);
+    const int width = 2 * radius + 1 + static_cast<int>(random() % 150);
+    Capture capture(height, width, RandomLevel(random));
+    const float spread = std::ldexp(1.0f, -static_cast<int>(random() % 24));
+    for (int i = 0; i < height * width; ++i) {
+      capture.data[3 * i] *= 1 + spread * static_cast<float>(random() % 1000) / 1000;
+    }
+    const float other = random() % 2 == 0 ? RandomLevel(random) : kOdd[random() % std::size(kOdd)];
+    for (unsigned n = random() % 4; n > 0; --n) {
+      capture.at(static_cast<int>(random() % height), static_cast<int>(random() % width)) = other;
+    }
+    const float threshold = random() % 2 == 0 ? spread : kThresholds[random() % std::size(kThresholds)];
+    const std::size_t size = static_cast<std::size_t>(height) * width;
+    std::vector<unsigned char> expected(size, 7);  // what is not flagged is not written
+    std::vector<unsigned char> mask(size, 7);
+    plain::DetectDot(capture.data.data(), height, width, threshold, radius, expected.data());
+    QVTester().DetectDot(capture.data.data(), height, width, threshold, radius, mask.data());
+    ASSERT_EQ(expected, mask) << "seed " << seed;
+    flagged += std::count(mask.begin(), mask.end(), 1);
+    pixels += size;
+  }
+  EXPECT_GT(flagged, pixels / 20) << "or the two would agree on nothing";
+  EXPECT_LT(flagged, pixels / 2);
+}
+
+TEST_F(Dots, DepartureBeyondTheLargestNumberIsInfinite) {
+  const float most = 3.39e38f;
+  Capture capture(7, 38, 1);
+  for (const int row : {0, 1, 2}) capture.at(row, 34) = row == 1 ? -most : most;
+  EXPECT_THAT(capture.Flagged(100, 3), ElementsAre(cv::Point(34, 1))) << "50 means off, but no float can hold it";
+}
+
+// The dot's departure to the last bit, by bisection of the threshold: where the undivided test alone would be a few
+// roundings off.
+TEST_F(Dots, AreExactAtTheThreshold) {
+  std::mt19937 random(5);
+  std::uniform_real_distribution<float> any(0.5f, 1);
+  for (int round = 0; round < 300; ++round) {
+    const int radius = 1 + round % 3;
+    const std::vector<float> levels = {1, 40000, 1e-38f, 1e-41f};
+    Capture capture(9, 60, levels[round % 4] * any(random));
+    const std::vector<float> factors = {1 + 3e-5f, 1.2f, 0.3f, 5, -1, 9};
+    capture.at(4, 20) *= factors[round % 6] * any(random);
+    const auto plain_flags = [&](float threshold) {
+      std::vector<unsigned char> mask(9 * 60, 0);
+      plain::DetectDot(capture.data.data(), 9, 60, threshold, radius, mask.data());
+      return std::count(mask.begin(), mask.end(), 1) > 0;
+    };
+    std::int32_t flagging = 0;
+    std::int32_t silent = 0x7f800000;  // the bits of infinity
+    const auto value = [](std::int32_t bits) {
+      float number = 0;
+      std::memcpy(&number, &bits, sizeof(number));
+      return number;
+    };
+    while (silent - flagging > 1) {
+      const std::int32_t middle = flagging + (silent - flagging) / 2;
+      (plain_flags(value(middle)) ? flagging : silent) = middle;
+    }
+    EXPECT_THAT(capture.Flagged(value(flagging), radius), ::testing::Contains(cv::Point(20, 4))) << round;
+    EXPECT_THAT(capture.Flagged(value(silent), radius), IsEmpty()) << round;
+  }
 }
 
 TEST_F(Dots, HdrPicturesAreStretchedForTheEye) {

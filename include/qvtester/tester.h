@@ -273,8 +273,9 @@ class QV_API QVTester {
   /// @param threshold  relative deviation, 0.1 for 10 %; a pixel beyond it is flagged.
   /// @param radius     the mean is taken over 2 radius + 1 pixels a side, shifted inward near an edge.
   /// @param[out] mask  height x width bytes; 1 is set at flagged pixels, nothing else is written.
-  /// The mean comes from a summed-area table in single precision (Crow 1984), whose rounding is part of the result. A
-  /// picture smaller than the window is logged and flags nothing.
+  /// The mean comes from a summed-area table in single precision (Crow 1984), whose rounding is part of the result: on
+  /// 12 megapixels it alone flags pixels of a uniform picture at small radii. A picture smaller than the window is
+  /// logged and flags nothing.
   void DetectDot(float* data, int height, int width, float threshold, int radius, unsigned char* mask);
   /// Channel 0 of a float picture of several channels, stretched from its least and largest value to 0 and 255,
   /// CV_8UC1.
