@@ -6,6 +6,7 @@
 #include <random>
 
 #include "qvtester/tester.h"
+#include "unit_tests/plain/colour.h"
 
 namespace {
 
@@ -124,6 +125,41 @@ TEST(Colour, TemperaturesEndWhereTheFitsDo) {
   for (float* xyz : {black, nothing, opposite}) EXPECT_EQ(0.0f, *Buffer(tester.xyz2cct(xyz, 1, 1), &std::free));
   // x = 0.331 in single precision belongs to the cool side: sums that are exact, so that x is the quotient itself.
   EXPECT_NEAR(Temperature(0.331f, 0.34f), Temperature(0.33f, 0.34f), 60);
+}
+
+// Bit for bit; which NaN comes of two is the compiler's choice.
+void ExpectSame(const std::vector<float>& expected, const float* got, unsigned seed) {
+  for (std::size_t i = 0; i < expected.size(); ++i) {
+    if (std::isnan(expected[i]) && std::isnan(got[i])) continue;
+    ASSERT_EQ(0, std::memcmp(&expected[i], got + i, sizeof(float)))
+        << "seed " << seed << ", value " << i << ": " << expected[i] << ", " << got[i];
+  }
+}
+
+TEST(Colour, WholeBuffersAreAsTheirPixels) {
+  QVTester tester;
+  for (unsigned seed = 0; seed < 600; ++seed) {
+    std::mt19937 random(seed);
+    std::uniform_real_distribution<float> any(-0.1f, 1);
+    const int rows = 1 + static_cast<int>(random() % 20);
+    const int cols = static_cast<int>(random() % 40);
+    const std::size_t pixels = static_cast<std::size_t>(rows) * cols;
+    std::vector<float> triples(3 * pixels, random() % 2 == 0 ? 0.0f : -0.0f);  // black, and then some are not
+    const std::size_t first = random() % (3 * pixels + 1);
+    for (std::size_t i = first; i < triples.size(); ++i) triples[i] = any(random);
+    const float odd[] = {0.0f, -0.0f, 1e-45f, 1e38f, -1e38f, INFINITY, NAN};
+    for (unsigned n = random() % 8; n > 0 && pixels > 0; --n) {
+      triples[random() % triples.size()] = odd[random() % std::size(odd)];
+    }
+    for (float& value : tester.prop_color_matrix_) value = any(random);
+
+    std::vector<float> xyz(3 * pixels);
+    plain::rgb2xyz(tester.prop_color_matrix_, triples.data(), pixels, xyz.data());
+    ExpectSame(xyz, Buffer(tester.rgb2xyz(triples.data(), rows, cols), &std::free).get(), seed);
+    std::vector<float> cct(pixels);
+    plain::xyz2cct(triples.data(), pixels, cct.data());
+    ExpectSame(cct, Buffer(tester.xyz2cct(triples.data(), rows, cols), &std::free).get(), seed);
+  }
 }
 
 TEST(Colour, BuffersTooLargeAreNull) {

@@ -1,8 +1,14 @@
 // Colour conversions. Single precision throughout, but where a step says double.
+//
+// The plain forms of rgb2xyz and xyz2cct, for whole buffers, are in unit_tests/plain/colour.h; these give the same
+// bits. rgb2xyz multiplies and adds four pixels at a time, each in the plain order. xyz2cct divides for a stretch of
+// pixels first, where divisions overlap, and leaves out powers that can only lead to 0.
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <cstdlib>
+#include <opencv2/core/hal/intrin.hpp>
 
 #include "qvtester/tester.h"
 
@@ -15,15 +21,17 @@ float Linear(int v) {
   return static_cast<float>(std::pow(static_cast<double>((c + 0.055f) / 1.055f), 2.4));
 }
 
-// Cool side of the Planckian locus, 0 < x <= 0.331; in double, A narrowed to float.
+// Cool side of the Planckian locus, 0 < x <= 0.331; in double, A narrowed to float. Below 0.235 A is 0, which leaves
+// 5550 K, and that is no answer.
 float CoolTemperature(float xf, float yf) {
+  if (xf < 0.235f) return 0;
   const double x = xf;
   const double y = yf;
   float a = 0;
-  if (xf >= 0.235f && xf <= 0.252f) {
+  if (xf <= 0.252f) {
     const float square = xf * xf;
     a = static_cast<float>(100000 * (1.6 * square - 0.89553 * x + 0.12932));
-  } else if (xf > 0.252f) {
+  } else {
     a = static_cast<float>(10000 * (1.8785 * (x * x) - 1.7555 * x + 0.3756));
   }
   const double s = y + 0.6886 * x - 0.3993;
@@ -43,15 +51,37 @@ float WarmTemperature(float xf, float yf) {
   return static_cast<float>(a + static_cast<double>(k) * power);
 }
 
-// Fits to either side of the pivot of 5550 K; breakpoints are held against x in single precision.
-float Temperature(float X, float Y, float Z) {
-  if (X == 0 && Y == 0 && Z == 0) return 0;
-  const float sum = X + Y + Z;
-  const float x = std::clamp(X / sum, 0.0f, 1.0f);
-  const float y = std::clamp(Y / sum, 0.0f, 1.0f);
+// Fits to either side of the pivot of 5550 K; breakpoints are held against x in single precision. Chromaticities are
+// clamped to 0 to 1, but no x beyond that is looked at further. Black pixels come as 0 / 0, and end here too.
+float Temperature(float x, float y) {
   if (!(x > 0 && x <= 0.61f)) return 0;
+  y = std::clamp(y, 0.0f, 1.0f);
   const float cct = x <= 0.331f ? CoolTemperature(x, y) : WarmTemperature(x, y);
   return cct == 5550.0f || cct <= 0 ? 0 : cct;
+}
+
+constexpr std::size_t kStretch = 64;
+
+// Of at most a stretch of pixels, into zeroed memory.
+void Temperatures(const float* xyz, std::size_t pixels, float* cct) {
+  if (std::all_of(xyz, xyz + 3 * pixels, [](float value) { return value == 0; })) return;
+  std::array<float, kStretch> x;
+  std::array<float, kStretch> y;
+  for (std::size_t i = 0; i < pixels; ++i) {
+    const float sum = xyz[3 * i] + xyz[3 * i + 1] + xyz[3 * i + 2];
+    x[i] = xyz[3 * i] / sum;
+    y[i] = xyz[3 * i + 1] / sum;
+  }
+  for (std::size_t i = 0; i < pixels; ++i) cct[i] = Temperature(x[i], y[i]);
+}
+
+using cv::v_float32x4;
+
+// A row of a matrix times four pixels: left to right, and + 0 at the end, as OpenCV's matrix product, which never gives
+// a negative zero.
+v_float32x4 Product(const float* row, const v_float32x4& red, const v_float32x4& green, const v_float32x4& blue) {
+  return cv::v_setall_f32(row[0]) * red + cv::v_setall_f32(row[1]) * green + cv::v_setall_f32(row[2]) * blue +
+         cv::v_setzero_f32();
 }
 
 float* AllocateFloats(int rows, int cols, std::size_t per_pixel) {
@@ -92,10 +122,18 @@ void QVTester::ConvertXYZ2LAB(float X, float Y, float Z, float /*Xw*/, float /*Y
 float* QVTester::rgb2xyz(float* rgb, int rows, int cols) {
   float* const xyz = AllocateFloats(rows, cols, 3);
   if (xyz == nullptr) return nullptr;
-  const float* const m = prop_color_matrix_;
-  // Left to right, and + 0 at the end: as OpenCV's matrix product, which never gives a negative zero.
   const std::size_t pixels = static_cast<std::size_t>(rows) * static_cast<std::size_t>(cols);
-  for (std::size_t i = 0; i < pixels; ++i) {
+  const float* const m = prop_color_matrix_;
+  std::size_t i = 0;
+  for (; i + 4 <= pixels; i += 4) {
+    v_float32x4 red;
+    v_float32x4 green;
+    v_float32x4 blue;
+    cv::v_load_deinterleave(rgb + 3 * i, red, green, blue);
+    cv::v_store_interleave(xyz + 3 * i, Product(m, red, green, blue), Product(m + 3, red, green, blue),
+                           Product(m + 6, red, green, blue));
+  }
+  for (; i < pixels; ++i) {
     const float* const in = rgb + 3 * i;
     float* const out = xyz + 3 * i;
     for (int k = 0; k < 3; ++k) out[k] = m[3 * k] * in[0] + m[3 * k + 1] * in[1] + m[3 * k + 2] * in[2] + 0.0f;
@@ -107,6 +145,8 @@ float* QVTester::xyz2cct(float* xyz, int rows, int cols) {
   float* const cct = AllocateFloats(rows, cols, 1);
   if (cct == nullptr) return nullptr;
   const std::size_t pixels = static_cast<std::size_t>(rows) * static_cast<std::size_t>(cols);
-  for (std::size_t i = 0; i < pixels; ++i) cct[i] = Temperature(xyz[3 * i], xyz[3 * i + 1], xyz[3 * i + 2]);
+  for (std::size_t i = 0; i < pixels; i += kStretch) {
+    Temperatures(xyz + 3 * i, std::min(kStretch, pixels - i), cct + i);
+  }
   return cct;
 }
