@@ -165,6 +165,25 @@ TEST_F(Dust, DarkPixelsAreCountedInTwoRegions) {
   EXPECT_THROW(theTester->detectMung(gray, {0, 0, 101, 10}, {0, 0, 1, 1}), cv::Exception);
 }
 
+// Work images are kept from run to run; what somebody took a hold of is not among them.
+TEST_F(Dust, FormerPicturesStayWithTheirHolders) {
+  std::vector<cv::Mat> held;
+  std::vector<cv::Mat> copies;
+  for (const int x : {100, 200, 300, 400}) {
+    const cv::Mat photo = DrawDust({{x, 300}});
+    ASSERT_EQ(1, Measure(photo));
+    EXPECT_EQ(1, Results().dust_blob_count_main_);
+    EXPECT_EQ("[" + std::to_string(x) + ",300]", Property("t82.vi0_mung_loc"));
+    ASSERT_EQ(-95, Measure(cv::Mat(480, 640, CV_16UC3, cv::Scalar::all(200))));
+    for (const cv::Mat& image : {theTester->blob_image_, theTester->DrawBlobs()}) {
+      held.push_back(image);
+      copies.push_back(image.clone());
+    }
+    EXPECT_EQ(0, theTester->blob_image_.at<uchar>(300, x)) << "the last search that succeeded";
+  }
+  for (std::size_t i = 0; i < held.size(); ++i) EXPECT_EQ(0, cv::norm(held[i], copies[i], cv::NORM_INF)) << i;
+}
+
 TEST_F(Dust, BlobsAreDrawnWhenAskedFor) {
   EXPECT_TRUE(theTester->DrawBlobs().empty());
   ASSERT_EQ(1, Measure(DrawDust({{100, 300}})));

@@ -2,6 +2,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cmath>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
@@ -33,6 +34,11 @@ class Preview : public ::testing::Test {
   static void Load(int slot, const cv::Mat& image) {
     theTester->resources_[slot] = std::make_unique<QVResource>();
     theTester->resources_[slot]->SetImage(image);
+  }
+  static cv::Mat Loaded(int slot) {
+    cv::Mat image;
+    theTester->resources_[slot]->GetImage(&image);
+    return image;
   }
   std::string Property(const std::string& key) const { return ReadFile(store_ + "/" + key); }
   static QVResultData& Results() {
@@ -81,6 +87,41 @@ TEST_F(Preview, IdenticalFramesGiveNoNumbers) {
   }
   Load(22, cv::Mat(4, 4, CV_16UC3, cv::Scalar::all(77)));
   EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_PREVIEW_2, false)) << "frames of different depths";
+}
+
+// The method's steps with a fresh picture each; a run reuses memory, and that of the former map where it fits.
+TEST_F(Preview, MapsAreThoseOfTheSteps) {
+  for (const int depth : {CV_8U, CV_8U, CV_16U, CV_32F}) {
+    for (const cv::Size size : {cv::Size(40, 30), {40, 30}, {30, 40}}) {
+      cv::Mat frames[2];
+      for (int i = 0; i < 2; ++i) {
+        frames[i].create(size, CV_MAKETYPE(depth, 3));
+        cv::randu(frames[i], 0, depth == CV_8U ? 256 : 65536);
+        Load(14 + i, frames[i]);
+      }
+      ASSERT_EQ(1, RunTest(QV_TEST_CAMERA_PREVIEW, false));
+      cv::Mat first;
+      cv::Mat second;
+      cv::cvtColor(frames[0], first, cv::COLOR_RGB2GRAY);
+      cv::cvtColor(frames[1], second, cv::COLOR_RGB2GRAY);
+      cv::Mat map;
+      cv::Mat(cv::abs(second - first)).convertTo(map, CV_32F);
+      map /= 255.0;
+      double maximum = 0;
+      cv::minMaxLoc(map, nullptr, &maximum);
+      const QVPreviewResult& result = Results().preview_main_;
+      EXPECT_EQ(static_cast<float>(cv::mean(map)[0]), result.preview_diff_mean_);
+      map /= maximum;
+      ASSERT_EQ(size, cv::Size(result.preview_diff_cols_, result.preview_diff_rows_));
+      EXPECT_TRUE(std::equal(map.begin<float>(), map.end<float>(), result.preview_diff_map_));
+      EXPECT_EQ(0, cv::norm(frames[1], Loaded(15), cv::NORM_INF)) << "the photo stays as it is";
+    }
+  }
+  const std::vector<float> before(Results().preview_main_.preview_diff_map_,
+                                  Results().preview_main_.preview_diff_map_ + 1200);
+  Load(15, cv::Mat(40, 30, CV_8UC3, cv::Scalar(1)));
+  EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_PREVIEW, false)) << "frames of different depths";
+  EXPECT_TRUE(std::equal(before.begin(), before.end(), Results().preview_main_.preview_diff_map_));
 }
 
 TEST_F(Preview, ThreeMarksArePublished) {

@@ -335,11 +335,12 @@ class QV_API QVTester {
   };
   ColorStandard standard_main_, standard_front_;
 
-  // Work images of the chart tests: kept, since new pages cost more than what is written to them. The next test
+  // Work images of the camera tests: kept, since new pages cost more than what is written to them. The next test
   // overwrites them, so nothing that is handed out shares them.
-  cv::Mat gray_, binary_;  // CV_8UC1
+  cv::Mat gray_, binary_;  // of the photo's size, one channel
+  cv::Mat upright_;        // the photo on a straightened canvas
 
-  // What the last detectBlob saw.
+  // What the last detectBlob saw; a copy that shares it stays as it is when the next one runs.
   cv::Mat blob_image_;  // CV_8UC1
   std::vector<cv::KeyPoint> blob_keypoints_;
   cv::Mat blob_drawing_;

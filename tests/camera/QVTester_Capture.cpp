@@ -40,9 +40,8 @@ Triple ToLab(QVTester& tester, const Triple& xyz, const Triple& white) {
 
 // Patches of the upright chart.
 Patches SamplePatches(QVTester& tester, const cv::Mat& photo, std::vector<cv::Point> points) {
-  cv::Mat upright;
-  tester.NormalizePatternImage(photo, points, upright);
-  return tester.GetColorPatchRGB(upright, points);
+  tester.NormalizePatternImage(photo, points, tester.upright_);
+  return tester.GetColorPatchRGB(tester.upright_, points);
 }
 
 std::vector<cv::Point> FindMarks(QVTester& tester, const cv::Mat& photo, int threshold) {

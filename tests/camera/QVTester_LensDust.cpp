@@ -75,12 +75,11 @@ int QVTester::TestLensDust(bool front, bool fake_mode) {
   cv::Mat photo;
   const int slot = front ? QV_RESOURCE_FRONT_DUST_PHOTO : QV_RESOURCE_DUST_PHOTO;
   if (const int code = FetchImage(*this, slot, photo); code != QV_SUCCESS) return code;
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
+  cv::cvtColor(photo, gray_, cv::COLOR_RGB2GRAY);
   QVDEBUGP("[%s] fake_mode: %d", "TestLensDust", fake_mode ? 1 : 0);
-  const int blob_count = fake_mode ? -1 : detectBlob(gray);
+  const int blob_count = fake_mode ? -1 : detectBlob(gray_);
 
-  const cv::Mat histogram = Histogram(gray);
+  const cv::Mat histogram = Histogram(gray_);
   auto copy = std::make_unique<int[]>(kBins);
   std::copy_n(histogram.ptr<int>(), kBins, copy.get());
   const cv::Mat& reference = front ? prop_table_0_ : prop_table_1_;
@@ -99,15 +98,15 @@ int QVTester::detectBlob(cv::Mat& gray) {
   const char* const name = "detectBlob";
   const auto mean = static_cast<float>(cv::mean(gray)[0]);
   QVDEBUGP("[%s] means: %.2f", name, mean);
-  cv::Mat bin;
-  cv::adaptiveThreshold(gray, bin, static_cast<int>(mean), cv::ADAPTIVE_THRESH_MEAN_C, cv::THRESH_BINARY, 15, 7.0);
-  draw_guide_line(bin, bin.cols, bin.rows, 0);
+  cv::adaptiveThreshold(gray, binary_, static_cast<int>(mean), cv::ADAPTIVE_THRESH_MEAN_C, cv::THRESH_BINARY, 15, 7.0);
+  draw_guide_line(binary_, binary_.cols, binary_.rows, 0);
 
   std::vector<cv::KeyPoint> keypoints;
   QVDEBUGP("[%s] dj_check1", name);
-  cv::SimpleBlobDetector::create(BlobParams())->detect(bin, keypoints);
+  cv::SimpleBlobDetector::create(BlobParams())->detect(binary_, keypoints);
   QVDEBUGP("[%s] dj_check2", name);
-  blob_image_ = bin;
+  cv::swap(blob_image_, binary_);
+  if (binary_.u != nullptr && binary_.u->refcount > 1) binary_.release();  // somebody still looks at the former one
   blob_keypoints_ = keypoints;
   blob_drawing_.release();
 
@@ -121,7 +120,7 @@ int QVTester::detectBlob(cv::Mat& gray) {
   for (std::size_t i = 0; i < keypoints.size(); ++i) {
     const cv::Point2f p = keypoints[i].pt;
     QVDEBUGP("[%s] blob(%d) point: (%.2f, %.2f)", name, static_cast<int>(i), p.x, p.y);
-    if (!isValidLocation(bin.cols, bin.rows, p)) continue;
+    if (!isValidLocation(blob_image_.cols, blob_image_.rows, p)) continue;
     QVDEBUGP("[%s] detected mung.", name);
     save_mung_location(p, step_);
     if (++saved == kMostPlaces) {

@@ -46,21 +46,27 @@ void QVTester::TestCameraPreview(bool front) {
     QVDEBUGP("[OKAPI] image size does not match");
     return;
   }
-  cv::cvtColor(first, first, cv::COLOR_RGB2GRAY);
-  cv::cvtColor(second, second, cv::COLOR_RGB2GRAY);
-  cv::Mat map;
-  cv::Mat(cv::abs(second - first)).convertTo(map, CV_32F);
-  map /= 255.0;
+  cv::cvtColor(first, gray_, cv::COLOR_RGB2GRAY);
+  cv::cvtColor(second, binary_, cv::COLOR_RGB2GRAY);
+  cv::absdiff(binary_, gray_, binary_);  // the last step that may refuse the frames: from here on the map is written
+
+  QVPreviewResult& result = front ? Results(*this).preview_front_ : Results(*this).preview_main_;
+  const bool fits = result.preview_diff_map_ != nullptr && result.preview_diff_cols_ == binary_.cols &&
+                    result.preview_diff_rows_ == binary_.rows;
+  std::unique_ptr<float[]> fresh(fits ? nullptr : new float[binary_.total()]);
+  cv::Mat map(binary_.size(), CV_32F, fits ? result.preview_diff_map_ : fresh.get());
+  binary_.convertTo(map, CV_32F, 1 / 255.0);
   double maximum = 0;
   cv::minMaxLoc(map, nullptr, &maximum);
   const auto mean = static_cast<float>(cv::mean(map)[0]);
   map /= maximum;  // identical frames give 0 / 0, and are stored so
-
-  QVPreviewResult& result = front ? Results(*this).preview_front_ : Results(*this).preview_main_;
-  auto copy = std::make_unique<float[]>(map.total());
-  std::copy_n(map.ptr<float>(), map.total(), copy.get());
-  ReleaseTestResult(front ? QV_TEST_CAMERA_PREVIEW_2 : QV_TEST_CAMERA_PREVIEW);
-  result = {map.cols, map.rows, copy.release(), mean};
+  if (!fits) {
+    ReleaseTestResult(front ? QV_TEST_CAMERA_PREVIEW_2 : QV_TEST_CAMERA_PREVIEW);
+    result.preview_diff_map_ = fresh.release();
+  }
+  result.preview_diff_cols_ = map.cols;
+  result.preview_diff_rows_ = map.rows;
+  result.preview_diff_mean_ = mean;
 }
 
 int QVTester::CheckPatternCircles(int cam_id) {
