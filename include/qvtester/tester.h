@@ -338,7 +338,6 @@ class QV_API QVTester {
   // Work images of the camera tests: kept, since new pages cost more than what is written to them. The next test
   // overwrites them, so nothing that is handed out shares them.
   cv::Mat gray_, binary_;  // of the photo's size, one channel
-  cv::Mat upright_;        // the photo on a straightened canvas
 
   // What the last detectBlob saw; a copy that shares it stays as it is when the next one runs.
   cv::Mat blob_image_;  // CV_8UC1

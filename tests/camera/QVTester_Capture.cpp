@@ -9,6 +9,8 @@
 #include "chart/chart_image.h"
 #include "chart/chart_layout.h"
 #include "chart/points.h"
+#include "chart/region_warp.h"
+#include "chart/upright.h"
 #include "core/slots.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
@@ -38,10 +40,53 @@ Triple ToLab(QVTester& tester, const Triple& xyz, const Triple& white) {
   return lab;
 }
 
-// Patches of the upright chart.
+// Half-open range of pixels about a patch's centre along one axis, or nothing where it leaves the image.
+std::optional<cv::Range> PatchRange(const char* axis, int centre, int half, int end, const char* side) {
+  const cv::Range range(centre - half, centre + half);
+  if (range.start >= 0 && range.end >= range.start && range.end <= end) return range;
+  const char* const name = "GetColorPatchRGB";
+  QVDEBUGP("[%s] %sRange.(start,end)=(%d,%d)", name, axis, range.start, range.end);
+  QVDEBUGP("[%s] %s-%s, assert!! before opencv", name, side, axis);
+  return std::nullopt;
+}
+
+// Mean colours of the patches around a chart that lies upright in a picture of this size, of which `cut` gives regions.
+template <typename Cut>
+Patches SampleGrid(QVTester& tester, const std::vector<cv::Point>& points, cv::Size size, Cut&& cut) {
+  const char* const name = "GetColorPatchRGB";
+  cv::Point p1;
+  cv::Point p2;
+  cv::Point p3;
+  tester.SortPatternPoints(points, p1, p2, p3);
+  QVDEBUGP("[%s] img.(rows,cols)=(%d,%d)", name, size.height, size.width);
+  const PatchGrid grid = PlacePatches(p1, p2, p3);
+
+  constexpr std::array<const char*, 4> kSides = {"top", "bottom", "left", "right"};
+  Patches colours;
+  for (std::size_t i = 0; i < grid.centres.size(); ++i) {
+    const char* const side = kSides[i / 6];
+    if (i % 6 == 0) QVDEBUGP("[%s] %s", name, side);
+    const auto rows = PatchRange("row", grid.centres[i].x, grid.half, size.height, side);
+    if (!rows) return colours;
+    const auto cols = PatchRange("col", grid.centres[i].y, grid.half, size.width, side);
+    if (!cols) return colours;
+    const cv::Scalar mean = cv::mean(cut(cv::Rect(cols->start, rows->start, cols->size(), rows->size())));
+    // Red, green, blue of a picture that holds blue first, whatever the grey conversions take it for.
+    colours.emplace_back(static_cast<int>(mean[2]), static_cast<int>(mean[1]), static_cast<int>(mean[0]));
+  }
+  return colours;
+}
+
+// As GetColorPatchRGB of what NormalizePatternImage gives, but only the patches are turned upright; a turn by exactly
+// 0 degrees leaves the pixels of an 8-bit photo as they are.
 Patches SamplePatches(QVTester& tester, const cv::Mat& photo, std::vector<cv::Point> points) {
-  tester.NormalizePatternImage(photo, points, tester.upright_);
-  return tester.GetColorPatchRGB(tester.upright_, points);
+  const UprightTurn turn = TurnUpright(photo.size(), tester.GetPatternAngle(points));
+  const bool upright = cv::norm(turn.map, cv::Mat::eye(2, 3, CV_64F), cv::NORM_INF) == 0;
+  CarryMarks(turn, points);
+  return SampleGrid(tester, points, turn.canvas, [&](cv::Rect patch) {
+    const bool inside = patch.br().x <= photo.cols && patch.br().y <= photo.rows;
+    return upright && inside ? photo(patch) : WarpRegion(photo, turn.map, turn.canvas, patch);
+  });
 }
 
 std::vector<cv::Point> FindMarks(QVTester& tester, const cv::Mat& photo, int threshold) {
@@ -88,16 +133,6 @@ int ExtractStandard(QVTester& tester, const cv::Mat& photo, QVTester::ColorStand
   standard.count = static_cast<int>(patches.size());
   standard.is_extracted = true;
   return QV_SUCCESS;
-}
-
-// Half-open range of pixels about a patch's centre along one axis, or nothing where it leaves the image.
-std::optional<cv::Range> PatchRange(const char* axis, int centre, int half, int end, const char* side) {
-  const cv::Range range(centre - half, centre + half);
-  if (range.start >= 0 && range.end >= range.start && range.end <= end) return range;
-  const char* const name = "GetColorPatchRGB";
-  QVDEBUGP("[%s] %sRange.(start,end)=(%d,%d)", name, axis, range.start, range.end);
-  QVDEBUGP("[%s] %s-%s, assert!! before opencv", name, side, axis);
-  return std::nullopt;
 }
 
 }  // namespace
@@ -158,26 +193,5 @@ int QVTester::TestCameraCapture(bool front) {
 }
 
 std::vector<cv::Point3i> QVTester::GetColorPatchRGB(cv::Mat image, std::vector<cv::Point> finder_points) {
-  const char* const name = "GetColorPatchRGB";
-  cv::Point p1;
-  cv::Point p2;
-  cv::Point p3;
-  SortPatternPoints(finder_points, p1, p2, p3);
-  QVDEBUGP("[%s] img.(rows,cols)=(%d,%d)", name, image.rows, image.cols);
-  const PatchGrid grid = PlacePatches(p1, p2, p3);
-
-  constexpr std::array<const char*, 4> kSides = {"top", "bottom", "left", "right"};
-  std::vector<cv::Point3i> colours;
-  for (std::size_t i = 0; i < grid.centres.size(); ++i) {
-    const char* const side = kSides[i / 6];
-    if (i % 6 == 0) QVDEBUGP("[%s] %s", name, side);
-    const auto rows = PatchRange("row", grid.centres[i].x, grid.half, image.rows, side);
-    if (!rows) return colours;
-    const auto cols = PatchRange("col", grid.centres[i].y, grid.half, image.cols, side);
-    if (!cols) return colours;
-    const cv::Scalar mean = cv::mean(image.rowRange(*rows).colRange(*cols));
-    // Red, green, blue of a picture that holds blue first, whatever the grey conversions take it for.
-    colours.emplace_back(static_cast<int>(mean[2]), static_cast<int>(mean[1]), static_cast<int>(mean[0]));
-  }
-  return colours;
+  return SampleGrid(*this, finder_points, image.size(), [&](cv::Rect patch) { return image(patch); });
 }
