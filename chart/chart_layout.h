@@ -78,8 +78,8 @@ struct ChartPatch {
   int red, green, blue;  // sRGB
 };
 
-/// Patches are sampled over D / 21 to each side of their middle. They are drawn larger by what a straightening that is a
-/// degree off moves the furthest of them.
+/// Patches are sampled over D / 21 to each side of their middle. They are drawn larger by what a straightening that is
+/// a degree off moves the furthest of them.
 inline constexpr double kPatchHalf = 470;
 
 // In sampling order: six along the top, six along the bottom, six down the left side, six down the right. The white is

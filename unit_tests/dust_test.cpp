@@ -13,7 +13,6 @@ namespace {
 
 using ::testing::Contains;
 using ::testing::ElementsAre;
-using ::testing::Not;
 
 // A plain photo with dark discs of this diameter.
 cv::Mat DrawDust(const std::vector<cv::Point>& places, int diameter = 9, int level = 180) {
