@@ -14,6 +14,7 @@
 namespace {
 
 constexpr const char* kRegionNames[] = {"vertical", "horizontal"};
+constexpr double kMostClipped = 0.01;  // of a region's pixels
 
 struct SharpnessOptions : MeasureOptions {
   std::string photo, truth;
@@ -48,6 +49,13 @@ void AddIsoFigures(Record& record, const cv::Mat& photo) {
       throw Failure(kInternalFault, "no memory for the figures of ISO 12233");
     }
     record.phase.Add(std::string("mtf50_iso_") + kRegionNames[i], iso.mtf50);
+    const cv::Mat region = upright.picture(regions[i]);
+    if (cv::countNonZero(region == 255) > kMostClipped * static_cast<double>(region.total())) {
+      record.details.push_back(
+          Format("%s: the paper of the %s region is clipped at level 255, so the edge looks sharper "
+                 "than it is; use less light or a shorter exposure",
+                 record.inputs[0].path.c_str(), kRegionNames[i]));
+    }
     if (iso.reason == nullptr) continue;
     record.details.push_back(Format("%s: no MTF50 after ISO 12233 of the %s region: %s", record.inputs[0].path.c_str(),
                                     kRegionNames[i], iso.reason));
@@ -135,13 +143,17 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
     std::vector<cv::Point2d> outline;
     for (const cv::Point2d& corner : region.outline) outline.push_back(place(corner));
     picture.Line(outline, colour, 3, true);
-    const cv::Point2d middle = (outline[0] + outline[2]) / 2;
-    picture.Text(kRegionNames[i], middle - cv::Point2d(0, 8), 16, colour, Align::kCentre, true);
+    // Off the edges: above the one region, below the other.
+    cv::Point2d label = (outline[0] + outline[2]) / 2;
+    for (const cv::Point2d& corner : outline)
+      label.y = i == 0 ? std::max(label.y, corner.y) : std::min(label.y, corner.y);
+    label.y += i == 0 ? 22 : -54;
+    picture.Text(kRegionNames[i], label, 16, colour, Align::kCentre, true);
     const auto figure = [](double value) { return std::isfinite(value) ? Format("%.3f", value) : "none"; };
-    picture.Text(Format("MTF50 %s Nyquist%s", figure(mtf50.value()).c_str(), word), middle + cv::Point2d(0, 14), 16,
+    picture.Text(Format("MTF50 %s Nyquist%s", figure(mtf50.value()).c_str(), word), label + cv::Point2d(0, 22), 16,
                  colour, Align::kCentre, true);
     const double iso = record.phase.Find(std::string("mtf50_iso_") + kRegionNames[i])->value();
-    picture.Text("ISO 12233: " + figure(iso), middle + cv::Point2d(0, 36), 16, colour, Align::kCentre, true);
+    picture.Text("ISO 12233: " + figure(iso), label + cv::Point2d(0, 44), 16, colour, Align::kCentre, true);
 
     const double left = width + 16 + static_cast<double>(i) * kPlotWidth;
     Plot profile;
