@@ -45,7 +45,7 @@ void ForEachTrial(int trials, const std::function<void(int)>& run) {
 double Quantile(std::vector<double> values, double share) {
   if (values.empty()) return NAN;
   std::sort(values.begin(), values.end());
-  return values[static_cast<std::size_t>(share * static_cast<double>(values.size() - 1) + 0.5)];
+  return values[static_cast<std::size_t>(std::lround(share * static_cast<double>(values.size() - 1)))];
 }
 
 double Mean(const std::vector<double>& values) {
@@ -534,7 +534,7 @@ void PrintDetection() {
   constexpr double kHeight = 300;
   Picture picture(static_cast<int>(3 * kWidth), static_cast<int>(2 * kHeight + 40));
   picture.Text("Share found: chart cyan, QR code yellow, ArUco marker red", {12, 26}, 16, kInk);
-  int place = 0;
+  cv::Rect2d place(0, 40, kWidth, kHeight);
   for (const Sweep& sweep : Sweeps()) {
     std::printf("\n| %s | chart | QR code | ArUco |\n|---|---|---|---|\n", sweep.axis);
     std::vector<Detections> found(sweep.values.size() * kPhotos);
@@ -567,8 +567,9 @@ void PrintDetection() {
                   100 * shares[1]);
       for (int k = 0; k < 3; ++k) plot.more_curves[k].points.emplace_back(sweep.values[i], shares[k]);
     }
-    DrawPlot(picture, plot, {place % 3 * kWidth, 40.0 + place / 3 * kHeight, kWidth, kHeight});
-    ++place;
+    DrawPlot(picture, plot, place);
+    place.x += kWidth;
+    if (place.br().x > picture.width()) place = {0, place.y + kHeight, kWidth, kHeight};
   }
   if (!curves_file.empty()) WriteWholeFile(curves_file, picture.Png());
 }
