@@ -130,15 +130,4 @@ TEST_F(CameraProgram, OnlyPublishReachesTheSharedStore) {
   EXPECT_FALSE(std::filesystem::exists(store));
 }
 
-TEST_F(CameraProgram, CastAndExposureAreWhatTheySay) {
-  const std::string photo = Simulate({"--scene", "dust", "--specks", "0", "--gain", "0.5", "--exposure", "0.5",
-                                      "--cast", "1,0.9,0.8", "--bits", "16"});
-  const cv::Mat image = cv::imread(photo, cv::IMREAD_UNCHANGED);
-  ASSERT_EQ(CV_16UC3, image.type());
-  const double white = 255 * 0.5 * std::sqrt(2.0) * 257;
-  EXPECT_NEAR(white, image.at<cv::Vec3w>(5, 5)[2], 1);
-  EXPECT_NEAR(0.9 * white, image.at<cv::Vec3w>(5, 5)[1], 1);
-  EXPECT_NEAR(0.8 * white, image.at<cv::Vec3w>(5, 5)[0], 1);
-}
-
 }  // namespace

@@ -1,35 +1,20 @@
 #include <gmock/gmock.h>
 
-#include "qvtester/api.h"
 #include "qvtester/log.h"
-#include "qvtester/tester.h"
-#include "unit_tests/drawing.h"
-#include "unit_tests/log_lines.h"
+#include "unit_tests/module_test.h"
 
 namespace {
 
 using ::testing::ElementsAre;
+using ::testing::IsSupersetOf;
 
 QV_TEST_INDEX Index(int test) { return static_cast<QV_TEST_INDEX>(test); }
 
 const char* const kRefused = "[OKAPI] Error : Invalid parameter or insufficient image";
 
-class Dispatch : public ::testing::Test {
+class Dispatch : public ModuleTest {
  protected:
-  void SetUp() override { InitTestModule(); }
-  void TearDown() override { FinalizeTestModule(); }
-
-  static void Fill(int slot) {
-    theTester->resources_[slot] = std::make_unique<QVResource>();
-    theTester->resources_[slot]->SetImage(cv::Mat(20, 20, CV_8UC3, cv::Scalar(200, 3, 7)));
-  }
-  static QVResultData* Results() {
-    QVResultData* results = nullptr;
-    EXPECT_EQ(1, GetResult(&results));
-    return results;
-  }
-
-  LogLines log_;
+  static void Fill(int slot) { Load(slot, cv::Mat(20, 20, CV_8UC3, cv::Scalar(200, 3, 7))); }
 };
 
 TEST_F(Dispatch, TestsNeedTheirSlots) {
@@ -49,26 +34,11 @@ TEST_F(Dispatch, TestsNeedTheirSlots) {
     EXPECT_EQ(-97, RunTest(Index(unknown), false));
     EXPECT_THAT(LogLines::Texts(), ElementsAre(kRefused));
   }
-}
-
-TEST_F(Dispatch, TestsWithoutARoutineAreLoggedAndRefused) {
   Fill(13);
   SetStep(4);
   const LogLines log;
-  EXPECT_EQ(-97, RunTest(Index(5), true));
+  EXPECT_EQ(-97, RunTest(Index(5), true)) << "a test without a routine";
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] RunTest, testindex: 5, fake_mode: 1, step: 4"));
-}
-
-TEST_F(Dispatch, FlashIsTheMeanOfTheFirstChannel) {
-  Fill(16);
-  Fill(23);
-  EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_FLASH, false));
-  EXPECT_EQ(200.0f, Results()->flash_mean_);
-  EXPECT_EQ(0.0f, Results()->flash_mean_vtcam_);
-  theTester->resources_[23]->SetImage(cv::Mat(1, 2, CV_8UC1, std::array<uchar, 2>{10, 15}.data()));
-  EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_FLASH_VT, false));
-  EXPECT_EQ(12.5f, Results()->flash_mean_vtcam_);
-  EXPECT_EQ(200.0f, Results()->flash_mean_);
 }
 
 TEST_F(Dispatch, ASlotWithoutAnImageIsUnusable) {
@@ -78,7 +48,7 @@ TEST_F(Dispatch, ASlotWithoutAnImageIsUnusable) {
 }
 
 TEST_F(Dispatch, RecordsOwnTheirArrays) {  // the address sanitizer sees what is freed twice or not at all
-  QVPhase1Result& record = Results()->phase1_[4];
+  QVPhase1Result& record = Results().phase1_[4];
   for (int i = 0; i < 2; ++i) {
     theTester->SetResultImage(&record, 2, 3, new unsigned char[6]{});
     theTester->SetResultRawData(&record, 4, 5, new float[20]{});
@@ -110,14 +80,17 @@ TEST_F(Dispatch, ReleasingATestsDataEmptiesItsSlots) {
 
 TEST_F(Dispatch, TheTesterOutlivesASecondInit) {
   QVTester* before = theTester;
-  setWorkingBinaryThresh(99);
+  EXPECT_EQ(1, setWorkingBinaryThresh(-99));
   Fill(17);
-  Results()->flash_mean_ = 5;
+  Results().flash_mean_ = 5;
   EXPECT_EQ(1, InitTestModule());
   EXPECT_EQ(before, theTester);
-  EXPECT_EQ(99, getWorkingBinaryThresh());
+  EXPECT_EQ(-99, getWorkingBinaryThresh());
+  EXPECT_EQ(0, SetStep(3));
+  EXPECT_THAT(LogLines::Texts(), IsSupersetOf({"setWorkingBinaryThresh value: -99", "getWorkingBinaryThresh value: -99",
+                                               "SetStep, step: 3"}));
   EXPECT_EQ(nullptr, theTester->resources_[17]);
-  EXPECT_EQ(0.0f, Results()->flash_mean_);
+  EXPECT_EQ(0.0f, Results().flash_mean_);
 }
 
 TEST_F(Dispatch, NullPointersAreRefused) {
@@ -159,17 +132,6 @@ TEST(Log, LinesAreStrippedEndedAndCut) {
   QVDEBUGP("%s", " \n ");
   QVDEBUGP("%s", "");
   EXPECT_THAT(LogLines::All(), ElementsAre("[OKAPI] value 7\r\n", "[OKAPI] \r\n", "[OKAPI] \r\n"));
-}
-
-TEST(Threshold, SettingAndReadingAreLogged) {
-  InitTestModule();
-  const LogLines log;
-  EXPECT_EQ(1, setWorkingBinaryThresh(-5));
-  EXPECT_EQ(-5, getWorkingBinaryThresh());
-  EXPECT_EQ(0, SetStep(3));
-  EXPECT_THAT(LogLines::Texts(),
-              ElementsAre("setWorkingBinaryThresh value: -5", "getWorkingBinaryThresh value: -5", "SetStep, step: 3"));
-  FinalizeTestModule();
 }
 
 }  // namespace

@@ -54,44 +54,12 @@ TEST_F(Dots, APixelIsHeldAgainstItsLocalMean) {
   EXPECT_THAT(capture.Flagged(0.03f, 2), SizeIs(25)) << "all whose window holds the dot";
 }
 
-TEST_F(Dots, WindowsAreShiftedInwardAtTheEdges) {
-  for (const cv::Point corner : {cv::Point(0, 0), {29, 0}, {0, 19}, {29, 19}}) {
-    Capture capture(20, 30, 4);
-    capture.at(corner.y, corner.x) = 8;
-    EXPECT_THAT(capture.Flagged(0.5f, 2), ElementsAre(corner));
-    // A window of its full size holds 25 pixels, so the mean is 4.16 and the dot 12/13 off; a cropped one would be
-    // 9/13.
-    EXPECT_THAT(capture.Flagged(0.92f, 2), ElementsAre(corner));
-  }
-}
-
-TEST_F(Dots, TheLimitIsStrict) {
-  Capture capture(3, 3, 1);
-  capture.at(1, 1) = 10;  // mean 2: the dot is 4 off, the others a half
-  EXPECT_THAT(capture.Flagged(4, 1), IsEmpty());
-  EXPECT_THAT(capture.Flagged(std::nextafter(4.0f, 0.0f), 1), ElementsAre(cv::Point(1, 1)));
-  EXPECT_THAT(capture.Flagged(0.5f, 1), SizeIs(1));
-  EXPECT_THAT(capture.Flagged(std::nextafter(0.5f, 0.0f), 1), SizeIs(9));
-  EXPECT_THAT(Capture(5, 5, 3).Flagged(0, 0), IsEmpty()) << "radius 0: each pixel is its own mean";
-}
-
 TEST_F(Dots, SmallPicturesAreLoggedAndLeftAlone) {
   EXPECT_THAT(Capture(4, 30, 4).Flagged(0, 2), IsEmpty());
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[DetectDot] a picture of 30 x 4 is smaller than the window of radius 2"));
   EXPECT_THAT(Capture(30, 4, 4).Flagged(0, 2), IsEmpty());
   EXPECT_THAT(Capture(5, 5, 4).Flagged(0, INT_MAX), IsEmpty());
   EXPECT_THAT(Capture(5, 5, 4).Flagged(0, -1), IsEmpty());
-}
-
-TEST_F(Dots, OddNumbersHarmOnlyTheirWindows) {
-  for (const float odd : {NAN, INFINITY}) {
-    Capture capture(20, 30, 4);
-    capture.at(3, 3) = 8;
-    capture.at(12, 20) = odd;  // every sum below and to the right of it is spoiled, those above are not
-    EXPECT_THAT(capture.Flagged(0.5f, 1), ::testing::Contains(cv::Point(3, 3)));
-  }
-  Capture zero(9, 9, 0);  // 0 / 0 compares as no departure
-  EXPECT_THAT(zero.Flagged(0.5f, 1), IsEmpty());
 }
 
 // Levels from the smallest to the largest, so that every guard of the undivided test is met.
@@ -131,13 +99,6 @@ TEST_F(Dots, AreThoseOfTheWholeTable) {
   }
   EXPECT_GT(flagged, pixels / 20) << "or the two would agree on nothing";
   EXPECT_LT(flagged, pixels / 2);
-}
-
-TEST_F(Dots, DepartureBeyondTheLargestNumberIsInfinite) {
-  const float most = 3.39e38f;
-  Capture capture(7, 38, 1);
-  for (const int row : {0, 1, 2}) capture.at(row, 34) = row == 1 ? -most : most;
-  EXPECT_THAT(capture.Flagged(100, 3), ElementsAre(cv::Point(34, 1))) << "50 means off, but no float can hold it";
 }
 
 // The dot's departure to the last bit, by bisection of the threshold: where the undivided test alone would be a few
@@ -224,23 +185,6 @@ class Areas : public ::testing::Test {
   cv::Point* bottom_right_ = nullptr;
 };
 
-TEST_F(Areas, PixelsThreeApartMergeWithinEight) {
-  Add({10, 10, 1, 1}, 2);
-  Add({13, 10, 1, 1}, 5);
-  EXPECT_EQ(1, Cluster(8));
-  EXPECT_EQ(cv::Rect(10, 10, 4, 1), Result(0));
-  EXPECT_EQ(7, counts_[0]);
-  EXPECT_THAT(areas_, ElementsAre(0));
-}
-
-TEST_F(Areas, TheyStayApartWithinTwo) {
-  Add({10, 10, 1, 1});
-  Add({13, 10, 1, 1});
-  EXPECT_EQ(2, Cluster(2));
-  EXPECT_THAT(areas_, ElementsAre(0, 1));
-  EXPECT_EQ(cv::Rect(13, 10, 1, 1), Result(1));
-}
-
 TEST_F(Areas, ChainsCollapseOverSeveralPasses) {
   // In this order no area is close to the one before it; the last joins two that are kept apart until then.
   for (const int x : {0, 20, 40, 60, 30, 10, 50}) Add({x, 40, 8, 8}, 1);
@@ -267,21 +211,11 @@ TEST_F(Areas, GrowthEndsAtTheImage) {
   EXPECT_EQ(2, Cluster(20));
 }
 
-TEST_F(Areas, WithoutCountsNothingIsCounted) {
+TEST_F(Areas, CountsAreOptional) {
   Add({10, 10, 1, 1}, 2);
   Add({11, 10, 1, 1}, 5);
   EXPECT_EQ(1, Cluster(4, false));
   EXPECT_EQ(2, counts_[0]) << "the caller's array is left alone";
-  int* none = nullptr;
-  QVTester tester;
-  areas_ = {0, 1};
-  std::free(top_left_);
-  std::free(bottom_right_);
-  top_left_ = static_cast<cv::Point*>(std::calloc(2, sizeof(cv::Point)));
-  bottom_right_ = static_cast<cv::Point*>(std::calloc(2, sizeof(cv::Point)));
-  EXPECT_EQ(1, tester.ErrorAreaClustering(4, 100, 80, &areas_, &none, &top_left_, &bottom_right_));
-  EXPECT_EQ(0, none[0]);
-  std::free(none);
 }
 
 TEST_F(Areas, FewerThanTwoAreLeftAsTheyAre) {
@@ -296,7 +230,7 @@ TEST_F(Areas, FewerThanTwoAreLeftAsTheyAre) {
 TEST_F(Areas, NoTwoOfManyAreCloseInTheEnd) {
   std::mt19937 random(4);
   int total = 0;
-  for (int i = 0; i < 10000; ++i) {
+  for (int i = 0; i < 3000; ++i) {
     Add(cv::Rect(static_cast<int>(random() % 98), static_cast<int>(random() % 78), 1, 1), i % 7);
     total += i % 7;
   }

@@ -91,31 +91,6 @@ std::vector<cv::Point2d> MarkCentres(const ChartView& view) {
   return {Place(view, 0, 0) - half, Place(view, kChartSide, 0) - half, Place(view, 0, kChartSide) - half};
 }
 
-cv::Mat DrawEdge(const EdgeView& view) {
-  constexpr int kSamples = 4;  // a side of the pixel
-  std::vector<cv::Point2d> samples;
-  for (int i = 0; i < kSamples; ++i) {
-    for (int j = 0; j < kSamples; ++j) samples.emplace_back((j + 0.5) / kSamples, (i + 0.5) / kSamples);
-  }
-  cv::Mat region(view.rows, view.cols, CV_32F);
-  const double across = std::cos(std::atan(view.slope));
-  for (int r = 0; r < view.rows; ++r) {
-    for (int c = 0; c < view.cols; ++c) {
-      double sum = 0;
-      for (const cv::Point2d& sample : samples) {
-        const double y = r + sample.y - view.rows / 2.0;
-        const double x = c + sample.x - view.cols / 2.0;
-        const double distance = (x - view.place - view.slope * y) * across;
-        sum += 0.5 * std::erfc(-distance / (view.sigma_px * std::sqrt(2.0)));
-      }
-      const double share = sum / static_cast<double>(samples.size());
-      region.at<float>(r, c) =
-          static_cast<float>(view.dark + (view.light - view.dark) * (view.dark_left ? share : 1 - share));
-    }
-  }
-  return region;
-}
-
 cv::Mat DrawEdgePhoto(const EdgePhoto& view) {
   const double angle = view.normal_deg * CV_PI / 180;
   const cv::Point2d normal(std::cos(angle), std::sin(angle));
@@ -137,6 +112,17 @@ cv::Mat DrawEdgePhoto(const EdgePhoto& view) {
     }
   }
   return photo;
+}
+
+cv::Mat DrawEdge(const EdgeView& view) {
+  EdgePhoto photo;
+  photo.size = {view.cols, view.rows};
+  photo.through = {(view.cols - 1) / 2.0 + view.place, (view.rows - 1) / 2.0};
+  photo.normal_deg = -std::atan(view.slope) * 180 / CV_PI;
+  photo.sigma_px = view.sigma_px;
+  photo.dark = view.dark_left ? view.dark : view.light;
+  photo.light = view.dark_left ? view.light : view.dark;
+  return DrawEdgePhoto(photo);
 }
 
 std::array<cv::Point2d, 4> TurnedRectangle(cv::Point2d middle, double length, double width, double turn_deg) {

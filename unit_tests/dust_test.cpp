@@ -3,11 +3,7 @@
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
-#include "qvtester/api.h"
-#include "qvtester/host_properties.h"
-#include "qvtester/tester.h"
-#include "unit_tests/drawing.h"
-#include "unit_tests/log_lines.h"
+#include "unit_tests/module_test.h"
 
 namespace {
 
@@ -21,32 +17,12 @@ cv::Mat DrawDust(const std::vector<cv::Point>& places, int diameter = 9, int lev
   return photo;
 }
 
-class Dust : public ::testing::Test {
+class Dust : public PublishingTest {
  protected:
-  void SetUp() override {
-    InitTestModule();
-    SetHostPropertyStore(store_.c_str());
-  }
-  void TearDown() override {
-    FinalizeTestModule();
-    SetHostPropertyStore(nullptr);
-  }
   static int Measure(const cv::Mat& photo, bool front = false, bool fake_mode = false) {
-    const int slot = front ? 26 : 19;
-    theTester->resources_[slot] = std::make_unique<QVResource>();
-    theTester->resources_[slot]->SetImage(photo);
+    Load(front ? 26 : 19, photo);
     return RunTest(front ? QV_TEST_LENS_DUST_2 : QV_TEST_LENS_DUST, fake_mode);
   }
-  static QVResultData& Results() {
-    QVResultData* results = nullptr;
-    GetResult(&results);
-    return *results;
-  }
-  std::string Property(const std::string& key) const { return ReadFile(store_ + "/" + key); }
-
-  TemporaryFolder folder_;
-  std::string store_ = folder_.Path("properties");
-  LogLines log_;
 };
 
 TEST_F(Dust, SpecksAreCountedAndPublished) {
@@ -79,18 +55,15 @@ TEST_F(Dust, FivePlacesAreEnough) {
 }
 
 TEST_F(Dust, OnlyTheCornersAreLeftOut) {
-  EXPECT_TRUE(theTester->isValidLocation(640, 480, {10, 300}));
-  EXPECT_TRUE(theTester->isValidLocation(640, 480, {21, 20}));
-  EXPECT_FALSE(theTester->isValidLocation(640, 480, {20, 20}));
-  EXPECT_FALSE(theTester->isValidLocation(640, 480, {10, 470}));
-  EXPECT_FALSE(theTester->isValidLocation(640, 480, {620, 460}));
-  EXPECT_TRUE(theTester->isValidLocation(640, 480, {619.5f, 460}));
+  for (const cv::Point2f inside : {cv::Point2f(10, 300), {21, 20}, {619.5f, 460}}) {
+    EXPECT_TRUE(theTester->isValidLocation(640, 480, inside)) << inside;
+  }
+  for (const cv::Point2f corner : {cv::Point2f(20, 20), {10, 470}, {620, 460}}) {
+    EXPECT_FALSE(theTester->isValidLocation(640, 480, corner)) << corner;
+  }
   EXPECT_EQ("[isValidLocation] invalid location!! x: 620.00, y: 460.00", LogLines::Texts().back());
   ASSERT_EQ(1, Measure(DrawDust({{12, 12}, {12, 240}})));
   EXPECT_EQ("[12,240]", Property("t82.vi0_mung_loc"));
-  ASSERT_EQ(1, Measure(DrawDust({{12, 12}})));
-  EXPECT_EQ(0, Results().dust_blob_count_main_);
-  EXPECT_EQ("[detectBlob] no mung.", LogLines::Texts().back());
 }
 
 TEST_F(Dust, TheSearchSeesSizesAndLevelsAsTuned) {
@@ -166,12 +139,12 @@ TEST_F(Dust, DarkPixelsAreCountedInTwoRegions) {
 
 // Work images are kept from run to run; what somebody took a hold of is not among them.
 TEST_F(Dust, FormerPicturesStayWithTheirHolders) {
+  EXPECT_TRUE(theTester->DrawBlobs().empty());
   std::vector<cv::Mat> held;
   std::vector<cv::Mat> copies;
-  for (const int x : {100, 200, 300, 400}) {
-    const cv::Mat photo = DrawDust({{x, 300}});
-    ASSERT_EQ(1, Measure(photo));
-    EXPECT_EQ(1, Results().dust_blob_count_main_);
+  for (const int x : {100, 200, 300}) {
+    ASSERT_EQ(1, Measure(DrawDust({{x, 300}})));
+    EXPECT_TRUE(theTester->blob_drawing_.empty()) << "drawn when asked for";
     EXPECT_EQ("[" + std::to_string(x) + ",300]", Property("t82.vi0_mung_loc"));
     ASSERT_EQ(-95, Measure(cv::Mat(480, 640, CV_16UC3, cv::Scalar::all(200))));
     for (const cv::Mat& image : {theTester->blob_image_, theTester->DrawBlobs()}) {
@@ -179,19 +152,11 @@ TEST_F(Dust, FormerPicturesStayWithTheirHolders) {
       copies.push_back(image.clone());
     }
     EXPECT_EQ(0, theTester->blob_image_.at<uchar>(300, x)) << "the last search that succeeded";
+    int blue = 0;
+    for (const auto& pixel : cv::Mat_<cv::Vec3b>(held.back())) blue += pixel[0] > pixel[2] + 50 ? 1 : 0;
+    EXPECT_GT(blue, 10);
   }
   for (std::size_t i = 0; i < held.size(); ++i) EXPECT_EQ(0, cv::norm(held[i], copies[i], cv::NORM_INF)) << i;
-}
-
-TEST_F(Dust, BlobsAreDrawnWhenAskedFor) {
-  EXPECT_TRUE(theTester->DrawBlobs().empty());
-  ASSERT_EQ(1, Measure(DrawDust({{100, 300}})));
-  EXPECT_TRUE(theTester->blob_drawing_.empty());
-  const cv::Mat drawing = theTester->DrawBlobs();
-  ASSERT_EQ(CV_8UC3, drawing.type());
-  int blue = 0;
-  for (const auto& pixel : cv::Mat_<cv::Vec3b>(drawing)) blue += pixel[0] > pixel[2] + 50 ? 1 : 0;
-  EXPECT_GT(blue, 10);
 }
 
 }  // namespace

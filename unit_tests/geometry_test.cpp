@@ -7,6 +7,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"
+#include "unit_tests/plain/chart_mtf.h"
 
 namespace {
 
@@ -63,62 +64,35 @@ TEST(Geometry, AnglesCountFromTheUprightChart) {
   EXPECT_THAT(angles, ElementsAre(315, 45, 135, 224));
 }
 
-TEST(Geometry, AnUprightPictureIsCopiedOntoASquare) {
+TEST(Geometry, APictureOfAnyKindIsWhatTheWarpGives) {
   QVTester tester;
-  cv::Mat image(480, 640, CV_8UC1);
-  cv::randu(image, 0, 255);
-  std::vector<cv::Point> points = {kCorner, kRight, kBelow};
-  cv::Mat upright;
-  tester.NormalizePatternImage(image, points, upright);
-  ASSERT_EQ(cv::Size(640, 640), upright.size());
-  EXPECT_EQ(0, cv::norm(image, upright.rowRange(0, 480), cv::NORM_INF));
-  EXPECT_EQ(0, cv::countNonZero(upright.rowRange(480, 640)));
-  EXPECT_THAT(points, ElementsAre(kCorner, kRight, kBelow));
-}
-
-TEST(Geometry, AnUprightPictureOfAnyKindIsWhatTheWarpGives) {
-  QVTester tester;
+  const std::vector<std::vector<cv::Point>> charts = {
+      {kCorner, kRight, kBelow}, {{300, 200}, {200, 200}, {300, 300}}, {{200, 200}, {210, 300}, {300, 190}}};
   for (const int type : {CV_8UC1, CV_8UC3, CV_8UC4, CV_16UC1, CV_16SC3, CV_32FC1}) {
     for (const cv::Size& size : {cv::Size(64, 48), cv::Size(31, 77), cv::Size(50, 50)}) {
-      cv::Mat image(size, type);
-      cv::randu(image, 0, 256);
-      if (image.depth() == CV_32F) image.at<float>(5, 5) = INFINITY;  // its neighbours become NaN
-      const int side = std::max(size.width, size.height);
-      cv::Mat expected;
-      const cv::Point2f middle(static_cast<float>(side) * 0.5f, static_cast<float>(side) * 0.5f);
-      cv::warpAffine(image, expected, cv::getRotationMatrix2D(middle, 0, 1), {side, side}, cv::INTER_LINEAR);
-      cv::Mat upright(side, side, type, cv::Scalar::all(7));  // as a picture before it would be
-      for (cv::Mat* normalized : {&upright, &image}) {
-        std::vector<cv::Point> points = {kCorner, kRight, kBelow};
-        tester.NormalizePatternImage(image, points, *normalized);
-        ASSERT_EQ(cv::Size(side, side), normalized->size());
-        const std::size_t bytes = expected.total() * expected.elemSize();
-        EXPECT_EQ(0, std::memcmp(expected.data, normalized->data, bytes)) << type << ' ' << size;
+      for (const std::vector<cv::Point>& chart : charts) {  // upright, turned by 90 degrees, by 6 the other way
+        cv::Mat image(size, type);
+        cv::randu(image, 0, 256);
+        if (image.depth() == CV_32F) image.at<float>(5, 5) = INFINITY;  // its neighbours become NaN
+        std::vector<cv::Point> expected_points = chart;
+        cv::Mat expected;
+        plain::NormalizePatternImage(tester, image, expected_points, expected);
+        cv::Mat upright(expected.size(), type, cv::Scalar::all(7));  // as a picture before it would be
+        for (cv::Mat* normalized : {&upright, &image}) {
+          std::vector<cv::Point> points = chart;
+          tester.NormalizePatternImage(image, points, *normalized);
+          ASSERT_EQ(expected.size(), normalized->size());
+          const std::size_t bytes = expected.total() * expected.elemSize();
+          EXPECT_EQ(0, std::memcmp(expected.data, normalized->data, bytes)) << type << ' ' << size;
+          EXPECT_EQ(expected_points, points);
+        }
       }
     }
   }
-  std::vector<cv::Point> points = {kCorner, kRight, kBelow};
+  std::vector<cv::Point> points = charts[0];
   cv::Mat upright;
   EXPECT_THROW(tester.NormalizePatternImage(cv::Mat(), points, upright), cv::Exception);
   EXPECT_THROW(tester.NormalizePatternImage(cv::Mat(1, SHRT_MAX, CV_8UC1), points, upright), cv::Exception);
-}
-
-TEST(Geometry, ThePictureTurnsAboutTheMiddleOfTheSquare) {
-  QVTester tester;
-  cv::Mat image(480, 640, CV_8UC1);
-  cv::randu(image, 0, 255);
-  // A chart turned by 90 degrees: it comes back about (320, 320), not about the picture's own middle.
-  std::vector<cv::Point> points = {{300, 200}, {200, 200}, {300, 300}};
-  cv::Mat upright;
-  tester.NormalizePatternImage(image, points, upright);
-  EXPECT_THAT(points, ElementsAre(cv::Point(200, 340), cv::Point(200, 440), cv::Point(300, 340)));
-  cv::Mat expected;
-  cv::warpAffine(image, expected, cv::getRotationMatrix2D({320, 320}, -90, 1), {640, 640}, cv::INTER_LINEAR);
-  EXPECT_EQ(0, cv::norm(expected, upright, cv::NORM_INF));
-  points = {{200, 200}, {210, 300}, {300, 190}};  // 6 degrees the other way
-  tester.NormalizePatternImage(image, points, upright);
-  cv::warpAffine(image, expected, cv::getRotationMatrix2D({320, 320}, 315 - 309, 1), {640, 640}, cv::INTER_LINEAR);
-  EXPECT_EQ(0, cv::norm(expected, upright, cv::NORM_INF));
 }
 
 TEST(Geometry, PointsTravelWithThePicture) {

@@ -8,48 +8,17 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
-#include "qvtester/api.h"
-#include "qvtester/host_properties.h"
-#include "qvtester/tester.h"
-#include "unit_tests/drawing.h"
-#include "unit_tests/log_lines.h"
+#include "unit_tests/module_test.h"
 
 namespace {
 
 using ::testing::Contains;
 using ::testing::ElementsAre;
 
-class Preview : public ::testing::Test {
+class Preview : public PublishingTest {
  protected:
-  void SetUp() override {
-    InitTestModule();
-    SetHostPropertyStore(store_.c_str());
-    SetHostPreviewFolder(folder_.Path("").c_str());
-  }
-  void TearDown() override {
-    FinalizeTestModule();
-    SetHostPropertyStore(nullptr);
-    SetHostPreviewFolder(nullptr);
-  }
-  static void Load(int slot, const cv::Mat& image) {
-    theTester->resources_[slot] = std::make_unique<QVResource>();
-    theTester->resources_[slot]->SetImage(image);
-  }
-  static cv::Mat Loaded(int slot) {
-    cv::Mat image;
-    theTester->resources_[slot]->GetImage(&image);
-    return image;
-  }
-  std::string Property(const std::string& key) const { return ReadFile(store_ + "/" + key); }
-  static QVResultData& Results() {
-    QVResultData* results = nullptr;
-    GetResult(&results);
-    return *results;
-  }
-
-  TemporaryFolder folder_;
-  std::string store_ = folder_.Path("properties");
-  LogLines log_;
+  Preview() { SetHostPreviewFolder(folder_.Path("").c_str()); }
+  ~Preview() override { SetHostPreviewFolder(nullptr); }
 };
 
 TEST_F(Preview, TheDifferenceIsMeasuredAndScaled) {
@@ -72,7 +41,10 @@ TEST_F(Preview, TheDifferenceIsMeasuredAndScaled) {
   const LogLines log;
   EXPECT_EQ(1, RunTest(QV_TEST_CAMERA_PREVIEW, false));
   EXPECT_EQ("[OKAPI] image size does not match", LogLines::Texts().back());
-  EXPECT_EQ(3, Results().preview_main_.preview_diff_cols_);
+  Load(15, cv::Mat(2, 3, CV_16UC3, cv::Scalar(1)));
+  EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_PREVIEW, false)) << "frames of different depths";
+  EXPECT_EQ(3, result.preview_diff_cols_);
+  EXPECT_EQ(0.5f, result.preview_diff_map_[1]);
 }
 
 TEST_F(Preview, IdenticalFramesGiveNoNumbers) {
@@ -85,8 +57,6 @@ TEST_F(Preview, IdenticalFramesGiveNoNumbers) {
     EXPECT_EQ(0.0f, result.preview_diff_mean_);
     for (int i = 0; i < 16; ++i) EXPECT_TRUE(std::isnan(result.preview_diff_map_[i]));
   }
-  Load(22, cv::Mat(4, 4, CV_16UC3, cv::Scalar::all(77)));
-  EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_PREVIEW_2, false)) << "frames of different depths";
 }
 
 // The method's steps with a fresh picture each; a run reuses memory, and that of the former map where it fits.
@@ -117,16 +87,13 @@ TEST_F(Preview, MapsAreThoseOfTheSteps) {
       EXPECT_EQ(0, cv::norm(frames[1], Loaded(15), cv::NORM_INF)) << "the photo stays as it is";
     }
   }
-  const std::vector<float> before(Results().preview_main_.preview_diff_map_,
-                                  Results().preview_main_.preview_diff_map_ + 1200);
-  Load(15, cv::Mat(40, 30, CV_8UC3, cv::Scalar(1)));
-  EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_PREVIEW, false)) << "frames of different depths";
-  EXPECT_TRUE(std::equal(before.begin(), before.end(), Results().preview_main_.preview_diff_map_));
 }
 
 TEST_F(Preview, ThreeMarksArePublished) {
   EXPECT_EQ(-98, CheckPatternCircles(0));
   Load(17, DrawChart());
+  EXPECT_EQ(1, CheckPatternCircles(1));
+  EXPECT_FALSE(std::filesystem::exists(store_)) << "another camera publishes nothing";
   EXPECT_EQ(1, CheckPatternCircles(0));
   EXPECT_EQ("3", Property("t82.vi_c_num_main"));
   EXPECT_EQ("151,151", Property("t82.vi_circle_loc_0_0"));
@@ -147,21 +114,17 @@ TEST_F(Preview, ThreeMarksArePublished) {
   EXPECT_EQ("0,0", Property("t82.vi_center_loc_0"));
   EXPECT_EQ("848,151", Property("t82.vi_circle_loc_0_2")) << "points of an earlier run are not cleared";
   EXPECT_EQ("[CheckPatternCircles]Cannot find 3Circles in Preview!!", LogLines::Texts().back());
-}
-
-TEST_F(Preview, OtherCamerasPublishNothing) {
-  Load(17, DrawChart());
-  EXPECT_EQ(1, CheckPatternCircles(1));
-  EXPECT_FALSE(std::filesystem::exists(store_));
   Load(17, cv::Mat(20, 20, CV_16UC3, cv::Scalar::all(9)));
   EXPECT_EQ(-95, CheckPatternCircles(0));
 }
 
 TEST_F(Preview, TheCentreIsTheMiddleOfTheLongestSide) {
-  std::vector<cv::Point> points = {{0, 0}, {0, 10}, {-11, 10}};
   const LogLines log;
-  EXPECT_EQ(0, theTester->GetImageCenter(points, 0));
-  EXPECT_EQ("-5,5", Property("t82.vi_center_loc_0")) << "cut toward zero";
+  const auto centre = [&](std::vector<cv::Point> points) {
+    EXPECT_EQ(0, theTester->GetImageCenter(points, 0));
+    return Property("t82.vi_center_loc_0");
+  };
+  EXPECT_EQ("-5,5", centre({{0, 0}, {0, 10}, {-11, 10}})) << "cut toward zero";
   EXPECT_THAT(
       LogLines::Texts(),
       ElementsAre("[GetImageCenter] Calculate center point number : 3, cam_id : 0",
@@ -171,21 +134,11 @@ TEST_F(Preview, TheCentreIsTheMiddleOfTheLongestSide) {
                   ": -5, final y : 10",
                   "[GetImageCenter] 2th temp_length : 14.866069, cal_length : 14.866069, x : -11, y : 10, final "
                   "x : -5, final y : 5"));
-  points = {{0, 0}, {0, 10}, {10, 10}};
-  points[2] = {0, 20};  // two sides of 10, one of 20
-  theTester->GetImageCenter(points, 0);
-  EXPECT_EQ("0,10", Property("t82.vi_center_loc_0"));
-  points = {{0, 0}, {6, 8}, {0, 16}};
-  points[2] = {-6, 8};  // 10, 12, 10
-  theTester->GetImageCenter(points, 0);
-  EXPECT_EQ("0,8", Property("t82.vi_center_loc_0"));
-  points = {{0, 0}, {0, 10}, {8, 5}, {4, 2}};
-  theTester->GetImageCenter(points, 0);
-  EXPECT_EQ("0,0", Property("t82.vi_center_loc_0")) << "four points have no centre";
+  EXPECT_EQ("0,10", centre({{0, 0}, {0, 10}, {0, 20}}));
+  EXPECT_EQ("0,8", centre({{0, 0}, {6, 8}, {0, 16}})) << "of a middle one";
+  EXPECT_EQ("0,0", centre({{0, 0}, {0, 10}, {8, 5}, {4, 2}})) << "four points have no centre";
   EXPECT_EQ("4,2", Property("t82.vi_circle_loc_0_3"));
-  points.clear();
-  EXPECT_EQ(0, theTester->GetImageCenter(points, 2));
-  EXPECT_EQ("0,0", Property("t82.vi_center_loc_2"));
+  EXPECT_EQ("0,0", centre({}));
 }
 
 TEST_F(Preview, LongKeysAreCutNotOverrun) {
@@ -219,20 +172,20 @@ TEST_F(Preview, TheStoreRefusesWhatIsNotItsOwn) {
   std::filesystem::create_directory(folder_.Path("real"));
   std::filesystem::create_directory_symlink(folder_.Path("real"), folder_.Path("link"));
   SetHostPropertyStore(folder_.Path("link").c_str());
-  Load(17, DrawChart());
-  EXPECT_EQ(1, CheckPatternCircles(0)) << "publishing is nobody's failure";
+  std::vector<cv::Point> points = {{1, 2}};
+  EXPECT_EQ(0, theTester->GetImageCenter(points, 0)) << "publishing is nobody's failure";
   EXPECT_TRUE(std::filesystem::is_empty(folder_.Path("real")));
 
   SetHostPropertyStore(store_.c_str());
-  EXPECT_EQ(1, CheckPatternCircles(0));
+  theTester->GetImageCenter(points, 0);
   struct stat status = {};
   ASSERT_EQ(0, stat(store_.c_str(), &status));
   EXPECT_EQ(0700u, status.st_mode & 0777u);
   if (geteuid() == 0) {
     ASSERT_EQ(0, chown(store_.c_str(), 12345, 12345));
-    std::filesystem::remove(store_ + "/t82.vi_c_num_main");
-    EXPECT_EQ(1, CheckPatternCircles(0));
-    EXPECT_FALSE(std::filesystem::exists(store_ + "/t82.vi_c_num_main"));
+    points = {{3, 4}};
+    theTester->GetImageCenter(points, 0);
+    EXPECT_EQ("1,2", Property("t82.vi_circle_loc_0_0"));
   }
 }
 

@@ -44,6 +44,11 @@ TEST(Properties, EveryOneKeepsItsOwnValue) {
     tester.GetProperty(Index(index), nine);
     EXPECT_THAT(nine, Each(1000u + static_cast<unsigned>(index)));
   }
+  for (const unsigned index : {64u, 65u}) {  // five coefficients, and zeros behind them
+    const unsigned own = 1000 + index;
+    tester.GetProperty(Index(static_cast<int>(index)), nine);
+    EXPECT_THAT(nine, ElementsAre(own, own, own, own, own, 0, 0, 0, 0));
+  }
 }
 
 TEST(Properties, DefaultsAreTheCalibratedOnes) {
@@ -79,16 +84,6 @@ TEST(Properties, UnknownIndicesChangeNothing) {
   EXPECT_EQ(77, untouched);
 }
 
-TEST(Properties, DistortionReadsAsNineFloatsWithZerosBehind) {
-  QVTester tester;
-  float coefficients[5] = {1, 2, 3, 4, 5};
-  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_DIST_COEFFS_0, coefficients));
-  std::array<float, 9> out;
-  out.fill(-1);
-  ASSERT_EQ(1, tester.GetProperty(QV_PROPERTY_DIST_COEFFS_0, out.data()));
-  EXPECT_THAT(out, ElementsAre(1, 2, 3, 4, 5, 0, 0, 0, 0));
-}
-
 TEST(Properties, RegionListsAreCopiedByTheirCount) {
   QVTester tester;
   EXPECT_EQ(nullptr, Get<QVRegionRecord*>(tester, 76));
@@ -121,25 +116,6 @@ TEST(Properties, TablesStayInTheCallersMemory) {
   ASSERT_EQ(1, tester.GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
   EXPECT_THAT(out, ElementsAreArray(table));
   EXPECT_TRUE(tester.prop_table_1_.empty());
-}
-
-TEST(Properties, PatchValuesRaiseTheirOwnFlag) {
-  QVTester tester;
-  std::array<float, 72> values;
-  values.fill(3);
-  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_REF_PATCH_VALUES_1, values.data()));
-  EXPECT_TRUE(tester.ref_patch_values_1_set_);
-  EXPECT_FALSE(tester.ref_patch_values_0_set_);
-  const auto held = Get<std::array<float, 72>>(tester, 91);
-  EXPECT_THAT(held, Each(3));
-}
-
-TEST(Properties, InitialisingAgainKeepsThem) {
-  QVTester tester;
-  int value = 90;
-  tester.SetProperty(QV_PROPERTY_BINARY_THR_WORKING, &value);
-  tester.Initialize();
-  EXPECT_EQ(90, Get<int>(tester, 93));
 }
 
 }  // namespace

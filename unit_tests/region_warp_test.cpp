@@ -51,25 +51,4 @@ TEST(RegionWarp, ALargePictureKeepsItsPlaces) {
   }
 }
 
-TEST(RegionWarp, RegionsAreRefusedAsTheWholesAre) {
-  const cv::Mat image(40, 50, CV_8UC1, cv::Scalar(1));
-  const cv::Mat whole(50, 50, CV_8UC1, cv::Scalar(1));
-  const auto code = [](const auto& cut) {
-    try {
-      cut();
-      return 0;
-    } catch (const cv::Exception& e) {
-      return e.code;
-    }
-  };
-  for (const cv::Rect& region : {cv::Rect(-1, 0, 10, 10), cv::Rect(0, -1, 10, 10), cv::Rect(41, 0, 10, 10),
-                                 cv::Rect(0, 41, 10, 10), cv::Rect(20, 20, -5, 5), cv::Rect(20, 20, 5, -5),
-                                 cv::Rect(60, 0, 0, 0), cv::Rect(50, 50, 0, 0), cv::Rect(3, 3, 0, 9)}) {
-    EXPECT_EQ(code([&] { return whole(region); }), code([&] {
-                return WarpRegion(image, Turn(50, 4), {50, 50}, region);
-              }))
-        << region;
-  }
-}
-
 }  // namespace

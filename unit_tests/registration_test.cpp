@@ -3,10 +3,7 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
-#include "qvtester/api.h"
-#include "qvtester/tester.h"
-#include "unit_tests/drawing.h"
-#include "unit_tests/log_lines.h"
+#include "unit_tests/module_test.h"
 
 namespace {
 
@@ -44,18 +41,10 @@ double GridError(const cv::Mat& matrix, cv::Point shift) {
   return sum / (9.0 * points);
 }
 
-TEST(Unwarp, AnIdenticalPictureComesBackItself) {
-  QVTester tester;
-  const cv::Mat scene = View(DrawScene(1), {0, 0});
-  cv::Mat unwarped;
-  ASSERT_EQ(1, tester.GetUnwarpedImage(scene, scene, unwarped));
-  EXPECT_EQ(0, cv::norm(scene, unwarped, cv::NORM_INF));
-}
-
 TEST(Unwarp, ShiftedPicturesAreBroughtBack) {
   QVTester tester;
   std::vector<double> errors;
-  for (unsigned seed = 1; seed <= 8; ++seed) {
+  for (unsigned seed = 1; seed <= 6; ++seed) {
     const cv::Mat scene = DrawScene(seed);
     const cv::Point shift(static_cast<int>(seed * 7 % 31) - 15, static_cast<int>(seed * 5 % 23) - 11);
     cv::Mat colour;
@@ -98,24 +87,21 @@ TEST(Unwarp, TooLittleToSeeIsNoRegistration) {
   EXPECT_THROW(tester.GetUnwarpedImage(scene, cv::Mat(9, 9, CV_16UC1, cv::Scalar(0)), unwarped), cv::Exception);
   EXPECT_THROW(tester.GetUnwarpedImage(cv::Mat(), scene, unwarped), cv::Exception);
   ASSERT_EQ(1, tester.GetUnwarpedImage(scene, scene, unwarped));
+  EXPECT_EQ(0, cv::norm(scene, unwarped, cv::NORM_INF)) << "an identical picture comes back itself";
   EXPECT_EQ(cv::Size(1280, 480), tester.DrawUnwarpMatches().size());
 }
 
-class ImageList : public ::testing::Test {
+class ImageList : public ModuleTest {
  protected:
-  void SetUp() override {
-    InitTestModule();
+  ImageList() {
     for (int i = 0; i < 4; ++i) {
       files_.push_back(folder_.Write(std::to_string(i) + ".png", View(scene_, {3 * i, -2 * i})));
     }
   }
-  void TearDown() override { FinalizeTestModule(); }
   static const QVTester::ImageList& Held() { return theTester->image_list_; }
 
-  TemporaryFolder folder_;
   cv::Mat scene_ = DrawScene(5);
   std::vector<std::string> files_;
-  LogLines log_;
 };
 
 TEST_F(ImageList, PicturesAreRegisteredBinarisedAndTakenApart) {

@@ -4,33 +4,21 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
-#include "qvtester/api.h"
-#include "qvtester/tester.h"
-#include "unit_tests/drawing.h"
-#include "unit_tests/log_lines.h"
+#include "unit_tests/module_test.h"
 
 namespace {
 
+using ::testing::Each;
 using ::testing::HasSubstr;
 using ::testing::SizeIs;
 
 QV_RESOURCE_INDEX Slot(int slot) { return static_cast<QV_RESOURCE_INDEX>(slot); }
 
-class Resources : public ::testing::Test {
+class Resources : public ModuleTest {
  protected:
-  void SetUp() override { InitTestModule(); }
-  void TearDown() override { FinalizeTestModule(); }
-
-  static int Load(int slot, std::string path) { return SetResource(Slot(slot), path.data()); }
+  static int LoadFile(int slot, std::string path) { return SetResource(Slot(slot), path.data()); }
   static bool Filled(int slot) { return theTester->resources_[slot] != nullptr; }
-  static cv::Mat Held(int slot) {
-    cv::Mat image;
-    theTester->resources_[slot]->GetImage(&image);
-    return image;
-  }
 
-  LogLines log_;
-  TemporaryFolder folder_;
   std::string photo_ = folder_.Write("photo.png", cv::Mat(4, 6, CV_8UC3, cv::Scalar(1, 2, 3)));
 };
 
@@ -41,7 +29,7 @@ TEST_F(Resources, EachSetterTakesItsOwnSlots) {
     EXPECT_EQ(slot >= 0 && slot <= 13 ? 1 : -97, SetHDRResource(Slot(slot), 1, 1, true, hdr)) << slot;
     EXPECT_EQ(slot >= 14 && slot <= 35 ? 1 : -97, SetLDRResource(Slot(slot), 1, 1, ldr)) << slot;
     if (slot == 34 || slot == 35) continue;  // a film's
-    EXPECT_EQ(slot >= 14 && slot <= 33 ? 1 : -97, Load(slot, photo_)) << slot;
+    EXPECT_EQ(slot >= 14 && slot <= 33 ? 1 : -97, LoadFile(slot, photo_)) << slot;
   }
 }
 
@@ -50,23 +38,28 @@ TEST_F(Resources, ImageFilesBecomeEightBitColour) {
   const std::string deep = folder_.Write("deep.png", cv::Mat(4, 6, CV_16UC3, cv::Scalar::all(0x1234)));
   const std::string alpha = folder_.Write("alpha.png", cv::Mat(4, 6, CV_8UC4, cv::Scalar::all(9)));
   for (const auto& [path, level] : {std::pair{grey, 7}, {deep, 0x12}, {alpha, 9}}) {
-    ASSERT_EQ(1, Load(20, path));
-    EXPECT_EQ(CV_8UC3, Held(20).type());
-    EXPECT_EQ(level, Held(20).at<cv::Vec3b>(0, 0)[1]);
+    ASSERT_EQ(1, LoadFile(20, path));
+    EXPECT_EQ(CV_8UC3, Loaded(20).type());
+    EXPECT_EQ(level, Loaded(20).at<cv::Vec3b>(0, 0)[1]);
   }
 }
 
-TEST_F(Resources, OrientationTagsDoNotTurnThePhoto) {
+TEST_F(Resources, OrientationTagsDoNotTurnThePhotoAndACutOneCounts) {
+  cv::Mat noise(80, 160, CV_8UC3);
+  cv::randu(noise, 0, 255);
   std::vector<uchar> jpeg;
-  cv::imencode(".jpg", cv::Mat(8, 16, CV_8UC3, cv::Scalar(90, 90, 90)), jpeg);
+  cv::imencode(".jpg", noise, jpeg);
   const unsigned char exif[] = {
       0xFF, 0xE1, 0,    34,   'E', 'x', 'i', 'f', 0, 0, 'M', 'M', 0, 42, 0, 0, 0, 8,
       0,    1,    0x01, 0x12, 0,   3,   0,   0,   0, 1, 0,   6,   0, 0,  0, 0, 0, 0};  // turn by 90 degrees
   jpeg.insert(jpeg.begin() + 2, std::begin(exif), std::end(exif));
   const std::string path = folder_.Write("turned.jpg", std::string(jpeg.begin(), jpeg.end()));
-  ASSERT_EQ(cv::Size(8, 16), cv::imread(path, cv::IMREAD_COLOR).size()) << "the tag is not understood";
-  ASSERT_EQ(1, Load(17, path));
-  EXPECT_EQ(cv::Size(16, 8), Held(17).size());
+  ASSERT_EQ(cv::Size(80, 160), cv::imread(path, cv::IMREAD_COLOR).size()) << "the tag is not understood";
+  const std::string cut = folder_.Write("cut.jpg", std::string(jpeg.begin(), jpeg.begin() + jpeg.size() / 2));
+  for (const std::string& file : {path, cut}) {
+    ASSERT_EQ(1, LoadFile(17, file));
+    EXPECT_EQ(cv::Size(160, 80), Loaded(17).size());
+  }
 }
 
 TEST_F(Resources, RefusedFilesLeaveTheSlotAndOneLine) {
@@ -75,27 +68,17 @@ TEST_F(Resources, RefusedFilesLeaveTheSlotAndOneLine) {
                                         folder_.Write("cut.png", png.substr(0, 20)),
                                         folder_.Write("words.jpg", std::string("this is no image")), folder_.Path("")};
   for (const bool filled : {false, true}) {
-    if (filled) Load(20, photo_);
+    if (filled) LoadFile(20, photo_);
     for (const std::string& path : bad) {
       const LogLines log;
-      EXPECT_EQ(-97, Load(20, path)) << path;
+      EXPECT_EQ(-97, LoadFile(20, path)) << path;
       ASSERT_THAT(LogLines::Texts(), SizeIs(1)) << path;
       EXPECT_THAT(LogLines::Texts()[0], HasSubstr(path));
       EXPECT_EQ(filled, Filled(20));
     }
-    EXPECT_EQ(-97, Load(20, folder_.Path("missing.png")));
+    EXPECT_EQ(-97, LoadFile(20, folder_.Path("missing.png")));
   }
-  EXPECT_EQ(cv::Vec3b(1, 2, 3), Held(20).at<cv::Vec3b>(3, 5));
-}
-
-TEST_F(Resources, AFileCutInItsDataCounts) {
-  cv::Mat noise(64, 64, CV_8UC3);
-  cv::randu(noise, 0, 255);
-  std::vector<uchar> jpeg;
-  cv::imencode(".jpg", noise, jpeg);
-  const std::string path = folder_.Write("half.jpg", std::string(jpeg.begin(), jpeg.begin() + jpeg.size() / 2));
-  EXPECT_EQ(1, Load(20, path));
-  EXPECT_EQ(cv::Size(64, 64), Held(20).size());
+  EXPECT_EQ(cv::Vec3b(1, 2, 3), Loaded(20).at<cv::Vec3b>(3, 5));
 }
 
 TEST_F(Resources, VideosOpenInTheirOwnSlots) {
@@ -104,14 +87,14 @@ TEST_F(Resources, VideosOpenInTheirOwnSlots) {
     cv::VideoWriter writer(path, cv::CAP_OPENCV_MJPEG, cv::VideoWriter::fourcc('M', 'J', 'P', 'G'), 10, {64, 48});
     for (int i = 0; i < 3; ++i) writer.write(cv::Mat(48, 64, CV_8UC3, cv::Scalar::all(80 * i)));
   }
-  ASSERT_EQ(1, Load(34, path));
+  ASSERT_EQ(1, LoadFile(34, path));
   cv::VideoCapture video;
   theTester->resources_[34]->GetVideo(&video);
   cv::Mat frame;
   ASSERT_TRUE(video.read(frame));
   EXPECT_EQ(cv::Size(64, 48), frame.size());
 
-  EXPECT_EQ(-97, Load(34, folder_.Write("words.avi", std::string("no film"))));
+  EXPECT_EQ(-97, LoadFile(34, folder_.Write("words.avi", std::string("no film"))));
   EXPECT_TRUE(video.read(frame)) << "the open film must go on";
   EXPECT_FALSE(Filled(35));
 }
@@ -120,33 +103,32 @@ TEST_F(Resources, PreviewFramesAreConvertedOrRefused) {
   std::vector<unsigned char> frame(640 * 720, 128);  // neutral chroma, grey luma
   std::fill_n(frame.begin(), 640 * 480, static_cast<unsigned char>(126));
   ASSERT_EQ(1, SetResource(Slot(14), 640, 480, static_cast<void*>(frame.data())));
-  EXPECT_EQ(cv::Size(640, 480), Held(14).size());
-  EXPECT_EQ(CV_8UC4, Held(14).type());
-  EXPECT_EQ(cv::Vec4b(128, 128, 128, 255), Held(14).at<cv::Vec4b>(479, 639));  // 1.164 (126 - 16)
+  EXPECT_EQ(cv::Size(640, 480), Loaded(14).size());
+  EXPECT_EQ(CV_8UC4, Loaded(14).type());
+  EXPECT_EQ(cv::Vec4b(128, 128, 128, 255), Loaded(14).at<cv::Vec4b>(479, 639));  // 1.164 (126 - 16)
 
   for (const cv::Size size : {cv::Size(639, 480), cv::Size(640, 3), cv::Size(2, INT_MAX)}) {
     EXPECT_EQ(-95, SetResource(Slot(14), size.width, size.height, static_cast<void*>(frame.data()))) << size;
     EXPECT_EQ(-95, SetResource(Slot(15), size.width, size.height, static_cast<void*>(frame.data()))) << size;
   }
-  EXPECT_EQ(cv::Size(640, 480), Held(14).size());
+  EXPECT_EQ(cv::Size(640, 480), Loaded(14).size());
   EXPECT_FALSE(Filled(15));
   EXPECT_EQ(1, SetResource(Slot(0), 2, 4, static_cast<void*>(frame.data()))) << "any slot takes a preview frame";
   EXPECT_EQ(-97, SetResource(Slot(37), 2, 4, static_cast<void*>(frame.data())));
 }
 
-TEST_F(Resources, SixteenBitImagesStayAsTheyCome) {
-  unsigned short pixels[] = {1, 2, 3, 65535, 5, 6};
-  ASSERT_EQ(1, SetLDRResource(Slot(17), 2, 1, pixels));
-  pixels[0] = 0;
-  EXPECT_EQ(CV_16UC3, Held(17).type());
-  EXPECT_EQ(cv::Vec3w(1, 2, 3), Held(17).at<cv::Vec3w>(0, 0));
-  EXPECT_EQ(cv::Vec3w(65535, 5, 6), Held(17).at<cv::Vec3w>(0, 1));
-}
+TEST_F(Resources, BuffersAreCopied) {
+  unsigned short levels[] = {1, 2, 3, 65535, 5, 6};
+  ASSERT_EQ(1, SetLDRResource(Slot(17), 2, 1, levels));
+  levels[0] = 0;
+  EXPECT_EQ(CV_16UC3, Loaded(17).type());
+  EXPECT_EQ(cv::Vec3w(1, 2, 3), Loaded(17).at<cv::Vec3w>(0, 0));
+  EXPECT_EQ(cv::Vec3w(65535, 5, 6), Loaded(17).at<cv::Vec3w>(0, 1));
 
-TEST_F(Resources, HdrBuffersAreCopied) {
   float pixels[] = {1, 2, 3, 4, 5, 6};
   ASSERT_EQ(1, SetHDRResource(Slot(5), 1, 2, true, pixels));
   pixels[5] = 0;
+  EXPECT_EQ(-99, SetHDRResource(Slot(5), INT_MAX, INT_MAX, false, pixels)) << "no product of sizes wraps";
   float* held = nullptr;
   int width = 0;
   theTester->resources_[5]->GetHDRImage(&held);
@@ -155,11 +137,6 @@ TEST_F(Resources, HdrBuffersAreCopied) {
   EXPECT_EQ(1, width);
   EXPECT_EQ(2, theTester->hdr_height_);
   EXPECT_TRUE(theTester->hdr_flag_);
-
-  EXPECT_EQ(-99, SetHDRResource(Slot(5), INT_MAX, INT_MAX, false, pixels)) << "no product of sizes wraps";
-  EXPECT_TRUE(theTester->hdr_flag_);
-  theTester->resources_[5]->GetHDRImage(&held);
-  EXPECT_EQ(1.0f, held[0]);
 }
 
 TEST_F(Resources, BadArgumentsAreRefused) {
@@ -169,15 +146,15 @@ TEST_F(Resources, BadArgumentsAreRefused) {
   EXPECT_EQ(-97, SetLDRResource(Slot(20), 1, 1, nullptr));
   EXPECT_EQ(-97, SetResource(Slot(20), nullptr));
   EXPECT_EQ(-97, SetResource(Slot(20), 2, 2, static_cast<void*>(nullptr)));
-  EXPECT_FALSE(Filled(20));
   EXPECT_EQ(-99, SetLDRResource(Slot(20), INT_MAX, INT_MAX, ldr));
   EXPECT_EQ(-99, SetLDRResource(Slot(20), 1 << 20, 1 << 20, ldr)) << "OpenCV's own out of memory";
+  EXPECT_FALSE(Filled(20));
 }
 
 TEST_F(Resources, OnlyHdrSlotsAreReleasedOneByOne) {
   float hdr[3] = {};
   ASSERT_EQ(1, SetHDRResource(Slot(5), 1, 1, false, hdr));
-  ASSERT_EQ(1, Load(20, photo_));
+  ASSERT_EQ(1, LoadFile(20, photo_));
   EXPECT_EQ(1, ReleaseImage(Slot(5)));
   EXPECT_EQ(1, ReleaseImage(Slot(5)));
   EXPECT_FALSE(Filled(5));
@@ -189,12 +166,16 @@ TEST_F(Resources, OnlyHdrSlotsAreReleasedOneByOne) {
 
 TEST_F(Resources, AStandardImageOverridesItsReferenceValues) {
   for (const auto& [slot, property] : {std::pair{18, 91}, {25, 92}}) {
-    float values[72] = {};
-    ASSERT_EQ(1, SetProperty(static_cast<QV_PROPERTY_INDEX>(91), values));
-    ASSERT_EQ(1, SetProperty(static_cast<QV_PROPERTY_INDEX>(92), values));
-    EXPECT_EQ(-97, Load(slot, folder_.Write("words.png", std::string("words"))));
+    std::array<float, 72> values;
+    for (const int index : {91, 92}) {
+      values.fill(static_cast<float>(index));
+      ASSERT_EQ(1, SetProperty(static_cast<QV_PROPERTY_INDEX>(index), values.data()));
+    }
+    GetProperty(static_cast<QV_PROPERTY_INDEX>(property), values.data());
+    EXPECT_THAT(values, Each(static_cast<float>(property)));
+    EXPECT_EQ(-97, LoadFile(slot, folder_.Write("words.png", std::string("words"))));
     EXPECT_TRUE(theTester->ref_patch_values_0_set_ && theTester->ref_patch_values_1_set_);
-    ASSERT_EQ(1, Load(slot, photo_));
+    ASSERT_EQ(1, LoadFile(slot, photo_));
     EXPECT_EQ(property == 91, theTester->ref_patch_values_0_set_);
     EXPECT_EQ(property == 92, theTester->ref_patch_values_1_set_);
   }

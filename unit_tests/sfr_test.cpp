@@ -39,7 +39,7 @@ TEST_P(KnownBlur, Mtf50LiesWithinTheLaw) {
   const double sigma = GetParam();
   for (const int cols : {100, 151}) {
     for (const double slope_deg : {3.0, 5.0, 8.0}) {
-      for (const double place : {0.0, 0.3, 2.7, -6.5}) {
+      for (const double place : {0.3, -6.5}) {
         EdgeView view;
         view.rows = 2 * cols;
         view.cols = cols;
@@ -81,49 +81,13 @@ TEST(SlantedEdge, TheAxisEndsAtNyquistForEvenWidths) {
   }
 }
 
-TEST(SlantedEdge, UprightEdgesGoThroughInfinities) {
-  EdgeView view;
-  view.slope = 0;
-  const Sfr result = Measure(DrawEdge(view));
-  const auto [low, high] = method_law::MeasuredMtf50(view.sigma_px, view.cols);
-  EXPECT_GT(result.mtf50, 0.98 * low);
-  EXPECT_LT(result.mtf50, 1.02 * high);
-}
-
-TEST(SlantedEdge, AFlatRegionGivesAnAxisAndNoFigures) {
-  for (const float level : {0.0f, 128.0f}) {
-    const Sfr result = Measure(cv::Mat(200, 60, CV_32F, cv::Scalar(level)));
-    ASSERT_EQ(31u, result.freq.size());
-    EXPECT_EQ(1.0f, result.freq.back());
-    EXPECT_FALSE(std::isfinite(result.mtf50));
-    for (const float response : result.sfr) EXPECT_FALSE(std::isfinite(response));
-  }
-}
-
-TEST(SlantedEdge, NoiseAndStripesAreSurvived) {  // slopes far beyond any array, bins outside it
-  cv::theRNG().state = 5;
-  for (int round = 0; round < 300; ++round) {
-    cv::Mat region(10 + round % 50, 5 + round % 37, CV_8UC1);
-    cv::randu(region, 0, 2 + round % 254);
-    if (round % 3 == 0) cv::repeat(region.row(0).clone(), region.rows, 1, region);
-    const Sfr result = Measure(region);
-    EXPECT_EQ(static_cast<std::size_t>(std::min(region.rows, region.cols) / 2 + 1), result.sfr.size());
-  }
-}
-
-TEST(SlantedEdge, NarrowRegionsAreAnError) {
+TEST(SlantedEdge, WithoutAnEdgeThereIsNoFigure) {
+  const Sfr flat = Measure(cv::Mat(200, 60, CV_32F, cv::Scalar(128)));
+  EXPECT_EQ(31u, flat.freq.size());
+  EXPECT_FALSE(std::isfinite(flat.mtf50));
+  for (const float response : flat.sfr) EXPECT_FALSE(std::isfinite(response));
   EXPECT_NO_THROW(Measure(cv::Mat(20, 5, CV_32F, cv::Scalar(3))));
   EXPECT_THROW(Measure(cv::Mat(20, 4, CV_32F, cv::Scalar(3))), cv::Exception);
-  EXPECT_THROW(Measure(cv::Mat()), cv::Exception);
-}
-
-TEST(SlantedEdge, Mtf50AloneIsTheSameFigure) {
-  QVTester tester;
-  float mtf50 = 0;
-  cv::Mat levels;
-  DrawEdge({}).convertTo(levels, CV_8U);
-  EXPECT_EQ(1, tester.CalculateMTF(levels, mtf50));
-  EXPECT_EQ(Measure(levels).mtf50, mtf50);
 }
 
 TEST(SfrSteps, KernelsFollowTheBrighterSide) {
@@ -158,14 +122,6 @@ TEST(SfrSteps, TheDerivativeCorrelatesAndFillsItsFirstColumn) {
   float three[] = {0.5f, 0, -0.5f};
   tester.GetFirstDerivative(rows, 2, 5, three, 3, out);  // the last column sees its neighbour mirrored
   EXPECT_THAT(Values(out), ElementsAre(0, -4, -4, -6, 0, 0, 0, 0, -1, 0));
-}
-
-TEST(SfrSteps, TheWindowLeansHalfASample) {
-  QVTester tester;
-  const auto window = Values(tester.GetAHammingWindow(4, 2.5f));  // wid = 1.5
-  EXPECT_FLOAT_EQ(static_cast<float>(0.54 + 0.46 * std::cos(2.5 * 3.141592 / 1.5)), window[0]);
-  EXPECT_FLOAT_EQ(static_cast<float>(0.54 + 0.46 * std::cos(0.5 * 3.141592 / 1.5)), window[2]);
-  EXPECT_EQ(window[2], window[3]) << "the peak lies between the third and the fourth of four";
 }
 
 TEST(SfrSteps, ShiftsMoveTheCentreToTheMiddle) {
@@ -203,27 +159,6 @@ TEST(SfrSteps, PolynomialsAreFittedLowestPowerFirst) {
         "&&(dst.cols==1)&&(dst.rows==(order+1))&&(order>=1)",
         e.err);
   }
-}
-
-TEST(SfrSteps, PixelsFallIntoBinsAlongTheEdge) {
-  QVTester tester;
-  const cv::Mat region = (cv::Mat_<float>(3, 4) << 0, 0, 8, 8, 0, 0, 8, 8, 0, 0, 0, 8);
-  // Upright: bin n is column n.
-  EXPECT_THAT(Values(tester.ProjectData(region, 0, 0, 1)), ElementsAre(0, 0, 16.0f / 3, 8));
-  // Half a column a row: row 2 falls one bin lower, row 1 stays; one bin of slant, so the window starts at bin 1.
-  EXPECT_THAT(Values(tester.ProjectData(region, 0.5f, 0, 1)), ElementsAre(0, 0, 8, 8));
-  // The other way, barely slanted: no margin, and the last column's lower rows fall outside.
-  EXPECT_THAT(Values(tester.ProjectData(region, -0.25f, 0, 1)), ElementsAre(0, 0, 8.0f / 3, 16.0f / 3));
-  // Two bins a pixel: every other one is empty and reads 0.
-  EXPECT_THAT(Values(tester.ProjectData(region.row(0), 0, 0, 2)), ElementsAre(0, 0, 0, 0, 8, 0, 8, 0));
-  for (const float steep : {NAN, INFINITY, -3e9f}) {
-    for (const float value : Values(tester.ProjectData(region, steep, 0, 1))) EXPECT_TRUE(std::isnan(value));
-  }
-}
-
-TEST(SfrSteps, ASlantWithoutEndNeedsNoMemory) {
-  QVTester tester;
-  EXPECT_EQ(4u, Values(tester.ProjectData(cv::Mat::ones(3, 4, CV_32F), 4e8f, 0, 1)).size());
 }
 
 // What a measurement gives to the last bit, any NaN as one, or the error that it ends with.
@@ -278,30 +213,21 @@ cv::Mat RandomRegion(cv::RNG& random) {
   return part;
 }
 
-TEST(SfrForms, AgreeOnGreyLevels) {
+TEST(SfrForms, AgreeOnAnyRegion) {
   cv::RNG random(7);
-  for (int round = 0; round < 3000; ++round) {
+  const float limits[] = {NAN, INFINITY, -INFINITY, 1e38f, -3e38f, 1e-38f, 1e-45f, -1, 256, 255.5f, 8388609, -0.0f};
+  for (int round = 0; round < 2500; ++round) {
     cv::Mat region = RandomRegion(random);
     cv::Mat levels;
     region.convertTo(levels, round % 7 == 0 ? CV_16U : CV_8U, round % 14 == 0 ? 200 : 1);
     ASSERT_EQ(PlainOutcome(levels), FastOutcome(levels)) << "round " << round << " " << region.size;
-    levels.convertTo(region, CV_32F);
-    ASSERT_EQ(PlainOutcome(region), FastOutcome(region)) << "round " << round << " " << region.size;
-  }
-}
-
-TEST(SfrForms, AgreeOnAnyFloats) {
-  cv::RNG random(8);
-  const float limits[] = {NAN, INFINITY, -INFINITY, 1e38f, -3e38f, 1e-38f, 1e-45f, -1, 256, 255.5f, 8388609, -0.0f};
-  for (int round = 0; round < 2000; ++round) {
-    cv::Mat region = RandomRegion(random);
-    if (round % 2 == 0) {
+    if (round % 3 == 0) {
       cv::Mat(region * std::pow(10.0, random.uniform(-44.0, 36.0))).copyTo(region);
     } else {
-      for (float& value : cv::Mat_<float>(region)) value = std::round(std::clamp(value, 0.0f, 255.0f));
-      for (int i = round % 3; i >= 0; --i) {
-        region.at<float>(random.uniform(0, region.rows), random.uniform(0, region.cols)) =
-            limits[random.uniform(0, 12)];
+      levels.convertTo(region, CV_32F);
+      for (int i = round % 3; i > 0; --i) {
+        float& any = region.at<float>(random.uniform(0, region.rows), random.uniform(0, region.cols));
+        if (round % 2 == 0) any = limits[random.uniform(0, 12)];
       }
     }
     ASSERT_EQ(PlainOutcome(region), FastOutcome(region)) << "round " << round << " " << region.size;
@@ -318,21 +244,6 @@ std::vector<std::uint32_t> Bits(const cv::Mat& matrix) {
   return bits;
 }
 
-TEST(SfrForms, TheWindowIsTheCosineToTheLastBit) {
-  QVTester tester;
-  cv::RNG random(9);
-  for (int round = 0; round < 20000; ++round) {
-    const int n = round % 20 == 0 ? random.uniform(1, 3000) : random.uniform(1, 300);
-    const float mid = round % 5 == 0 ? random.uniform(-1e3f, 3e3f) : static_cast<float>(n) * random.uniform(0.0f, 1.0f);
-    ASSERT_EQ(Bits(plain::GetAHammingWindow(n, mid)), Bits(tester.GetAHammingWindow(n, mid))) << n << " " << mid;
-  }
-  for (const float mid : {NAN, INFINITY, -INFINITY, 3e38f, -1e9f, 0.0f, 1.0f, 100.5f}) {
-    for (const int n : {1, 2, 200}) {
-      ASSERT_EQ(Bits(plain::GetAHammingWindow(n, mid)), Bits(tester.GetAHammingWindow(n, mid))) << n << " " << mid;
-    }
-  }
-}
-
 TEST(SfrForms, AgreeOnBinsOfAnySlope) {
   QVTester tester;
   cv::RNG random(10);
@@ -340,7 +251,8 @@ TEST(SfrForms, AgreeOnBinsOfAnySlope) {
   cv::randu(levels, 0, 256);
   cv::Mat region;
   levels.convertTo(region, CV_32F);
-  std::vector<float> slopes = {0, -0.0f, 1, -1, 0.5f, -0.25f, 1.0f / 3, 1e-7f, -1e-7f, 1e-38f, NAN, INFINITY};
+  std::vector<float> slopes = {0,     -0.0f,  1,      -1,   0.5f,  -0.25f, 1.0f / 3,
+                               1e-7f, -1e-7f, 1e-38f, 4e8f, -3e9f, NAN,    INFINITY};
   for (int round = 0; round < 1000; ++round) {  // from slants lost in rounding to such that no bin has its own float
     const auto size = static_cast<float>(std::pow(10.0, random.uniform(-9.0, 7.0)));
     slopes.push_back(round % 2 == 0 ? size : -size);
