@@ -43,7 +43,8 @@ TEST_F(Autofocus, AChartPhotoGivesCurvesAndFigures) {
   }
 }
 
-TEST_F(Autofocus, TwoMarksChangeNothing) {  // the fault that matters: stale numbers taken for new ones
+TEST_F(Autofocus,
+       PhotosThatCanNotBeMeasuredChangeNothing) {  // the fault that matters: stale numbers taken for new ones
   ChartView two;
   two.marks = 2;
   ASSERT_EQ(1, Measure(DrawChart()));
@@ -62,25 +63,13 @@ TEST_F(Autofocus, TwoMarksChangeNothing) {  // the fault that matters: stale num
   EXPECT_EQ(5.0f, vertical);
   EXPECT_EQ(6.0f, horizontal);
   EXPECT_EQ("CheckMTF Fail to get SFR data (Result:-91)", LogLines::Texts().back());
-}
-
-TEST_F(Autofocus, UnusablePhotosChangeNothing) {
-  ASSERT_EQ(1, Measure(DrawChart()));
-  const std::vector<float> before = Held();
-  cv::Mat deep;
-  DrawChart().convertTo(deep, CV_16U, 257);
-  cv::Mat grey;
-  cv::cvtColor(DrawChart(), grey, cv::COLOR_BGR2GRAY);
-  for (const cv::Mat& photo : {deep, grey, cv::Mat()}) EXPECT_EQ(-95, Measure(photo));
+  for (const int type : {CV_16UC3, CV_8UC1}) EXPECT_EQ(-95, Measure(cv::Mat(50, 50, type, cv::Scalar::all(0))));
+  EXPECT_EQ(-95, Measure(cv::Mat()));
   EXPECT_EQ(before, Held());
-}
 
-TEST_F(Autofocus, ReleasedResultsAreGone) {
-  ASSERT_EQ(1, Measure(DrawChart()));
   EXPECT_EQ(1, ReleaseTestResult(QV_TEST_CAMERA_AUTOFOCUS));
   EXPECT_EQ(0, Results().af_sfr_count_);
   EXPECT_EQ(nullptr, Results().af_sfr_first_);
-  EXPECT_EQ(1, Measure(DrawChart()));
 }
 
 TEST_F(Autofocus, TheMtfMeasuresAgree) {
@@ -132,7 +121,7 @@ TEST(ChartMtf, WorkImagesAndRegionsGiveWhatTheLiteralChainGives) {
   QVTester tester;  // one for all photos: what it keeps must not be seen
   const LogLines log;
   int measured = 0;
-  for (const double turn : {0.0, 2.0, 31.0, 90.0, 143.0, 200.0, 317.0, 359.0}) {
+  for (const double turn : {0.0, 31.0, 90.0, 143.0, 359.0}) {
     for (const cv::Size& size : {cv::Size(900, 700), cv::Size(640, 800), cv::Size(500, 500)}) {
       ChartView view;
       view.turn_deg = turn;
@@ -154,7 +143,7 @@ TEST(ChartMtf, WorkImagesAndRegionsGiveWhatTheLiteralChainGives) {
       EXPECT_EQ(plain[2], horizontal);
     }
   }
-  EXPECT_GT(measured, 15) << "of 22 with three marks";
+  EXPECT_GT(measured, 9) << "of 14 with three marks";
 }
 
 TEST(ChartMtf, ARegionOutsideTheUprightPictureIsTheSameError) {

@@ -1,6 +1,5 @@
 #include <gmock/gmock.h>
 
-#include "qvtester/log.h"
 #include "unit_tests/module_test.h"
 
 namespace {
@@ -124,14 +123,6 @@ TEST(WithoutATester, EveryFunctionSaysSo) {
   EXPECT_EQ(-96, getWorkingBinaryThresh());
   EXPECT_EQ(-96, GetImage(QV_RESOURCE_CHART_PHOTO, nullptr, nullptr, nullptr));
   EXPECT_EQ(-96, SaveHDRImage(QV_RESOURCE_HDR_FIRST, nullptr));
-}
-
-TEST(Log, LinesAreStrippedEndedAndCut) {
-  const LogLines log;
-  QVDEBUGP("value %d \t\n ", 7);
-  QVDEBUGP("%s", " \n ");
-  QVDEBUGP("%s", "");
-  EXPECT_THAT(LogLines::All(), ElementsAre("[OKAPI] value 7\r\n", "[OKAPI] \r\n", "[OKAPI] \r\n"));
 }
 
 }  // namespace

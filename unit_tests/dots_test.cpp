@@ -2,9 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdint>
 #include <cstdlib>
-#include <cstring>
 #include <random>
 
 #include "qvtester/tester.h"
@@ -13,8 +11,10 @@
 
 namespace {
 
+using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
+using ::testing::Not;
 using ::testing::SizeIs;
 
 // Channel 0 of a capture; the other channels must not matter.
@@ -101,35 +101,26 @@ TEST_F(Dots, AreThoseOfTheWholeTable) {
   EXPECT_LT(flagged, pixels / 2);
 }
 
-// The dot's departure to the last bit, by bisection of the threshold: where the undivided test alone would be a few
-// roundings off.
+// At the dot's departure to the last bit, where the undivided test alone would be a few roundings off.
 TEST_F(Dots, AreExactAtTheThreshold) {
   std::mt19937 random(5);
   std::uniform_real_distribution<float> any(0.5f, 1);
+  const float levels[] = {1, 40000, 1e-38f, 1e-41f};
+  const float factors[] = {1 + 3e-5f, 1.2f, 0.3f, 5, -1, 9};
   for (int round = 0; round < 300; ++round) {
     const int radius = 1 + round % 3;
-    const std::vector<float> levels = {1, 40000, 1e-38f, 1e-41f};
+    const int side = 2 * radius + 1;
     Capture capture(9, 60, levels[round % 4] * any(random));
-    const std::vector<float> factors = {1 + 3e-5f, 1.2f, 0.3f, 5, -1, 9};
     capture.at(4, 20) *= factors[round % 6] * any(random);
-    const auto plain_flags = [&](float threshold) {
-      std::vector<unsigned char> mask(9 * 60, 0);
-      plain::DetectDot(capture.data.data(), 9, 60, threshold, radius, mask.data());
-      return std::count(mask.begin(), mask.end(), 1) > 0;
-    };
-    std::int32_t flagging = 0;
-    std::int32_t silent = 0x7f800000;  // the bits of infinity
-    const auto value = [](std::int32_t bits) {
-      float number = 0;
-      std::memcpy(&number, &bits, sizeof(number));
-      return number;
-    };
-    while (silent - flagging > 1) {
-      const std::int32_t middle = flagging + (silent - flagging) / 2;
-      (plain_flags(value(middle)) ? flagging : silent) = middle;
-    }
-    EXPECT_THAT(capture.Flagged(value(flagging), radius), ::testing::Contains(cv::Point(20, 4))) << round;
-    EXPECT_THAT(capture.Flagged(value(silent), radius), IsEmpty()) << round;
+    const cv::Mat_<float> sums = plain::SumChannel0(capture.data.data(), 9, 60);
+    const cv::Point from(20 - radius, 4 - radius);
+    const cv::Point to = from + cv::Point(side, side);
+    const float mean =
+        (sums(to) + sums(from) - sums(from.y, to.x) - sums(to.y, from.x)) / static_cast<float>(side * side);
+    const float departure = std::fabs((mean - capture.at(4, 20)) / mean);
+    const cv::Point dot(20, 4);
+    EXPECT_THAT(capture.Flagged(std::nextafter(departure, 0.0f), radius), Contains(dot)) << round;
+    EXPECT_THAT(capture.Flagged(departure, radius), Not(Contains(dot))) << round;
   }
 }
 
@@ -150,39 +141,44 @@ TEST_F(Dots, HdrPicturesAreStretchedForTheEye) {
   EXPECT_EQ(0, cv::countNonZero(tester.HDR2UCHAR(constant)));
 }
 
+template <typename T>
+void Allocate(T*& array, std::size_t n) {
+  std::free(array);
+  array = static_cast<T*>(std::calloc(n, sizeof(T)));
+}
+
 // The caller's arrays, from malloc, and what comes back; the address sanitizer watches who frees them.
 class Areas : public ::testing::Test {
  protected:
   ~Areas() override {
-    std::free(counts_);
-    std::free(top_left_);
-    std::free(bottom_right_);
+    for (void* array : {static_cast<void*>(counts_), static_cast<void*>(first_), static_cast<void*>(last_)}) {
+      std::free(array);
+    }
   }
   void Add(cv::Rect area, int count = 1) { given_.emplace_back(area, count); }
   int Cluster(int distance, bool with_counts = true) {
-    const std::size_t n = given_.size();
-    areas_.resize(n);
-    counts_ = static_cast<int*>(std::malloc((n + 1) * sizeof(int)));
-    top_left_ = static_cast<cv::Point*>(std::malloc((n + 1) * sizeof(cv::Point)));
-    bottom_right_ = static_cast<cv::Point*>(std::malloc((n + 1) * sizeof(cv::Point)));
-    for (std::size_t i = 0; i < n; ++i) {
-      areas_[i] = static_cast<int>(i);
-      counts_[i] = given_[i].second;
-      top_left_[i] = given_[i].first.tl();
-      bottom_right_[i] = given_[i].first.br() - cv::Point(1, 1);
+    areas_.clear();
+    Allocate(counts_, given_.size());
+    Allocate(first_, given_.size());
+    Allocate(last_, given_.size());
+    for (const auto& [area, count] : given_) {
+      const int i = static_cast<int>(areas_.size());
+      areas_.push_back(i);
+      counts_[i] = count;
+      first_[i] = area.tl();
+      last_[i] = area.br() - cv::Point(1, 1);
     }
-    QVTester tester;
-    return tester.ErrorAreaClustering(distance, size_.width, size_.height, &areas_, with_counts ? &counts_ : nullptr,
-                                      &top_left_, &bottom_right_);
+    return QVTester().ErrorAreaClustering(distance, size_.width, size_.height, &areas_,
+                                          with_counts ? &counts_ : nullptr, &first_, &last_);
   }
-  cv::Rect Result(int i) const { return {top_left_[i], bottom_right_[i] + cv::Point(1, 1)}; }
+  cv::Rect Result(int i) const { return {first_[i], last_[i] + cv::Point(1, 1)}; }
 
   cv::Size size_ = {100, 80};
   std::vector<std::pair<cv::Rect, int>> given_;
   std::vector<int> areas_;
   int* counts_ = nullptr;
-  cv::Point* top_left_ = nullptr;
-  cv::Point* bottom_right_ = nullptr;
+  cv::Point* first_ = nullptr;
+  cv::Point* last_ = nullptr;
 };
 
 TEST_F(Areas, ChainsCollapseOverSeveralPasses) {
@@ -211,20 +207,15 @@ TEST_F(Areas, GrowthEndsAtTheImage) {
   EXPECT_EQ(2, Cluster(20));
 }
 
-TEST_F(Areas, CountsAreOptional) {
-  Add({10, 10, 1, 1}, 2);
-  Add({11, 10, 1, 1}, 5);
-  EXPECT_EQ(1, Cluster(4, false));
-  EXPECT_EQ(2, counts_[0]) << "the caller's array is left alone";
-}
-
-TEST_F(Areas, FewerThanTwoAreLeftAsTheyAre) {
+TEST_F(Areas, CountsAreOptionalAndOneAreaIsLeftAsItIs) {
   Add({10, 10, 1, 1}, 2);
   EXPECT_EQ(1, Cluster(8));
   EXPECT_EQ(2, counts_[0]);
+  Add({11, 10, 1, 1}, 5);
+  EXPECT_EQ(1, Cluster(4, false));
+  EXPECT_EQ(2, counts_[0]) << "the caller's array is left alone";
   areas_.clear();
-  QVTester tester;
-  EXPECT_EQ(0, tester.ErrorAreaClustering(8, 10, 10, &areas_, nullptr, nullptr, nullptr));
+  EXPECT_EQ(0, QVTester().ErrorAreaClustering(8, 10, 10, &areas_, nullptr, nullptr, nullptr));
 }
 
 TEST_F(Areas, NoTwoOfManyAreCloseInTheEnd) {

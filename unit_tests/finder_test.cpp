@@ -68,6 +68,37 @@ TEST(FinderRuns, TheRatioIsHalfAModuleWide) {
   }
 }
 
+TEST(CrossChecks, TheSizesMayDifferByDirection) {
+  QVTester tester;
+  const cv::Mat image = DrawMarks({40, 40}, 3, {{10, 8}});
+  // A total of 21 against a row total of 30 is 30 % off: enough for the vertical check, too much for the horizontal.
+  EXPECT_EQ(20.5f, tester.crossCheckVertical(image, 20, 18, 9, 30));
+  EXPECT_EQ(FLT_MAX, tester.crossCheckHorizontal(image, 18, 20, 9, 30));
+  EXPECT_EQ(FLT_MAX, tester.crossCheckVertical(image, 20, 18, 9, 35));  // exactly 40 %
+  EXPECT_EQ(18.5f, tester.crossCheckHorizontal(image, 18, 20, 9, 26));
+  EXPECT_FALSE(tester.crossCheckDiagonal(image, 20, 18, 9, 7)) << "twice the row's total off";
+  EXPECT_TRUE(tester.crossCheckDiagonal(image, 20, 18, 9, 8));
+}
+
+TEST(CrossChecks, ASideMayHoldMaxCountBeforeTheCoreButNotBehind) {
+  QVTester tester;
+  for (const auto& [runs, passes] : {Runs{{4, 4, 12, 3, 3}, true},
+                                     {{5, 4, 12, 3, 3}, false},
+                                     {{4, 5, 12, 3, 3}, false},
+                                     {{4, 4, 12, 4, 3}, false},
+                                     {{4, 4, 12, 3, 4}, false}}) {
+    cv::Mat column(60, 1, CV_8UC1, cv::Scalar(255));
+    int end = 10;
+    for (std::size_t i = 0; i < 5; ++i) {
+      column.rowRange(end, end + runs[i]).setTo(i % 2 == 0 ? 0 : 255);
+      end += runs[i];
+    }
+    const int core = 10 + runs[0] + runs[1] + runs[2] / 2;
+    EXPECT_EQ(passes, tester.crossCheckVertical(column, core, 0, 4, end - 10) != FLT_MAX)
+        << ::testing::PrintToString(runs);
+  }
+}
+
 TEST(CrossChecks, MarksAtTheBorderFailInsteadOfReadingOutside) {
   QVTester tester;
   const cv::Mat image = DrawMarks({40, 40}, 3, {{10, 8}});
@@ -83,6 +114,16 @@ TEST(CrossChecks, MarksAtTheBorderFailInsteadOfReadingOutside) {
   }
   EXPECT_FALSE(tester.crossCheckDiagonal(image, -1, 5, 9, 21));
   EXPECT_EQ(FLT_MAX, tester.crossCheckVertical(image, 40, 5, 9, 21));
+}
+
+TEST(FinderPoints, TheDiagonalIsAlwaysChecked) {
+  QVTester tester;
+  cv::Mat ring = DrawMarks({60, 60}, 4, {{10, 10}});
+  ASSERT_THAT(tester.GetFinderPoints(ring), SizeIs(1));
+  for (const int row : {10, 30}) {
+    for (const int column : {10, 30}) ring(cv::Rect(column, row, 8, 8)).setTo(255);
+  }
+  EXPECT_THAT(tester.GetFinderPoints(ring), IsEmpty()) << "a ring without corners";
 }
 
 TEST(FinderPoints, DrawnMarksAreFoundExactly) {
@@ -219,22 +260,6 @@ TEST(FinderPoints, TheScanByRunsEqualsTheScanByPixels) {
       ExpectPlainSearch(pictures.Disguised(image), seed);
       if (HasFatalFailure()) return;
     }
-  }
-}
-
-TEST(FinderPoints, ChartPhotosAreScannedAlikeAtAnyThreshold) {
-  const LogLines log;
-  ChartView view;
-  view.size = {700, 600};
-  view.scale = 0.06;
-  for (const double turn : {0.0, 3.0, 45.0, 118.0}) {
-    view.turn_deg = turn;
-    cv::Mat photo;
-    cv::cvtColor(DrawChart(view), photo, cv::COLOR_BGR2GRAY);
-    cv::Mat noise(photo.size(), CV_8UC1);
-    cv::randn(noise, 20, 8);
-    photo -= noise;  // specks wherever the threshold is near a grey level
-    for (int threshold = 5; threshold < 255; threshold += 10) ExpectPlainSearch(photo > threshold, threshold);
   }
 }
 

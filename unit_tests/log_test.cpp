@@ -27,6 +27,13 @@ extern "C" int __android_log_print(int priority, const char* tag, const char* fm
 
 namespace {
 
+TEST(LogLine, WhiteSpaceAtItsEndIsStripped) {
+  QVDEBUGP("value %d \t\n ", 7);
+  EXPECT_EQ("value 7\r\n", last_line);
+  QVDEBUGP("%s", " \n ");
+  EXPECT_EQ("\r\n", last_line);
+}
+
 TEST(LogLine, ItHoldsFourThousandAndNinetyThreeCharacters) {
   for (const std::size_t length : {4092u, 4093u, 4094u, 9000u}) {
     QVDEBUGP("%s", std::string(length, 'x').c_str());

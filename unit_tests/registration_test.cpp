@@ -50,28 +50,22 @@ TEST(Unwarp, ShiftedPicturesAreBroughtBack) {
     cv::Mat colour;
     cv::cvtColor(View(scene, shift), colour, cv::COLOR_GRAY2BGR);
     cv::Mat unwarped;
+    cv::theRNG().state = seed;
     ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), colour, unwarped));
+    EXPECT_EQ(seed, cv::theRNG().state) << "the caller's random numbers are left alone";
     EXPECT_EQ(cv::Size(640, 480), unwarped.size());
     EXPECT_EQ(CV_8UC3, unwarped.type());
     errors.push_back(GridError(tester.unwarp_.matrix, shift));
+    if (seed > 1) continue;
+    cv::Mat again;
+    cv::theRNG().state = 99;
+    ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), colour, again));
+    EXPECT_EQ(0, cv::norm(unwarped, again, cv::NORM_INF)) << "a search is repeatable";
   }
   // The method fixes the map by three matches: some pairs go wrong, most do not.
   std::sort(errors.begin(), errors.end());
   EXPECT_LT(errors[errors.size() / 2], 3) << ::testing::PrintToString(errors);
   EXPECT_LT(errors[errors.size() * 3 / 4 - 1], 10);
-}
-
-TEST(Unwarp, SearchesAreRepeatableAndLeaveTheCallersRandomNumbersAlone) {
-  QVTester tester;
-  const cv::Mat scene = DrawScene(3);
-  cv::Mat first;
-  cv::Mat second;
-  cv::theRNG().state = 99;
-  ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), View(scene, {9, 4}), first));
-  EXPECT_EQ(99u, cv::theRNG().state);
-  cv::theRNG().state = 7;
-  ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), View(scene, {9, 4}), second));
-  EXPECT_EQ(0, cv::norm(first, second, cv::NORM_INF));
 }
 
 TEST(Unwarp, TooLittleToSeeIsNoRegistration) {

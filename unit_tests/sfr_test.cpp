@@ -68,19 +68,6 @@ TEST(SlantedEdge, PolarityAndOrientationLeaveTheResponseAlone) {
   EXPECT_EQ(plain.mtf50, lying.mtf50);
 }
 
-TEST(SlantedEdge, TheAxisEndsAtNyquistForEvenWidths) {
-  for (const int cols : {100, 101}) {
-    EdgeView view;
-    view.cols = cols;
-    const Sfr result = Measure(DrawEdge(view));
-    ASSERT_EQ(cols / 2 + 1u, result.freq.size());
-    ASSERT_EQ(result.freq.size(), result.sfr.size());
-    EXPECT_EQ(0.0f, result.freq[0]);
-    EXPECT_EQ(1.0f, result.sfr[0]);
-    EXPECT_EQ(cols == 100 ? 1.0f : 100.0f / 101, result.freq.back());
-  }
-}
-
 TEST(SlantedEdge, WithoutAnEdgeThereIsNoFigure) {
   const Sfr flat = Measure(cv::Mat(200, 60, CV_32F, cv::Scalar(128)));
   EXPECT_EQ(31u, flat.freq.size());

@@ -31,14 +31,9 @@ TEST_F(Verify, EveryCommandsRecordIsMeasuredAgain) {
   Store({"mtf", chart}, "mtf.json");
   Store({"flash", chart, "--vt"}, "flash.json");
   Store({"capture", chart, "--standard", front, "--front"}, "capture.json");
-  Store({"dust", chart, "--reference",
-         folder_.Write("levels.txt",
-                       [] {
-                         std::string numbers;
-                         for (int i = 0; i < 256; ++i) numbers += "7 ";
-                         return numbers;
-                       }())},
-        "dust.json");
+  std::string levels;
+  for (int i = 0; i < 256; ++i) levels += "7 ";
+  Store({"dust", chart, "--reference", folder_.Write("levels.txt", levels)}, "dust.json");
   Store({"preview", front, folder_.Path("front.second.png")}, "preview.json");
   Store({"circles", chart, "--camera=2"}, "circles.json");
   Store({"register", pair, folder_.Path("pair.second.png"), "-o", folder_.Path("out.png")}, "register.json");
