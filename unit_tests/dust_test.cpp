@@ -96,12 +96,16 @@ TEST_F(Dust, HistogramsAreComparedWithTheCamerasReference) {
   reference[3] = 7;
   ASSERT_EQ(1, Measure(DrawDust({}), true));
   EXPECT_EQ(0, Results().dust_hist_diff_front_) << "no reference, no difference";
+  std::array<int, 256> out = {};
+  EXPECT_EQ(-97, GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
   SetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, reference.data());
   ASSERT_EQ(1, Measure(DrawDust({}), true));
   EXPECT_EQ(57, Results().dust_hist_diff_front_);
   reference[3] = 107;
   ASSERT_EQ(1, Measure(DrawDust({}), true));
   EXPECT_EQ(157, Results().dust_hist_diff_front_) << "the table is the caller's";
+  ASSERT_EQ(1, GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
+  EXPECT_EQ(reference, out);
   EXPECT_EQ(nullptr, Results().dust_hist_main_);
   reference.fill(INT_MIN);
   ASSERT_EQ(1, Measure(DrawDust({}), true));

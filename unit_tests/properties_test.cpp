@@ -10,7 +10,6 @@ namespace {
 
 using ::testing::Each;
 using ::testing::ElementsAre;
-using ::testing::ElementsAreArray;
 
 QV_PROPERTY_INDEX Index(int index) { return static_cast<QV_PROPERTY_INDEX>(index); }
 
@@ -102,20 +101,6 @@ TEST(Properties, RegionListsAreCopiedByTheirCount) {
   EXPECT_EQ(-97, tester.SetProperty(QV_PROPERTY_REGION_LIST_0, records));
   EXPECT_EQ(before, Get<QVRegionRecord*>(tester, 76));
   EXPECT_EQ(nullptr, Get<QVRegionRecord*>(tester, 78)) << "the other list is its own";
-}
-
-TEST(Properties, TablesStayInTheCallersMemory) {
-  QVTester tester;
-  std::array<int, 256> table = {};
-  std::array<int, 256> out;
-  out.fill(9);
-  EXPECT_EQ(-97, tester.GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
-  EXPECT_THAT(out, Each(9));
-  ASSERT_EQ(1, tester.SetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, table.data()));
-  table[255] = 42;
-  ASSERT_EQ(1, tester.GetProperty(QV_PROPERTY_FRONT_DUST_HISTOGRAM, out.data()));
-  EXPECT_THAT(out, ElementsAreArray(table));
-  EXPECT_TRUE(tester.prop_table_1_.empty());
 }
 
 }  // namespace

@@ -148,28 +148,35 @@ TEST(SfrSteps, PolynomialsAreFittedLowestPowerFirst) {
   }
 }
 
-// What a measurement gives to the last bit, any NaN as one, or the error that it ends with.
+// To the last bit, any NaN as one.
+std::vector<std::uint32_t> Bits(const std::vector<float>& values) {
+  std::vector<std::uint32_t> bits;
+  for (const float value : values) {
+    const float one_nan = std::isnan(value) ? NAN : value;
+    std::memcpy(&bits.emplace_back(), &one_nan, sizeof one_nan);
+  }
+  return bits;
+}
+
+// What a measurement gives, or the error that it ends with.
 template <typename Call>
-std::string Outcome(Call&& calculate) {
+std::vector<std::uint32_t> Outcome(Call&& calculate) {
   Sfr result;
   try {
     EXPECT_TRUE(calculate(result));
   } catch (const cv::Exception& e) {
-    return e.what();
+    return {static_cast<std::uint32_t>(e.code)};
   }
   result.sfr.push_back(result.mtf50);
-  std::string text = std::to_string(result.freq.size()) + ":";
-  for (const std::vector<float>& values : {result.freq, result.sfr}) {
-    for (const float value : values) text += cv::format(" %a", std::isnan(value) ? NAN : value);
-  }
-  return text;
+  result.sfr.insert(result.sfr.end(), result.freq.begin(), result.freq.end());
+  return Bits(result.sfr);
 }
 
-std::string FastOutcome(const cv::Mat& region) {
+std::vector<std::uint32_t> FastOutcome(const cv::Mat& region) {
   return Outcome([&](Sfr& s) { return QVTester().CalculateSFR(region, s.freq, s.sfr, s.mtf50); });
 }
 
-std::string PlainOutcome(const cv::Mat& region) {
+std::vector<std::uint32_t> PlainOutcome(const cv::Mat& region) {
   QVTester tester;
   return Outcome([&](Sfr& s) { return plain::CalculateSFR(tester, region, s.freq, s.sfr, s.mtf50); });
 }
@@ -222,15 +229,6 @@ TEST(SfrForms, AgreeOnAnyRegion) {
   EXPECT_EQ(PlainOutcome({}), FastOutcome({}));
 }
 
-std::vector<std::uint32_t> Bits(const cv::Mat& matrix) {
-  std::vector<std::uint32_t> bits;
-  for (const float value : Values(matrix)) {
-    const float one_nan = std::isnan(value) ? NAN : value;
-    std::memcpy(&bits.emplace_back(), &one_nan, sizeof one_nan);
-  }
-  return bits;
-}
-
 TEST(SfrForms, AgreeOnBinsOfAnySlope) {
   QVTester tester;
   cv::RNG random(10);
@@ -247,7 +245,8 @@ TEST(SfrForms, AgreeOnBinsOfAnySlope) {
   for (const float slope : slopes) {
     for (const int fac : {1, 2, 4}) {
       const cv::Mat part = region(cv::Rect(0, 0, random.uniform(1, 91), random.uniform(1, 301)));
-      ASSERT_EQ(Bits(plain::ProjectData(part, slope, fac)), Bits(tester.ProjectData(part, slope, 0, fac)))
+      ASSERT_EQ(Bits(Values(plain::ProjectData(part, slope, fac))),
+                Bits(Values(tester.ProjectData(part, slope, 0, fac))))
           << slope << " " << fac << " " << part.size;
     }
   }
