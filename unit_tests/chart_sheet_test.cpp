@@ -1,9 +1,7 @@
 #include <gmock/gmock.h>
 
-#include <algorithm>
 #include <cmath>
 #include <cstdlib>
-#include <numeric>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 #include <sstream>

@@ -1,9 +1,9 @@
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <climits>
 #include <cmath>
 #include <cstring>
-#include <numeric>
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"

@@ -1,8 +1,9 @@
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <cstring>
-#include <limits>
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"
