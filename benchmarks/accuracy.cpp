@@ -20,6 +20,7 @@
 #include <vector>
 
 #include "chart/chart_layout.h"
+#include "qvtester/host_properties.h"
 #include "qvtester/tester.h"
 #include "tools/chart_view.h"
 #include "tools/method_law.h"
@@ -43,6 +44,8 @@ void ForEachTrial(int trials, const std::function<void(int)>& run) {
 }
 
 double Quantile(std::vector<double> values, double share) {
+  values.erase(std::remove_if(values.begin(), values.end(), [](double value) { return std::isnan(value); }),
+               values.end());
   if (values.empty()) return NAN;
   std::sort(values.begin(), values.end());
   return values[static_cast<std::size_t>(std::lround(share * static_cast<double>(values.size() - 1)))];
@@ -86,8 +89,9 @@ Reading MeasureSharpness(const cv::Mat& photo) {
   return reading;
 }
 
-// How far outside of the law's bounds a reading lies, in percent; 0 inside.
+// How far outside of the law's bounds a reading lies, in percent; 0 inside, infinity where there is none.
 double Departure(double reading, const Json& edge) {
+  if (!std::isfinite(reading)) return INFINITY;
   const double low = edge.at("expected_low_nyquist");
   const double high = edge.at("expected_high_nyquist");
   return 100 * std::max({0.0, reading / high - 1, 1 - reading / low});
@@ -612,6 +616,8 @@ int main(int argc, char** argv) {
     }
   }
   __android_log_set_minimum_priority(ANDROID_LOG_SILENT);
+  ScratchFolder scratch;
+  SetHostPropertyStore((scratch.path() + "/properties").c_str());
   cv::setNumThreads(1);  // the trials take the cores
   for (const Section& section : kSections) {
     if (wanted.empty() || std::find(wanted.begin(), wanted.end(), section.name) != wanted.end()) section.print();

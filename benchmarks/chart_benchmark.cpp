@@ -208,7 +208,7 @@ void GetMTFFromImage(benchmark::State& state) {
     benchmark::DoNotOptimize(mtf50);
   }
 }
-BENCHMARK(GetMTFFromImage)->Arg(3);
+BENCHMARK(GetMTFFromImage)->Arg(0)->Arg(3)->Arg(29)->Arg(118);
 
 void PlainSFRFromImage(benchmark::State& state) {
   const cv::Mat& photo = ChartPhoto(static_cast<double>(state.range(0)));
@@ -243,8 +243,15 @@ const Ratios kRatios = {
     {"SFR of a photo, 3 degrees, over grey", "GetSFRFromImage/3", {"CvtColorAndThreshold"}, 2.8},
     {"SFR of a photo, 29 degrees, over grey", "GetSFRFromImage/29", {"CvtColorAndThreshold"}, 2.8},
     {"SFR of a photo, 118 degrees, over grey", "GetSFRFromImage/118", {"CvtColorAndThreshold"}, 2.8},
+    // The plain chain for the MTF50 alone is that of the SFR.
+    {"MTF50 of a photo, 0 degrees", "GetMTFFromImage/0", {"PlainSFRFromImage/0"}, 0.13},
     {"MTF50 of a photo, 3 degrees", "GetMTFFromImage/3", {"PlainSFRFromImage/3"}, 0.13},
+    {"MTF50 of a photo, 29 degrees", "GetMTFFromImage/29", {"PlainSFRFromImage/29"}, 0.13},
+    {"MTF50 of a photo, 118 degrees", "GetMTFFromImage/118", {"PlainSFRFromImage/118"}, 0.13},
+    {"MTF50 of a photo, 0 degrees, over grey", "GetMTFFromImage/0", {"CvtColorAndThreshold"}, 2.8},
     {"MTF50 of a photo, 3 degrees, over grey", "GetMTFFromImage/3", {"CvtColorAndThreshold"}, 2.8},
+    {"MTF50 of a photo, 29 degrees, over grey", "GetMTFFromImage/29", {"CvtColorAndThreshold"}, 2.8},
+    {"MTF50 of a photo, 118 degrees, over grey", "GetMTFFromImage/118", {"CvtColorAndThreshold"}, 2.8},
 };
 
 }  // namespace

@@ -36,6 +36,7 @@ class RatioReporter : public benchmark::ConsoleReporter {
       const benchmark::BenchmarkName& name = run.run_name;
       if (run.error_occurred) {
         std::fprintf(stderr, "%s: %s\n", name.str().c_str(), run.error_message.c_str());
+        failed_ = true;
       } else if (run.run_type == Run::RT_Iteration) {
         const double seconds = run.cpu_accumulated_time / static_cast<double>(run.iterations);
         times_ms_[name.args.empty() ? name.function_name : name.function_name + "/" + name.args].push_back(1e3 *
@@ -46,6 +47,8 @@ class RatioReporter : public benchmark::ConsoleReporter {
     }
     if (verbose_) ConsoleReporter::ReportRuns(shown);
   }
+
+  bool failed() const { return failed_; }
 
   void Finalize() override {
     std::printf("%-44s %10s  %-44s %10s %8s %8s\n", "row", "ms", "over", "ms", "ratio", "target");
@@ -71,6 +74,7 @@ class RatioReporter : public benchmark::ConsoleReporter {
   }
 
   bool verbose_;
+  bool failed_ = false;                                  // a benchmark could not run
   std::map<std::string, std::vector<double>> times_ms_;  // CPU time of the thread, an entry a repetition
 };
 
@@ -99,5 +103,5 @@ int main(int argc, char** argv) {
   RatioReporter reporter(verbose);
   benchmark::RunSpecifiedBenchmarks(&reporter);
   benchmark::Shutdown();
-  return 0;
+  return reporter.failed() ? 1 : 0;
 }

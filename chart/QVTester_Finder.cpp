@@ -4,7 +4,7 @@
 //   - no rows are jumped once two marks are known;
 //   - the diagonal check is always applied; vertical and horizontal checks differ in the size they allow;
 //   - the best three are chosen by module size alone, and the points come back as (row, column).
-// The search pixel by pixel, as it is described, is in unit_tests/plain/finder.h.
+// The row scan pixel by pixel, as it is described, is in unit_tests/plain/finder.h.
 
 #include <algorithm>
 #include <cfloat>

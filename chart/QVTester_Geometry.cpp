@@ -14,14 +14,6 @@ namespace {
 
 constexpr float kUprightAngle = 315.0f;
 
-bool IsIdentity(const cv::Mat& map) { return cv::norm(map, cv::Mat::eye(2, 3, CV_64F), cv::NORM_INF) == 0; }
-
-// Whether cv::warpAffine would take the picture, and pixels times 0 add nothing.
-bool CopiesWhole(const cv::Mat& image) {
-  const int depth = image.depth();
-  return (depth == CV_8U || depth == CV_16U || depth == CV_16S) && std::max(image.cols, image.rows) < SHRT_MAX;
-}
-
 void CopyOntoCanvas(const cv::Mat& image, cv::Size size, cv::Mat& canvas) {
   canvas.create(size, image.type());
   image.copyTo(canvas({0, 0, image.cols, image.rows}));
@@ -35,6 +27,12 @@ UprightTurn TurnUpright(cv::Size picture, float pattern_angle) {
   const int side = std::max(picture.width, picture.height);
   const cv::Point2f centre(static_cast<float>(side) * 0.5f, static_cast<float>(side) * 0.5f);
   return {{side, side}, cv::getRotationMatrix2D(centre, kUprightAngle - pattern_angle, 1.0)};
+}
+
+bool LeavesPixels(const UprightTurn& turn, const cv::Mat& picture) {
+  const int depth = picture.depth();
+  return cv::norm(turn.map, cv::Mat::eye(2, 3, CV_64F), cv::NORM_INF) == 0 && !picture.empty() &&
+         (depth == CV_8U || depth == CV_16U || depth == CV_16S) && std::max(picture.cols, picture.rows) < SHRT_MAX;
 }
 
 void CarryMarks(const UprightTurn& turn, std::vector<cv::Point>& marks) {
@@ -95,10 +93,11 @@ float QVTester::GetPatternAngle(std::vector<cv::Point> points) {
 }
 
 // A turn by exactly 0 degrees gives the same pixels as a copy, at a fraction of the time. Where it would not, it is
-// warped: floating-point pixels meet their neighbours times 0, and what cv::warpAffine refuses is still refused.
+// warped: floating-point pixels meet their neighbours times 0, and what cv::warpAffine refuses is still refused. The
+// plain form is in unit_tests/plain/chart_mtf.h.
 void QVTester::NormalizePatternImage(cv::Mat image, std::vector<cv::Point>& points, cv::Mat& normalized) {
   const UprightTurn turn = TurnUpright(image.size(), GetPatternAngle(points));
-  if (IsIdentity(turn.map) && !image.empty() && CopiesWhole(image)) {
+  if (LeavesPixels(turn, image)) {
     CopyOntoCanvas(image, turn.canvas, normalized);
   } else {
     cv::warpAffine(image, normalized, turn.map, turn.canvas, cv::INTER_LINEAR, cv::BORDER_CONSTANT, cv::Scalar(0));

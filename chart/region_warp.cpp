@@ -33,7 +33,7 @@ cv::Matx23d Inverse(const cv::Matx23d& m) {
 cv::Mat WarpRegion(const cv::Mat& image, const cv::Mat& map, cv::Size canvas_size, cv::Rect region) {
   CV_Assert(0 <= region.x && 0 <= region.width && region.x + region.width <= canvas_size.width && 0 <= region.y &&
             0 <= region.height && region.y + region.height <= canvas_size.height);
-  if (region.empty()) return {};
+  if (region.empty()) return {region.size(), image.type()};
   const cv::Matx23d m = Inverse(map);
   std::vector<cv::Point> columns(static_cast<std::size_t>(region.width));  // what a column adds to a row's place
   for (int j = 0; j < region.width; ++j) {

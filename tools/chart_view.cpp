@@ -115,7 +115,7 @@ ChartView LookAtChart(QVTester& tester, int threshold) {
   const cv::Point2d down = view.marks[2].centre - view.marks[0].centre;
   view.legs_ratio = cv::norm(right) / cv::norm(down);
   view.legs_angle_deg = std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI;
-  view.turn_deg = std::atan2(-right.y, right.x) * 180 / CV_PI;
+  view.turn_deg = std::atan2(0.0 - right.y, right.x) * 180 / CV_PI;  // never -0
   view.straightened_by_deg = cvRound(std::remainder(tester.GetPatternAngle(points) - 315.0, 360.0));
   return view;
 }

@@ -153,7 +153,8 @@ void Look(Record& record, const Dots& dots, const DotsOptions& options) {
         Format("%s: %d separate dots are noise, not defects; use a higher --threshold", path.c_str(), dots.spots));
   }
   if (dots.non_finite > 0) {
-    record.details.push_back(Format("%s: %d pixels are not finite; no dot is seen where a window takes one in",
+    record.cannot_judge = true;
+    record.details.push_back(Format("%s: %d pixels are not finite, and no dot is seen below and to the right of one",
                                     path.c_str(), dots.non_finite));
   }
 }
@@ -236,6 +237,7 @@ CommandBody DeclareDots(CLI::App& command) {
     Measuring m;
     m.phase = "hdr_dots";
     m.test_name = "DetectDot";
+    m.look_at = "is it a float picture of an evenly lit panel?";
     m.inputs = {{kSlot, options->picture}};
     m.load = [options](const std::string& path) {
       cv::Mat picture = ReadFloatPicture(path, options->channel);

@@ -36,6 +36,22 @@ constexpr char kFooter[] =
     "Exit status: 0 measured, within all limits; 1 measured, a limit broken; 2 wrong usage; 3 could not measure;\n"
     "4 internal fault; 130 interrupted. `qvtester COMMAND --help` shows a command's options.";
 
+// Options and their values as words of their own: "--json=FILE" and "-oFILE" taken apart.
+std::vector<std::string> Separate(const std::vector<std::string>& words) {
+  std::vector<std::string> parts;
+  for (const std::string& word : words) {
+    const std::size_t equals = word.find('=');
+    if (word.rfind("--", 0) == 0 && equals != std::string::npos) {
+      parts.insert(parts.end(), {word.substr(0, equals), word.substr(equals + 1)});
+    } else if (word.rfind("-o", 0) == 0 && word.size() > 2) {
+      parts.insert(parts.end(), {"-o", word.substr(2)});
+    } else {
+      parts.push_back(word);
+    }
+  }
+  return parts;
+}
+
 }  // namespace
 
 int RunCommand(const std::vector<std::string>& words) {
@@ -57,7 +73,7 @@ int RunCommand(const std::vector<std::string>& words) {
   } catch (const CLI::ParseError& e) {
     return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
   }
-  SetCommandLine(words);
+  SetCommandLine(Separate(words));
   const int status = body();
   if (!std::cout.flush()) throw Failure(kInternalFault, "standard output can't be written");
   return status;

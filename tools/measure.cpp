@@ -144,7 +144,8 @@ std::string Annotate(const Record& record, const Measuring& measuring) {
   return shows ? measuring.annotate(record) : std::string();
 }
 
-void CheckOutputs(const MeasureOptions& options) {
+void CheckOutputs(const MeasureOptions& options, const Measuring& measuring) {
+  for (const std::string& output : {options.json, options.annotate}) RefuseInputAsOutput(output, measuring.inputs);
   if (options.json == "-" && options.annotate == "-") {
     throw Failure(kWrongUsage, "the record and the picture: standard output takes one of them");
   }
@@ -169,14 +170,18 @@ std::string Report(const Record& record, const Measuring& measuring) {
 }
 
 // Where, why, which code, what to do about it.
-std::string MissSentence(const Record& record) {
+std::string MissSentence(const Record& record, const std::string& look_at) {
   std::string text;
   for (const std::string& sentence : record.details) text += (text.empty() ? "" : "; ") + sentence;
   if (record.phase.code == QV_SUCCESS) return text;
   // The circle check answers a miss with 0.
   const ResultCode& row = FindCode(record.phase.code == QV_DONE ? QV_ERROR_PATTERN_NOT_FOUND : record.phase.code);
   if (text.empty()) text = row.meaning;
-  return Format("%s (code %d, %s: %s); %s", text.c_str(), record.phase.code, row.name, row.meaning, row.look_at);
+  const std::string advice = look_at.empty() || row.code != QV_ERROR_INVALID_ARGUMENT ? row.look_at : look_at;
+  if (row.code != record.phase.code) {
+    return Format("%s (code %d: %s); %s", text.c_str(), record.phase.code, row.meaning, advice.c_str());
+  }
+  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name, row.meaning, advice.c_str());
 }
 
 }  // namespace
@@ -201,6 +206,15 @@ void MeasureOptions::DeclarePublishOn(CLI::App& command) {
   command.add_flag("--publish", publish, "Write the findings to the system properties that other programs read");
 }
 
+void RefuseInputAsOutput(const std::string& output, const std::vector<SlotInput>& inputs) {
+  for (const SlotInput& input : inputs) {
+    std::error_code none;
+    if (output != "-" && std::filesystem::equivalent(output, input.path, none)) {
+      throw Failure(kWrongUsage, output + ": would overwrite the photo that is measured");
+    }
+  }
+}
+
 cv::Mat SlotPhoto(QV_RESOURCE_INDEX slot) {
   cv::Mat photo;
   if (theTester->resources_[slot] != nullptr) theTester->resources_[slot]->GetImage(&photo);
@@ -223,7 +237,7 @@ std::string LimitText(const Measurement& m) {
 }
 
 int Measure(const MeasureOptions& options, const Measuring& measuring) {
-  CheckOutputs(options);
+  CheckOutputs(options, measuring);
   Record record;
   record.start_millis = MillisSinceEpoch();
   record.dut_id = options.dut;
@@ -259,7 +273,7 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
 
   const bool measured = record.phase.code == QV_SUCCESS && !record.cannot_judge;
   if (!measured) {
-    std::cerr << MissSentence(record) << '\n';
+    std::cerr << MissSentence(record, measuring.look_at) << '\n';
   } else {
     for (const std::string& sentence : record.details) std::cerr << "warning: " << sentence << '\n';
     if (record.limits.given() && !record.limited()) {

@@ -37,6 +37,7 @@ struct SlotInput {
 /// What one command adds to the common road.
 struct Measuring {
   std::string phase, test_name;
+  std::string look_at;  // advice when an input is refused, where the code's own does not fit
   std::optional<int> test_index;
   std::vector<SlotInput> inputs;
   std::function<void()> prepare;                             // before the slots are loaded
@@ -52,6 +53,9 @@ struct Measuring {
 
 /// Measures, prints, writes what was asked for, and answers the exit status.
 int Measure(const MeasureOptions& options, const Measuring& measuring);
+
+/// Throws Failure (wrong usage) when a file to be written is one that is read.
+void RefuseInputAsOutput(const std::string& output, const std::vector<SlotInput>& inputs);
 
 /// The image that a slot of the tester holds.
 cv::Mat SlotPhoto(QV_RESOURCE_INDEX slot);

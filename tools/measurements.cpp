@@ -133,7 +133,7 @@ const std::vector<Row>& Rows() {
 
       {kDustTests,
        {"blob_count", kOne, kWhole, nullptr, kBlob,
-        "Dark blobs outside the corners, counted up to five. Discs of about 5 to 16 pixels are seen."}},
+        "Dark blobs outside the corners, counted up to five. Discs of 4 to 16 pixels are seen."}},
       {kDustTests, {"blobs", kPixel, kReal, &kColumnAxis, kBlob, "Places of the counted blobs, column and row."}},
       {kDustTests,
        {"mean_level", kGreyLevel, kReal, nullptr, kBins, "Mean grey level of the photo; blobs are seen from 126 up."}},

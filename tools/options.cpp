@@ -30,17 +30,19 @@ cv::Size ParseSize(const char* option, const std::string& text) {
   return {width, height};
 }
 
-std::vector<double> ParseNumbers(const char* option, const std::string& text, std::size_t count) {
+std::vector<double> ParseNumbers(const char* option, const std::string& text, std::size_t count, double low,
+                                 double high) {
   std::vector<double> numbers;
   std::istringstream words(text);
   char comma = ',';
   for (double number = 0; comma == ',' && words >> number;) {
-    if (std::isfinite(number)) numbers.push_back(number);
+    if (number >= low && number <= high) numbers.push_back(number);
     comma = 0;
     words >> comma;
   }
   if (numbers.size() != count || !words.eof() || comma != 0) {
-    throw Failure(kWrongUsage, Format("%s %s: give %zu numbers with commas between", option, text.c_str(), count));
+    throw Failure(kWrongUsage, Format("%s %s: give %zu numbers from %g to %g with commas between", option, text.c_str(),
+                                      count, low, high));
   }
   return numbers;
 }

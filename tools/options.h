@@ -13,7 +13,8 @@ CLI::Option* AddNumber(CLI::App& command, const char* name, double& value, const
 /// "4000x3000"; throws Failure (wrong usage) that names the option.
 cv::Size ParseSize(const char* option, const std::string& text);
 
-/// "1,0.9,1": as many finite numbers as asked for; throws Failure (wrong usage) that names the option.
-std::vector<double> ParseNumbers(const char* option, const std::string& text, std::size_t count);
+/// "1,0.9,1": as many numbers from low to high as asked for; throws Failure (wrong usage) that names the option.
+std::vector<double> ParseNumbers(const char* option, const std::string& text, std::size_t count, double low,
+                                 double high);
 
 #endif  // QVTESTER_TOOLS_OPTIONS_H_

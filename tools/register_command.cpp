@@ -70,10 +70,11 @@ void Look(Record& record) {
   const double stretch = record.phase.Find("stretch")->value();
   if (agreeing >= kLeastAgreeing * good && agreeing > 3 && stretch <= kMostStretch) return;
   record.doubtful = true;
+  const std::string shape = stretch < 1000 ? Format("stretches the picture by %.2f", stretch) : "folds it to a line";
   record.details.push_back(
-      Format("%s: doubtful: %.0f of %.0f good matches agree with the map, which stretches the "
-             "picture by %.2f; one of the three matches that make it may be false",
-             record.inputs[1].path.c_str(), agreeing, good, stretch));
+      Format("%s: doubtful: %.0f of %.0f good matches agree with the map, which %s; one of the "
+             "three matches that make it may be false",
+             record.inputs[1].path.c_str(), agreeing, good, shape.c_str()));
 }
 
 std::string Report(const Record& record) {
@@ -133,9 +134,15 @@ CommandBody DeclareRegister(CLI::App& command) {
     m.look = Look;
     m.report = Report;
     m.annotate = [](const Record& /*record*/) { return Png(theTester->DrawUnwarpMatches()); };
+    RefuseInputAsOutput(options->output, m.inputs);
     const int status = Measure(*options, m);
-    if (!options->output.empty() && !unwarped->empty())
+    if (options->output.empty()) return status;
+    if (unwarped->empty()) {
+      std::error_code ignored;
+      std::filesystem::remove(options->output, ignored);  // one of an earlier run would be taken for this run's
+    } else {
       WriteWholeFile(options->output, Encode(*unwarped, options->output));
+    }
     return status;
   };
 }

@@ -42,11 +42,11 @@ std::string Encode(const cv::Mat& photo, const Output& output) {
   if (is_hdr && extension != ".exr" && extension != ".tif" && extension != ".tiff" && extension != ".pfm") {
     throw Failure(kWrongUsage, output.path + ": floats are kept without loss in an .exr, .tif or .pfm file");
   }
-  if (extension == ".nv21") return Nv21(photo);
   const bool takes_16_bits = extension == ".png" || extension == ".tif" || extension == ".tiff";
   if (photo.depth() == CV_16U && !takes_16_bits) {
     throw Failure(kWrongUsage, output.path + ": 16 bits a channel need a .png or .tif file");
   }
+  if (extension == ".nv21") return Nv21(photo);
   std::vector<uchar> file;
   try {
     // Fast compression: noise does not compress anyway. A float TIFF would be written as LogLuv unless told not to.
@@ -80,7 +80,13 @@ void DeclareCamera(CLI::App& command, CameraModel& c) {
   AddNumber(command, "--shading", c.shading_percent, "How much darker the photo's corners are [0]", 0, 100, "PERCENT");
   AddNumber(command, "--noise", c.noise_percent, "Read noise, standard deviation, of 255 [0]", 0, 100, "PERCENT");
   AddNumber(command, "--full-well", c.full_well, "Electrons at level 255, for shot noise; 0 for none [0]", 0, 1e9, "N");
-  command.add_option("--seed", c.seed, "Seed of the noise [1]")->type_name("N");
+  command.add_option("--seed", c.seed, "Seed of the noise [1]")
+      ->check([](const std::string& text) {
+        const bool whole =
+            !text.empty() && text.size() < 19 && text.find_first_not_of("0123456789") == std::string::npos;
+        return whole ? std::string() : text + " is no whole number of up to 18 digits";
+      })
+      ->type_name("N");
 }
 
 }  // namespace
@@ -94,7 +100,7 @@ CommandBody DeclareSimulate(CLI::App& command) {
   command
       .add_option("-o,--output", o->output.path,
                   "Photo to write: .png, .jpg, .bmp, .tif, or .nv21 for a raw preview frame; .exr, .tif or .pfm for "
-                  "hdr; - is standard output, as PNG or PFM. Its truth goes beside it, to PHOTO.truth.json")
+                  "hdr; - is standard output, as PNG or PFM. Its truth goes beside it: that of p.png to p.truth.json")
       ->required()
       ->type_name("PHOTO");
   command
@@ -116,7 +122,8 @@ CommandBody DeclareSimulate(CLI::App& command) {
       ->check(CLI::IsMember({"auto", "fine", "medium", "coarse"}))
       ->type_name("SIZE");
   command
-      .add_option("--motion", o->motion, "preview, pair: way of the scene to the second photo, PHOTO.second.png [4,0]")
+      .add_option("--motion", o->motion,
+                  "preview, pair: way of the scene to the second photo, p.second.png beside p.png [4,0]")
       ->type_name("DX,DY");
   command.add_option("--specks", o->specks, "dust: number of specks [5]")->check(CLI::Range(0, 1000))->type_name("N");
   AddNumber(command, "--speck-size", o->speck_px, "dust: diameter of a speck [10]", 0.5, 500, "PX");
@@ -143,9 +150,9 @@ CommandBody DeclareSimulate(CLI::App& command) {
   command.add_flag("--quiet", o->output.quiet, "Print nothing");
   return [o] {
     o->camera.size = ParseSize("--size", o->size);
-    const std::vector<double> cast = ParseNumbers("--cast", o->cast, 3);
-    const std::vector<double> smear = ParseNumbers("--smear", o->smear, 2);
-    const std::vector<double> motion = ParseNumbers("--motion", o->motion, 2);
+    const std::vector<double> cast = ParseNumbers("--cast", o->cast, 3, 0, 16);
+    const std::vector<double> smear = ParseNumbers("--smear", o->smear, 2, -100, 100);
+    const std::vector<double> motion = ParseNumbers("--motion", o->motion, 2, -30000, 30000);
     o->camera.cast = {cast[0], cast[1], cast[2]};
     o->camera.smear_px = {smear[0], smear[1]};
     o->motion_px = {motion[0], motion[1]};

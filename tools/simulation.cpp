@@ -81,7 +81,8 @@ Json MarkTruth(const cv::Matx33d& photo_from_scene, double module) {
           {"module_px", PixelsPerUnit(photo_from_scene) * module},
           {"legs_ratio", cv::norm(right) / cv::norm(down)},
           {"legs_angle_deg", std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI},
-          {"chart_turn_deg", std::atan2(-right.y, right.x) * 180 / CV_PI}};
+          {"chart_turn_deg", std::atan2(-right.y, right.x) * 180 / CV_PI},
+          {"centre", ToJson((marks[1] + marks[2]) / 2)}};  // middle of the longest side
 }
 
 // True figure of one edge and what the measure may read of it, in units of Nyquist.
@@ -148,8 +149,6 @@ Simulation TargetPhoto(const SimulationOptions& options) {
   Simulation s;
   s.levels = {Expose(options.camera, AimingTarget(), map)};
   s.truth.update(MarkTruth(map, kMarkSizes.back().module));
-  s.truth["centre"] =
-      ToJson((Map(map, {kMarkCentres[1][0] * 1.0, 0.0}) + Map(map, {0.0, kMarkCentres[2][1] * 1.0})) / 2);
   return s;
 }
 
@@ -197,7 +196,7 @@ Simulation DustPhoto(const SimulationOptions& options) {
   const cv::Mat gray = Gray(cv::min(s.levels[0], 255));
   s.truth["mean_level"] = cv::mean(gray)[0];
   std::vector<int> histogram(256);
-  for (const float level : cv::Mat_<float>(gray)) ++histogram[cvRound(level)];
+  for (const float level : cv::Mat_<float>(gray)) ++histogram[std::clamp(cvRound(level), 0, 255)];
   s.truth["histogram"] = histogram;  // without noise
   return s;
 }
@@ -235,6 +234,7 @@ Simulation HdrCapture(const SimulationOptions& options) {
   const int apart = options.dot_px + 8;
   if (right < 0 || bottom < 0) throw Failure(kWrongUsage, "--dot-size: larger than the photo");
   cv::Mat factors(camera.size, CV_32FC3, cv::Scalar::all(1));
+  cv::Mat taken = cv::Mat::zeros(camera.size, CV_8U);  // where another dot would come too near
   cv::RNG random(camera.seed + 12345);
   std::vector<cv::Rect> dots;
   Simulation s;
@@ -245,10 +245,9 @@ Simulation HdrCapture(const SimulationOptions& options) {
     const cv::Point at = tries < static_cast<int>(first.size())
                              ? first[tries]
                              : cv::Point(random.uniform(0, right + 1), random.uniform(0, bottom + 1));
-    const bool free = std::none_of(dots.begin(), dots.end(), [&](const cv::Rect& dot) {
-      return std::abs(dot.x - at.x) < apart && std::abs(dot.y - at.y) < apart;
-    });
-    if (!free) continue;
+    if (taken.at<uchar>(at) != 0) continue;
+    taken(cv::Rect(at - cv::Point(apart, apart), cv::Size(2 * apart + 1, 2 * apart + 1)) & cv::Rect({}, camera.size)) =
+        1;
     const double contrast = dots.size() % 2 == 0 ? options.dot_contrast : -options.dot_contrast;
     dots.emplace_back(at, cv::Size(options.dot_px, options.dot_px));
     factors(dots.back()).setTo(cv::Scalar::all(1 + contrast));

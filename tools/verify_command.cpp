@@ -3,6 +3,7 @@
 #include <cmath>
 #include <filesystem>
 #include <iostream>
+#include <map>
 #include <memory>
 #include <sstream>
 
@@ -25,28 +26,37 @@ bool IsOneOf(const Names& names, const std::string& word) {
   return std::find(names.begin(), names.end(), word) != names.end();
 }
 
-// A file that the record names: where it says, seen from the record's folder, or beside the record.
-std::string Locate(const std::string& named, const fs::path& folder) {
-  for (const fs::path& place : {folder / named, folder / fs::path(named).filename()}) {
+// A file that the record names: seen from the record's folder, as named, or beside the record; of a photo, the first
+// with the content that was measured.
+std::string Locate(const std::string& named, const fs::path& folder, const std::string& sha256) {
+  std::string found = named;
+  bool any = false;
+  for (const fs::path& place : {folder / named, fs::path(named), folder / fs::path(named).filename()}) {
     std::error_code error;
-    if (fs::is_regular_file(place, error)) return place;
+    if (!fs::is_regular_file(place, error)) continue;
+    if (!any) found = place;
+    any = true;
+    if (sha256.empty()) break;
+    if (HexDigest(ReadWholeFile(place, kCouldNotMeasure), "SHA256") == sha256) return place;
   }
-  return named;
+  return found;
 }
 
-std::vector<std::string> CommandAgain(const Json& command, const fs::path& folder) {
+// The record's command without what concerns its outputs.
+std::vector<std::string> CommandAgain(const Json& record, const fs::path& folder) {
+  std::map<std::string, std::string> digests;
+  for (const Json& input : record.at("inputs")) digests[input.at("path")] = input.at("sha256");
+  const Json& command = record.at("metadata").at("command");
   std::vector<std::string> words;
   for (std::size_t i = 0; i < command.size(); ++i) {
     const std::string word = command[i];
-    const std::string name = word.substr(0, word.find('='));
     if (IsOneOf(kOutputFlags, word)) continue;
-    if (IsOneOf(kOutputOptions, name)) {
-      if (name == word) ++i;  // its value is the next word
-      continue;
+    if (IsOneOf(kOutputOptions, word)) {
+      ++i;  // and its value
+    } else {
+      words.push_back(i == 0 ? word : Locate(word, folder, digests[word]));
     }
-    words.push_back(i == 0 ? word : Locate(word, folder));
   }
-  words.insert(words.end(), {"--json", "-"});
   return words;
 }
 
@@ -93,7 +103,7 @@ Check Compare(const Json& was, const Json& is) {
       check.moved.push_back("the photo itself has changed: " + is.at("inputs")[i].at("path").get<std::string>());
     }
   }
-  for (const auto& [name, m] : stored.at("measurements").items()) {
+  for (const auto& [name, m] : stored.at("measurements").get_ref<const Json::object_t&>()) {
     if (!m.contains("measured_value")) continue;
     ++check.numbers;
     const Json& now = measured.at("measurements");
@@ -114,25 +124,25 @@ Check Compare(const Json& was, const Json& is) {
 }
 
 Check VerifyRecord(const fs::path& path, const Json& record) {
-  const Json command = record.value("metadata", Json::object()).value("command", Json());
-  if (!command.is_array() || command.empty()) {
-    throw Failure(kCouldNotMeasure, path.string() + ": the record does not say which command made it");
-  }
-  if (IsOneOf(command, "-")) {
-    throw Failure(kCouldNotMeasure, path.string() + ": made from standard input, which is gone");
-  }
-  std::string text;
-  std::string errors;
-  {
-    const Kept out(std::cout);
-    const Kept err(std::cerr);
-    RunCommand(CommandAgain(command, path.parent_path()));
-    text = out.Text();
-    errors = err.Text();
-  }
-  const Json again = Json::parse(text, nullptr, false);
-  if (again.is_discarded()) throw Failure(kCouldNotMeasure, path.string() + ": can't be run again: " + errors);
   try {
+    std::vector<std::string> words = CommandAgain(record, path.parent_path());
+    if (words.empty())
+      throw Failure(kCouldNotMeasure, path.string() + ": the record does not say which command made it");
+    if (IsOneOf(words, "-")) {
+      throw Failure(kCouldNotMeasure, path.string() + ": made from standard input, which is gone");
+    }
+    words.insert(words.end(), {"--json", "-"});
+    std::string text;
+    std::string errors;
+    {
+      const Kept out(std::cout);
+      const Kept err(std::cerr);
+      RunCommand(words);
+      text = out.Text();
+      errors = err.Text();
+    }
+    const Json again = Json::parse(text, nullptr, false);
+    if (again.is_discarded()) throw Failure(kCouldNotMeasure, path.string() + ": can't be run again: " + errors);
     return Compare(record, again);
   } catch (const Json::exception& e) {
     throw Failure(kCouldNotMeasure, path.string() + ": not a whole record (" + e.what() + ")");
@@ -170,8 +180,8 @@ CommandBody DeclareVerify(CLI::App& command) {
   auto paths = std::make_shared<std::vector<std::string>>();
   command
       .add_option("RECORD", *paths,
-                  "Records of golden photos, as --json wrote them, or folders of them; the photos are looked for where "
-                  "the record says, seen from its folder, and beside it")
+                  "Records of golden photos, as --json wrote them, or folders of them; a photo is looked for where the "
+                  "record says and beside the record, by its content")
       ->required()
       ->type_name("PATH");
   return [paths] {

@@ -106,7 +106,7 @@ TEST_F(PictureProgram, WhatCanNotBeSearchedForDotsIsTold) {
   noise = cv::Scalar(1);
   noise.at<float>(100, 100) = std::numeric_limits<float>::quiet_NaN();
   ASSERT_TRUE(cv::imwrite(folder_.Path("noise.tif"), noise));
-  Record({"dots", folder_.Path("noise.tif"), "--annotate", folder_.Path("seen.png")});
+  EXPECT_EQ("ERROR", Record({"dots", folder_.Path("noise.tif"), "--annotate", folder_.Path("seen.png")}, 3)["outcome"]);
   EXPECT_THAT(err_, HasSubstr("1 pixels are not finite"));
 }
 

@@ -231,7 +231,7 @@ class QV_API QVTester {
   /// histogram beside the reference (properties 88 and 87). With fake_mode the blobs are left out. Answers 1.
   int TestLensDust(bool front, bool fake_mode);
   /// Finds dark blobs in a grey photo (CV_8UC1) and publishes the places of the first five outside the corners.
-  /// Sees discs of about 5 to 16 pixels where the mean grey level is above 130: tests/camera/QVTester_LensDust.cpp.
+  /// Sees discs of 4 to 16 pixels where the mean grey level is above 130: tests/camera/QVTester_LensDust.cpp.
   /// @return the number of places published.
   int detectBlob(cv::Mat& gray);
   /// False in the four corner squares of 20 pixels, where the fixture's marks are.

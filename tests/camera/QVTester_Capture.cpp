@@ -77,11 +77,11 @@ Patches SampleGrid(QVTester& tester, const std::vector<cv::Point>& points, cv::S
   return colours;
 }
 
-// As GetColorPatchRGB of what NormalizePatternImage gives, but only the patches are turned upright; a turn by exactly
-// 0 degrees leaves the pixels of an 8-bit photo as they are.
+// As its plain form, GetColorPatchRGB of what NormalizePatternImage gives, but only the patches are turned upright; a
+// turn by exactly 0 degrees leaves the pixels of an 8-bit photo as they are.
 Patches SamplePatches(QVTester& tester, const cv::Mat& photo, std::vector<cv::Point> points) {
   const UprightTurn turn = TurnUpright(photo.size(), tester.GetPatternAngle(points));
-  const bool upright = cv::norm(turn.map, cv::Mat::eye(2, 3, CV_64F), cv::NORM_INF) == 0;
+  const bool upright = LeavesPixels(turn, photo);
   CarryMarks(turn, points);
   return SampleGrid(tester, points, turn.canvas, [&](cv::Rect patch) {
     const bool inside = patch.br().x <= photo.cols && patch.br().y <= photo.rows;
