@@ -221,7 +221,7 @@ TEST(SfrForms, AgreeOnAnyRegion) {
     } else {
       levels.convertTo(region, CV_32F);
       for (int i = round % 3; i > 0; --i) {
-        float& any = region.at<float>(random.uniform(0, region.rows), random.uniform(0, region.cols));
+        auto& any = region.at<float>(random.uniform(0, region.rows), random.uniform(0, region.cols));
         if (round % 2 == 0) any = limits[random.uniform(0, 12)];
       }
     }
