@@ -94,14 +94,15 @@ Check Compare(const Json& was, const Json& is) {
   Check check;
   const Json& stored = was.at("phases").at(0);
   const Json& measured = is.at("phases").at(0);
-  if (stored.at("result_code") != measured.at("result_code")) {
-    check.moved.push_back("the result code was " + stored.at("result_code").dump() + ", is " +
-                          measured.at("result_code").dump());
-  }
   for (std::size_t i = 0; i < was.at("inputs").size(); ++i) {
     if (i < is.at("inputs").size() && was.at("inputs")[i].at("sha256") != is.at("inputs")[i].at("sha256")) {
       check.moved.push_back("the photo itself has changed: " + is.at("inputs")[i].at("path").get<std::string>());
     }
+  }
+  if (!check.moved.empty()) return check;  // figures of another photo say nothing
+  if (stored.at("result_code") != measured.at("result_code")) {
+    check.moved.push_back("the result code was " + stored.at("result_code").dump() + ", is " +
+                          measured.at("result_code").dump());
   }
   for (const auto& [name, m] : stored.at("measurements").get_ref<const Json::object_t&>()) {
     if (!m.contains("measured_value")) continue;
