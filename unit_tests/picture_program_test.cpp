@@ -45,7 +45,8 @@ TEST_F(PictureProgram, DotsAreFoundWhereTheyWereDrawn) {
     EXPECT_EQ(60, Measured(record, "hdr_dots_dot_count"));
     std::map<std::pair<double, double>, int> seen;
     for (const json& area : Measured(record, "hdr_dots_areas")) ++seen[{area[0], area[1]}];
-    for (const json& dot : Truth("panel")["dots"]) {
+    const json truth = Truth("panel");
+    for (const json& dot : truth["dots"]) {
       const std::pair<double, double> at(dot["column"], dot["row"]);
       EXPECT_EQ(1, seen[at]) << dot;
     }
