@@ -45,7 +45,7 @@ Json ToJson(const Measurement& m) {
     }
     Json dimension = ToJson(*m.info->figure->axis);
     dimension["description"] = "";
-    json["dimensions"] = {dimension};
+    json["dimensions"] = Json::array({dimension});  // braces alone are a copy to some compilers
   } else {
     json["measured_value"] = ToJson(m.value(), m.info->figure->number);
   }
