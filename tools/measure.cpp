@@ -9,6 +9,7 @@
 #include "core/property_table.h"
 #include "qvtester/host_properties.h"
 #include "tools/codes.h"
+#include "tools/options.h"
 
 namespace {
 
@@ -77,8 +78,18 @@ cv::Size SlotSize(QV_RESOURCE_INDEX slot) {
   return size;
 }
 
+// Hands the slot a preview frame as a phone's camera delivers it.
+int LoadRaw(QV_RESOURCE_INDEX slot, cv::Size size, std::string& content) {
+  const std::size_t bytes = std::size_t{3} * static_cast<std::size_t>(size.area()) / 2;
+  if (content.size() != bytes) {
+    throw Failure(kCouldNotMeasure, Format("%zu bytes are no NV21 frame of %d x %d, which has %zu", content.size(),
+                                           size.width, size.height, bytes));
+  }
+  return SetResource(slot, size.width, size.height, content.data());
+}
+
 // Loads one slot. What can't be read becomes the run's code and a sentence; what the decoder says, a warning.
-bool Load(Record& record, const Measuring& measuring, const SlotInput& input, ScratchFolder& scratch,
+bool Load(Record& record, const Measuring& measuring, cv::Size raw_size, const SlotInput& input, ScratchFolder& scratch,
           SideOutput& side) {
   const std::string shown = input.path == "-" ? "standard input" : input.path;
   const auto refuse = [&](int code, const std::string& why) {
@@ -97,20 +108,24 @@ bool Load(Record& record, const Measuring& measuring, const SlotInput& input, Sc
 
   // The library reads a file of its own accord, and a pipe can be read but once.
   std::string path = input.path;
-  if (path == "-" || !std::filesystem::is_regular_file(path)) {
+  if (raw_size.empty() && (path == "-" || !std::filesystem::is_regular_file(path))) {
     path = scratch.path() + "/input";
     WriteWholeFile(path, content);
   }
   int code = QV_SUCCESS;
   try {
-    code = measuring.load ? measuring.load(path) : SetResource(input.slot, path.data());
+    code = !raw_size.empty() ? LoadRaw(input.slot, raw_size, content)
+           : measuring.load  ? measuring.load(path)
+                             : SetResource(input.slot, path.data());
   } catch (const Failure& e) {
     return refuse(QV_ERROR_INVALID_ARGUMENT, e.what());
   }
   const std::vector<std::string> chatter = side.TakeChatter();
   const std::string said = chatter.empty() ? "" : "the decoder says \"" + chatter.front() + "\"";
   if (code == QV_ERROR_INVALID_ARGUMENT) {
-    return refuse(code, "not a picture that can be decoded" + (said.empty() ? "" : "; " + said));
+    const bool frame = LowerExtension(input.path) == ".nv21";
+    return refuse(code, "not a picture that can be decoded" + (said.empty() ? "" : "; " + said) +
+                            (frame ? "; a raw frame needs its size: --raw WxH, where the command takes it" : ""));
   }
   if (code != QV_SUCCESS) return refuse(code, FindCode(code).meaning);
   if (!said.empty()) record.details.push_back(shown + ": " + said + "; is the file cut?");
@@ -202,6 +217,10 @@ void MeasureOptions::DeclareThresholdOn(CLI::App& command) {
       ->type_name("N");
 }
 
+void MeasureOptions::DeclareRawOn(CLI::App& command) {
+  command.add_option("--raw", raw_size, "Frames are raw NV21 of this size, not picture files")->type_name("WxH");
+}
+
 void MeasureOptions::DeclarePublishOn(CLI::App& command) {
   command.add_flag("--publish", publish, "Write the findings to the system properties that other programs read");
 }
@@ -238,6 +257,10 @@ std::string LimitText(const Measurement& m) {
 
 int Measure(const MeasureOptions& options, const Measuring& measuring) {
   CheckOutputs(options, measuring);
+  const cv::Size raw_size = options.raw_size.empty() ? cv::Size() : ParseSize("--raw", options.raw_size);
+  if (raw_size.width % 2 != 0 || raw_size.height % 2 != 0) {
+    throw Failure(kWrongUsage, "--raw " + options.raw_size + ": an NV21 frame has an even width and height");
+  }
   Record record;
   record.start_millis = MillisSinceEpoch();
   record.dut_id = options.dut;
@@ -256,7 +279,7 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
     if (options.threshold) setWorkingBinaryThresh(*options.threshold);
     if (measuring.prepare) measuring.prepare();
     const bool loaded = std::all_of(measuring.inputs.begin(), measuring.inputs.end(), [&](const SlotInput& input) {
-      return Load(record, measuring, input, scratch, side);
+      return Load(record, measuring, raw_size, input, scratch, side);
     });
     record.phase.start_millis = record.phase.end_millis = MillisSinceEpoch();
     if (loaded) Run(record, measuring);
@@ -273,7 +296,9 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
 
   const bool measured = record.phase.code == QV_SUCCESS && !record.cannot_judge;
   if (!measured) {
-    std::cerr << MissSentence(record, measuring.look_at) << '\n';
+    const bool raw = !raw_size.empty();
+    std::cerr << MissSentence(record, raw ? "is that the frame's size, and the file whole?" : measuring.look_at)
+              << '\n';
   } else {
     for (const std::string& sentence : record.details) std::cerr << "warning: " << sentence << '\n';
     if (record.limits.given() && !record.limited()) {

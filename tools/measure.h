@@ -19,12 +19,15 @@ struct MeasureOptions {
   std::optional<int> threshold;
   double pixel_pitch_um = 0;  // 0: not known
   bool verbose = false, quiet = false, publish = false;
+  std::string raw_size;  // inputs are NV21 frames of this size; none: they are files to decode
 
   /// Declares the options that all measuring commands share; the picture's may go by a name of its own.
   void DeclareOn(CLI::App& command, const char* picture = "--annotate",
                  const char* shows = "Write a picture of what was measured");
   /// Declares what commands that look for the chart share.
   void DeclareThresholdOn(CLI::App& command);
+  /// Declares --raw, for commands that take preview frames.
+  void DeclareRawOn(CLI::App& command);
   /// Declares --publish, for tests that write system properties.
   void DeclarePublishOn(CLI::App& command);
 };

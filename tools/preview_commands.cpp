@@ -75,6 +75,7 @@ CommandBody DeclarePreview(CLI::App& command) {
   command.add_option("FIRST", options->first, "First preview frame")->required();
   command.add_option("SECOND", options->second, "Second preview frame, of the same size")->required();
   command.add_flag("--front", options->front, "The front camera's preview (test 19)");
+  options->DeclareRawOn(command);
   options->DeclareOn(command);
   return [options] {
     const bool front = options->front;
@@ -116,6 +117,7 @@ CommandBody DeclareCircles(CLI::App& command) {
       ->check(CLI::IsMember({0, 2}))
       ->type_name("N");
   options->DeclareThresholdOn(command);
+  options->DeclareRawOn(command);
   options->DeclarePublishOn(command);
   options->DeclareOn(command);
   return [options] {

@@ -41,6 +41,28 @@ TEST_F(CameraProgram, PreviewMeasuresMotion) {
   EXPECT_THAT(run.err, HasSubstr("of different sizes, 1200 x 900 and 300 x 200"));
 }
 
+TEST_F(CameraProgram, RawFramesAreMeasuredAsTheirPictures) {
+  const std::string size = "640x480";
+  const std::vector<std::string> scene = {"--scene", "target", "--turn", "12", "--size", size};
+  const json of_picture = Measured(Record({"circles", Simulate(scene)}), "circle_check_centre");
+  std::vector<std::string> simulate = {"simulate", "-o", folder_.Path("raw.nv21"), "--quiet"};
+  simulate.insert(simulate.end(), scene.begin(), scene.end());
+  ASSERT_EQ(0, RunProgram(simulate).status);
+  const std::string raw = folder_.Path("raw.nv21");
+  const json of_frame = Measured(Record({"circles", raw, "--raw", size}), "circle_check_centre");
+  for (const int i : {0, 1}) EXPECT_NEAR(of_picture[0][i], of_frame[0][i], 0.5) << "levels a few apart after coding";
+  EXPECT_EQ(0, Measured(Record({"preview", raw, raw, "--raw", size}), "camera_preview_difference_mean"));
+
+  const std::vector<std::pair<std::vector<std::string>, std::string>> wrong = {
+      {{"preview", raw, raw, "--raw", "640x478"}, "460800 bytes are no NV21 frame of 640 x 478, which has 458880"},
+      {{"circles", raw}, "a raw frame needs its size: --raw WxH"}};
+  for (const auto& [arguments, says] : wrong) {
+    const ProgramRun run = RunProgram(arguments);
+    EXPECT_EQ(3, run.status);
+    EXPECT_THAT(run.err, HasSubstr(says));
+  }
+}
+
 TEST_F(CameraProgram, CirclesFindTheCentre) {
   const std::string frame = Simulate({"--scene", "target", "--turn", "12", "--size", "640x480", "--noise", "1"});
   const json centre = Measured(Record({"circles", frame}), "circle_check_centre");
