@@ -74,6 +74,8 @@ bool WriteAll(int fd, const char* data, std::size_t length) {
 int Put(std::string& place, const char* directory) {
   if (directory != nullptr && *directory == '\0') return QV_ERROR_INVALID_ARGUMENT;
   place = directory == nullptr ? "" : directory;
+  // A name that ends in a slash or a dot would be looked up behind a link.
+  while (place.size() > 1 && (place.back() == '/' || place.substr(place.size() - 2) == "/.")) place.pop_back();
   return QV_SUCCESS;
 }
 

@@ -46,6 +46,17 @@ TEST_F(Store, KeysStayInTheirDirectory) {
   EXPECT_GT(0, platform::property_set(std::string(5000, 'k').c_str(), "x"));
 }
 
+TEST_F(Store, ALinkIsNoStoreHoweverItIsSpelled) {
+  std::filesystem::create_directory(folder_.Path("real"));
+  std::filesystem::create_directory_symlink(folder_.Path("real"), folder_.Path("link"));
+  for (const char* end : {"", "/", "/.", "//./"}) {
+    SetHostPropertyStore((folder_.Path("link") + end).c_str());
+    EXPECT_GT(0, platform::property_set("k", "x")) << end;
+    SetHostPropertyStore((folder_.Path("real") + end).c_str());
+    EXPECT_EQ(0, platform::property_set("k", "x")) << end;
+  }
+}
+
 TEST_F(Store, NothingIsLeftBesideTheKeys) {
   for (int i = 0; i < 10; ++i) platform::property_set("k", std::to_string(i).c_str());
   const std::filesystem::directory_iterator files(folder_.Path("p"));
