@@ -13,9 +13,9 @@ int QVFinderPattern::getCount() const { return count; }
 void QVFinderPattern::setAverage(float average) { this->average = average; }
 
 bool QVFinderPattern::aboutEquals(float moduleSize, float i, float j) const {
-  if (std::fabs(i - y) > moduleSize || std::fabs(j - x) > moduleSize) return false;
+  const bool near = std::fabs(i - y) <= moduleSize && std::fabs(j - x) <= moduleSize;  // not so where one is NaN
   const float difference = std::fabs(moduleSize - estimatedModuleSize);
-  return difference <= 1.0f || difference <= estimatedModuleSize;
+  return near && (difference <= 1.0f || difference <= estimatedModuleSize);
 }
 
 QVFinderPattern QVFinderPattern::combineEstimate(float i, float j, float newModuleSize) const {

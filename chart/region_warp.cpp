@@ -63,9 +63,11 @@ void FormPlaces(cv::Point row, const std::vector<int>& column_x, const std::vect
 }  // namespace
 
 cv::Mat WarpRegion(const cv::Mat& image, const cv::Mat& map, cv::Size canvas_size, cv::Rect region) {
-  CV_Assert(0 <= region.x && 0 <= region.width && region.x + region.width <= canvas_size.width && 0 <= region.y &&
-            0 <= region.height && region.y + region.height <= canvas_size.height);
-  if (region.empty()) return {region.size(), image.type()};
+  // A header without pixels cuts as the whole canvas would: it throws for a region outside, and one of no area is 0 x
+  // 0.
+  uchar none = 0;
+  const cv::Mat header(canvas_size, CV_8UC1, &none);
+  if (header(region).empty()) return cv::Mat(0, 0, image.type());
   const cv::Matx23d m = Inverse(map);
   std::vector<int> column_x(static_cast<std::size_t>(region.width));  // what a column adds to a row's place
   std::vector<int> column_y(column_x.size());

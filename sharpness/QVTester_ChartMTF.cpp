@@ -25,6 +25,7 @@ struct UprightChart {
 
 UprightChart Straighten(QVTester& tester, const cv::Mat& gray, std::vector<cv::Point> points) {
   UprightChart chart = {gray, TurnUpright(gray.size(), tester.GetPatternAngle(points)), {}, {}, {}};
+  CV_Assert(chart.turn.canvas.width < SHRT_MAX);  // as the whole picture's cv::warpAffine would
   CarryMarks(chart.turn, points);
   tester.SortPatternPoints(points, chart.corner, chart.second, chart.third);
   return chart;

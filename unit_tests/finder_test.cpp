@@ -36,6 +36,7 @@ TEST(FinderPattern, TheSameMarkIsOneModuleAwayAtMost) {
   EXPECT_TRUE(mark.aboutEquals(4, 54, 96));
   EXPECT_FALSE(mark.aboutEquals(4, 54.5f, 100));
   EXPECT_FALSE(mark.aboutEquals(4, 50, 95.5f));
+  EXPECT_FALSE(mark.aboutEquals(4, NAN, 100) || mark.aboutEquals(4, 50, NAN));
   EXPECT_TRUE(mark.aboutEquals(8, 50, 100)) << "differs by the mark's own module size";
   EXPECT_FALSE(mark.aboutEquals(8.5f, 50, 100));
   EXPECT_TRUE(QVFinderPattern(0, 0, 0.25f, 1).aboutEquals(1.25f, 0, 0)) << "one pixel is always allowed";
