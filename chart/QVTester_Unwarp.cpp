@@ -77,8 +77,8 @@ int QVTester::GetUnwarpedImage(cv::Mat reference, cv::Mat image, cv::Mat& unwarp
   const FeatureImage to = FindFeatures(image);
   const Registration result = Register(from, to);
   if (result.matrix.empty()) return QV_ERROR_NO_REGISTRATION;
-  unwarp_ = {from.image, to.image, from.keypoints, to.keypoints, result.good, result.matrix, cv::Mat()};
-  unwarped = result.unwarped;
+  unwarp_ = {from.image.clone(), to.image.clone(), from.keypoints, to.keypoints, result.good, result.matrix, cv::Mat()};
+  result.unwarped.copyTo(unwarped);
   return QV_SUCCESS;
 }
 

@@ -122,6 +122,7 @@ int QVTester::Initialize() {
 
 int QVTester::Release() {
   for (auto& resource : resources_) resource.reset();
+  image_list_ = ImageList();
   for (int test = QV_TEST_PHASE1_0; test <= QV_TEST_TOUCH_PANEL_PRINT; ++test) {
     ReleaseTestResult(static_cast<QV_TEST_INDEX>(test));
   }

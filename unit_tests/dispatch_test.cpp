@@ -44,6 +44,10 @@ TEST_F(Dispatch, ASlotWithoutAnImageIsUnusable) {
   theTester->resources_[16] = std::make_unique<QVResource>();
   EXPECT_EQ(-95, RunTest(QV_TEST_CAMERA_FLASH, false));
   EXPECT_EQ(-98, theTester->TestCameraAutofocus()) << "a direct call with its slot empty";
+  QVTester bare;  // never initialised: no slot is filled, and no result block is needed to say so
+  EXPECT_THAT((std::array{bare.TestCameraFlash(), bare.TestCameraFlashVT(), bare.TestCameraAutofocus(),
+                          bare.TestCameraCapture(false), bare.CheckPatternCircles(0)}),
+              ::testing::Each(-98));
 }
 
 TEST_F(Dispatch, RecordsOwnTheirArrays) {  // the address sanitizer sees what is freed twice or not at all

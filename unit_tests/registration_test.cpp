@@ -82,7 +82,14 @@ TEST(Unwarp, TooLittleToSeeIsNoRegistration) {
   EXPECT_THROW(tester.GetUnwarpedImage(cv::Mat(), scene, unwarped), cv::Exception);
   ASSERT_EQ(1, tester.GetUnwarpedImage(scene, scene, unwarped));
   EXPECT_EQ(0, cv::norm(scene, unwarped, cv::NORM_INF)) << "an identical picture comes back itself";
-  EXPECT_EQ(cv::Size(1280, 480), tester.DrawUnwarpMatches().size());
+  cv::theRNG().state = 1;  // of the lines' colours
+  const cv::Mat drawing = tester.DrawUnwarpMatches().clone();
+  EXPECT_EQ(cv::Size(1280, 480), drawing.size());
+  cv::Mat reused = scene.clone();
+  ASSERT_EQ(1, tester.GetUnwarpedImage(reused, reused, unwarped));
+  reused.setTo(0);
+  cv::theRNG().state = 1;
+  EXPECT_EQ(0, cv::norm(drawing, tester.DrawUnwarpMatches(), cv::NORM_INF)) << "what was registered is drawn";
 }
 
 class ImageList : public ModuleTest {
@@ -127,6 +134,8 @@ TEST_F(ImageList, PicturesAreRegisteredBinarisedAndTakenApart) {
   EXPECT_EQ(CV_8UC1, Held().combined.type());
   theTester->resources_[32] = std::make_unique<QVResource>();
   EXPECT_EQ(1, theTester->ValidateTest(QV_TEST_TOUCH_PANEL_PRINT));
+  theTester->Initialize();
+  EXPECT_TRUE(Held().gray.empty() && Held().matrix.empty()) << "the list goes with its slot";
 }
 
 TEST_F(ImageList, AFailureChangesNothing) {
