@@ -99,21 +99,27 @@ int QVTester::ReleaseDataForTest(QV_TEST_INDEX test) {
   return ReleaseTestResult(test);
 }
 
-void QVTester::SetResult(QVPhase1Result* r, int code) { r->result_ = code; }
+int QVTester::SetResult(QVPhase1Result* r, int code) {
+  r->result_ = code;
+  return QV_SUCCESS;
+}
 
-void QVTester::SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image) {
+int QVTester::SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image) {
   r->image_width_ = width;
   r->image_height_ = height;
   ReplaceArray(r->image_, image);
+  return QV_SUCCESS;
 }
 
-void QVTester::SetResultRawData(QVPhase1Result* r, int width, int height, float* data) {
+int QVTester::SetResultRawData(QVPhase1Result* r, int width, int height, float* data) {
   r->raw_width_ = width;
   r->raw_height_ = height;
   ReplaceArray(r->raw_data_, data);
+  return QV_SUCCESS;
 }
 
-void QVTester::SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count) {
+int QVTester::SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count) {
   r->error_point_count_ = count;
   ReplaceArray(r->error_points_, points);
+  return QV_SUCCESS;
 }

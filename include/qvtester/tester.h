@@ -90,10 +90,10 @@ class QV_API QVTester {
   int ReleaseDataForTest(QV_TEST_INDEX test);
 
   /// Store into a record of the tests 0-12, which takes over the array (from new[]) and frees the one before.
-  void SetResult(QVPhase1Result* r, int code);
-  void SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image);
-  void SetResultRawData(QVPhase1Result* r, int width, int height, float* data);
-  void SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count);
+  int SetResult(QVPhase1Result* r, int code);
+  int SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image);
+  int SetResultRawData(QVPhase1Result* r, int width, int height, float* data);
+  int SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count);
 
   // ---- Chart: finder marks --------------------------------------------------------------------------------------
 
