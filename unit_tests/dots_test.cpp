@@ -7,6 +7,7 @@
 
 #include "qvtester/tester.h"
 #include "unit_tests/log_lines.h"
+#include "unit_tests/plain/error_areas.h"
 #include "unit_tests/plain/hdr_dots.h"
 
 namespace {
@@ -139,6 +140,8 @@ TEST_F(Dots, HdrPicturesAreStretchedForTheEye) {
   EXPECT_EQ(0, cv::norm(before, hdr, cv::NORM_INF));
   cv::Mat constant(2, 2, CV_32FC3, cv::Scalar::all(7));
   EXPECT_EQ(0, cv::countNonZero(tester.HDR2UCHAR(constant)));
+  cv::Mat none;
+  EXPECT_THROW(tester.HDR2UCHAR(none), cv::Exception);
 }
 
 template <typename T>
@@ -218,23 +221,29 @@ TEST_F(Areas, CountsAreOptionalAndOneAreaIsLeftAsItIs) {
   EXPECT_EQ(0, QVTester().ErrorAreaClustering(8, 10, 10, &areas_, nullptr, nullptr, nullptr));
 }
 
-TEST_F(Areas, NoTwoOfManyAreCloseInTheEnd) {
+TEST_F(Areas, ChangedAreasAreAllThatNeedsASecondLook) {
   std::mt19937 random(4);
-  int total = 0;
-  for (int i = 0; i < 3000; ++i) {
-    Add(cv::Rect(static_cast<int>(random() % 98), static_cast<int>(random() % 78), 1, 1), i % 7);
-    total += i % 7;
-  }
-  const int n = Cluster(0);
-  int sum = 0;
-  for (int i = 0; i < n; ++i) sum += counts_[i];
-  EXPECT_EQ(total, sum);
-  for (int i = 0; i < n; ++i) {
-    for (int j = 0; j < i; ++j) {
-      const cv::Rect both = (Result(i) & Result(j));
-      EXPECT_FALSE(both.width > 1 && both.height > 1) << Result(i) << Result(j);
+  const auto any = [&](int from, int to) { return std::uniform_int_distribution<int>(from, to)(random); };
+  int lists_merged = 0;
+  for (int list = 0; list < 400; ++list) {
+    given_.clear();
+    std::vector<plain::ErrorArea> plain;
+    const int distance = any(0, 12);
+    size_ = {any(2, 300), any(2, 200)};
+    for (int n = any(2, 150); n > 0; --n) {
+      const cv::Rect area(any(0, size_.width - 1), any(0, size_.height - 1), any(1, 9),
+                          any(1, 40) == 1 ? 60 : any(1, 9));
+      Add(area, any(0, 9));
+      plain.push_back({area.tl(), area.br() - cv::Point(1, 1), given_.back().second, 0});
     }
+    const auto expected = plain::ErrorAreaClustering(distance, size_.width, size_.height, plain);
+    const int n = Cluster(distance);
+    std::vector<plain::ErrorArea> merged;
+    for (int i = 0; i < n; ++i) merged.push_back({first_[i], last_[i], counts_[i], areas_[i]});
+    ASSERT_TRUE(expected == merged) << "list " << list;
+    lists_merged += n < static_cast<int>(given_.size()) ? 1 : 0;
   }
+  EXPECT_GT(lists_merged, 200) << "most lists have something to merge";
 }
 
 }  // namespace

@@ -154,10 +154,11 @@ void QVTester::DetectDot(float* data, int height, int width, float threshold, in
 }
 
 cv::Mat QVTester::HDR2UCHAR(cv::Mat& hdr) {
+  CV_Assert(!hdr.empty());
   std::vector<cv::Mat> channels;
   cv::split(hdr, channels);
   cv::Mat stretched;
-  cv::normalize(channels.at(0), stretched, 0, 255.0, cv::NORM_MINMAX, CV_32F);
+  cv::normalize(channels[0], stretched, 0, 255.0, cv::NORM_MINMAX, CV_32F);
   stretched.convertTo(stretched, CV_8U);
   return stretched;
 }
