@@ -1,0 +1,132 @@
+// Exported calls in any order on any content: whatever libFuzzer comes up with, no crash, no leak, every array that the
+// result block names is there to be read, and every answer is a code of the library's.
+//   calls_fuzzer -close_fd_mask=2 -max_total_time=60
+
+#include <fuzzer/FuzzedDataProvider.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <opencv2/imgproc.hpp>
+#include <set>
+
+#include "qvtester/api.h"
+#include "qvtester/host_properties.h"
+#include "unit_tests/drawing.h"
+
+namespace {
+
+using Bytes = FuzzedDataProvider;
+
+// Files to load: photos that some test finds something in, and what can't be read.
+const std::vector<std::string>& Files() {
+  static const TemporaryFolder folder;
+  static const std::vector<std::string> files = [] {
+    SetHostPropertyStore(folder.Path("properties").c_str());
+    SetHostPreviewFolder(folder.Path("").c_str());
+    cv::Mat dust(240, 320, CV_8UC3, cv::Scalar(220, 225, 210));
+    for (int i = 1; i < 8; ++i) cv::circle(dust, {40 * i, 30 * i}, 5, cv::Scalar::all(120), cv::FILLED);
+    const cv::Mat chart = DrawChart({3, 0, 0.04, {360, 360}, 0.5});
+    return std::vector<std::string>{folder.Write("chart.png", chart),
+                                    folder.Write("turned.png", DrawChart({3, 118, 0.04, {480, 400}, 0.5})),
+                                    folder.Write("two.png", DrawChart({2, 0, 0.04, {360, 360}, 0.5})),
+                                    folder.Write("cut.png", chart(cv::Rect(0, 0, 340, 300))),
+                                    folder.Write("dust.png", dust),
+                                    folder.Write("gray.png", cv::Mat(9, 1, CV_16UC1, cv::Scalar(4000))),
+                                    folder.Write("none.jpg", std::string("no picture")),
+                                    folder.Write("empty.png", std::string()),
+                                    folder.Path("missing.png"),
+                                    folder.Path("")};
+  }();
+  return files;
+}
+
+template <typename T>
+void ReadAll(const T* array, int count) {
+  for (int i = 0; i < count; ++i) static_cast<void>(*static_cast<const volatile T*>(array + i));
+}
+
+void ReadResults() {
+  QVResultData* results = nullptr;
+  if (GetResult(&results) != 1) return;
+  for (const QVPreviewResult* preview : {&results->preview_main_, &results->preview_front_}) {
+    if (preview->preview_diff_map_ != nullptr)
+      ReadAll(preview->preview_diff_map_, preview->preview_diff_rows_ * preview->preview_diff_cols_);
+  }
+  for (const float* sfr : {results->af_sfr_first_, results->af_sfr_second_, results->af_sfr_third_})
+    ReadAll(sfr, results->af_sfr_count_);
+  for (const QVCaptureResult* capture : {&results->capture_main_, &results->capture_front_}) {
+    ReadAll(capture->capture_lab_, 3 * capture->capture_lab_count_);
+    ReadAll(capture->capture_delta_e_, capture->capture_delta_e_count_);
+  }
+  for (const int* histogram : {results->dust_hist_main_, results->dust_hist_front_})
+    if (histogram != nullptr) ReadAll(histogram, 256);
+}
+
+// What a setter is given: enough bytes for any kind, of which the fuzzer chooses the first.
+template <typename T>
+std::vector<T> Buffer(Bytes& bytes, std::size_t count) {
+  std::vector<T> values(count);
+  bytes.ConsumeData(values.data(), std::min<std::size_t>(count * sizeof(T), 32));
+  return values;
+}
+
+int Property(Bytes& bytes) {
+  alignas(8) static int shared[2][288];  // 87 and 88 go on reading the caller's memory
+  const int index = bytes.ConsumeIntegralInRange(-2, 100);
+  if (bytes.ConsumeBool()) {
+    int out[288];
+    return GetProperty(static_cast<QV_PROPERTY_INDEX>(index), out);
+  }
+  if (index >= 76 && index <= 79) return 1;  // lists and their lengths hold pointers, which a fuzzer can't make up
+  int* const value = shared[index == 88];
+  bytes.ConsumeData(value, 36);
+  return SetProperty(static_cast<QV_PROPERTY_INDEX>(index), value);
+}
+
+int Call(Bytes& bytes) {
+  const auto test = static_cast<QV_TEST_INDEX>(bytes.ConsumeIntegralInRange(-1, 31));
+  const auto slot = static_cast<QV_RESOURCE_INDEX>(bytes.ConsumeIntegralInRange(-1, 38));
+  const int width = bytes.ConsumeIntegralInRange(-1, 40);
+  const int height = bytes.ConsumeIntegralInRange(-1, 40);
+  const auto area = static_cast<std::size_t>(std::max(width, 0) * std::max(height, 0));
+  float vertical = 0;
+  float horizontal = 0;
+  switch (bytes.ConsumeIntegralInRange(0, 16)) {
+    case 0: return InitTestModule();
+    case 1: return FinalizeTestModule() == 0 ? InitTestModule() : -1000;
+    case 2: return SetLDRResource(slot, width, height, Buffer<unsigned short>(bytes, 3 * area + 1).data());
+    case 3: return SetHDRResource(slot, width, height, bytes.ConsumeBool(), Buffer<float>(bytes, 3 * area + 1).data());
+    case 4: return SetResource(slot, width, height, Buffer<unsigned char>(bytes, 2 * area + 1).data());
+    case 5: return Property(bytes);
+    case 6: return ReleaseImage(slot);
+    case 7: return ReleaseDataForTest(test);
+    case 8: return ReleaseTestResult(test);
+    case 9: return SetStep(width);
+    case 10: return CheckMTF(&vertical, &horizontal);
+    case 11: return CheckPatternCircles(width % 4);
+    case 12: return TestCameraCapture(bytes.ConsumeBool());
+    case 13: return setWorkingBinaryThresh(8 * width);
+    case 14: return SavePreview(Buffer<unsigned char>(bytes, 2 * area + 1).data(), height, width, height);
+    case 15: {
+      std::string file = Files()[bytes.ConsumeIntegralInRange<std::size_t>(0, Files().size() - 1)];
+      return SetResource(slot, file.data());
+    }
+    default: return RunTest(test, bytes.ConsumeBool());
+  }
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static const std::set<int> codes = {1, 0, -87, -90, -91, -95, -97, -98};
+  Files();
+  Bytes bytes(data, size);
+  if (InitTestModule() != 1) std::abort();
+  for (int i = 0; i < 60 && bytes.remaining_bytes() > 0; ++i) {
+    if (codes.count(Call(bytes)) == 0) std::abort();
+    ReadResults();
+  }
+  FinalizeTestModule();
+  return 0;
+}

@@ -1,0 +1,182 @@
+// Fast forms against their plain forms on whatever bytes libFuzzer comes up with: results must agree to the last bit.
+//   fast_forms_fuzzer -max_total_time=60
+
+#include <fuzzer/FuzzedDataProvider.h>
+
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <opencv2/imgproc.hpp>
+
+#include "chart/region_warp.h"
+#include "unit_tests/plain/colour.h"
+#include "unit_tests/plain/error_areas.h"
+#include "unit_tests/plain/finder.h"
+#include "unit_tests/plain/hdr_dots.h"
+#include "unit_tests/plain/sfr.h"
+
+namespace {
+
+using Bytes = FuzzedDataProvider;
+
+void Demand(bool same, const char* what) {
+  if (same) return;
+  std::fprintf(stderr, "%s: not as its plain form\n", what);
+  std::abort();
+}
+
+// Any NaN is as good as another.
+bool Same(const std::vector<float>& a, const std::vector<float>& b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(), [](float x, float y) {
+    return (std::isnan(x) && std::isnan(y)) || (x == y && std::signbit(x) == std::signbit(y));
+  });
+}
+
+// Bit patterns as they come, or levels of a photo.
+std::vector<float> Floats(Bytes& bytes, std::size_t count) {
+  const bool levels = bytes.ConsumeBool();
+  std::vector<float> values;
+  for (std::size_t i = 0; i < count; ++i) {
+    const auto bits = bytes.ConsumeIntegral<std::uint32_t>();
+    auto value = static_cast<float>(bits & 255);
+    if (!levels) std::memcpy(&value, &bits, sizeof value);
+    values.push_back(value);
+  }
+  return values;
+}
+
+void Finder(Bytes& bytes) {
+  cv::Mat image(bytes.ConsumeIntegralInRange(0, 90), bytes.ConsumeIntegralInRange(0, 300), CV_8UC1, cv::Scalar(255));
+  while (bytes.remaining_bytes() > 0) {
+    const cv::Point at(bytes.ConsumeIntegralInRange(-9, 300), bytes.ConsumeIntegralInRange(-9, 90));
+    const int module = bytes.ConsumeIntegralInRange(0, 9);
+    if (module > 0) {
+      for (const int side : {7, 5, 3}) {
+        const cv::Point inset = cv::Point(7 - side, 7 - side) * module / 2;
+        image(cv::Rect(at + inset, cv::Size(side, side) * module) & cv::Rect({}, image.size())) = side == 5 ? 1 : 0;
+      }
+    } else {
+      const cv::Size size(bytes.ConsumeIntegralInRange(1, 40), bytes.ConsumeIntegralInRange(1, 40));
+      image(cv::Rect(at, size) & cv::Rect({}, image.size())) = bytes.ConsumeIntegralInRange(0, 2);
+    }
+  }
+  QVTester fast;
+  QVTester plain;
+  Demand(plain::GetFinderPoints(plain, image) == fast.GetFinderPoints(image), "GetFinderPoints");
+  std::vector<float> seen[2];
+  for (const QVTester* tester : {&plain, &fast}) {
+    for (const QVFinderPattern& c : tester->possibleCenters) {
+      seen[tester == &fast].insert(seen[tester == &fast].end(), {c.x, c.y, c.estimatedModuleSize, c.average});
+    }
+  }
+  Demand(Same(seen[0], seen[1]) && plain.hasSkipped == fast.hasSkipped, "GetFinderPoints' candidates");
+}
+
+void Dots(Bytes& bytes) {
+  const int height = bytes.ConsumeIntegralInRange(0, 30);
+  const int width = bytes.ConsumeIntegralInRange(0, 60);
+  const int radius = bytes.ConsumeIntegralInRange(0, 6);
+  const float threshold = Floats(bytes, 1)[0];
+  const std::size_t size = static_cast<std::size_t>(height) * width;
+  const std::vector<float> data = Floats(bytes, 3 * size);
+  std::vector<unsigned char> masks[2] = {std::vector<unsigned char>(size, 7), std::vector<unsigned char>(size, 7)};
+  if (2 * radius + 1 <= std::min(height, width)) {
+    plain::DetectDot(data.data(), height, width, threshold, radius, masks[0].data());
+  }
+  QVTester().DetectDot(const_cast<float*>(data.data()), height, width, threshold, radius, masks[1].data());
+  Demand(masks[0] == masks[1], "DetectDot");
+}
+
+void Sfr(Bytes& bytes) {
+  cv::Mat region(bytes.ConsumeIntegralInRange(1, 60), bytes.ConsumeIntegralInRange(1, 60), CV_32F);
+  const std::vector<float> values =
+      Floats(bytes, std::min<std::size_t>(region.total(), bytes.remaining_bytes() / 4 + 1));
+  for (std::size_t i = 0; i < region.total(); ++i) region.ptr<float>()[i] = values[i % values.size()];
+  std::vector<float> seen[2];
+  for (const bool fast : {false, true}) {
+    QVTester tester;
+    std::vector<float> freq;
+    float mtf50 = 0;
+    try {
+      if (fast) {
+        tester.CalculateSFR(region, freq, seen[1], mtf50);
+      } else {
+        plain::CalculateSFR(tester, region, freq, seen[0], mtf50);
+      }
+      seen[fast].push_back(mtf50);
+      seen[fast].insert(seen[fast].end(), freq.begin(), freq.end());
+    } catch (const cv::Exception& e) {
+      seen[fast] = {static_cast<float>(e.code)};
+    }
+  }
+  Demand(Same(seen[0], seen[1]), "CalculateSFR");
+}
+
+void Areas(Bytes& bytes) {
+  const int distance = bytes.ConsumeIntegralInRange(0, 12);
+  std::vector<plain::ErrorArea> given;
+  while (bytes.remaining_bytes() > 0 && given.size() < 300) {
+    const cv::Point at(bytes.ConsumeIntegral<std::uint8_t>(), bytes.ConsumeIntegral<std::uint8_t>());
+    const cv::Point size(bytes.ConsumeIntegralInRange(0, 15), bytes.ConsumeIntegralInRange(0, 15));
+    given.push_back({at, at + size, 1, 0});
+  }
+  const auto n = given.size();
+  if (n < 2) return;
+  std::vector<int> areas(n);
+  auto* counts = static_cast<int*>(std::malloc(n * sizeof(int)));
+  auto* first = static_cast<cv::Point*>(std::malloc(n * sizeof(cv::Point)));
+  auto* last = static_cast<cv::Point*>(std::malloc(n * sizeof(cv::Point)));
+  for (std::size_t i = 0; i < n; ++i) {
+    counts[i] = given[i].count;
+    first[i] = given[i].top_left;
+    last[i] = given[i].bottom_right;
+  }
+  QVTester().ErrorAreaClustering(distance, 200, 200, &areas, &counts, &first, &last);
+  std::vector<plain::ErrorArea> merged;
+  for (std::size_t i = 0; i < areas.size(); ++i) merged.push_back({first[i], last[i], counts[i], areas[i]});
+  std::free(counts);
+  std::free(first);
+  std::free(last);
+  Demand(plain::ErrorAreaClustering(distance, 200, 200, given) == merged, "ErrorAreaClustering");
+}
+
+void Temperatures(Bytes& bytes) {
+  const std::size_t pixels = bytes.remaining_bytes() / 12;
+  std::vector<float> xyz = Floats(bytes, 3 * pixels);
+  std::vector<float> expected(pixels);
+  plain::xyz2cct(xyz.data(), pixels, expected.data());
+  float* const cct = QVTester().xyz2cct(xyz.data(), static_cast<int>(pixels), 1);
+  Demand(Same(expected, {cct, cct + pixels}), "xyz2cct");
+  std::free(cct);
+}
+
+void Warp(Bytes& bytes) {
+  cv::Mat image(bytes.ConsumeIntegralInRange(1, 40), bytes.ConsumeIntegralInRange(1, 80),
+                bytes.ConsumeBool() ? CV_8UC3 : CV_8UC1);
+  const cv::Size canvas(bytes.ConsumeIntegralInRange(1, 90), bytes.ConsumeIntegralInRange(1, 90));
+  const cv::Mat map = cv::getRotationMatrix2D(cv::Point2f(canvas.width * 0.5f, canvas.height * 0.5f),
+                                              bytes.ConsumeFloatingPointInRange(-720.0, 720.0),
+                                              bytes.ConsumeFloatingPointInRange(0.1, 8.0));
+  const int x = bytes.ConsumeIntegralInRange(0, canvas.width - 1);
+  const int y = bytes.ConsumeIntegralInRange(0, canvas.height - 1);
+  const cv::Rect region(x, y, bytes.ConsumeIntegralInRange(0, canvas.width - x),
+                        bytes.ConsumeIntegralInRange(0, canvas.height - y));
+  for (std::size_t i = 0; i < image.total() * image.elemSize(); ++i) image.data[i] = bytes.ConsumeIntegral<uchar>();
+  cv::Mat whole;
+  cv::warpAffine(image, whole, map, canvas, cv::INTER_LINEAR, cv::BORDER_CONSTANT, cv::Scalar(0));
+  const cv::Mat expected = whole(region);
+  const cv::Mat warped = WarpRegion(image, map, canvas, region);
+  Demand(expected.size() == warped.size() && (warped.empty() || cv::norm(expected, warped, cv::NORM_INF) == 0),
+         "WarpRegion");
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static constexpr std::array kSubjects = {Finder, Dots, Sfr, Areas, Temperatures, Warp};
+  Bytes bytes(data, size);
+  kSubjects[bytes.ConsumeIntegralInRange<std::size_t>(0, kSubjects.size() - 1)](bytes);
+  return 0;
+}
