@@ -1,9 +1,7 @@
 #include <gmock/gmock.h>
 
 #include <cfloat>
-#include <functional>
 #include <opencv2/imgproc.hpp>
-#include <random>
 
 #include "qvtester/tester.h"
 #include "unit_tests/drawing.h"
@@ -17,18 +15,12 @@ using ::testing::IsEmpty;
 using ::testing::SizeIs;
 using ::testing::UnorderedElementsAre;
 
-// Where a drawn mark is found: its middle, cut to whole pixels.
-cv::Point Found(cv::Point corner, int module) { return {corner.x + 7 * module / 2, corner.y + 7 * module / 2}; }
-
 TEST(FinderPattern, MergesAreWeightedByCount) {
-  const QVFinderPattern twice(10, 20, 4, 2);
-  const QVFinderPattern merged = twice.combineEstimate(23, 13, 7);  // row 23, column 13
+  const QVFinderPattern merged = QVFinderPattern(10, 20, 4, 2).combineEstimate(23, 13, 7);  // row 23, column 13
   EXPECT_EQ(11.0f, merged.x);
   EXPECT_EQ(21.0f, merged.y);
   EXPECT_EQ(5.0f, merged.estimatedModuleSize);
   EXPECT_EQ(3, merged.count);
-  EXPECT_EQ(1, QVFinderPattern(1.9f, -0.9f, 1, 1).getX());
-  EXPECT_EQ(0, QVFinderPattern(1.9f, -0.9f, 1, 1).getY());
 }
 
 TEST(FinderPattern, TheSameMarkIsOneModuleAwayAtMost) {
@@ -86,9 +78,8 @@ TEST(CrossChecks, ASideMayHoldMaxCountBeforeTheCoreButNotBehind) {
     const cv::Mat wide(60, 9, CV_8UC1, cv::Scalar(255));
     cv::Mat column = wide.col(4);  // with a stride of its own
     int end = 10;
-    for (std::size_t i = 0; i < 5; ++i) {
+    for (std::size_t i = 0; i < 5; end += runs[i], ++i) {
       column.rowRange(end, end + runs[i]).setTo(i % 2 == 0 ? 0 : 255);
-      end += runs[i];
     }
     const int core = 10 + runs[0] + runs[1] + runs[2] / 2;
     EXPECT_EQ(passes, tester.crossCheckVertical(column, core, 0, 4, end - 10) != FLT_MAX)
@@ -125,18 +116,17 @@ TEST(FinderPoints, TheDiagonalIsAlwaysChecked) {
 }
 
 TEST(FinderPoints, DrawnMarksAreFoundExactly) {
-  std::mt19937 random(1);
+  cv::RNG random(1);
   QVTester tester;
   for (int round = 0; round < 1000; ++round) {
-    const auto any = [&](int from, int to) { return std::uniform_int_distribution<int>(from, to)(random); };
-    const int module = any(2, 9);
+    const int module = random.uniform(2, 10);
     const int room = 11 * module;
-    const auto near = [&] { return any(0, 2 * module); };
-    const auto away = [&] { return room + any(0, 40); };
+    const auto near = [&] { return random.uniform(0, 2 * module + 1); };
+    const auto away = [&] { return room + random.uniform(0, 41); };
     const std::vector<cv::Point> corners = {{near(), near()}, {near(), away()}, {away(), near()}};
-    const cv::Mat image = DrawMarks({2 * room + 50, 2 * room + 50}, module, corners);
-    EXPECT_THAT(tester.GetFinderPoints(image),
-                UnorderedElementsAre(Found(corners[0], module), Found(corners[1], module), Found(corners[2], module)))
+    const cv::Point middle(7 * module / 2, 7 * module / 2);  // of a mark, cut to whole pixels
+    EXPECT_THAT(tester.GetFinderPoints(DrawMarks({2 * room + 50, 2 * room + 50}, module, corners)),
+                UnorderedElementsAre(corners[0] + middle, corners[1] + middle, corners[2] + middle))
         << "round " << round << ", module " << module;
   }
 }
@@ -144,9 +134,10 @@ TEST(FinderPoints, DrawnMarksAreFoundExactly) {
 TEST(FinderPoints, FewerThanThreeAreHandedOutAndLogged) {
   QVTester tester;
   const LogLines log;
-  EXPECT_THAT(tester.GetFinderPoints(cv::Mat(2, 50, CV_8UC1, cv::Scalar(0))), IsEmpty());
-  EXPECT_THAT(tester.GetFinderPoints(cv::Mat()), IsEmpty());
-  EXPECT_THAT(tester.GetFinderPoints(cv::Mat(50, 50, CV_8UC1, cv::Scalar(255))), IsEmpty());
+  for (const cv::Mat& image :
+       {cv::Mat(2, 50, CV_8UC1, cv::Scalar(0)), cv::Mat(), cv::Mat(9, 9, CV_8UC1, cv::Scalar(255))}) {
+    EXPECT_THAT(tester.GetFinderPoints(image), IsEmpty());
+  }
   EXPECT_THAT(tester.GetFinderPoints(DrawMarks({80, 60}, 3, {{5, 5}, {5, 50}})), SizeIs(2));
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] startSize : 0", "[OKAPI] startSize : 0", "[OKAPI] startSize : 0",
                                              "[OKAPI] startSize : 2"));
@@ -155,106 +146,86 @@ TEST(FinderPoints, FewerThanThreeAreHandedOutAndLogged) {
   }
 }
 
-// All that a search answers and leaves; the cross checks' counts tell of its last call, also of one that failed.
-std::vector<float> Traces(QVTester& tester, const std::function<std::vector<cv::Point>()>& search) {
-  std::fill_n(tester.crossCheckStateCount, 5, -1);
-  std::vector<float> traces;
-  for (const cv::Point& point : search()) {
-    traces.push_back(static_cast<float>(point.x));
-    traces.push_back(static_cast<float>(point.y));
-  }
+// What a search leaves; the cross checks' counts tell of its last call, also of one that failed.
+std::vector<float> Traces(const QVTester& tester) {
+  std::vector<float> traces(tester.crossCheckStateCount, tester.crossCheckStateCount + 5);
   traces.push_back(static_cast<float>(tester.startSize));
   traces.push_back(tester.hasSkipped ? 1 : 0);
-  traces.insert(traces.end(), tester.crossCheckStateCount, tester.crossCheckStateCount + 5);
-  for (const QVFinderPattern& candidate : tester.possibleCenters) {
-    const auto count = static_cast<float>(candidate.count);
-    for (const float value : {candidate.x, candidate.y, candidate.estimatedModuleSize, candidate.average, count}) {
-      traces.push_back(value);
-    }
+  for (const QVFinderPattern& c : tester.possibleCenters) {
+    traces.insert(traces.end(), {c.x, c.y, c.estimatedModuleSize, c.average, static_cast<float>(c.count)});
   }
   return traces;
 }
 
-class Pictures {
- public:
-  explicit Pictures(unsigned seed) : random_(seed) {}
+// Specks, so many per cent of them dark.
+cv::Mat Specks(cv::RNG& random, cv::Size size, int dark, int grain) {
+  cv::Mat image(size, CV_8UC1);
+  random.fill(image, cv::RNG::UNIFORM, 0, 100);
+  cv::resize(image >= dark, image, {}, grain, grain, cv::INTER_NEAREST);
+  return image;
+}
 
-  int Any(int from, int to) { return std::uniform_int_distribution<int>(from, to)(random_); }
+// Of any density and grain; sizes around and below a block of 64 pixels.
+cv::Mat Garbage(cv::RNG& random) {
+  const int width = random.uniform(0, 3) == 0 ? 64 * random.uniform(1, 4) : random.uniform(1, 201);
+  return Specks(random, {width, random.uniform(1, 51)}, random.uniform(0, 101), random.uniform(1, 4));
+}
 
-  // Garbage of any density and grain; sizes around and below a block of 64 pixels.
-  cv::Mat Garbage() {
-    cv::Mat image(Any(1, 50), Any(0, 2) == 0 ? 64 * Any(1, 3) : Any(1, 200), CV_8UC1);
-    const int dark = Any(0, 100);
-    for (uchar& pixel : cv::Mat_<uchar>(image)) pixel = Any(0, 99) < dark ? 0 : 255;
-    cv::resize(image, image, {}, Any(1, 3), Any(1, 3), cv::INTER_NEAREST);
-    return image;
+// Marks, some cut by the border, on specked paper or among the blocks of a two-dimensional code.
+cv::Mat Marks(cv::RNG& random) {
+  const int module = random.uniform(1, 9);
+  const int dark = std::array<int, 3>{0, 2, 50}[random.uniform(0, 3)];
+  const int grain = dark == 50 ? module : 1;
+  const cv::Size size = cv::Size(random.uniform(7, 31), random.uniform(7, 31)) * module / grain;
+  const cv::Mat image = Specks(random, size, dark, grain);
+  const int margin = 7 * (module + 1);
+  cv::Mat canvas;
+  cv::copyMakeBorder(image, canvas, margin, margin, margin, margin, cv::BORDER_CONSTANT);
+  for (int marks = random.uniform(0, 7); marks > 0; --marks) {
+    DrawMark(canvas, random.uniform(margin / 2, image.rows + margin / 2),
+             random.uniform(margin / 2, image.cols + margin / 2), std::max(1, module + random.uniform(-1, 2)));
   }
-  // Marks, some cut by the border, on specked paper or among the blocks of a two-dimensional code.
-  cv::Mat Marks() {
-    const int module = Any(1, 8);
-    const int dark = std::array<int, 3>{0, 2, 50}[Any(0, 2)];
-    const int grain = dark == 50 ? module : 1;
-    cv::Mat image(Any(7, 30) * module / grain, Any(7, 30) * module / grain, CV_8UC1);
-    for (uchar& pixel : cv::Mat_<uchar>(image)) pixel = Any(0, 99) < dark ? 0 : 255;
-    cv::resize(image, image, {}, grain, grain, cv::INTER_NEAREST);
-    const int margin = 7 * (module + 1);
-    cv::Mat canvas;
-    cv::copyMakeBorder(image, canvas, margin, margin, margin, margin, cv::BORDER_CONSTANT);
-    for (int marks = Any(0, 6); marks > 0; --marks) {
-      DrawMark(canvas, Any(margin / 2, image.rows + margin / 2), Any(margin / 2, image.cols + margin / 2),
-               std::max(1, module + Any(-1, 1)));
-    }
-    return canvas({margin, margin, image.cols, image.rows}).clone();
-  }
-  // One sampled row of runs near the limits of the ratio.
-  cv::Mat Limits() {
-    std::vector<uchar> row(static_cast<std::size_t>(Any(0, 3)), 255);
-    const int total = Any(7, 90);
-    for (int mark = 0; mark < 3; ++mark) {
-      for (const int modules : {1, 1, 3, 1, 1, 1}) {
-        const int ideal = modules * total * std::array<int, 3>{1, 2, 3}[Any(0, 2)] / 14;
-        row.insert(row.end(), std::max(0, ideal + Any(-1, 1)), row.empty() || row.back() != 0 ? 0 : 255);
-      }
-    }
-    return cv::repeat(cv::Mat(1, static_cast<int>(row.size()), CV_8UC1, row.data()), 3, 1);
-  }
-  // In a wider picture of other pixels, and with any value but 0 for light.
-  cv::Mat Disguised(const cv::Mat& image) {
-    cv::Mat around(image.rows + 3, image.cols + Any(1, 70), CV_8UC1, cv::Scalar(0));
-    cv::Mat view = around(cv::Rect({Any(0, around.cols - image.cols), 2}, image.size()));
-    for (int i = 0; i < image.rows; ++i) {
-      for (int j = 0; j < image.cols; ++j) {
-        view.at<uchar>(i, j) = image.at<uchar>(i, j) == 0 ? 0 : static_cast<uchar>(Any(1, 255));
-      }
-    }
-    return view;
-  }
+  return canvas({{margin, margin}, image.size()}).clone();
+}
 
- private:
-  std::mt19937 random_;
-};
+// One sampled row of runs near the limits of the ratio.
+cv::Mat Limits(cv::RNG& random) {
+  std::vector<uchar> row(random.uniform(0, 4), 255);
+  const int total = random.uniform(7, 91);
+  for (int run = 0; run < 18; ++run) {
+    const int modules = run % 6 == 2 ? 3 : 1;
+    const int ideal = modules * total * random.uniform(1, 4) / 14;
+    row.insert(row.end(), std::max(0, ideal + random.uniform(-1, 2)), row.empty() || row.back() != 0 ? 0 : 255);
+  }
+  return cv::repeat(cv::Mat(row).reshape(1, 1), 3, 1);
+}
 
-void ExpectPlainSearch(const cv::Mat& image, unsigned seed) {
-  QVTester tester;
-  const std::vector<float> plain = Traces(tester, [&] { return plain::GetFinderPoints(tester, image); });
-  ASSERT_EQ(plain, Traces(tester, [&] { return tester.GetFinderPoints(image); })) << "seed " << seed;
+// In a wider picture of other pixels, and with any value but 0 for light.
+cv::Mat Disguised(cv::RNG& random, const cv::Mat& image) {
+  cv::Mat around = cv::Mat::zeros(image.rows + 3, image.cols + random.uniform(1, 71), CV_8UC1);
+  cv::Mat view = around({{random.uniform(0, around.cols - image.cols + 1), 2}, image.size()});
+  random.fill(view, cv::RNG::UNIFORM, 1, 256);
+  view &= image;
+  return view;
 }
 
 TEST(FinderPoints, TheScanByRunsEqualsTheScanByPixels) {
   const LogLines log;
-  for (unsigned seed = 0; seed < 1500; ++seed) {
-    Pictures pictures(seed);
-    for (const cv::Mat& image : {pictures.Garbage(), pictures.Marks(), pictures.Limits()}) {
-      ExpectPlainSearch(image, seed);
-      ExpectPlainSearch(pictures.Disguised(image), seed);
-      if (HasFatalFailure()) return;
+  cv::RNG random(1);
+  for (int round = 0; round < 1500; ++round) {
+    for (const cv::Mat& image : {Garbage(random), Marks(random), Limits(random)}) {
+      for (const cv::Mat& picture : {image, Disguised(random, image)}) {
+        QVTester plain;
+        QVTester fast;
+        ASSERT_EQ(plain::GetFinderPoints(plain, picture), fast.GetFinderPoints(picture)) << "round " << round;
+        ASSERT_EQ(Traces(plain), Traces(fast)) << "round " << round;
+      }
     }
   }
 }
 
 TEST(FinderSelection, ThePatternIsConfirmedBySizes) {
   QVTester tester;
-  EXPECT_FALSE(tester.haveMultiplyConfirmedCenters());
   tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10, 2}, {0, 0, 10, 1}};
   EXPECT_FALSE(tester.haveMultiplyConfirmedCenters()) << "only two were seen twice";
   tester.possibleCenters = {{0, 0, 10, 2}, {0, 0, 10.5f, 2}, {0, 0, 11, 3}};
@@ -277,14 +248,11 @@ TEST(FinderSelection, TwoConfirmedMarksOnlyRaiseTheFlag) {
 
 TEST(FinderSelection, StrayModuleSizesGoFirstThenTheLeastSeen) {
   QVTester tester;
-  tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, 30, 9}};
-  EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)));
-  EXPECT_THAT(tester.possibleCenters, SizeIs(3));
-
-  tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, 13, 9}};
-  EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)))
-      << "2.25 off an average of 10.75: a fifth of the average is the limit";
-
+  for (const float stray : {30.0f, 13.0f}) {  // 13 is 2.25 off an average of 10.75: a fifth of the average is the limit
+    tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, stray, 9}};
+    EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)));
+    EXPECT_THAT(tester.possibleCenters, SizeIs(3));
+  }
   tester.possibleCenters.clear();
   for (int i = 1; i <= 8; ++i) tester.possibleCenters.emplace_back(0.0f, static_cast<float>(i), 10.0f, i);
   EXPECT_THAT(tester.selectBestPatterns(), ElementsAre(cv::Point(8, 0), cv::Point(7, 0), cv::Point(6, 0)));
