@@ -122,24 +122,8 @@ void Areas(Bytes& bytes) {
     const cv::Point size(bytes.ConsumeIntegralInRange(0, 15), bytes.ConsumeIntegralInRange(0, 15));
     given.push_back({at, at + size, 1, 0});
   }
-  const auto n = given.size();
-  if (n < 2) return;
-  std::vector<int> areas(n);
-  auto* counts = static_cast<int*>(std::malloc(n * sizeof(int)));
-  auto* first = static_cast<cv::Point*>(std::malloc(n * sizeof(cv::Point)));
-  auto* last = static_cast<cv::Point*>(std::malloc(n * sizeof(cv::Point)));
-  for (std::size_t i = 0; i < n; ++i) {
-    counts[i] = given[i].count;
-    first[i] = given[i].top_left;
-    last[i] = given[i].bottom_right;
-  }
-  QVTester().ErrorAreaClustering(distance, 200, 200, &areas, &counts, &first, &last);
-  std::vector<plain::ErrorArea> merged;
-  for (std::size_t i = 0; i < areas.size(); ++i) merged.push_back({first[i], last[i], counts[i], areas[i]});
-  std::free(counts);
-  std::free(first);
-  std::free(last);
-  Demand(plain::ErrorAreaClustering(distance, 200, 200, given) == merged, "ErrorAreaClustering");
+  Demand(plain::ErrorAreaClustering(distance, 200, 200, given) == plain::ClusterByTester(distance, 200, 200, given),
+         "ErrorAreaClustering");
 }
 
 void Temperatures(Bytes& bytes) {

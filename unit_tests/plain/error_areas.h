@@ -2,8 +2,11 @@
 #define QVTESTER_UNIT_TESTS_PLAIN_ERROR_AREAS_H_
 
 #include <algorithm>
+#include <cstdlib>
 #include <opencv2/core.hpp>
 #include <vector>
+
+#include "qvtester/tester.h"
 
 // Merging of error areas as its method is written: what tests/led_touch/QVTester_ErrorAreas.cpp is compared with.
 
@@ -44,6 +47,25 @@ inline std::vector<ErrorArea> ErrorAreaClustering(int distance, int width, int h
     }
     in = out;
   }
+  return in;
+}
+
+// The tester's answer by its own interface: arrays from malloc, which it replaces.
+inline std::vector<ErrorArea> ClusterByTester(int distance, int width, int height, std::vector<ErrorArea> in) {
+  std::vector<int> areas(in.size());
+  auto* counts = static_cast<int*>(std::calloc(in.size(), sizeof(int)));
+  auto* first = static_cast<cv::Point*>(std::calloc(in.size(), sizeof(cv::Point)));
+  auto* last = static_cast<cv::Point*>(std::calloc(in.size(), sizeof(cv::Point)));
+  for (std::size_t i = 0; i < in.size(); ++i) {
+    counts[i] = in[i].count;
+    first[i] = in[i].top_left;
+    last[i] = in[i].bottom_right;
+  }
+  in.resize(QVTester().ErrorAreaClustering(distance, width, height, &areas, &counts, &first, &last));
+  for (std::size_t i = 0; i < in.size(); ++i) in[i] = {first[i], last[i], counts[i], areas.at(i)};
+  std::free(counts);
+  std::free(first);
+  std::free(last);
   return in;
 }
 

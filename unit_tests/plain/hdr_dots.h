@@ -16,14 +16,13 @@ namespace plain {
 // precision: its rounding is part of the result. (height + 1) x (width + 1).
 inline cv::Mat SumChannel0(const float* data, int height, int width) {
   cv::Mat sums = cv::Mat::zeros(height + 1, width + 1, CV_32F);
-  for (int y = 1; y <= height; ++y) {
-    const float* const row = data + static_cast<std::size_t>(y - 1) * width * 3;
-    const auto* const above = sums.ptr<float>(y - 1);
-    auto* const here = sums.ptr<float>(y);
+  for (int y = 0; y < height; ++y) {
+    const auto* const above = sums.ptr<float>(y);
+    auto* const here = sums.ptr<float>(y + 1);
     float row_sum = 0;
-    for (int x = 1; x <= width; ++x) {
-      row_sum += row[3 * (x - 1)];
-      here[x] = above[x] + row_sum;
+    for (int x = 0; x < width; ++x, data += 3) {
+      row_sum += *data;
+      here[x + 1] = above[x + 1] + row_sum;
     }
   }
   return sums;
