@@ -9,7 +9,10 @@
 
 namespace {
 
+using ::testing::AllOf;
 using ::testing::ElementsAre;
+using ::testing::Gt;
+using ::testing::Lt;
 
 class Autofocus : public ModuleTest {
  protected:
@@ -32,25 +35,22 @@ TEST_F(Autofocus, AChartPhotoGivesCurvesAndFigures) {
   ASSERT_EQ(1, Measure(DrawChart()));
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] RunTest, testindex: 14, fake_mode: 0, step: 0",
                                              "[GetSFRFromImage] prop_binary_thr_working_: 125"));
-  const QVResultData* results = &Results();
-  EXPECT_EQ(75 / 2 + 1, results->af_sfr_count_);  // 750 chart units at a tenth of a pixel
-  EXPECT_EQ(1.0f, results->af_sfr_second_[0]);
-  EXPECT_EQ(1.0f, results->af_sfr_third_[0]);
+  const QVResultData& results = Results();
+  EXPECT_EQ(75 / 2 + 1, results.af_sfr_count_);  // 750 chart units at a tenth of a pixel
+  EXPECT_EQ(1.0f, results.af_sfr_second_[0]);
+  EXPECT_EQ(1.0f, results.af_sfr_third_[0]);
   const auto [low, high] = method_law::MeasuredMtf50(ChartView().blur_px, 75);
-  for (const float mtf50 : {results->af_sfr_scalar1_, results->af_sfr_scalar2_}) {
-    EXPECT_GT(mtf50, 0.95 * low);  // 5 %: the drawing has four subpixels and whole grey levels
-    EXPECT_LT(mtf50, 1.05 * high);
-  }
+  const auto lawful = AllOf(Gt(0.95 * low), Lt(1.05 * high));  // 5 %: four subpixels and whole grey levels are drawn
+  EXPECT_THAT(results.af_sfr_scalar1_, lawful);
+  EXPECT_THAT(results.af_sfr_scalar2_, lawful);
 }
 
-TEST_F(Autofocus,
-       PhotosThatCanNotBeMeasuredChangeNothing) {  // the fault that matters: stale numbers taken for new ones
-  ChartView two;
-  two.marks = 2;
+// The fault that matters: stale numbers taken for new ones.
+TEST_F(Autofocus, PhotosThatCanNotBeMeasuredChangeNothing) {
   ASSERT_EQ(1, Measure(DrawChart()));
   const std::vector<float> before = Held();
   const LogLines log;
-  EXPECT_EQ(-91, Measure(DrawChart(two)));
+  EXPECT_EQ(-91, Measure(DrawChart({2})));
   EXPECT_EQ(before, Held());
   EXPECT_THAT(LogLines::Texts(),
               ElementsAre("[OKAPI] RunTest, testindex: 14, fake_mode: 0, step: 0",
@@ -94,7 +94,7 @@ TEST_F(Autofocus, TheMtfMeasuresAgree) {
   ASSERT_EQ(1, CheckMTF(&vertical, &horizontal));
   EXPECT_EQ(Held()[0], vertical);
 
-  LogLines miss;
+  const LogLines miss;
   EXPECT_EQ(-91, theTester->GetMTFFromImage(cv::Mat(50, 50, CV_8UC3, cv::Scalar::all(255)), vertical, horizontal));
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[GetMTFFromImage] prop_binary_thr_working_: 125", "[OKAPI] startSize : 0",
                                              "GetMTFFromImage 0 circle is detected using finder_point algorithm!",
@@ -104,16 +104,12 @@ TEST_F(Autofocus, TheMtfMeasuresAgree) {
 // The code and all figures of a measure.
 template <typename Measure>
 std::vector<float> Figures(const Measure& measure) {
-  std::vector<float> freq;
-  std::vector<float> sfr_vertical;
-  std::vector<float> sfr_horizontal;
+  std::vector<float> lists[3];
   float vertical = 0;
   float horizontal = 0;
-  const int code = measure(freq, sfr_vertical, sfr_horizontal, vertical, horizontal);
+  const int code = measure(lists[0], lists[1], lists[2], vertical, horizontal);
   std::vector<float> figures = {static_cast<float>(code), vertical, horizontal};
-  for (const auto* list : {&freq, &sfr_vertical, &sfr_horizontal}) {
-    figures.insert(figures.end(), list->begin(), list->end());
-  }
+  for (const auto& list : lists) figures.insert(figures.end(), list.begin(), list.end());
   return figures;
 }
 
@@ -123,12 +119,7 @@ TEST(ChartMtf, WorkImagesAndRegionsGiveWhatTheLiteralChainGives) {
   int measured = 0;
   for (const double turn : {0.0, 31.0, 90.0, 143.0, 359.0}) {
     for (const cv::Size& size : {cv::Size(900, 700), cv::Size(640, 800), cv::Size(500, 500)}) {
-      ChartView view;
-      view.turn_deg = turn;
-      view.size = size;
-      view.scale = 0.05;
-      view.marks = size.width == 500 && turn < 3 ? 2 : 3;
-      const cv::Mat photo = DrawChart(view);
+      const cv::Mat photo = DrawChart({size.width == 500 && turn < 3 ? 2 : 3, turn, 0.05, size});
       const cv::Mat untouched = photo.clone();
       const auto plain = Figures([&](auto&... out) { return plain::GetSFRFromImage(tester, photo, out...); });
       EXPECT_EQ(plain, Figures([&](auto&... out) { return tester.GetSFRFromImage(photo, out...); }))
@@ -136,11 +127,9 @@ TEST(ChartMtf, WorkImagesAndRegionsGiveWhatTheLiteralChainGives) {
       EXPECT_EQ(0, cv::norm(photo, untouched, cv::NORM_INF));
       if (plain[0] != QV_SUCCESS) continue;
       ++measured;
-      float vertical = 0;
-      float horizontal = 0;
-      EXPECT_EQ(QV_SUCCESS, tester.GetMTFFromImage(photo, vertical, horizontal));
-      EXPECT_EQ(plain[1], vertical);
-      EXPECT_EQ(plain[2], horizontal);
+      std::vector<float> mtf50(2);
+      EXPECT_EQ(QV_SUCCESS, tester.GetMTFFromImage(photo, mtf50[0], mtf50[1]));
+      EXPECT_THAT(mtf50, ElementsAre(plain[1], plain[2]));
     }
   }
   EXPECT_GT(measured, 9) << "of 14 with three marks";
@@ -149,12 +138,10 @@ TEST(ChartMtf, WorkImagesAndRegionsGiveWhatTheLiteralChainGives) {
 TEST(ChartMtf, ARegionOutsideTheUprightPictureIsTheSameError) {
   QVTester tester;
   const LogLines log;
-  const std::vector<cv::Mat> views = {
-      // A chart turned by 45 degrees at the upper right: the vertical region is out of view.
-      DrawMarks({1000, 1000}, 6, {{279, 679}, {19, 939}, {539, 939}}),
-      // With corner and second mark in one column the scale is 0, and both regions are empty.
-      DrawMarks({400, 400}, 5, {{20, 20}, {20, 60}, {340, 20}})};
-  for (const cv::Mat& marks : views) {
+  for (const cv::Mat& marks : {// A chart turned by 45 degrees at the upper right: the vertical region is out of view.
+                               DrawMarks({1000, 1000}, 6, {{279, 679}, {19, 939}, {539, 939}}),
+                               // With corner and second mark in one column the scale is 0, and both regions are empty.
+                               DrawMarks({400, 400}, 5, {{20, 20}, {20, 60}, {340, 20}})}) {
     cv::Mat photo;
     cv::cvtColor(marks, photo, cv::COLOR_GRAY2BGR);
     std::vector<float> list;

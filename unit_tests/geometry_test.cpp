@@ -16,20 +16,18 @@ using ::testing::ElementsAre;
 // Points hold the row in x, the column in y.
 const cv::Point kCorner(100, 200), kRight(100, 300), kBelow(200, 200);
 
+// Corner, second and third mark.
+std::vector<cv::Point> Sorted(const std::vector<cv::Point>& points) {
+  std::vector<cv::Point> marks(3, {9, 9});
+  QVTester().SortPatternPoints(points, marks[0], marks[1], marks[2]);
+  return marks;
+}
+
 TEST(Geometry, EveryListOrderGivesTheSameMarks) {
-  QVTester tester;
-  std::vector<cv::Point> points = {kCorner, kRight, kBelow};
   std::vector<int> order = {0, 1, 2};
   do {
-    const std::vector<cv::Point> list = {points[order[0]], points[order[1]], points[order[2]]};
-    cv::Point corner;
-    cv::Point second;
-    cv::Point third;
-    tester.SortPatternPoints(list, corner, second, third);
-    EXPECT_EQ(kCorner, tester.GetCornerPoint(list));
-    EXPECT_EQ(kCorner, corner);
-    EXPECT_EQ(kRight, second);
-    EXPECT_EQ(kBelow, third);
+    const cv::Point points[] = {kCorner, kRight, kBelow};
+    EXPECT_THAT(Sorted({points[order[0]], points[order[1]], points[order[2]]}), ElementsAre(kCorner, kRight, kBelow));
   } while (std::next_permutation(order.begin(), order.end()));
 }
 
@@ -43,12 +41,7 @@ TEST(Geometry, EqualLongestSidesAreSettledByOrder) {
 
 TEST(Geometry, ShortListsAreSurvived) {
   QVTester tester;
-  cv::Point corner;
-  cv::Point second;
-  cv::Point third(9, 9);
-  tester.SortPatternPoints({}, corner, second, third);
-  EXPECT_EQ(cv::Point(-1, -1), second);
-  EXPECT_EQ(cv::Point(0, 0), third);
+  EXPECT_THAT(Sorted({}), ElementsAre(cv::Point(0, 0), cv::Point(-1, -1), cv::Point(0, 0)));
   EXPECT_EQ(-1.0f, tester.GetPatternAngle({kCorner, kRight}));
   EXPECT_EQ(-1.0f, tester.GetPatternAngle({kCorner, kRight, kBelow, kBelow}));
 }
@@ -82,8 +75,8 @@ TEST(Geometry, APictureOfAnyKindIsWhatTheWarpGives) {
           std::vector<cv::Point> points = chart;
           tester.NormalizePatternImage(image, points, *normalized);
           ASSERT_EQ(expected.size(), normalized->size());
-          const std::size_t bytes = expected.total() * expected.elemSize();
-          EXPECT_EQ(0, std::memcmp(expected.data, normalized->data, bytes)) << type << ' ' << size;
+          EXPECT_EQ(0, std::memcmp(expected.data, normalized->data, expected.total() * expected.elemSize()))
+              << type << ' ' << size;
           EXPECT_EQ(expected_points, points);
         }
       }
@@ -98,28 +91,24 @@ TEST(Geometry, APictureOfAnyKindIsWhatTheWarpGives) {
 TEST(Geometry, PointsTravelWithThePicture) {
   QVTester tester;
   for (int turn = 0; turn < 360; turn += 7) {
-    // A chart turned about the middle of a 640 x 640 picture, its marks drawn as dots.
+    // A chart turned about the middle of a picture, its marks drawn as dots.
     std::vector<cv::Point> points;
     cv::Mat image = cv::Mat::zeros(480, 640, CV_8UC1);
-    const double angle = turn * CV_PI / 180;
-    for (const cv::Point2d& p : {cv::Point2d(-80, -80), {80, -80}, {-80, 80}}) {
-      const cv::Point2d at(320 + p.x * std::cos(angle) + p.y * std::sin(angle),
-                           240 - p.x * std::sin(angle) + p.y * std::cos(angle));
-      points.emplace_back(cvRound(at.y), cvRound(at.x));
-      cv::circle(image, {cvRound(at.x), cvRound(at.y)}, 4, cv::Scalar(255), cv::FILLED);
+    const cv::Matx23d map = cv::getRotationMatrix2D({320, 240}, turn, 1);
+    for (const cv::Vec3d& mark : {cv::Vec3d(240, 160, 1), {400, 160, 1}, {240, 320, 1}}) {
+      const cv::Vec2d at = map * mark;
+      points.emplace_back(cvRound(at[1]), cvRound(at[0]));
+      cv::circle(image, {points.back().y, points.back().x}, 4, cv::Scalar(255), cv::FILLED);
     }
     cv::Mat upright;
     tester.NormalizePatternImage(image, points, upright);
     for (const cv::Point& p : points) EXPECT_GT(upright.at<uchar>(p.x, p.y), 200) << "turned by " << turn;
-    cv::Point corner;
-    cv::Point second;
-    cv::Point third;
-    tester.SortPatternPoints(points, corner, second, third);
+    const std::vector<cv::Point> marks = Sorted(points);
     // The angle is known to a degree: 160 pixels sideways rise by 3 at the most, 2 more for rounding.
-    EXPECT_NEAR(0, second.x - corner.x, 5) << "turned by " << turn;
-    EXPECT_NEAR(160, second.y - corner.y, 3);
-    EXPECT_NEAR(0, third.y - corner.y, 5);
-    EXPECT_NEAR(160, third.x - corner.x, 3);
+    EXPECT_NEAR(0, marks[1].x - marks[0].x, 5) << "turned by " << turn;
+    EXPECT_NEAR(160, marks[1].y - marks[0].y, 3);
+    EXPECT_NEAR(0, marks[2].y - marks[0].y, 5);
+    EXPECT_NEAR(160, marks[2].x - marks[0].x, 3);
   }
 }
 

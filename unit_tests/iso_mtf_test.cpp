@@ -18,19 +18,13 @@ struct Slant {
   double turn_deg = 0, slope_deg = 5;  // of the region in the photo, of the edge in the region
   double sigma_px = 0.8, noise = 0;
   cv::Point2d off = {0, 0};  // of the edge's middle from the region's
-  double width = kWidth;
-  bool light_left = false;
+  double width = kWidth;     // of the region
 };
 
 QVIsoMtf MeasureEdge(const Slant& slant) {
   const int side = static_cast<int>(std::hypot(kLength, kWidth)) + 2;
-  EdgePhoto view;
-  view.size = {side, side};
   const cv::Point2d middle(side / 2.0, side / 2.0);
-  view.through = middle + slant.off;
-  view.normal_deg = slant.turn_deg + slant.slope_deg + (slant.light_left ? 180 : 0);
-  view.sigma_px = slant.sigma_px;
-  cv::Mat photo = DrawEdgePhoto(view);
+  cv::Mat photo = DrawEdgePhoto({{side, side}, middle + slant.off, slant.turn_deg + slant.slope_deg, slant.sigma_px});
   cv::Mat noise(photo.size(), CV_32F);
   cv::randn(noise, 0, slant.noise);
   cv::Mat(photo + noise).convertTo(photo, CV_8U);
@@ -69,21 +63,16 @@ TEST(IsoMtf, PolarityPlaceAndOrientationLeaveItAlone) {
   const QVIsoMtf plain = MeasureEdge({});
   EXPECT_EQ(nullptr, plain.reason);
   EXPECT_NEAR(-5, plain.edge_angle_deg, 0.01);
-  Slant slant;
-  slant.light_left = true;
-  EXPECT_NEAR(plain.mtf50, MeasureEdge(slant).mtf50, 1e-3 * plain.mtf50);  // levels are rounded elsewhere
-  slant.turn_deg = 90;
-  EXPECT_NEAR(plain.mtf50, MeasureEdge(slant).mtf50, 1e-3 * plain.mtf50);
-  slant.off = {68, 0};  // it leaves the region half-way to its end
-  EXPECT_NEAR(plain.mtf50, MeasureEdge(slant).mtf50, 5e-3 * plain.mtf50);
-  slant.off = {3, -20};  // the window goes with the edge, not with the region
-  EXPECT_NEAR(plain.mtf50, MeasureEdge(slant).mtf50, 5e-3 * plain.mtf50);
+  EXPECT_NEAR(plain.mtf50, MeasureEdge({0, 185}).mtf50, 1e-3 * plain.mtf50);  // levels are rounded elsewhere
+  EXPECT_NEAR(plain.mtf50, MeasureEdge({90, 185}).mtf50, 1e-3 * plain.mtf50);
+  for (const cv::Point2d off : {cv::Point2d(68, 0),      // the edge leaves the region half-way to its end
+                                cv::Point2d(3, -20)}) {  // the window goes with the edge, not with the region
+    EXPECT_NEAR(plain.mtf50, MeasureEdge({90, 185, 0.8, 0, off}).mtf50, 5e-3 * plain.mtf50);
+  }
 }
 
 TEST(IsoMtf, ARegionMayFillThePhoto) {
-  EdgePhoto view;
-  view.size = {100, 250};
-  view.through = {50, 125};
+  const EdgePhoto view = {{100, 250}, {50, 125}};
   QVIsoMtf result;
   const auto all = TurnedRectangle({49.5, 124.5}, 250, 100, 0);
   ASSERT_EQ(QV_SUCCESS, MeasureIsoMtf50(DrawEdgePhoto(view), all, &result));
@@ -91,40 +80,30 @@ TEST(IsoMtf, ARegionMayFillThePhoto) {
 }
 
 TEST(IsoMtf, WhereThereIsNoFigureItSaysWhy) {
-  const auto why = [](const Slant& slant) {
+  for (const auto& [slant, reason] : std::vector<std::pair<Slant, const char*>>{
+           {{0, 0}, "follows the pixel grid"},
+           {{40, 5}, "follows the pixel grid"},  // at 45 degrees
+           {{0, 5, 0.8, 0, {}, 10}, "too small"},
+           {{0, 5, 30}, "too wide"},
+           {{0, 0.3, 1, 0, {kWidth / 2 - 5, 0}}, "too near"},  // and still in every row
+           {{0, 0.3, 1, 0, {3 * kWidth, 0}}, "not show one edge"},
+           {{0, 0.3, 1, 5, {3 * kWidth, 0}}, "not show one edge"}}) {
     const QVIsoMtf result = MeasureEdge(slant);
-    EXPECT_TRUE(std::isnan(result.mtf50));
-    return std::string(result.reason == nullptr ? "" : result.reason);
-  };
-  EXPECT_THAT(why({0, 0}), HasSubstr("follows the pixel grid"));
-  EXPECT_THAT(why({40, 5}), HasSubstr("follows the pixel grid")) << "at 45 degrees";
-  Slant slant;
-  slant.width = 10;
-  EXPECT_THAT(why(slant), HasSubstr("too small"));
-  slant.width = kWidth;
-  slant.sigma_px = 30;
-  EXPECT_THAT(why(slant), HasSubstr("too wide"));
-  slant.sigma_px = 1;
-  slant.off = {kWidth / 2 - 5, 0};
-  slant.slope_deg = 0.3;  // and still in every row
-  EXPECT_THAT(why(slant), HasSubstr("too near"));
-  slant.off = {3 * kWidth, 0};
-  EXPECT_THAT(why(slant), HasSubstr("not show one edge"));
-  slant.noise = 5;
-  EXPECT_THAT(why(slant), HasSubstr("not show one edge"));
-
+    EXPECT_TRUE(std::isnan(result.mtf50)) << reason;
+    EXPECT_THAT(result.reason, HasSubstr(reason));
+  }
   QVIsoMtf result;
+  const cv::Mat photo = cv::Mat::zeros(9, 9, CV_8U);
   const auto beyond = TurnedRectangle({5000, -3}, kLength, kWidth, 0);
-  EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8U), beyond, &result));
+  EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(photo, beyond, &result));
   EXPECT_THAT(result.reason, HasSubstr("outside the photo"));
   for (const double nowhere : {1e300, -1e12, std::nan("")}) {
-    const auto corners = TurnedRectangle({nowhere, 0}, kLength, kWidth, 0);
-    EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8U), corners, &result));
+    EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(photo, TurnedRectangle({nowhere, 0}, kLength, kWidth, 0), &result));
     EXPECT_TRUE(std::isnan(result.mtf50) && result.reason != nullptr) << nowhere;
   }
   EXPECT_EQ(QV_ERROR_UNUSABLE_INPUT, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8UC3), beyond, &result));
   EXPECT_EQ(QV_ERROR_UNUSABLE_INPUT, MeasureIsoMtf50(cv::Mat(), beyond, &result));
-  EXPECT_EQ(QV_ERROR_INVALID_ARGUMENT, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8U), beyond, nullptr));
+  EXPECT_EQ(QV_ERROR_INVALID_ARGUMENT, MeasureIsoMtf50(photo, beyond, nullptr));
 }
 
 }  // namespace

@@ -50,8 +50,7 @@ void ReadResults() {
   QVResultData* results = nullptr;
   if (GetResult(&results) != 1) return;
   for (const QVPreviewResult* preview : {&results->preview_main_, &results->preview_front_}) {
-    if (preview->preview_diff_map_ != nullptr)
-      ReadAll(preview->preview_diff_map_, preview->preview_diff_rows_ * preview->preview_diff_cols_);
+    ReadAll(preview->preview_diff_map_, preview->preview_diff_rows_ * preview->preview_diff_cols_);
   }
   for (const float* sfr : {results->af_sfr_first_, results->af_sfr_second_, results->af_sfr_third_})
     ReadAll(sfr, results->af_sfr_count_);

@@ -65,13 +65,14 @@ void Finder(Bytes& bytes) {
   QVTester fast;
   QVTester plain;
   Demand(plain::GetFinderPoints(plain, image) == fast.GetFinderPoints(image), "GetFinderPoints");
-  std::vector<float> seen[2];
-  for (const QVTester* tester : {&plain, &fast}) {
-    for (const QVFinderPattern& c : tester->possibleCenters) {
-      seen[tester == &fast].insert(seen[tester == &fast].end(), {c.x, c.y, c.estimatedModuleSize, c.average});
+  const auto left = [](const QVTester& tester) {
+    std::vector<float> values = {tester.hasSkipped ? 1.0f : 0.0f};
+    for (const QVFinderPattern& c : tester.possibleCenters) {
+      values.insert(values.end(), {c.x, c.y, c.estimatedModuleSize, c.average});
     }
-  }
-  Demand(Same(seen[0], seen[1]) && plain.hasSkipped == fast.hasSkipped, "GetFinderPoints' candidates");
+    return values;
+  };
+  Demand(Same(left(plain), left(fast)), "GetFinderPoints' candidates");
 }
 
 void Dots(Bytes& bytes) {
@@ -80,13 +81,12 @@ void Dots(Bytes& bytes) {
   const int radius = bytes.ConsumeIntegralInRange(0, 6);
   const float threshold = Floats(bytes, 1)[0];
   const std::size_t size = static_cast<std::size_t>(height) * width;
-  const std::vector<float> data = Floats(bytes, 3 * size);
-  std::vector<unsigned char> masks[2] = {std::vector<unsigned char>(size, 7), std::vector<unsigned char>(size, 7)};
-  if (2 * radius + 1 <= std::min(height, width)) {
-    plain::DetectDot(data.data(), height, width, threshold, radius, masks[0].data());
-  }
-  QVTester().DetectDot(const_cast<float*>(data.data()), height, width, threshold, radius, masks[1].data());
-  Demand(masks[0] == masks[1], "DetectDot");
+  std::vector<float> data = Floats(bytes, 3 * size);
+  std::vector<unsigned char> expected(size, 7);
+  std::vector<unsigned char> mask = expected;
+  plain::DetectDot(data.data(), height, width, threshold, radius, expected.data());
+  QVTester().DetectDot(data.data(), height, width, threshold, radius, mask.data());
+  Demand(expected == mask, "DetectDot");
 }
 
 void Sfr(Bytes& bytes) {
@@ -94,24 +94,23 @@ void Sfr(Bytes& bytes) {
   const std::vector<float> values =
       Floats(bytes, std::min<std::size_t>(region.total(), bytes.remaining_bytes() / 4 + 1));
   for (std::size_t i = 0; i < region.total(); ++i) region.ptr<float>()[i] = values[i % values.size()];
-  std::vector<float> seen[2];
-  for (const bool fast : {false, true}) {
-    QVTester tester;
+  const auto outcome = [](auto&& calculate) {
     std::vector<float> freq;
+    std::vector<float> sfr;
     float mtf50 = 0;
     try {
-      if (fast) {
-        tester.CalculateSFR(region, freq, seen[1], mtf50);
-      } else {
-        plain::CalculateSFR(tester, region, freq, seen[0], mtf50);
-      }
-      seen[fast].push_back(mtf50);
-      seen[fast].insert(seen[fast].end(), freq.begin(), freq.end());
+      calculate(freq, sfr, mtf50);
     } catch (const cv::Exception& e) {
-      seen[fast] = {static_cast<float>(e.code)};
+      return std::vector<float>{static_cast<float>(e.code)};
     }
-  }
-  Demand(Same(seen[0], seen[1]), "CalculateSFR");
+    sfr.push_back(mtf50);
+    sfr.insert(sfr.end(), freq.begin(), freq.end());
+    return sfr;
+  };
+  QVTester tester;
+  Demand(Same(outcome([&](auto&... out) { plain::CalculateSFR(tester, region, out...); }),
+              outcome([&](auto&... out) { tester.CalculateSFR(region, out...); })),
+         "CalculateSFR");
 }
 
 void Areas(Bytes& bytes) {
@@ -140,7 +139,7 @@ void Warp(Bytes& bytes) {
   cv::Mat image(bytes.ConsumeIntegralInRange(1, 40), bytes.ConsumeIntegralInRange(1, 80),
                 bytes.ConsumeBool() ? CV_8UC3 : CV_8UC1);
   const cv::Size canvas(bytes.ConsumeIntegralInRange(1, 90), bytes.ConsumeIntegralInRange(1, 90));
-  const cv::Mat map = cv::getRotationMatrix2D(cv::Point2f(canvas.width * 0.5f, canvas.height * 0.5f),
+  const cv::Mat map = cv::getRotationMatrix2D({canvas.width * 0.5f, canvas.height * 0.5f},
                                               bytes.ConsumeFloatingPointInRange(-720.0, 720.0),
                                               bytes.ConsumeFloatingPointInRange(0.1, 8.0));
   const int x = bytes.ConsumeIntegralInRange(0, canvas.width - 1);
