@@ -128,13 +128,6 @@ TEST(Dots, HdrPicturesAreStretchedForTheEye) {
   EXPECT_THROW(tester.HDR2UCHAR(none), cv::Exception);
 }
 
-TEST(Areas, ChainsCollapseOverSeveralPasses) {
-  // In this order no area is close to the one before it; the last joins two that are kept apart until then.
-  std::vector<ErrorArea> areas;
-  for (const int x : {0, 20, 40, 60, 30, 10, 50}) areas.push_back({{x, 40}, {x + 7, 47}, 1, 0});
-  EXPECT_THAT(plain::ClusterByTester(12, 100, 80, areas), ElementsAre(ErrorArea{{0, 40}, {67, 47}, 7, 0}));
-}
-
 TEST(Areas, TheFirstCloseOneTakesAll) {
   const std::vector<ErrorArea> areas = {
       {{0, 0}, {3, 3}, 1, 0},

@@ -2,8 +2,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdint>
-#include <cstring>
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"
@@ -144,34 +142,10 @@ TEST(SfrSteps, PolynomialsAreFittedLowestPowerFirst) {
   }
 }
 
-// To the last bit, any NaN as one.
-std::vector<std::uint32_t> Bits(const std::vector<float>& values) {
-  std::vector<std::uint32_t> bits;
-  for (const float value : values) {
-    const float one_nan = std::isnan(value) ? NAN : value;
-    std::memcpy(&bits.emplace_back(), &one_nan, sizeof one_nan);
-  }
-  return bits;
-}
-
-// Bits of all that a measurement gives, or the error that it ends with.
-template <typename Call>
-std::vector<std::uint32_t> Outcome(Call&& calculate) {
-  Sfr result;
-  try {
-    EXPECT_TRUE(calculate(result));
-  } catch (const cv::Exception& e) {
-    return {static_cast<std::uint32_t>(e.code)};
-  }
-  result.sfr.push_back(result.mtf50);
-  result.sfr.insert(result.sfr.end(), result.freq.begin(), result.freq.end());
-  return Bits(result.sfr);
-}
-
 void ExpectPlainOutcome(const cv::Mat& region, int round) {
   QVTester tester;
-  EXPECT_EQ(Outcome([&](Sfr& s) { return plain::CalculateSFR(tester, region, s.freq, s.sfr, s.mtf50); }),
-            Outcome([&](Sfr& s) { return tester.CalculateSFR(region, s.freq, s.sfr, s.mtf50); }))
+  EXPECT_EQ(plain::Outcome([&](auto&... out) { plain::CalculateSFR(tester, region, out...); }),
+            plain::Outcome([&](auto&... out) { tester.CalculateSFR(region, out...); }))
       << "round " << round << " " << region.size;
 }
 
@@ -232,8 +206,8 @@ TEST(SfrForms, AgreeOnBinsOfAnySlope) {
   for (const float slope : slopes) {
     for (const int fac : {1, 2, 4}) {
       const cv::Mat part = region(cv::Rect(0, 0, random.uniform(1, 91), random.uniform(1, 301)));
-      ASSERT_EQ(Bits(Values(plain::ProjectData(part, slope, fac))),
-                Bits(Values(tester.ProjectData(part, slope, 0, fac))))
+      ASSERT_EQ(plain::Bits(Values(plain::ProjectData(part, slope, fac))),
+                plain::Bits(Values(tester.ProjectData(part, slope, 0, fac))))
           << slope << " " << fac << " " << part.size;
     }
   }

@@ -3,7 +3,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstddef>
 #include <cstdint>
 #include <opencv2/core.hpp>
 
@@ -28,28 +27,22 @@ inline cv::Mat SumChannel0(const float* data, int height, int width) {
   return sums;
 }
 
-// First row or column of the window about place i (from 1): shifted inward near an edge, so that it keeps its size.
-inline int WindowStart(int i, int radius, int size) {
-  const int side = 2 * radius + 1;
-  return std::min(side + std::max(i - radius - 1, 0), size) - side;
-}
-
+// The window about a pixel is shifted inward near an edge, so that it keeps its size.
 inline void DetectDot(const float* data, int height, int width, float threshold, int radius, unsigned char* mask) {
-  const std::int64_t side = 2 * static_cast<std::int64_t>(radius) + 1;
-  if (radius < 0 || height < side || width < side) return;
+  const std::int64_t size = 2 * static_cast<std::int64_t>(radius) + 1;
+  if (radius < 0 || height < size || width < size) return;
+  const int side = static_cast<int>(size);
   const cv::Mat sums = SumChannel0(data, height, width);
-  const auto area = static_cast<float>(side * side);
-  for (int y = 1; y <= height; ++y) {
-    const int top = WindowStart(y, radius, height);
+  const auto area = static_cast<float>(size * size);
+  for (int y = 0; y < height; ++y) {
+    const int top = std::min(std::max(y - radius, 0), height - side);
     const auto* const upper = sums.ptr<float>(top);
-    const auto* const lower = sums.ptr<float>(top + static_cast<int>(side));
-    const std::size_t row = static_cast<std::size_t>(y - 1) * width;
-    for (int x = 1; x <= width; ++x) {
-      const int left = WindowStart(x, radius, width);
-      const int right = left + static_cast<int>(side);
+    const auto* const lower = sums.ptr<float>(top + side);
+    for (int x = 0; x < width; ++x, data += 3, ++mask) {
+      const int left = std::min(std::max(x - radius, 0), width - side);
+      const int right = left + side;
       const float mean = (lower[right] + upper[left] - upper[right] - lower[left]) / area;
-      const float pixel = data[3 * (row + x - 1)];
-      if (std::fabs((mean - pixel) / mean) > threshold) mask[row + x - 1] = 1;
+      if (std::fabs((mean - *data) / mean) > threshold) *mask = 1;
     }
   }
 }

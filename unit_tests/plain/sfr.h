@@ -3,7 +3,9 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <cstdlib>
+#include <cstring>
 #include <memory>
 #include <opencv2/imgproc.hpp>
 #include <vector>
@@ -145,6 +147,32 @@ inline bool CalculateSFR(QVTester& tester, cv::Mat roi, std::vector<float>& freq
   const int count = static_cast<int>(sfr.size() - first);
   mtf50 = InterpolateMTF50(freq.data() + (freq.size() - count), sfr.data() + first, count);
   return true;
+}
+
+// To the last bit, any NaN as one.
+inline std::vector<std::uint32_t> Bits(const std::vector<float>& values) {
+  std::vector<std::uint32_t> bits;
+  for (const float value : values) {
+    const float one_nan = std::isnan(value) ? NAN : value;
+    std::memcpy(&bits.emplace_back(), &one_nan, sizeof one_nan);
+  }
+  return bits;
+}
+
+/// Bits of all that a measurement gives, or the error that it ends with.
+template <typename Measure>
+std::vector<std::uint32_t> Outcome(const Measure& measure) {
+  std::vector<float> freq;
+  std::vector<float> sfr;
+  float mtf50 = 0;
+  try {
+    measure(freq, sfr, mtf50);
+  } catch (const cv::Exception& e) {
+    return {static_cast<std::uint32_t>(e.code)};
+  }
+  sfr.push_back(mtf50);
+  sfr.insert(sfr.end(), freq.begin(), freq.end());
+  return Bits(sfr);
 }
 
 }  // namespace plain
