@@ -10,31 +10,26 @@
 class LogLines {
  public:
   LogLines() {
-    Lines().clear();
+    lines_.clear();
     __android_log_set_minimum_priority(ANDROID_LOG_DEBUG);
-    __android_log_set_logger([](const __android_logger_data*, const char* message) { Lines().emplace_back(message); });
+    __android_log_set_logger([](const __android_logger_data*, const char* message) { lines_.emplace_back(message); });
   }
   ~LogLines() { __android_log_set_logger(__android_log_stderr_logger); }
   LogLines(const LogLines&) = delete;
   LogLines& operator=(const LogLines&) = delete;
 
-  static const std::vector<std::string>& All() { return Lines(); }
+  static const std::vector<std::string>& All() { return lines_; }
 
   // The lines' texts, without tag and line end.
   static std::vector<std::string> Texts() {
     std::vector<std::string> texts;
-    for (const std::string& line : Lines()) {
-      const std::string tag = "[OKAPI] ";
-      texts.push_back(line.substr(tag.size(), line.size() - tag.size() - 2));
-    }
+    const std::size_t tag = std::string("[OKAPI] ").size();
+    for (const std::string& line : lines_) texts.push_back(line.substr(tag, line.size() - tag - 2));
     return texts;
   }
 
  private:
-  static std::vector<std::string>& Lines() {
-    static std::vector<std::string> lines;
-    return lines;
-  }
+  inline static std::vector<std::string> lines_;
 };
 
 #endif  // QVTESTER_UNIT_TESTS_LOG_LINES_H_
