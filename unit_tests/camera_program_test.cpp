@@ -1,4 +1,5 @@
 #include <gmock/gmock.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cmath>
@@ -13,133 +14,100 @@ using nlohmann::json;
 using ::testing::AllOf;
 using ::testing::HasSubstr;
 
-class CameraProgram : public SimulatedPhotos {
- protected:
-  json Record(std::vector<std::string> arguments, int status = 0) {
-    arguments.insert(arguments.end(), {"--json", "-", "--annotate", folder_.Path("seen.png")});
-    const ProgramRun run = RunProgram(arguments);
-    EXPECT_EQ(status, run.status) << run.err;
-    EXPECT_FALSE(cv::imread(folder_.Path("seen.png")).empty());
-    return CheckedRecord(run.out);
-  }
-};
+using CameraProgram = SimulatedPhotos;
 
 TEST_F(CameraProgram, PreviewMeasuresMotion) {
-  const std::string first = Simulate({"--scene", "preview", "--motion", "7,3", "--blur", "1"});
-  const std::string second = folder_.Path("photo.second.png");
-  for (const bool front : {false, true}) {
-    std::vector<std::string> arguments = {"preview", first, second};
-    if (front) arguments.emplace_back("--front");
-    const double mean =
-        Measured(Record(arguments), front ? "camera_preview_front_difference_mean" : "camera_preview_difference_mean");
+  Simulate("--scene preview --motion 7,3 --blur 1");
+  for (const auto& [camera, phase] : {std::pair("", "camera_preview"), {" --front", "camera_preview_front"}}) {
+    const json record = Record(std::string("preview photo.png photo.second.png") + camera);
+    const double mean = Measured(record, std::string(phase) + "_difference_mean");
     EXPECT_NEAR(Truth()["difference_mean"].get<double>(), mean, 0.5 / 255);  // whole grey levels
     EXPECT_GT(mean, 0.001);
   }
-  EXPECT_EQ(0, Measured(Record({"preview", first, first}), "camera_preview_difference_mean"));
-  const ProgramRun run = RunProgram({"preview", first, Simulate({"--size", "300x200"}, "small")});
-  EXPECT_EQ(3, run.status);
-  EXPECT_THAT(run.err, HasSubstr("of different sizes, 1200 x 900 and 300 x 200"));
+  EXPECT_EQ(0, Measured(Record("preview photo.png photo.png"), "camera_preview_difference_mean"));
+  ExpectComplaint("preview photo.png " + Simulate("--size 300x200", "small.png"), 3,
+                  "of different sizes, 1200 x 900 and 300 x 200");
 }
 
-TEST_F(CameraProgram, RawFramesAreMeasuredAsTheirPictures) {
-  const std::string size = "640x480";
-  const std::vector<std::string> scene = {"--scene", "target", "--turn", "12", "--size", size};
-  const json of_picture = Measured(Record({"circles", Simulate(scene)}), "circle_check_centre");
-  std::vector<std::string> simulate = {"simulate", "-o", folder_.Path("raw.nv21"), "--quiet"};
-  simulate.insert(simulate.end(), scene.begin(), scene.end());
-  ASSERT_EQ(0, RunProgram(simulate).status);
-  const std::string raw = folder_.Path("raw.nv21");
-  const json of_frame = Measured(Record({"circles", raw, "--raw", size}), "circle_check_centre");
-  for (const int i : {0, 1}) EXPECT_NEAR(of_picture[0][i], of_frame[0][i], 0.5) << "levels a few apart after coding";
-  EXPECT_EQ(0, Measured(Record({"preview", raw, raw, "--raw", size}), "camera_preview_difference_mean"));
-
-  const std::vector<std::pair<std::vector<std::string>, std::string>> wrong = {
-      {{"preview", raw, raw, "--raw", "640x478"}, "460800 bytes are no NV21 frame of 640 x 478, which has 458880"},
-      {{"circles", raw}, "a raw frame needs its size: --raw WxH"}};
-  for (const auto& [arguments, says] : wrong) {
-    const ProgramRun run = RunProgram(arguments);
-    EXPECT_EQ(3, run.status);
-    EXPECT_THAT(run.err, HasSubstr(says));
-  }
-}
-
-TEST_F(CameraProgram, CirclesFindTheCentre) {
-  const std::string frame = Simulate({"--scene", "target", "--turn", "12", "--size", "640x480", "--noise", "1"});
-  const json centre = Measured(Record({"circles", frame}), "circle_check_centre");
-  EXPECT_NEAR(Truth()["centre"]["x"], centre[0][0], 1);
-  EXPECT_NEAR(Truth()["centre"]["y"], centre[0][1], 1);
-  const json miss = Record({"circles", Simulate({"--scene", "dust"}, "blank")}, 3);
+TEST_F(CameraProgram, CirclesFindTheCentreInPicturesAndRawFrames) {
+  const std::string scene = "--scene target --turn 12 --size 640x480 --noise 1";
+  const json centre = Measured(Record("circles " + Simulate(scene)), "circle_check_centre")[0];
+  EXPECT_NEAR(Truth()["centre"]["x"], centre[0], 1);
+  EXPECT_NEAR(Truth()["centre"]["y"], centre[1], 1);
+  const json miss = Record("circles " + Simulate("--scene dust", "blank.png") + " --annotate seen.png", 3);
+  EXPECT_FALSE(cv::imread(folder_.Path("seen.png")).empty());
   EXPECT_EQ(0, miss["phases"][0]["result_code"]) << "the check's own answer";
   EXPECT_EQ("ERROR", miss["outcome"]);
+
+  Simulate(scene, "raw.nv21");
+  const json of_frame = Measured(Record("circles raw.nv21 --raw 640x480"), "circle_check_centre")[0];
+  for (const int i : {0, 1}) EXPECT_NEAR(centre[i], of_frame[i], 0.5) << "levels a few apart after coding";
+  EXPECT_EQ(0, Measured(Record("preview raw.nv21 raw.nv21 --raw 640x480"), "camera_preview_difference_mean"));
+  ExpectComplaint("preview raw.nv21 raw.nv21 --raw 640x478", 3,
+                  "460800 bytes are no NV21 frame of 640 x 478, which has 458880");
+  ExpectComplaint("circles raw.nv21", 3, "a raw frame needs its size: --raw WxH");
 }
 
 TEST_F(CameraProgram, CaptureReadsThePatchesAsDrawn) {
+  Simulate("--size 1600x1200", "standard.png");
   for (const std::string turn : {"0", "10"}) {
-    const std::string photo = Simulate({"--turn", turn, "--gain", "0.8", "--size", "1600x1200"});
-    const std::string standard = Simulate({"--size", "1600x1200"}, "standard");
-    const json record = Record({"capture", photo, "--standard", standard});
+    Simulate("--gain 0.8 --size 1600x1200 --turn " + turn);
+    const json record = Record("capture photo.png --standard standard.png");
     double error = 0;
     for (int i = 0; i < 24; ++i) {
-      const json truth = Truth()["patches"][i]["lab"];
-      double square = 0;
-      int k = 0;
-      for (const char* name : {"camera_capture_lab_l", "camera_capture_lab_a", "camera_capture_lab_b"}) {
-        const json entry = Measured(record, name)[i];
+      cv::Vec3d difference;
+      for (int k = 0; k < 3; ++k) {
+        const json entry = Measured(record, std::string("camera_capture_lab_") + "lab"[k])[i];
         EXPECT_EQ(i, entry[0]);
-        square += std::pow(entry[1].get<double>() - truth[k++].get<double>(), 2);
+        difference[k] = entry[1].get<double>() - Truth()["patches"][i]["lab"][k].get<double>();
       }
-      error += std::sqrt(square) / 24;
+      error += cv::norm(difference) / 24;
     }
     EXPECT_LT(error, 0.7) << "patch means are cut to whole levels, half a level on average";
-    const json delta = Measured(record, "camera_capture_delta_e_76");
     double largest = 0;
-    for (const json& entry : delta) largest = std::max(largest, entry[1].get<double>());
+    for (const json& entry : Measured(record, "camera_capture_delta_e_76")) {
+      largest = std::max(largest, entry[1].get<double>());
+    }
     EXPECT_EQ(largest, Measured(record, "camera_capture_delta_e_76_max"));
   }
-  const json alone = Record({"capture", folder_.Path("photo.png"), "--front"});
+  const json alone = Record("capture photo.png --front");
   EXPECT_EQ(20, alone["metadata"]["test_index"]);
   EXPECT_EQ(4u, Measured(alone, "camera_capture_front_lab_l").size());
   EXPECT_EQ(9, Measured(alone, "camera_capture_front_lab_l")[3][0]);
-  const ProgramRun run =
-      RunProgram({"capture", folder_.Path("photo.png"), "--standard", Simulate({"--scene", "dust"}, "blank")});
-  EXPECT_EQ(3, run.status);
-  EXPECT_THAT(run.err, HasSubstr("blank.png: no finder mark was found"));
+  ExpectComplaint("capture photo.png --standard " + Simulate("--scene dust", "blank.png"), 3,
+                  "blank.png: no finder mark was found");
 }
 
 TEST_F(CameraProgram, DustIsFoundWhereItLies) {
-  const std::string photo = Simulate({"--scene", "dust", "--specks", "4", "--blur", "0.7", "--noise", "0.5"});
-  const std::string file = folder_.Path("dust.json");
-  ASSERT_EQ(0, RunProgram({"dust", photo, "--json", file}).status);
-  const json record = CheckedRecord(ReadFile(file));
+  Simulate("--scene dust --specks 4 --blur 0.7 --noise 0.5");
+  const json record = Record("dust photo.png");
+  folder_.Write("dust.json", record.dump());
   EXPECT_EQ(4, Measured(record, "lens_dust_blob_count"));
+  const json specks = Truth()["specks"];
   for (const json& blob : Measured(record, "lens_dust_blobs")) {
-    const json specks = Truth()["specks"];
     EXPECT_TRUE(std::any_of(specks.begin(), specks.end(), [&](const json& speck) {
       return std::hypot(speck["x"].get<double>() - blob[0].get<double>(),
                         speck["y"].get<double>() - blob[1].get<double>()) < 1;
     }));
   }
 
-  const json again = Record({"dust", photo, "--reference", file, "--front"});
+  const json again = Record("dust photo.png --reference dust.json --front");
   EXPECT_EQ(0, Measured(again, "lens_dust_front_histogram_difference"));
   EXPECT_EQ(256u, again["metadata"]["properties"]["87"].size());
   std::string numbers;
   for (int i = 0; i < 256; ++i) numbers += i == 3 ? "5 " : "0\n";
-  const std::string bare = folder_.Write("reference.txt", numbers);
-  EXPECT_EQ(1200 * 900 + 5, Measured(Record({"dust", photo, "--reference", bare}), "lens_dust_histogram_difference"));
+  folder_.Write("levels.txt", numbers);
+  EXPECT_EQ(1200 * 900 + 5,
+            Measured(Record("dust photo.png --reference levels.txt"), "lens_dust_histogram_difference"));
   for (const std::string& bad : {std::string("[1, 2]"), std::string("1 2 x"), std::string("{}"), numbers + " 7"}) {
-    const ProgramRun run = RunProgram({"dust", photo, "--reference", folder_.Write("bad.txt", bad)});
-    EXPECT_EQ(2, run.status) << bad;
-    EXPECT_THAT(run.err, HasSubstr("neither a dust record nor 256 whole numbers"));
+    folder_.Write("levels.txt", bad);
+    ExpectComplaint("dust photo.png --reference levels.txt", 2, "neither a dust record nor 256 whole numbers");
   }
 }
 
 TEST_F(CameraProgram, DarkPhotosAreNotJudged) {
-  const std::string photo = Simulate({"--scene", "dust", "--gain", "0.4"});
-  const ProgramRun run = RunProgram({"dust", photo, "--json", "-"});
-  EXPECT_EQ(3, run.status);
-  EXPECT_THAT(run.err, AllOf(HasSubstr("too dark to judge"), HasSubstr("mean grey level is 1")));
-  const json record = CheckedRecord(run.out);
+  const json record = Record("dust " + Simulate("--scene dust --gain 0.4"), 3);
+  EXPECT_THAT(err_, AllOf(HasSubstr("too dark to judge"), HasSubstr("mean grey level is 1")));
   EXPECT_EQ("ERROR", record["outcome"]);
   EXPECT_FALSE(record["phases"][0]["measurements"].contains("lens_dust_blob_count"));
 }
@@ -148,7 +116,7 @@ TEST_F(CameraProgram, OnlyPublishReachesTheSharedStore) {
   // The shared store is the user's own: only that nothing is written without --publish can be tested here.
   const std::string store = "/dev/shm/qvtester-" + std::to_string(geteuid()) + "/properties/t82.vi424242_mung_loc";
   ASSERT_FALSE(std::filesystem::exists(store));
-  EXPECT_EQ(0, RunProgram({"dust", Simulate({"--scene", "dust"}), "--step", "424242"}).status);
+  EXPECT_EQ(0, Run("dust --step 424242 " + Simulate("--scene dust")).status);
   EXPECT_FALSE(std::filesystem::exists(store));
 }
 

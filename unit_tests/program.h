@@ -5,7 +5,6 @@
 
 #include <nlohmann/json.hpp>
 #include <string>
-#include <vector>
 
 #include "unit_tests/drawing.h"
 
@@ -16,23 +15,25 @@ struct ProgramRun {
   std::string out, err;
 };
 
-/// Runs `qvtester` with these arguments and this standard input.
-ProgramRun RunProgram(const std::vector<std::string>& arguments, const std::string& input = "");
-
-/// Parses a record file and holds it against docs/record.schema.json; a breach is a test failure.
-nlohmann::json CheckedRecord(const std::string& text);
-
 /// A measured value of the record's only phase.
 nlohmann::json Measured(const nlohmann::json& record, const std::string& name);
 
-/// Tests on photos of the program's own simulator.
+/// Tests that run the program in a folder of their own, on photos of its own simulator.
 class SimulatedPhotos : public ::testing::Test {
  protected:
-  /// Takes a small photo with these options; answers its path.
-  std::string Simulate(const std::vector<std::string>& options = {}, const std::string& name = "photo");
+  /// Runs `qvtester` in the folder with these arguments, as a shell reads them.
+  ProgramRun Run(const std::string& arguments) const;
+  void ExpectComplaint(const std::string& arguments, int status, const std::string& complaint) const;
+
+  /// Runs a measuring command; answers its record, held against docs/record.schema.json. What it says goes to err_.
+  nlohmann::json Record(const std::string& arguments, int status = 0);
+
+  /// Takes a small photo with these options; answers its name.
+  std::string Simulate(const std::string& options = "", const std::string& name = "photo.png") const;
   nlohmann::json Truth(const std::string& name = "photo") const;
 
   TemporaryFolder folder_;
+  std::string err_;
 };
 
 #endif  // QVTESTER_UNIT_TESTS_PROGRAM_H_

@@ -19,81 +19,50 @@ using method_law::Sinc;
 class Simulator : public SimulatedPhotos {
  protected:
   // 16 bits a channel, as CV_32FC3 in levels of 255.
-  cv::Mat Levels(std::vector<std::string> options) {
-    options.insert(options.end(), {"--bits", "16"});
+  cv::Mat Levels(const std::string& options) const {
     cv::Mat levels;
-    cv::imread(Simulate(options), cv::IMREAD_UNCHANGED).convertTo(levels, CV_32F, 1 / 257.0);
+    cv::imread(folder_.Path(Simulate(options + " --bits 16")), cv::IMREAD_UNCHANGED)
+        .convertTo(levels, CV_32F, 1 / 257.0);
     return levels;
   }
-
-  // Where a place on the upright chart lies in the photo.
-  cv::Point2d Place(double x, double y) const {
-    const json truth = Truth();
-    const cv::Point2d corner(truth["marks"][0]["x"], truth["marks"][0]["y"]);
-    return corner + cv::Point2d(x, y) * truth["pixels_per_unit"].get<double>();
-  }
 };
 
-struct LensFault {
-  const char* name;
-  std::vector<std::string> options;
-  double (*response)(double f, cv::Point2d normal);  // without the pixel's own
-};
-
-void PrintTo(const LensFault& fault, std::ostream* out) { *out << fault.name; }
-
-class LensFaults : public Simulator, public ::testing::WithParamInterface<LensFault> {};
-
-TEST_P(LensFaults, HaveTheirAnalyticResponse) {
-  std::vector<std::string> options = {"--edge-angle", "6"};
-  options.insert(options.end(), GetParam().options.begin(), GetParam().options.end());
-  const json record = CheckedRecord(RunProgram({"autofocus", Simulate(options), "--json", "-"}).out);
+TEST_F(Simulator, LensFaultsHaveTheirAnalyticResponse) {
+  // At a frequency along the edge's normal, without the pixel's own.
+  const auto none = [](double, cv::Point2d) { return 1.0; };
+  const auto gaussian = [](double f, cv::Point2d) { return std::exp(-2 * std::pow(CV_PI * 0.9 * f, 2)); };
+  const auto disc = [](double f, cv::Point2d) {
+    const double x = 2 * CV_PI * 2.3 * f;
+    return std::fabs(2 * std::cyl_bessel_j(1, x) / x);
+  };
+  const auto motion = [](double f, cv::Point2d n) { return std::fabs(Sinc(f * n.dot({3, 1.5}))); };
   const auto target = EdgeTarget(6);
-  for (const bool lying : {false, true}) {
-    const std::string region = lying ? "vertical" : "horizontal";
-    const cv::Point2d edge = target[lying ? 1 : 3] - target[0];
-    const cv::Point2d n = cv::Point2d(edge.y, -edge.x) / cv::norm(edge);
-    const auto response = [&](double f) {
-      return std::fabs(Sinc(f * n.x) * Sinc(f * n.y)) * GetParam().response(f, n);
-    };
-    const json truth = Truth()["mtf50"][region];
-    const double half = 2 * method_law::HalfPoint(response, 1.0);
-    EXPECT_NEAR(half, truth["mtf50_nyquist"], 1e-3 * half);
-    for (int i = 1; i <= 20; ++i) EXPECT_NEAR(response(truth["sfr"][i][0].get<double>() / 2), truth["sfr"][i][1], 1e-3);
-    // 1 % is the measure's own; blur kernels are drawn on quarters of a pixel.
-    EXPECT_NEAR(half, Measured(record, "camera_autofocus_mtf50_iso_" + region), 0.015 * half);
+  for (const auto& [fault, blur] : std::vector<std::pair<std::string, double (*)(double, cv::Point2d)>>{
+           {"", none}, {"--blur 0.9", gaussian}, {"--defocus 2.3", disc}, {"--smear 3,1.5", motion}}) {
+    const json record = Record("autofocus " + Simulate("--edge-angle 6 " + fault));
+    for (const bool lying : {false, true}) {
+      const std::string region = lying ? "vertical" : "horizontal";
+      const cv::Point2d edge = target[lying ? 1 : 3] - target[0];
+      const cv::Point2d n = cv::Point2d(edge.y, -edge.x) / cv::norm(edge);
+      const auto response = [&, own = blur](double f) { return std::fabs(Sinc(f * n.x) * Sinc(f * n.y)) * own(f, n); };
+      const json truth = Truth()["mtf50"][region];
+      const double half = 2 * method_law::HalfPoint(response, 1.0);
+      EXPECT_NEAR(half, truth["mtf50_nyquist"], 1e-3 * half) << fault;
+      for (int i = 1; i <= 20; ++i) {
+        EXPECT_NEAR(response(truth["sfr"][i][0].get<double>() / 2), truth["sfr"][i][1], 1e-3) << fault;
+      }
+      // 1 % is the measure's own; blur kernels are drawn on quarters of a pixel.
+      EXPECT_NEAR(half, Measured(record, "camera_autofocus_mtf50_iso_" + region), 0.015 * half) << fault;
+    }
   }
 }
 
-INSTANTIATE_TEST_SUITE_P(Kinds, LensFaults,
-                         ::testing::Values(LensFault{"none", {}, [](double, cv::Point2d) { return 1.0; }},
-                                           LensFault{"gaussian",
-                                                     {"--blur", "0.9"},
-                                                     [](double f, cv::Point2d) {
-                                                       return std::exp(-2 * std::pow(CV_PI * 0.9 * f, 2));
-                                                     }},
-                                           LensFault{"disc",
-                                                     {"--defocus", "2.3"},
-                                                     [](double f, cv::Point2d) {
-                                                       const double x = 2 * CV_PI * 2.3 * f;
-                                                       return std::fabs(2 * std::cyl_bessel_j(1, x) / x);
-                                                     }},
-                                           LensFault{"motion",
-                                                     {"--smear", "3,1.5"},
-                                                     [](double f, cv::Point2d n) {
-                                                       return std::fabs(Sinc(f * n.dot({3, 1.5})));
-                                                     }}),
-                         [](const auto& fault) { return std::string(fault.param.name); });
-
 TEST_F(Simulator, NoiseHasItsVariance) {
-  const std::vector<std::string> plain = {"--scene",    "dust",   "--specks", "0",          "--cast",
-                                          "1,0.5,0.25", "--gain", "0.6",      "--exposure", "0.5"};
   for (const auto& [full_well, percent] : {std::pair(0.0, 2.0), {3000.0, 0.0}, {1500.0, 1.0}}) {
-    std::vector<std::string> options = plain;
-    options.insert(options.end(), {"--full-well", std::to_string(full_well), "--noise", std::to_string(percent)});
+    const cv::Mat levels = Levels("--scene dust --specks 0 --cast 1,0.5,0.25 --gain 0.6 --exposure 0.5 --full-well " +
+                                  std::to_string(full_well) + " --noise " + std::to_string(percent));
     cv::Scalar mean;
     cv::Scalar deviation;
-    const cv::Mat levels = Levels(options);
     cv::meanStdDev(levels, mean, deviation);
     const auto pixels = static_cast<double>(levels.total());
     for (int channel = 0; channel < 3; ++channel) {
@@ -107,24 +76,27 @@ TEST_F(Simulator, NoiseHasItsVariance) {
 }
 
 TEST_F(Simulator, ShadingContrastAndFillAreWhatTheySay) {
-  const cv::Mat shaded = Levels({"--scene", "dust", "--specks", "0", "--shading", "40"});
+  const cv::Mat shaded = Levels("--scene dust --specks 0 --shading 40");
   const float middle = shaded.at<cv::Vec3f>(450, 600)[1];
   EXPECT_NEAR(0.6, shaded.at<cv::Vec3f>(0, 0)[1] / middle, 1e-3);
   EXPECT_NEAR(0.6, shaded.at<cv::Vec3f>(899, 1199)[1] / middle, 1e-3);
 
   for (const double contrast : {4.0, 10.0}) {
-    const cv::Mat chart = Levels({"--contrast", std::to_string(contrast), "--fill", "0.5"});
-    const cv::Point dark = Place(4800, 2000);
-    const cv::Point light = Place(2000, 2000);
+    const cv::Mat chart = Levels("--fill 0.5 --contrast " + std::to_string(contrast));
+    const json truth = Truth();
+    const double scale = truth["pixels_per_unit"];
+    const auto level = [&](double x, double y) {
+      const cv::Point2d corner(truth["marks"][0]["x"], truth["marks"][0]["y"]);
+      return chart.at<cv::Vec3f>(corner + cv::Point2d(x, y) * scale)[1];
+    };
     // The drawing's levels are whole ones.
-    EXPECT_NEAR(contrast, chart.at<cv::Vec3f>(light)[1] / chart.at<cv::Vec3f>(dark)[1], 0.02 * contrast);
-    EXPECT_NEAR(0.5 * 900, (kChartSide + 2 * kPatchHalf) * Truth()["pixels_per_unit"].get<double>(), 1e-6);
+    EXPECT_NEAR(contrast, level(2000, 2000) / level(4800, 2000), 0.02 * contrast);
+    EXPECT_NEAR(0.5 * 900, (kChartSide + 2 * kPatchHalf) * scale, 1e-6);
   }
 }
 
 TEST_F(Simulator, TiltedChartsAreSeenInPerspective) {
-  const std::string photo = Simulate({"--scene", "target", "--pan", "12", "--tilt", "-7", "--turn", "20"});
-  const json record = CheckedRecord(RunProgram({"circles", photo, "--json", "-"}).out);
+  const json record = Record("circles " + Simulate("--scene target --pan 12 --tilt -7 --turn 20"));
   const json truth = Truth();
   for (std::size_t i = 0; i < 3; ++i) {
     const json mark = Measured(record, "circle_check_marks")[i];
@@ -136,7 +108,7 @@ TEST_F(Simulator, TiltedChartsAreSeenInPerspective) {
   EXPECT_NEAR(truth["chart_turn_deg"], Measured(record, "circle_check_chart_turn"), 0.3);
 
   // A pinhole 2.5 sides away sees a point x to the right at cos x / (1 + sin x / 2.5), sides.
-  Simulate({"--pan", "30"});
+  Simulate("--pan 30");
   const auto side = [&](double x) { return std::cos(CV_PI / 6) * x / (1 + std::sin(CV_PI / 6) * x / 2.5); };
   const double half = kChartSide / 2.0 / (kChartSide + 2 * kPatchHalf);
   const double width = side(half) - side(-half);
@@ -146,46 +118,36 @@ TEST_F(Simulator, TiltedChartsAreSeenInPerspective) {
 }
 
 TEST_F(Simulator, WidePhotosShowNoSeams) {
-  const std::vector<std::string> options = {"--marks", "coarse", "--blur", "0.3", "--turn", "9"};
-  const auto photo = [&](const std::string& size) {
-    std::vector<std::string> all = options;
-    all.insert(all.end(), {"--size", size});
-    return Levels(all);
-  };
+  const std::string chart = "--marks coarse --blur 0.3 --turn 9 --size ";
   // The same chart in the middle of more paper, wider than a drawing can be.
   // Corners are drawn to 1/256 of a subpixel; rounded the other way, one moves a level by 1 at most.
-  EXPECT_LT(cv::norm(photo("600x300"), photo("8200x300").colRange(3800, 4400), cv::NORM_INF), 1);
+  EXPECT_LT(cv::norm(Levels(chart + "600x300"), Levels(chart + "8200x300").colRange(3800, 4400), cv::NORM_INF), 1);
 }
 
 TEST_F(Simulator, FilesAreOfTheirFormats) {
-  const cv::Mat photo = cv::imread(Simulate({"--marks", "coarse"}));
-  const auto write = [&](const std::string& name, const std::vector<std::string>& options) {
-    std::vector<std::string> all = {"simulate", "-o", folder_.Path(name), "--size", "1200x900", "--marks", "coarse"};
-    all.insert(all.end(), options.begin(), options.end());
-    EXPECT_EQ(0, RunProgram(all).status);
-    return ReadFile(folder_.Path(name));
+  const auto write = [&](const std::string& name, const std::string& options = "") {
+    return ReadFile(folder_.Path(Simulate("--marks coarse " + options, name)));
   };
-  std::string frame = write("frame.nv21", {});
+  const auto picture = [&](const std::string& name) { return cv::imread(folder_.Path(name)); };
+  write("photo.png");
+  std::string frame = write("frame.nv21");
   ASSERT_EQ(1200u * 900 * 3 / 2, frame.size());
   cv::Mat decoded;
   cv::cvtColor(cv::Mat(900 * 3 / 2, 1200, CV_8UC1, frame.data()), decoded, cv::COLOR_YUV2BGR_NV21);
-  EXPECT_LT(cv::norm(photo, decoded, cv::NORM_L1) / static_cast<double>(photo.total() * 3), 1)
+  EXPECT_LT(cv::norm(picture("photo.png"), decoded, cv::NORM_L1) / (1200 * 900 * 3), 1)
       << "chroma of half the size moves edges of colours only";
-  EXPECT_EQ(2, RunProgram({"simulate", "-o", folder_.Path("frame.nv21"), "--size", "1201x900"}).status);
-  EXPECT_LT(write("poor.jpg", {"--quality", "10"}).size(), write("good.jpg", {"--quality", "90"}).size());
-  EXPECT_GT(cv::norm(photo, cv::imread(folder_.Path("poor.jpg"))),
-            cv::norm(photo, cv::imread(folder_.Path("good.jpg"))));
-  EXPECT_EQ(write("a.png", {"--noise", "2", "--seed", "7"}), write("a.png", {"--noise", "2", "--seed", "7"}));
-  EXPECT_NE(ReadFile(folder_.Path("a.png")), write("b.png", {"--noise", "2", "--seed", "8"}));
+  EXPECT_LT(write("poor.jpg", "--quality 10").size(), write("good.jpg", "--quality 90").size());
+  EXPECT_GT(cv::norm(picture("photo.png"), picture("poor.jpg")), cv::norm(picture("photo.png"), picture("good.jpg")));
+  const std::string seven = write("a.png", "--noise 2 --seed 7");
+  EXPECT_EQ(seven, write("a.png", "--noise 2 --seed 7"));
+  EXPECT_NE(seven, write("a.png", "--noise 2 --seed 8"));
 }
 
 TEST_F(Simulator, PhotosHaveTheLevelsOfTheirTruth) {
-  const std::string chart = Simulate({"--turn", "-4", "--cast", "1,0.9,0.8", "--shading", "20", "--gain", "1.1"});
-  json record = CheckedRecord(RunProgram({"flash", chart, "--json", "-"}).out);
+  json record = Record("flash " + Simulate("--turn -4 --cast 1,0.9,0.8 --shading 20 --gain 1.1"));
   EXPECT_NEAR(Truth()["flash_mean"], Measured(record, "camera_flash_mean"), 0.1);  // rounding to levels evens out
-  const std::string dust = Simulate({"--scene", "dust", "--specks", "3", "--blur", "0.8", "--shading", "3"});
+  record = Record("dust " + Simulate("--scene dust --specks 3 --blur 0.8 --shading 3"));
   const json truth = Truth();
-  record = CheckedRecord(RunProgram({"dust", dust, "--json", "-"}).out);
   EXPECT_NEAR(truth["mean_level"], Measured(record, "lens_dust_mean_level"), 0.1);
   const json histogram = Measured(record, "lens_dust_histogram");
   double moved = 0;
