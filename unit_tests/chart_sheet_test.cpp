@@ -24,16 +24,6 @@ struct Sheet {
   double px_per_unit = 0;
 };
 
-void Shell(const std::string& command) {
-  ASSERT_EQ(0, std::system(command.c_str())) << command;  // NOLINT(cert-env33-c): names of a test's own folder
-}
-
-// Centre of what is darker than the paper, weighed by how much.
-cv::Point2d DarkCentre(const cv::Mat& grey, const cv::Rect& window) {
-  const cv::Moments m = cv::moments(255 - grey(window));
-  return cv::Point2d(window.x + m.m10 / m.m00, window.y + m.m01 / m.m00);
-}
-
 // Where a line of pixels changes from its first level to its last.
 double Crossing(const cv::Mat& line) {
   const double first = *line.ptr();
@@ -43,18 +33,21 @@ double Crossing(const cv::Mat& line) {
 
 class ChartSheets : public SimulatedPhotos {
  protected:
+  void Shell(const std::string& command) const {
+    const std::string there = "cd '" + folder_.Path("") + "' && " + command;
+    ASSERT_EQ(0, std::system(there.c_str())) << command;  // NOLINT(cert-env33-c): names of a test's own folder
+  }
+
   // The sheet as shown, in sheet.png.
   Sheet Draw(const std::string& extension, const std::string& options = "") const {
     const std::string file = "sheet" + extension;
     const ProgramRun run = Run("chart --dpi 254 -o " + file + " " + options);
     EXPECT_EQ(0, run.status) << run.err;
-    const std::string at = "cd '" + folder_.Path("") + "' && ";
-    if (extension == ".svg") Shell(at + "rsvg-convert -b white -d 254 -p 254 -o sheet.png sheet.svg");
-    if (extension == ".pdf") Shell(at + "pdftoppm -png -singlefile -r 254 sheet.pdf sheet");
+    if (extension == ".svg") Shell("rsvg-convert -b white -d 254 -p 254 -o sheet.png sheet.svg");
+    if (extension == ".pdf") Shell("pdftoppm -png -singlefile -r 254 sheet.pdf sheet");
     EXPECT_THAT(run.out, StartsWith(file + "\n  "));
     Sheet sheet = {cv::imread(folder_.Path("sheet.png")), "", 0};
-    sheet.facts = std::regex_replace(run.out.substr(file.size() + 3), std::regex("\n( *)"), "\n");
-    sheet.facts.pop_back();
+    sheet.facts = std::regex_replace(run.out.substr(file.size() + 3), std::regex("\n  "), "\n");
     std::smatch scale;
     if (std::regex_search(sheet.facts, scale, std::regex("(.*) mm per chart unit"))) {
       sheet.px_per_unit = 10 * std::stod(scale[1]);
@@ -62,12 +55,11 @@ class ChartSheets : public SimulatedPhotos {
     return sheet;
   }
 
-  // What a phone's code reader sees, less the line end that it adds.
+  // What a phone's code reader sees; it adds a line end.
   std::string ReadCode(const cv::Mat& picture) const {
-    const std::string read = folder_.Path("read.txt");
-    Shell("zbarimg -q --nodbus --raw '" + folder_.Write("code.png", picture) + "' >'" + read + "'");
-    const std::string text = ReadFile(read);
-    return text.substr(0, text.find_last_not_of('\n') + 1);
+    folder_.Write("code.png", picture);
+    Shell("zbarimg -q --nodbus --raw code.png >read.txt");
+    return ReadFile(folder_.Path("read.txt"));
   }
 
   // Photographs the sheet on a dark table: turned, a little blurred, dim and noisy.
@@ -80,8 +72,7 @@ class ChartSheets : public SimulatedPhotos {
     cv::GaussianBlur(photo, photo, cv::Size(), 1);
     cv::Mat grain(photo.size(), CV_16SC3);
     cv::RNG(7).fill(grain, cv::RNG::NORMAL, 0, 4);
-    cv::Mat(photo * 0.9).convertTo(photo, CV_16S);
-    cv::Mat(photo + grain).convertTo(photo, CV_8U);
+    cv::add(photo * 0.9, grain, photo, cv::noArray(), CV_8U);
     folder_.Write("photo.png", photo);
     return photo;
   }
@@ -100,7 +91,9 @@ TEST_P(SheetFiles, ShowWhatTheTableSays) {
   std::vector<cv::Point2d> marks;
   for (const json& mark : Measured(Record("autofocus sheet.png"), "camera_autofocus_marks")) {
     const int half = static_cast<int>(4.5 * kMarkSizes[0].module * sheet.px_per_unit);
-    marks.push_back(DarkCentre(grey, {mark[0].get<int>() - half, mark[1].get<int>() - half, 2 * half, 2 * half}));
+    const cv::Rect window(mark[0].get<int>() - half, mark[1].get<int>() - half, 2 * half, 2 * half);
+    const cv::Moments dark = cv::moments(255 - grey(window));
+    marks.emplace_back(window.x + dark.m10 / dark.m00, window.y + dark.m01 / dark.m00);
   }
   // The scale is printed with four digits; the SVG's coordinates go in steps of 1/256 mm.
   const double side = kChartSide * sheet.px_per_unit;

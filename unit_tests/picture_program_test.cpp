@@ -4,7 +4,6 @@
 
 #include <cmath>
 #include <filesystem>
-#include <limits>
 #include <opencv2/imgcodecs.hpp>
 
 #include "unit_tests/program.h"
@@ -54,7 +53,6 @@ TEST_F(PictureProgram, DotsCloseTogetherMakeOneArea) {
   folder_.Write("panel.tif", panel);
   const std::string dots = "dots panel.tif --threshold 0.5 ";
   const json record = Record(dots + "--distance 8");
-  EXPECT_EQ(3, Measured(record, "hdr_dots_dot_count"));
   EXPECT_EQ(json({{22.0, 30.0}, {60.0, 30.0}}), Measured(record, "hdr_dots_areas"));
   EXPECT_EQ(json({{0, 2}, {1, 1}}), Measured(record, "hdr_dots_area_pixels"));
   EXPECT_EQ(json({{0, 5}, {1, 1}}), Measured(record, "hdr_dots_area_width"));
@@ -74,7 +72,7 @@ TEST_F(PictureProgram, WhatCanNotBeSearchedForDotsIsTold) {
   EXPECT_EQ("ERROR", Record("dots panel.tif --threshold 0.7", 3)["outcome"]);
   EXPECT_THAT(err_, HasSubstr("30000 separate dots are noise"));
   cv::Mat hole(300, 400, CV_32FC1, cv::Scalar(1));
-  hole.at<float>(100, 100) = std::numeric_limits<float>::quiet_NaN();
+  hole.at<float>(100, 100) = NAN;
   folder_.Write("panel.tif", hole);
   EXPECT_EQ("ERROR", Record("dots panel.tif --annotate seen.png", 3)["outcome"]);
   EXPECT_THAT(err_, HasSubstr("1 pixels are not finite"));
