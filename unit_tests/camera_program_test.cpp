@@ -11,7 +11,6 @@
 namespace {
 
 using nlohmann::json;
-using ::testing::AllOf;
 using ::testing::HasSubstr;
 
 using CameraProgram = SimulatedPhotos;
@@ -104,7 +103,7 @@ TEST_F(CameraProgram, DustIsFoundWhereItLiesUnlessThePhotoIsDark) {
   }
 
   const json dark = Record("dust " + Simulate("--scene dust --gain 0.4"), 3);
-  EXPECT_THAT(err_, AllOf(HasSubstr("too dark to judge"), HasSubstr("mean grey level is 1")));
+  EXPECT_THAT(err_, ::testing::AllOf(HasSubstr("too dark to judge"), HasSubstr("mean grey level is 1")));
   EXPECT_EQ("ERROR", dark["outcome"]);
   EXPECT_FALSE(dark["phases"][0]["measurements"].contains("lens_dust_blob_count"));
 }

@@ -1,15 +1,13 @@
 #include <android/log.h>
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cstdarg>
+#include <string>
 
 #include "qvtester/log.h"
 
-namespace {
-
-std::string last_line;
-
-}  // namespace
+static std::string last_line;
 
 // Stands in for liblog's, which cuts lines at about a thousand characters before anybody sees them.
 extern "C" int __android_log_print(int priority, const char* tag, const char* fmt,

@@ -22,7 +22,7 @@ int PixelsOf(const cv::Scalar& colour, const std::string& picture) {
 
 TEST_F(Program, AutofocusReportsRecordsAndDraws) {
   Simulate("--turn 3 --blur 0.8 --noise 1");
-  const ProgramRun run = Run("autofocus photo.png");
+  const ProgramRun run = Run("autofocus photo.png --json record.json");
   EXPECT_THAT(run.err, IsEmpty());
   EXPECT_THAT(run.out,
               AllOf(HasSubstr("MTF50      vertical"), HasSubstr("Nyquist"), HasSubstr("c/p"), HasSubstr("PASS")));
