@@ -34,13 +34,10 @@ TEST_F(Resources, EachSetterTakesItsOwnSlots) {
 }
 
 TEST_F(Resources, ImageFilesBecomeEightBitColour) {
-  const std::string grey = folder_.Write("grey.png", cv::Mat(4, 6, CV_8UC1, cv::Scalar(7)));
-  const std::string deep = folder_.Write("deep.png", cv::Mat(4, 6, CV_16UC3, cv::Scalar::all(0x1234)));
-  const std::string alpha = folder_.Write("alpha.png", cv::Mat(4, 6, CV_8UC4, cv::Scalar::all(9)));
-  for (const auto& [path, level] : {std::pair{grey, 7}, {deep, 0x12}, {alpha, 9}}) {
-    ASSERT_EQ(1, LoadFile(20, path));
-    EXPECT_EQ(CV_8UC3, Loaded(20).type());
-    EXPECT_EQ(level, Loaded(20).at<cv::Vec3b>(0, 0)[1]);
+  for (const auto& [type, level] : {std::pair{CV_8UC1, 7}, {CV_16UC3, 0x1234}, {CV_8UC4, 9}}) {
+    ASSERT_EQ(1, LoadFile(20, folder_.Write("image.png", cv::Mat(4, 6, type, cv::Scalar::all(level)))));
+    ASSERT_EQ(CV_8UC3, Loaded(20).type());
+    EXPECT_EQ(level < 256 ? level : level >> 8, Loaded(20).at<cv::Vec3b>(0, 0)[1]);
   }
 }
 
@@ -53,19 +50,16 @@ TEST_F(Resources, OrientationTagsDoNotTurnThePhotoAndACutOneCounts) {
       0xFF, 0xE1, 0,    34,   'E', 'x', 'i', 'f', 0, 0, 'M', 'M', 0, 42, 0, 0, 0, 8,
       0,    1,    0x01, 0x12, 0,   3,   0,   0,   0, 1, 0,   6,   0, 0,  0, 0, 0, 0};  // turn by 90 degrees
   jpeg.insert(jpeg.begin() + 2, std::begin(exif), std::end(exif));
-  const std::string path = folder_.Write("turned.jpg", std::string(jpeg.begin(), jpeg.end()));
-  ASSERT_EQ(cv::Size(80, 160), cv::imread(path, cv::IMREAD_COLOR).size()) << "the tag is not understood";
-  const std::string cut = folder_.Write("cut.jpg", std::string(jpeg.begin(), jpeg.begin() + jpeg.size() / 2));
-  for (const std::string& file : {path, cut}) {
-    ASSERT_EQ(1, LoadFile(17, file));
+  ASSERT_EQ(cv::Size(80, 160), cv::imdecode(jpeg, cv::IMREAD_COLOR).size()) << "the tag is not understood";
+  for (const std::size_t length : {jpeg.size(), jpeg.size() / 2}) {
+    ASSERT_EQ(1, LoadFile(17, folder_.Write("photo.jpg", std::string(jpeg.begin(), jpeg.begin() + length))));
     EXPECT_EQ(cv::Size(160, 80), Loaded(17).size());
   }
 }
 
 TEST_F(Resources, RefusedFilesLeaveTheSlotAndOneLine) {
-  const std::string png = ReadFile(photo_);
   const std::vector<std::string> bad = {folder_.Write("empty.png", std::string()),
-                                        folder_.Write("cut.png", png.substr(0, 20)),
+                                        folder_.Write("cut.png", ReadFile(photo_).substr(0, 20)),
                                         folder_.Write("words.jpg", std::string("this is no image")), folder_.Path("")};
   for (const bool filled : {false, true}) {
     if (filled) LoadFile(20, photo_);
@@ -102,28 +96,26 @@ TEST_F(Resources, VideosOpenInTheirOwnSlots) {
 TEST_F(Resources, PreviewFramesAreConvertedOrRefused) {
   std::vector<unsigned char> frame(640 * 720, 128);  // neutral chroma, grey luma
   std::fill_n(frame.begin(), 640 * 480, static_cast<unsigned char>(126));
-  ASSERT_EQ(1, SetResource(Slot(14), 640, 480, static_cast<void*>(frame.data())));
-  EXPECT_EQ(cv::Size(640, 480), Loaded(14).size());
-  EXPECT_EQ(CV_8UC4, Loaded(14).type());
-  EXPECT_EQ(cv::Vec4b(128, 128, 128, 255), Loaded(14).at<cv::Vec4b>(479, 639));  // 1.164 (126 - 16)
-
-  for (const cv::Size size : {cv::Size(639, 480), cv::Size(640, 3), cv::Size(2, INT_MAX)}) {
-    EXPECT_EQ(-95, SetResource(Slot(14), size.width, size.height, static_cast<void*>(frame.data()))) << size;
-    EXPECT_EQ(-95, SetResource(Slot(15), size.width, size.height, static_cast<void*>(frame.data()))) << size;
+  void* const data = frame.data();
+  ASSERT_EQ(1, SetResource(Slot(14), 640, 480, data));
+  for (const int slot : {14, 15}) {
+    for (const cv::Size size : {cv::Size(639, 480), cv::Size(640, 3), cv::Size(2, INT_MAX)}) {
+      EXPECT_EQ(-95, SetResource(Slot(slot), size.width, size.height, data)) << size;
+    }
   }
-  EXPECT_EQ(cv::Size(640, 480), Loaded(14).size());
   EXPECT_FALSE(Filled(15));
-  EXPECT_EQ(1, SetResource(Slot(0), 2, 4, static_cast<void*>(frame.data()))) << "any slot takes a preview frame";
-  EXPECT_EQ(-97, SetResource(Slot(37), 2, 4, static_cast<void*>(frame.data())));
+  ASSERT_EQ(cv::Size(640, 480), Loaded(14).size());
+  ASSERT_EQ(CV_8UC4, Loaded(14).type());
+  EXPECT_EQ(cv::Vec4b(128, 128, 128, 255), Loaded(14).at<cv::Vec4b>(479, 639));  // 1.164 (126 - 16)
+  EXPECT_EQ(1, SetResource(Slot(0), 2, 4, data)) << "any slot takes a preview frame";
+  EXPECT_EQ(-97, SetResource(Slot(37), 2, 4, data));
 }
 
 TEST_F(Resources, BuffersAreCopied) {
   unsigned short levels[] = {1, 2, 3, 65535, 5, 6};
   ASSERT_EQ(1, SetLDRResource(Slot(17), 2, 1, levels));
   levels[0] = 0;
-  EXPECT_EQ(CV_16UC3, Loaded(17).type());
-  EXPECT_EQ(cv::Vec3w(1, 2, 3), Loaded(17).at<cv::Vec3w>(0, 0));
-  EXPECT_EQ(cv::Vec3w(65535, 5, 6), Loaded(17).at<cv::Vec3w>(0, 1));
+  EXPECT_EQ(0, cv::norm(Loaded(17), cv::Mat_<cv::Vec3w>({1, 2}, {{1, 2, 3}, {65535, 5, 6}}), cv::NORM_INF));
 
   float pixels[] = {1, 2, 3, 4, 5, 6};
   ASSERT_EQ(1, SetHDRResource(Slot(5), 1, 2, true, pixels));
@@ -155,13 +147,10 @@ TEST_F(Resources, OnlyHdrSlotsAreReleasedOneByOne) {
   float hdr[3] = {};
   ASSERT_EQ(1, SetHDRResource(Slot(5), 1, 1, false, hdr));
   ASSERT_EQ(1, LoadFile(20, photo_));
-  EXPECT_EQ(1, ReleaseImage(Slot(5)));
-  EXPECT_EQ(1, ReleaseImage(Slot(5)));
+  for (int time = 0; time < 2; ++time) EXPECT_EQ(1, ReleaseImage(Slot(5)));
   EXPECT_FALSE(Filled(5));
   for (const int slot : {20, 14, 36, 37, -1}) EXPECT_EQ(-97, ReleaseImage(Slot(slot)));
   EXPECT_TRUE(Filled(20));
-  InitTestModule();
-  EXPECT_FALSE(Filled(20));
 }
 
 TEST_F(Resources, AStandardImageOverridesItsReferenceValues) {
