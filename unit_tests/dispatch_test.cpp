@@ -76,7 +76,7 @@ TEST_F(Dispatch, ReleasingATestsDataEmptiesItsSlots) {
 }
 
 TEST_F(Dispatch, TheTesterOutlivesASecondInit) {
-  QVTester* before = theTester;
+  const QVTester* const before = theTester;
   EXPECT_EQ(1, setWorkingBinaryThresh(-99));
   Fill(17);
   Results().flash_mean_ = 5;

@@ -13,7 +13,6 @@
 namespace {
 
 constexpr int kSubpixels = 4;
-constexpr double kModule = kMarkSizes.back().module;
 
 // Chart units to pixel corners: (0, 0) is the top left corner of the first pixel.
 cv::Point2d Place(const ChartView& view, double x, double y) {
@@ -32,17 +31,6 @@ void FillPolygon(cv::Mat& canvas, const ChartView& view, const std::vector<cv::P
     scaled.emplace_back(cvRound((p.x - 0.5) * (1 << kShift)), cvRound((p.y - 0.5) * (1 << kShift)));
   }
   cv::fillConvexPoly(canvas, scaled, cv::Scalar::all(level), cv::LINE_8, kShift);
-}
-
-void FillSquare(cv::Mat& canvas, const ChartView& view, double x, double y, double half, int level) {
-  FillPolygon(canvas, view, {{x - half, y - half}, {x + half, y - half}, {x + half, y + half}, {x - half, y + half}},
-              level);
-}
-
-void FillMark(cv::Mat& canvas, const ChartView& view, double x, double y, double module) {
-  FillSquare(canvas, view, x, y, 3.5 * module, 10);
-  FillSquare(canvas, view, x, y, 2.5 * module, 220);
-  FillSquare(canvas, view, x, y, 1.5 * module, 10);
 }
 
 // Integral of the integral of a Gaussian's distribution function: a ramp from t = 0 with a soft start.
@@ -73,11 +61,13 @@ cv::Mat DrawChart(const ChartView& view) {
   const auto target = EdgeTarget();
   FillPolygon(canvas, view, {target.begin(), target.end()}, 50);
 
-  for (int i = 0; i < std::min(view.marks, 3); ++i) {
+  for (int i = 0; i < view.marks; ++i) {
     const auto& [x, y] = kMarkCentres[view.marks == 2 ? 2 * i : i];
-    FillMark(canvas, view, x, y, kModule);
+    for (const auto& [modules, level] : {std::pair{3.5, 10}, {2.5, 220}, {1.5, 10}}) {
+      const double h = modules * kMarkSizes.back().module;
+      FillPolygon(canvas, view, {{x - h, y - h}, {x + h, y - h}, {x + h, y + h}, {x - h, y + h}}, level);
+    }
   }
-  if (view.marks > 3) FillMark(canvas, view, kChartSide, kChartSide, 1.2 * kModule);
 
   cv::Mat photo;
   cv::resize(canvas, photo, view.size, 0, 0, cv::INTER_AREA);
@@ -102,11 +92,10 @@ cv::Mat DrawEdgePhoto(const EdgePhoto& view) {
   for (int row = 0; row < photo.rows; ++row) {
     for (int column = 0; column < photo.cols; ++column) {
       const double d = (cv::Point2d(column, row) - view.through).dot(normal);
+      const auto ramp = [&](double t) { return BlurredRamp(d + t, view.sigma_px); };
       double share = d > 0 ? 1 : 0;
       if (std::fabs(d) < far) {
-        const auto ramp = [&](double t) { return BlurredRamp(t, view.sigma_px); };
-        share =
-            (ramp(d + (a + b) / 2) - ramp(d + (a - b) / 2) - ramp(d - (a - b) / 2) + ramp(d - (a + b) / 2)) / (a * b);
+        share = (ramp((a + b) / 2) - ramp((a - b) / 2) - ramp((b - a) / 2) + ramp(-(a + b) / 2)) / (a * b);
       }
       photo.at<float>(row, column) = static_cast<float>(view.dark + (view.light - view.dark) * share);
     }
@@ -141,8 +130,6 @@ TemporaryFolder::~TemporaryFolder() {
   std::error_code ignored;
   std::filesystem::remove_all(path_, ignored);
 }
-
-std::string TemporaryFolder::Path(const std::string& name) const { return path_ + "/" + name; }
 
 std::string TemporaryFolder::Write(const std::string& name, const std::string& content) const {
   std::ofstream(Path(name), std::ios::binary) << content;

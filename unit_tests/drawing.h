@@ -15,7 +15,7 @@ void DrawMark(cv::Mat& image, int row, int column, int module, int dark = 0, int
 cv::Mat DrawMarks(cv::Size size, int module, const std::vector<cv::Point>& corners);
 
 struct ChartView {
-  int marks = 3;        // 2 leaves out the one at the top right, 4 adds a larger one at the bottom right
+  int marks = 3;        // 2 leaves out the one at the top right
   double turn_deg = 0;  // counter-clockwise about the middle
   double scale = 0.1;   // pixels per chart unit
   cv::Size size = {1000, 1000};
@@ -61,7 +61,7 @@ class TemporaryFolder {
   ~TemporaryFolder();
   TemporaryFolder(const TemporaryFolder&) = delete;
   TemporaryFolder& operator=(const TemporaryFolder&) = delete;
-  std::string Path(const std::string& name) const;
+  std::string Path(const std::string& name) const { return path_ + "/" + name; }
   /// Writes a file of this content and answers its path.
   std::string Write(const std::string& name, const std::string& content) const;
   /// Writes an image file and answers its path.

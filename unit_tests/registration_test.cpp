@@ -7,8 +7,8 @@
 
 namespace {
 
+using ::testing::ElementsAre;
 using ::testing::HasSubstr;
-using ::testing::SizeIs;
 
 // A textured scene with few repeats, and a view of it: the part that a camera shifted by (dx, dy) sees.
 cv::Mat DrawScene(unsigned seed) {
@@ -91,15 +91,11 @@ TEST(Unwarp, TooLittleToSeeIsNoRegistration) {
 
 class ImageList : public ModuleTest {
  protected:
-  ImageList() {
-    for (int i = 0; i < 4; ++i) {
-      files_.push_back(folder_.Write(std::to_string(i) + ".png", View(scene_, {3 * i, -2 * i})));
-    }
-  }
+  std::string Write(int i) const { return folder_.Write(std::to_string(i) + ".png", View(scene_, {3 * i, -2 * i})); }
   static const QVTester::ImageList& Held() { return theTester->image_list_; }
 
   cv::Mat scene_ = DrawScene(5);
-  std::vector<std::string> files_;
+  std::vector<std::string> files_ = {Write(0), Write(1), Write(2), Write(3)};
 };
 
 TEST_F(ImageList, PicturesAreRegisteredBinarisedAndTakenApart) {
@@ -140,14 +136,13 @@ TEST_F(ImageList, AFailureChangesNothing) {
   ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[0], files_[1]}));
   const cv::Mat held = Held().matrix.clone();
 
-  for (const std::string& bad : {folder_.Path("missing.png"), folder_.Write("words.png", std::string("words"))}) {
+  folder_.Write("words.png", std::string("words"));
+  folder_.Write("blank.png", cv::Mat(480, 640, CV_8UC1, cv::Scalar(9)));
+  for (const auto& [bad, code] : {std::pair{"missing.png", -97}, {"words.png", -97}, {"blank.png", -90}}) {
     const LogLines log;
-    EXPECT_EQ(-97, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[2], bad}));
-    ASSERT_THAT(LogLines::Texts(), SizeIs(1));
-    EXPECT_THAT(LogLines::Texts()[0], HasSubstr(bad));
+    EXPECT_EQ(code, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[2], folder_.Path(bad)}));
+    EXPECT_THAT(LogLines::Texts(), ElementsAre(HasSubstr(folder_.Path(bad))));
   }
-  const std::string blank = folder_.Write("blank.png", cv::Mat(480, 640, CV_8UC1, cv::Scalar(9)));
-  EXPECT_EQ(-90, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[2], blank}));
   EXPECT_EQ(0, cv::norm(held, Held().matrix, cv::NORM_INF));
 }
 
@@ -156,7 +151,6 @@ TEST_F(ImageList, OtherSizesComeIntoTheFirstOnesFrame) {
   ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[0], wide}));
   EXPECT_EQ(cv::Size(640, 480), Held().registered[1].size());
   ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {wide})) << "a list of one";
-  EXPECT_EQ(1, Held().matrix.rows);
   EXPECT_EQ(1, Held().components);
   EXPECT_EQ(cv::Size(680, 520), theTester->RebuildListImage(0).size());
 }
