@@ -19,7 +19,7 @@ cv::Mat DrawDust(const std::vector<cv::Point>& places, int diameter = 9, int lev
   return photo;
 }
 
-class Dust : public PublishingTest {
+class Dust : public ModuleTest {
  protected:
   static int Measure(const cv::Mat& photo, bool front = false, bool fake_mode = false) {
     Load(front ? 26 : 19, photo);

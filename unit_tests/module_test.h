@@ -12,11 +12,17 @@
 #include "unit_tests/drawing.h"
 #include "unit_tests/log_lines.h"
 
-/// Tests through the function interface: each has a tester of its own, and its log lines are kept.
+/// Tests through the function interface: each has a tester and a property store of its own, and its log lines are kept.
 class ModuleTest : public ::testing::Test {
  protected:
-  ModuleTest() { InitTestModule(); }
-  ~ModuleTest() override { FinalizeTestModule(); }
+  ModuleTest() {
+    SetHostPropertyStore(store_.c_str());
+    InitTestModule();
+  }
+  ~ModuleTest() override {
+    FinalizeTestModule();
+    SetHostPropertyStore(nullptr);
+  }
 
   static void Load(int slot, const cv::Mat& image) {
     theTester->resources_[slot] = std::make_unique<QVResource>();
@@ -33,17 +39,10 @@ class ModuleTest : public ::testing::Test {
     return *results;
   }
 
-  LogLines log_;
-  TemporaryFolder folder_;
-};
-
-/// What they publish goes to a property store of the test's own.
-class PublishingTest : public ModuleTest {
- protected:
-  PublishingTest() { SetHostPropertyStore(store_.c_str()); }
-  ~PublishingTest() override { SetHostPropertyStore(nullptr); }
   std::string Property(const std::string& key) const { return ReadFile(store_ + "/" + key); }
 
+  LogLines log_;
+  TemporaryFolder folder_;
   std::string store_ = folder_.Path("properties");
 };
 

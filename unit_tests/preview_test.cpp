@@ -12,7 +12,7 @@ using ::testing::Contains;
 using ::testing::Each;
 using ::testing::ElementsAre;
 
-class Preview : public PublishingTest {
+class Preview : public ModuleTest {
  protected:
   Preview() { SetHostPreviewFolder(folder_.Path("").c_str()); }
   ~Preview() override { SetHostPreviewFolder(nullptr); }
@@ -125,6 +125,7 @@ TEST_F(Preview, TheCentreIsTheMiddleOfTheLongestSide) {
   EXPECT_EQ("0,8", centre({{0, 0}, {6, 8}, {0, 16}})) << "of a middle one";
   EXPECT_EQ("0,0", centre({{0, 0}, {0, 10}, {8, 5}, {4, 2}})) << "four points have no centre";
   EXPECT_EQ("4,2", Property("t82.vi_circle_loc_0_3"));
+  EXPECT_EQ("0,0", centre({}));
   SetHostPropertyStore(folder_.Path("no/store").c_str());
   EXPECT_EQ("0,0", centre({{0, 0}, {0, 10}, {0, 20}})) << "publishing is nobody's failure";
 }
