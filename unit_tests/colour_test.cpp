@@ -21,13 +21,19 @@ float Temperature(std::array<float, 3> xyz) { return *Buffer(QVTester().xyz2cct(
 
 float Temperature(float x, float y) { return Temperature({x, y, 1 - x - y}); }
 
-TEST(Colour, TheTransferFunctionIsThatOfSrgb) {
+TEST(Colour, TheCurvesAreThoseOfSrgbAndLab) {
   QVTester tester;
   EXPECT_EQ(1.0f, tester.GetLinearRGB(255));
   EXPECT_FLOAT_EQ(10 / 255.0f / 12.92f, tester.GetLinearRGB(10)) << "the straight part";
   EXPECT_NEAR(0.21586, tester.GetLinearRGB(128), 5e-6);  // published tables of sRGB
   EXPECT_NEAR(0.0033465, tester.GetLinearRGB(11), 5e-7);
   for (int v = 1; v < 256; ++v) EXPECT_GT(tester.GetLinearRGB(v), tester.GetLinearRGB(v - 1));
+  EXPECT_FLOAT_EQ(0.5f, tester.GetFValue(0.125f));
+  EXPECT_FLOAT_EQ(16 / 116.0f, tester.GetFValue(0));
+  const float epsilon = 0.008856452f;
+  const auto straight = static_cast<float>((static_cast<double>(24389.0f / 27.0f * epsilon) + 16) / 116);
+  EXPECT_EQ(straight, tester.GetFValue(epsilon));
+  EXPECT_EQ(static_cast<float>(std::cbrt(static_cast<double>(0.0089f))), tester.GetFValue(0.0089f));
 }
 
 TEST(Colour, TheWhiteIsThatOfD65AndLabRelativeToUnity) {
@@ -47,17 +53,7 @@ TEST(Colour, TheWhiteIsThatOfD65AndLabRelativeToUnity) {
   }
 }
 
-TEST(Colour, TheCompanionFunctionSwitchesAtEpsilon) {
-  QVTester tester;
-  EXPECT_FLOAT_EQ(0.5f, tester.GetFValue(0.125f));
-  EXPECT_FLOAT_EQ(16 / 116.0f, tester.GetFValue(0));
-  const float epsilon = 0.008856452f;
-  const auto straight = static_cast<float>((static_cast<double>(24389.0f / 27.0f * epsilon) + 16) / 116);
-  EXPECT_EQ(straight, tester.GetFValue(epsilon));
-  EXPECT_EQ(static_cast<float>(std::cbrt(static_cast<double>(0.0089f))), tester.GetFValue(0.0089f));
-}
-
-TEST(Colour, TemperaturesOfIlluminantsArePublished) {  // CIE 15's A, D50, D65, D75 and F2, and the Planckian locus
+TEST(Colour, TemperaturesAreThePublishedOnes) {  // CIE 15's A, D50, D65, D75 and F2, and the Planckian locus
   const std::map<float, std::pair<float, float>> lights = {
       {2856.0f, {0.44757f, 0.40745f}}, {5003.0f, {0.34567f, 0.35850f}}, {6504.0f, {0.31271f, 0.32902f}},
       {7504.0f, {0.29902f, 0.31485f}}, {4230.0f, {0.37208f, 0.37529f}}, {2000.0f, {0.5267f, 0.4133f}},
@@ -65,9 +61,7 @@ TEST(Colour, TemperaturesOfIlluminantsArePublished) {  // CIE 15's A, D50, D65, 
   for (const auto& [kelvin, xy] : lights) {
     EXPECT_NEAR(kelvin, Temperature(xy.first, xy.second), 0.005 * kelvin);  // the fit's own error
   }
-}
-
-TEST(Colour, TemperaturesEndWhereTheFitsDo) {
+  // They end where the fits do.
   EXPECT_EQ(0.0f, Temperature(0.6101f, 0.38f));
   EXPECT_GT(Temperature(0.61f, 0.38f), 0.0f);
   EXPECT_EQ(0.0f, Temperature(0.0f, 0.5f));

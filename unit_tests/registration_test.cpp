@@ -123,8 +123,6 @@ TEST_F(ImageList, PicturesAreRegisteredBinarisedAndTakenApart) {
   EXPECT_THROW(theTester->RebuildListImage(4), cv::Exception);
   EXPECT_NE(nullptr, theTester->resources_[36]);
   EXPECT_EQ(CV_8UC1, Held().combined.type());
-  theTester->resources_[32] = std::make_unique<QVResource>();
-  EXPECT_EQ(1, theTester->ValidateTest(QV_TEST_TOUCH_PANEL_PRINT));
   theTester->Initialize();
   EXPECT_TRUE(Held().gray.empty() && Held().matrix.empty()) << "the list goes with its slot";
 }

@@ -22,14 +22,19 @@ class Resources : public ModuleTest {
   std::string photo_ = folder_.Write("photo.png", cv::Mat(4, 6, CV_8UC3, cv::Scalar(1, 2, 3)));
 };
 
-TEST_F(Resources, EachSetterTakesItsOwnSlots) {
+TEST_F(Resources, SlotsAreSetAndReleasedByTheirOwnFunctions) {
   float hdr[3] = {};
   unsigned short ldr[3] = {};
   for (int slot = -1; slot <= 37; ++slot) {
-    EXPECT_EQ(slot >= 0 && slot <= 13 ? 1 : -97, SetHDRResource(Slot(slot), 1, 1, true, hdr)) << slot;
-    EXPECT_EQ(slot >= 14 && slot <= 35 ? 1 : -97, SetLDRResource(Slot(slot), 1, 1, ldr)) << slot;
+    const bool of_hdr = slot >= 0 && slot <= 13;
+    const bool of_ldr = slot >= 14 && slot <= 35;
+    EXPECT_EQ(of_hdr ? 1 : -97, SetHDRResource(Slot(slot), 1, 1, true, hdr)) << slot;
+    EXPECT_EQ(of_ldr ? 1 : -97, SetLDRResource(Slot(slot), 1, 1, ldr)) << slot;
+    for (int time = 0; time < 2; ++time) EXPECT_EQ(of_hdr ? 1 : -97, ReleaseImage(Slot(slot))) << slot;
+    EXPECT_EQ(of_ldr, of_ldr && Filled(slot)) << slot;
+    EXPECT_FALSE(of_hdr && Filled(slot)) << slot;
     if (slot == 34 || slot == 35) continue;  // a film's
-    EXPECT_EQ(slot >= 14 && slot <= 33 ? 1 : -97, LoadFile(slot, photo_)) << slot;
+    EXPECT_EQ(of_ldr ? 1 : -97, LoadFile(slot, photo_)) << slot;
   }
 }
 
@@ -138,14 +143,6 @@ TEST_F(Resources, BadArgumentsAreRefused) {
   EXPECT_EQ(-99, SetLDRResource(Slot(20), INT_MAX, INT_MAX, ldr));
   EXPECT_EQ(-99, SetLDRResource(Slot(20), 1 << 20, 1 << 20, ldr)) << "OpenCV's own out of memory";
   EXPECT_FALSE(Filled(20));
-}
-
-TEST_F(Resources, OnlyHdrSlotsAreReleasedOneByOne) {
-  for (const int slot : {5, 20}) Load(slot, cv::Mat(1, 1, CV_8UC3));
-  for (int time = 0; time < 2; ++time) EXPECT_EQ(1, ReleaseImage(Slot(5)));
-  EXPECT_FALSE(Filled(5));
-  for (const int slot : {20, 14, 36, 37, -1}) EXPECT_EQ(-97, ReleaseImage(Slot(slot)));
-  EXPECT_TRUE(Filled(20));
 }
 
 TEST_F(Resources, AStandardImageOverridesItsReferenceValues) {
