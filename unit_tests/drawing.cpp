@@ -104,13 +104,10 @@ cv::Mat DrawEdgePhoto(const EdgePhoto& view) {
 }
 
 cv::Mat DrawEdge(const EdgeView& view) {
-  EdgePhoto photo;
-  photo.size = {view.cols, view.rows};
-  photo.through = {(view.cols - 1) / 2.0 + view.place, (view.rows - 1) / 2.0};
-  photo.normal_deg = -std::atan(view.slope) * 180 / CV_PI;
-  photo.sigma_px = view.sigma_px;
-  photo.dark = view.dark_left ? view.dark : view.light;
-  photo.light = view.dark_left ? view.light : view.dark;
+  const cv::Point2d through((view.cols - 1) / 2.0 + view.place, (view.rows - 1) / 2.0);
+  EdgePhoto photo = {{view.cols, view.rows}, through,   -std::atan(view.slope) * 180 / CV_PI,
+                     view.sigma_px,          view.dark, view.light};
+  if (!view.dark_left) std::swap(photo.dark, photo.light);
   return DrawEdgePhoto(photo);
 }
 
