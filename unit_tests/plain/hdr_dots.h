@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstddef>
 #include <cstdint>
 #include <opencv2/core.hpp>
 
@@ -15,34 +16,41 @@ namespace plain {
 // precision: its rounding is part of the result. (height + 1) x (width + 1).
 inline cv::Mat SumChannel0(const float* data, int height, int width) {
   cv::Mat sums = cv::Mat::zeros(height + 1, width + 1, CV_32F);
-  for (int y = 0; y < height; ++y) {
-    const auto* const above = sums.ptr<float>(y);
-    auto* const here = sums.ptr<float>(y + 1);
+  for (int y = 1; y <= height; ++y) {
+    const float* const row = data + static_cast<std::size_t>(y - 1) * width * 3;
+    const auto* const above = sums.ptr<float>(y - 1);
+    auto* const here = sums.ptr<float>(y);
     float row_sum = 0;
-    for (int x = 0; x < width; ++x, data += 3) {
-      row_sum += *data;
-      here[x + 1] = above[x + 1] + row_sum;
+    for (int x = 1; x <= width; ++x) {
+      row_sum += row[3 * (x - 1)];
+      here[x] = above[x] + row_sum;
     }
   }
   return sums;
 }
 
-// The window about a pixel is shifted inward near an edge, so that it keeps its size.
+// First row or column of the window about place i (from 1): shifted inward near an edge, so that it keeps its size.
+inline int WindowStart(int i, int radius, int size) {
+  const int side = 2 * radius + 1;
+  return std::min(side + std::max(i - radius - 1, 0), size) - side;
+}
+
 inline void DetectDot(const float* data, int height, int width, float threshold, int radius, unsigned char* mask) {
-  const std::int64_t size = 2 * static_cast<std::int64_t>(radius) + 1;
-  if (radius < 0 || height < size || width < size) return;
-  const int side = static_cast<int>(size);
+  const std::int64_t side = 2 * static_cast<std::int64_t>(radius) + 1;
+  if (radius < 0 || height < side || width < side) return;
   const cv::Mat sums = SumChannel0(data, height, width);
-  const auto area = static_cast<float>(size * size);
-  for (int y = 0; y < height; ++y) {
-    const int top = std::min(std::max(y - radius, 0), height - side);
+  const auto area = static_cast<float>(side * side);
+  for (int y = 1; y <= height; ++y) {
+    const int top = WindowStart(y, radius, height);
     const auto* const upper = sums.ptr<float>(top);
-    const auto* const lower = sums.ptr<float>(top + side);
-    for (int x = 0; x < width; ++x, data += 3, ++mask) {
-      const int left = std::min(std::max(x - radius, 0), width - side);
-      const int right = left + side;
+    const auto* const lower = sums.ptr<float>(top + static_cast<int>(side));
+    const std::size_t row = static_cast<std::size_t>(y - 1) * width;
+    for (int x = 1; x <= width; ++x) {
+      const int left = WindowStart(x, radius, width);
+      const int right = left + static_cast<int>(side);
       const float mean = (lower[right] + upper[left] - upper[right] - lower[left]) / area;
-      if (std::fabs((mean - *data) / mean) > threshold) *mask = 1;
+      const float pixel = data[3 * (row + x - 1)];
+      if (std::fabs((mean - pixel) / mean) > threshold) mask[row + x - 1] = 1;
     }
   }
 }

@@ -2,6 +2,7 @@
 #define QVTESTER_UNIT_TESTS_PLAIN_SFR_H_
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <cstdint>
 #include <cstdlib>
@@ -69,32 +70,57 @@ inline cv::Mat ProjectData(cv::Mat bb, float slope, int fac) {
   return esf;
 }
 
-// Two passes of windowed centroids and a straight line; the second pass centres each row's window on the first line.
-// Columns per row.
-inline float EdgeSlope(QVTester& tester, const cv::Mat& region, float* fil) {
-  cv::Mat derivative;
-  tester.GetFirstDerivative(region, region.rows, region.cols, fil, 2, derivative);
-  float slope = 0;
-  float offset = static_cast<float>(region.cols + 1) * 0.5f;
-  for (const bool moving : {false, true}) {
-    cv::Mat loc(region.rows, 1, CV_32F);
-    cv::Mat window;
-    for (int n = 0; n < region.rows; ++n) {
-      if (moving || n == 0) window = GetAHammingWindow(region.cols, offset + slope * static_cast<float>(n));
-      const cv::Mat profile = derivative.row(n).t();
-      loc.at<float>(n) = tester.GetCentroid(profile.mul(window)) - 0.5f;
-    }
-    tester.FindEdge(loc, region.rows, &slope, &offset);
+struct Kernels {
+  Kernels(QVTester& tester, cv::Mat& region) {
+    float* two_taps = nullptr;
+    float* three_taps = nullptr;
+    tester.CalculateFilterValue(&region, &two_taps, &three_taps);
+    fil1.reset(two_taps);
+    fil2.reset(three_taps);
   }
-  return slope;
+  std::unique_ptr<float[]> fil1, fil2;
+};
+
+struct EdgeLine {
+  float slope;   // columns per row
+  float offset;  // column in row 0
+};
+
+inline float EdgeInRow(QVTester& tester, const cv::Mat& derivative, int row, const cv::Mat& window) {
+  cv::Mat profile;
+  cv::transpose(derivative.row(row), profile);
+  return tester.GetCentroid(profile.mul(window)) - 0.5f;
+}
+
+// Two passes of windowed centroids and a straight line; the second pass centres each row's window on the first line.
+inline EdgeLine LocateEdge(QVTester& tester, const cv::Mat& region, float* fil) {
+  const int nlin = region.rows;
+  const int npix = region.cols;
+  cv::Mat derivative;
+  tester.GetFirstDerivative(region, nlin, npix, fil, 2, derivative);
+
+  EdgeLine line = {};
+  cv::Mat loc(nlin, 1, CV_32F);
+  const cv::Mat centred = GetAHammingWindow(npix, static_cast<float>(npix + 1) * 0.5f);
+  for (int n = 0; n < nlin; ++n) loc.at<float>(n) = EdgeInRow(tester, derivative, n, centred);
+  tester.FindEdge(loc, nlin, &line.slope, &line.offset);
+
+  for (int n = 0; n < nlin; ++n) {
+    const float place = line.offset + line.slope * static_cast<float>(n);
+    loc.at<float>(n) = EdgeInRow(tester, derivative, n, GetAHammingWindow(npix, place));
+  }
+  tester.FindEdge(loc, nlin, &line.slope, &line.offset);
+  return line;
 }
 
 // Derivative of the edge spread, its centre of gravity moved to the middle, Hamming-windowed. npix x 1.
 inline cv::Mat CentredLineSpread(QVTester& tester, const cv::Mat& esf, float* fil) {
   const int npix = esf.rows;
+  cv::Mat row;
+  cv::transpose(esf, row);
   cv::Mat lsf;
-  tester.GetFirstDerivative(esf.t(), 1, npix, fil, 3, lsf);
-  lsf = lsf.t();
+  tester.GetFirstDerivative(row, 1, npix, fil, 3, lsf);
+  cv::transpose(lsf, lsf);
   const double mid = tester.GetCentroid(lsf) + 0.5;
   // Without a finite centre there is nothing to move to: all moves out of view, and the response is 0 / 0.
   lsf = tester.GetShiftedArray(lsf, std::fabs(mid) < kBeyondAnyArray ? static_cast<int>(mid) : 2 * npix);
@@ -104,30 +130,38 @@ inline cv::Mat CentredLineSpread(QVTester& tester, const cv::Mat& esf, float* fi
 // response[k] = |Re(DFT(lsf))[k]| / |Re(DFT(lsf))[0]|, k = 0 .. npix/2; frequencies 2k / npix of Nyquist.
 inline void AppendResponse(const cv::Mat& lsf, std::vector<float>& freq, std::vector<float>& sfr) {
   const int npix = lsf.rows;
+  std::array<cv::Mat, 2> planes = {lsf, cv::Mat::zeros(lsf.size(), CV_32F)};
   cv::Mat spectrum;
-  cv::merge(std::vector<cv::Mat>{lsf, cv::Mat::zeros(lsf.size(), CV_32F)}, spectrum);
+  cv::merge(planes.data(), planes.size(), spectrum);
   cv::dft(spectrum, spectrum);
-  const float dc = std::fabs(spectrum.at<cv::Vec2f>(0)[0]);
+  cv::split(spectrum, planes.data());
+  const float dc = std::fabs(planes[0].at<float>(0));
   for (int k = 0; k <= npix / 2; ++k) {
     freq.push_back(static_cast<float>(2 * k) / static_cast<float>(npix));
-    sfr.push_back(std::fabs(spectrum.at<cv::Vec2f>(k)[0]) / dc);
+    sfr.push_back(std::fabs(planes[0].at<float>(k)) / dc);
   }
 }
 
-// Straight line through the samples nearest and second nearest to 0.5, the earlier of equals; (0, 0) stands in for a
-// sample that is missing, not a number, or as far as 1.
+// Straight line through the samples nearest (a) and second nearest (b) to 0.5. A sample as far as a but nearer than b
+// becomes b; equal distances change nothing else.
 inline float InterpolateMTF50(const float* freq, const float* sfr, int count) {
   struct Sample {
     float frequency, response, distance;
   };
-  std::vector<Sample> samples = {{0, 0, 1}, {0, 0, 1}};
+  Sample a = {0, 0, 1.0f};
+  Sample b = a;
   for (int k = 0; k < count; ++k) {
-    if (!std::isnan(sfr[k])) samples.push_back({freq[k], sfr[k], std::fabs(sfr[k] - 0.5f)});
+    const Sample sample = {freq[k], sfr[k], std::fabs(sfr[k] - 0.5f)};
+    if (!(sample.distance < b.distance)) continue;
+    if (sample.distance < a.distance) {
+      b = a;
+      a = sample;
+    } else {
+      b = sample;
+    }
   }
-  const auto nearer = [](const Sample& a, const Sample& b) { return a.distance < b.distance; };
-  std::stable_sort(samples.begin(), samples.end(), nearer);
-  const auto lower = [](const Sample& a, const Sample& b) { return a.frequency < b.frequency; };
-  const auto [low, high] = std::minmax(samples[1], samples[0], lower);
+  const Sample& high = b.frequency > a.frequency ? b : a;
+  const Sample& low = b.frequency > a.frequency ? a : b;
   const float t = std::fabs(high.response - 0.5f) / std::fabs(high.response - low.response);
   return low.frequency * t + high.frequency * (1 - t);
 }
@@ -136,12 +170,10 @@ inline bool CalculateSFR(QVTester& tester, cv::Mat roi, std::vector<float>& freq
                          float& mtf50) {
   if (roi.depth() != CV_32F) roi.convertTo(roi, CV_32F);
   cv::Mat region = tester.ConvertToVertical(roi);  // nlin x npix, the edge runs down the rows
-  float* taps[2];
-  tester.CalculateFilterValue(&region, &taps[0], &taps[1]);
-  const std::unique_ptr<float[]> fil1(taps[0]);
-  const std::unique_ptr<float[]> fil2(taps[1]);
-  const cv::Mat esf = ProjectData(region, EdgeSlope(tester, region, fil1.get()), 1);  // npix x 1, edge spread
-  const cv::Mat lsf = CentredLineSpread(tester, esf, fil2.get());                     // npix x 1, line spread
+  const Kernels fil(tester, region);
+  const EdgeLine edge = LocateEdge(tester, region, fil.fil1.get());
+  const cv::Mat esf = ProjectData(region, edge.slope, 1);              // npix x 1, edge spread
+  const cv::Mat lsf = CentredLineSpread(tester, esf, fil.fil2.get());  // npix x 1, line spread
   const std::size_t first = sfr.size();
   AppendResponse(lsf, freq, sfr);
   const int count = static_cast<int>(sfr.size() - first);
