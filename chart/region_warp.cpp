@@ -63,8 +63,7 @@ void FormPlaces(cv::Point row, const std::vector<int>& column_x, const std::vect
 }  // namespace
 
 cv::Mat WarpRegion(const cv::Mat& image, const cv::Mat& map, cv::Size canvas_size, cv::Rect region) {
-  // A header without pixels cuts as the whole canvas would: it throws for a region outside, and one of no area is 0 x
-  // 0.
+  // A header without pixels cuts as the whole canvas would: it throws for a region outside; one of no area is 0 x 0.
   uchar none = 0;
   const cv::Mat header(canvas_size, CV_8UC1, &none);
   if (header(region).empty()) return cv::Mat(0, 0, image.type());

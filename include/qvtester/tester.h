@@ -89,7 +89,7 @@ class QV_API QVTester {
   /// Frees slots and result of one of the tests 0-12; -97 for test 3 and any other.
   int ReleaseDataForTest(QV_TEST_INDEX test);
 
-  /// Store into a record of the tests 0-12, which takes over the array (from new[]) and frees the one before.
+  /// Store into a record of the tests 0-12, which takes over the array (from new[]) and frees the one before. Answer 1.
   int SetResult(QVPhase1Result* r, int code);
   int SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image);
   int SetResultRawData(QVPhase1Result* r, int width, int height, float* data);
@@ -278,7 +278,7 @@ class QV_API QVTester {
   /// logged and flags nothing.
   void DetectDot(float* data, int height, int width, float threshold, int radius, unsigned char* mask);
   /// Channel 0 of a float picture of several channels, stretched from its least and largest value to 0 and 255,
-  /// CV_8UC1.
+  /// CV_8UC1. @throws cv::Exception for an empty picture.
   cv::Mat HDR2UCHAR(cv::Mat& hdr);
   /// Merges rectangles of defective pixels that lie within a distance, until no two do.
   ///
@@ -286,9 +286,9 @@ class QV_API QVTester {
   /// @param width, height          of the image, which bounds the overlap.
   /// @param[in,out] areas          as many entries as rectangles; then each one's index in the pass before the last.
   /// @param[in,out] counts         flagged pixels a rectangle; null, or pointing to null, counts from 0.
-  /// @param[in,out] topLeft        column and row, inside; bottomRight likewise. The arrays come from malloc: those
-  /// given
-  ///                               are freed, new ones handed back. Fewer than two rectangles are left as they are.
+  /// @param[in,out] topLeft        column and row, inside; bottomRight likewise.
+  /// The arrays come from malloc: those given are freed, new ones handed back. Fewer than two rectangles are left as
+  /// they are.
   /// @return number of areas.
   int ErrorAreaClustering(int distance, int width, int height, std::vector<int>* areas, int** counts,
                           cv::Point** topLeft, cv::Point** bottomRight);

@@ -1,4 +1,5 @@
-// Merging of rectangles of defective pixels that lie close together, until no two are close any more.
+// Merging of rectangles of defective pixels that lie close together, until no two are close any more. The plain form,
+// which holds every area against every other in each pass, is in unit_tests/plain/error_areas.h.
 
 #include <algorithm>
 #include <cstdlib>
