@@ -59,8 +59,8 @@ TEST_F(Capture, SamplingStopsAtTheFirstPatchOutside) {
 
 TEST_F(Capture, WithoutAStandardFourPatchesAreKept) {
   const cv::Mat photo = DrawPatches(Drawn);
-  for (const int top :
-       {0, 116, 119}) {  // the top row's patches begin in the photo; at -1; farther out, and are too few
+  // The top row's patches begin in the photo; at -1; farther out, and are too few.
+  for (const int top : {0, 116, 119}) {
     Load(17, photo(cv::Rect(116, top, 884, 1000 - top)));
     EXPECT_EQ(top == 119 ? -87 : 1, TestCameraCapture(false));
     ASSERT_EQ(4, Main().capture_lab_count_);
@@ -122,12 +122,11 @@ TEST_F(Capture, PatchesAreThoseOfTheStraightenedPhoto) {
 TEST_F(Capture, MissesInEitherPhotoStoreNothing) {
   const cv::Mat blank(200, 200, CV_8UC3, cv::Scalar::all(255));
   EXPECT_EQ(-98, TestCameraCapture(true));
-  for (const char* missed : {"1,", "2"}) {  // first in the standard, then in the photo
-    const bool extracted = missed[0] == '2';
+  for (const bool extracted : {false, true}) {  // missed in the standard, then in the photo
     Load(18, extracted ? DrawPatches(Drawn) : blank);
     Load(17, extracted ? blank : DrawPatches(Drawn));
     EXPECT_EQ(-91, TestCameraCapture(false));
-    EXPECT_EQ("[TestCameraCapture] TestCameraCapture" + std::string(missed) +
+    EXPECT_EQ("[TestCameraCapture] TestCameraCapture" + std::string(extracted ? "2" : "1,") +
                   " finder point : 0 \n return PATTERN NOT FOUND!",
               LogLines::Texts().back());
     EXPECT_EQ(extracted, theTester->standard_main_.is_extracted);
