@@ -14,7 +14,7 @@
 #include <vigra/slanted_edge_mtf.hxx>
 #endif
 
-#include "qvtester/iso_mtf.h"
+#include "desk/measure/iso_mtf.h"
 #include "tools/method_law.h"
 #include "unit_tests/drawing.h"
 
@@ -33,10 +33,8 @@ constexpr Setting kSettings[] = {{650, 225, 0}, {650, 225, 2}, {260, 90, 0}, {26
 using Method = std::function<double(const cv::Mat& region)>;  // MTF50 in units of Nyquist, NaN for none
 
 double MeasureIso(const cv::Mat& region) {
-  QVIsoMtf result = {};
   const cv::Point2d middle((region.cols - 1) / 2.0, (region.rows - 1) / 2.0);
-  MeasureIsoMtf50(region, TurnedRectangle(middle, region.rows, region.cols, 0), &result);
-  return result.mtf50;
+  return qv::MeasureIsoMtf(region, TurnedRectangle(middle, region.rows, region.cols, 0)).mtf50;
 }
 
 #ifdef QV_HAVE_VIGRA

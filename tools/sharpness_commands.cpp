@@ -3,7 +3,7 @@
 #include <memory>
 #include <opencv2/imgproc.hpp>
 
-#include "qvtester/iso_mtf.h"
+#include "desk/measure/iso_mtf.h"
 #include "tools/camera.h"
 #include "tools/chart_view.h"
 #include "tools/commands.h"
@@ -44,10 +44,7 @@ void AddIsoFigures(Record& record, const cv::Mat& photo) {
   const UprightPhoto upright = Straighten(*theTester, gray);
   const std::array<cv::Rect, 2> regions = MeasuredRegions(upright);
   for (std::size_t i = 0; i < regions.size(); ++i) {
-    QVIsoMtf iso = {};
-    if (MeasureIsoMtf50(gray, upright.OnPhoto(regions[i]), &iso) != QV_SUCCESS) {
-      throw Failure(kInternalFault, "no memory for the figures of ISO 12233");
-    }
+    const qv::IsoMtf iso = qv::MeasureIsoMtf(gray, upright.OnPhoto(regions[i]));
     record.phase.Add(std::string("mtf50_iso_") + kRegionNames[i], iso.mtf50);
     const cv::Mat region = upright.picture(regions[i]);
     if (cv::countNonZero(region == 255) > kMostClipped * static_cast<double>(region.total())) {

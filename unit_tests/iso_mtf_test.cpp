@@ -1,4 +1,4 @@
-#include "qvtester/iso_mtf.h"
+#include "desk/measure/iso_mtf.h"
 
 #include <gmock/gmock.h>
 
@@ -7,6 +7,7 @@
 #include "tools/method_law.h"
 #include "unit_tests/drawing.h"
 
+namespace qv {
 namespace {
 
 using ::testing::HasSubstr;
@@ -21,16 +22,14 @@ struct Slant {
   double width = kWidth;     // of the region
 };
 
-QVIsoMtf MeasureEdge(const Slant& slant) {
+IsoMtf MeasureEdge(const Slant& slant) {
   const int side = static_cast<int>(std::hypot(kLength, kWidth)) + 2;
   const cv::Point2d middle(side / 2.0, side / 2.0);
   cv::Mat photo = DrawEdgePhoto({{side, side}, middle + slant.off, slant.turn_deg + slant.slope_deg, slant.sigma_px});
   cv::Mat noise(photo.size(), CV_32F);
   cv::randn(noise, 0, slant.noise);
   cv::Mat(photo + noise).convertTo(photo, CV_8U);
-  QVIsoMtf result;
-  EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(photo, TurnedRectangle(middle, kLength, slant.width, slant.turn_deg), &result));
-  return result;
+  return MeasureIsoMtf(photo, TurnedRectangle(middle, kLength, slant.width, slant.turn_deg));
 }
 
 double ErrorPercent(const Slant& slant) {
@@ -60,7 +59,7 @@ TEST_P(IsoBlur, NoiseOfTwoPercentCostsTwoPercentAtMost) {
 INSTANTIATE_TEST_SUITE_P(Sigma, IsoBlur, ::testing::Values(0.3, 0.5, 0.8, 1.2, 2.0, 3.0, 8.0));
 
 TEST(IsoMtf, PolarityPlaceAndOrientationLeaveItAlone) {
-  const QVIsoMtf plain = MeasureEdge({});
+  const IsoMtf plain = MeasureEdge({});
   EXPECT_EQ(nullptr, plain.reason);
   EXPECT_NEAR(-5, plain.edge_angle_deg, 0.01);
   EXPECT_NEAR(plain.mtf50, MeasureEdge({0, 185}).mtf50, 1e-3 * plain.mtf50);  // levels are rounded elsewhere
@@ -73,9 +72,7 @@ TEST(IsoMtf, PolarityPlaceAndOrientationLeaveItAlone) {
 
 TEST(IsoMtf, ARegionMayFillThePhoto) {
   const EdgePhoto view = {{100, 250}, {50, 125}};
-  QVIsoMtf result;
-  const auto all = TurnedRectangle({49.5, 124.5}, 250, 100, 0);
-  ASSERT_EQ(QV_SUCCESS, MeasureIsoMtf50(DrawEdgePhoto(view), all, &result));
+  const IsoMtf result = MeasureIsoMtf(DrawEdgePhoto(view), TurnedRectangle({49.5, 124.5}, 250, 100, 0));
   EXPECT_NEAR(method_law::TrueMtf50(view.sigma_px, view.normal_deg), result.mtf50, 0.01 * result.mtf50);
 }
 
@@ -88,22 +85,20 @@ TEST(IsoMtf, WhereThereIsNoFigureItSaysWhy) {
            {{0, 0.3, 1, 0, {kWidth / 2 - 5, 0}}, "too near"},  // and still in every row
            {{0, 0.3, 1, 0, {3 * kWidth, 0}}, "not show one edge"},
            {{0, 0.3, 1, 5, {3 * kWidth, 0}}, "not show one edge"}}) {
-    const QVIsoMtf result = MeasureEdge(slant);
+    const IsoMtf result = MeasureEdge(slant);
     EXPECT_TRUE(std::isnan(result.mtf50)) << reason;
     EXPECT_THAT(result.reason, HasSubstr(reason));
   }
-  QVIsoMtf result;
   const cv::Mat photo = cv::Mat::zeros(9, 9, CV_8U);
   const auto beyond = TurnedRectangle({5000, -3}, kLength, kWidth, 0);
-  EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(photo, beyond, &result));
-  EXPECT_THAT(result.reason, HasSubstr("outside the photo"));
+  EXPECT_THAT(MeasureIsoMtf(photo, beyond).reason, HasSubstr("outside the photo"));
   for (const double nowhere : {1e300, -1e12, std::nan("")}) {
-    EXPECT_EQ(QV_SUCCESS, MeasureIsoMtf50(photo, TurnedRectangle({nowhere, 0}, kLength, kWidth, 0), &result));
+    const IsoMtf result = MeasureIsoMtf(photo, TurnedRectangle({nowhere, 0}, kLength, kWidth, 0));
     EXPECT_TRUE(std::isnan(result.mtf50) && result.reason != nullptr) << nowhere;
   }
-  EXPECT_EQ(QV_ERROR_UNUSABLE_INPUT, MeasureIsoMtf50(cv::Mat::zeros(9, 9, CV_8UC3), beyond, &result));
-  EXPECT_EQ(QV_ERROR_UNUSABLE_INPUT, MeasureIsoMtf50(cv::Mat(), beyond, &result));
-  EXPECT_EQ(QV_ERROR_INVALID_ARGUMENT, MeasureIsoMtf50(photo, beyond, nullptr));
+  EXPECT_THROW(MeasureIsoMtf(cv::Mat::zeros(9, 9, CV_8UC3), beyond), cv::Exception);
+  EXPECT_THROW(MeasureIsoMtf(cv::Mat(), beyond), cv::Exception);
 }
 
 }  // namespace
+}  // namespace qv

@@ -8,14 +8,15 @@
 // lie in the photo at any turn. Where the standard leaves a choice: the window reaches as far as the blur asks for, no
 // further, since what lies beyond adds noise only. All in double precision.
 
-#include "qvtester/iso_mtf.h"
+#include "desk/measure/iso_mtf.h"
 
 #include <algorithm>
 #include <cmath>
 #include <complex>
-#include <exception>
 #include <limits>
 #include <vector>
+
+namespace qv {
 
 namespace {
 
@@ -273,8 +274,8 @@ double Narrowing(double half, double reach) {
   return 2 * c * sigma_squared;
 }
 
-QVIsoMtf Measure(const cv::Mat& gray, Region region) {
-  const auto refuse = [](const char* reason) { return QVIsoMtf{kNone, kNone, reason}; };
+IsoMtf Measure(const cv::Mat& gray, Region region) {
+  const auto refuse = [](const char* reason) { return IsoMtf{kNone, kNone, reason}; };
   if (!(region.half_width >= kSmallestReach)) return refuse("the region is too small");
   if (!(cv::norm(region.middle) + region.half_length < kFarthest)) return refuse("the region lies outside the photo");
   // The part of the photo about the region, in double.
@@ -320,14 +321,9 @@ QVIsoMtf Measure(const cv::Mat& gray, Region region) {
 
 }  // namespace
 
-int MeasureIsoMtf50(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, QVIsoMtf* result) {
-  if (result == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  const bool known = gray.type() == CV_8UC1 || gray.type() == CV_16UC1 || gray.type() == CV_32FC1;
-  if (gray.empty() || !known) return QV_ERROR_UNUSABLE_INPUT;
-  try {
-    *result = Measure(gray, Describe(corners));
-  } catch (const std::exception&) {
-    return QV_ERROR_INTERNAL;
-  }
-  return QV_SUCCESS;
+IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners) {
+  CV_Assert(!gray.empty() && (gray.type() == CV_8UC1 || gray.type() == CV_16UC1 || gray.type() == CV_32FC1));
+  return Measure(gray, Describe(corners));
 }
+
+}  // namespace qv
