@@ -315,8 +315,9 @@ void PrintDust() {
         QVTester tester;
         tester.detectBlob(gray);
         for (const Json& speck : simulation.truth.at("specks")) {
-          found[trial] += static_cast<int>(
-              std::any_of(tester.blob_keypoints_.begin(), tester.blob_keypoints_.end(), [&](const cv::KeyPoint& blob) {
+          found[trial] += static_cast<int>(std::any_of(
+              tester.kept_->blobs.keypoints.begin(), tester.kept_->blobs.keypoints.end(),
+              [&](const cv::KeyPoint& blob) {
                 return std::hypot(blob.pt.x - speck.at("x").get<double>(), blob.pt.y - speck.at("y").get<double>()) < 2;
               }));
         }
@@ -353,7 +354,7 @@ void PrintRegistration() {
     QVTester tester;
     cv::Mat unwarped;
     if (tester.GetUnwarpedImage(first, second, unwarped) != QV_SUCCESS) return;
-    const cv::Matx23d found(tester.unwarp_.matrix);
+    const cv::Matx23d found(tester.kept_->unwarp.matrix);
     double sum = 0;
     for (int y = 0; y <= 480; y += 60) {
       for (int x = 0; x <= 640; x += 80) {

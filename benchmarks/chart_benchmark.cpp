@@ -11,7 +11,7 @@
 
 #include "benchmarks/pictures.h"
 #include "benchmarks/ratios.h"
-#include "chart/chart_image.h"
+#include "chart/find_chart.h"
 #include "unit_tests/drawing.h"
 #include "unit_tests/plain/chart_mtf.h"
 #include "unit_tests/plain/finder.h"
@@ -113,8 +113,7 @@ void GrayAndBinary(benchmark::State& state) {
   const cv::Mat& photo = ChartPhoto();
   QVTester tester;
   for ([[maybe_unused]] auto _ : state) {
-    ConvertToGray(tester, photo);
-    benchmark::DoNotOptimize(Binarise(tester, kThreshold).data);
+    benchmark::DoNotOptimize(Binarise(tester, photo, kThreshold, nullptr).data);
   }
 }
 BENCHMARK(GrayAndBinary);

@@ -77,16 +77,18 @@ int QVTester::GetUnwarpedImage(cv::Mat reference, cv::Mat image, cv::Mat& unwarp
   const FeatureImage to = FindFeatures(image);
   const Registration result = Register(from, to);
   if (result.matrix.empty()) return QV_ERROR_NO_REGISTRATION;
-  unwarp_ = {from.image.clone(), to.image.clone(), from.keypoints, to.keypoints, result.good, result.matrix, cv::Mat()};
+  kept_->unwarp = {from.image.clone(), to.image.clone(), from.keypoints, to.keypoints,
+                   result.good,        result.matrix,    cv::Mat()};
   result.unwarped.copyTo(unwarped);
   return QV_SUCCESS;
 }
 
 const cv::Mat& QVTester::DrawUnwarpMatches() {
-  if (unwarp_.drawing.empty() && !unwarp_.reference.empty()) {
-    cv::drawMatches(unwarp_.reference, unwarp_.reference_keypoints, unwarp_.image, unwarp_.image_keypoints,
-                    unwarp_.good, unwarp_.drawing, cv::Scalar::all(-1), cv::Scalar::all(-1), std::vector<char>(),
+  Unwarp& last = kept_->unwarp;
+  if (last.drawing.empty() && !last.reference.empty()) {
+    cv::drawMatches(last.reference, last.reference_keypoints, last.image, last.image_keypoints, last.good, last.drawing,
+                    cv::Scalar::all(-1), cv::Scalar::all(-1), std::vector<char>(),
                     cv::DrawMatchesFlags::NOT_DRAW_SINGLE_POINTS);
   }
-  return unwarp_.drawing;
+  return last.drawing;
 }

@@ -1,14 +1,9 @@
 #ifndef QVTESTER_CHART_UPRIGHT_H_
 #define QVTESTER_CHART_UPRIGHT_H_
 
-#include <opencv2/core.hpp>
 #include <vector>
 
-/// How a picture is turned to set its chart upright: about the middle of a square canvas of its longer side.
-struct UprightTurn {
-  cv::Size canvas;
-  cv::Mat map;  // 2 x 3, CV_64F, from picture to canvas
-};
+#include "qvtester/tester.h"
 
 /// The turn of a picture of this size, by the chart's angle (QVTester::GetPatternAngle).
 UprightTurn TurnUpright(cv::Size picture, float pattern_angle);

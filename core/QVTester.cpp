@@ -107,7 +107,7 @@ struct Getter {
 
 }  // namespace
 
-QVTester::QVTester() {
+QVTester::QVTester() : kept_(std::make_unique<Kept>()) {
   for (const QVProperty& property : kProperties) std::visit(Default{*this}, property.kind);
 }
 
@@ -122,7 +122,7 @@ int QVTester::Initialize() {
 
 int QVTester::Release() {
   for (auto& resource : resources_) resource.reset();
-  image_list_ = ImageList();
+  kept_->image_list = ImageList();
   for (int test = QV_TEST_PHASE1_0; test <= QV_TEST_TOUCH_PANEL_PRINT; ++test) {
     ReleaseTestResult(static_cast<QV_TEST_INDEX>(test));
   }

@@ -76,12 +76,12 @@ int QVTester::SetResource(QV_RESOURCE_INDEX index, std::vector<std::string> path
   list.components = std::clamp(prop_param_80_, 1, count);
 
   if (resources_[index] == nullptr) resources_[index] = std::make_unique<QVResource>();
-  image_list_ = std::move(list);
+  kept_->image_list = std::move(list);
   return QV_SUCCESS;
 }
 
 cv::Mat QVTester::RebuildListImage(int i) {
-  const ImageList& list = image_list_;
+  const ImageList& list = kept_->image_list;
   if (i < 0 || i >= list.projection.rows) CV_Error_(cv::Error::StsOutOfRange, ("the list holds no image %d", i));
   // As many images span one direction less than their number: the last component's is rounding alone.
   constexpr float kNothing = 1e-6f;

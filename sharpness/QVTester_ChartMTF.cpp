@@ -3,32 +3,25 @@
 
 #include <cstdlib>
 
-#include "chart/chart_image.h"
 #include "chart/chart_layout.h"
+#include "chart/find_chart.h"
 #include "chart/points.h"
 #include "chart/region_warp.h"
-#include "chart/upright.h"
 #include "core/slots.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
 
 namespace {
 
-// The upright picture, of which only the regions are drawn.
-struct UprightChart {
-  const cv::Mat& gray;  // as photographed
-  UprightTurn turn;
-  cv::Point corner, second, third;  // rows in x, columns in y
+// A region of the upright picture, which is not drawn beyond it.
+cv::Mat Cut(const FoundChart& chart, const cv::Rect& region) {
+  return WarpRegion(chart.gray, chart.turn.map, chart.turn.canvas, region);
+}
 
-  cv::Mat Cut(const cv::Rect& region) const { return WarpRegion(gray, turn.map, turn.canvas, region); }
-};
-
-UprightChart Straighten(QVTester& tester, const cv::Mat& gray, std::vector<cv::Point> points) {
-  UprightChart chart = {gray, TurnUpright(gray.size(), tester.GetPatternAngle(points)), {}, {}, {}};
-  CV_Assert(chart.turn.canvas.width < SHRT_MAX);  // as the whole picture's cv::warpAffine would
-  CarryMarks(chart.turn, points);
-  tester.SortPatternPoints(points, chart.corner, chart.second, chart.third);
-  return chart;
+void PlaceRegions(FoundChart& chart, int columns) {
+  const float scale = static_cast<float>(columns) / kChartSide;
+  chart.vertical = PlaceRegion(kVerticalRegion, chart.corner, scale);
+  chart.horizontal = PlaceRegion(kHorizontalRegion, chart.corner, scale);
 }
 
 cv::Mat InFloat(const cv::Mat& region) {
@@ -37,7 +30,7 @@ cv::Mat InFloat(const cv::Mat& region) {
   return values;
 }
 
-void LogGeometry(const char* name, const UprightChart& chart) {
+void LogGeometry(const char* name, const FoundChart& chart) {
   const cv::Point a = chart.corner;
   const cv::Point b = chart.second;
   const cv::Point c = chart.third;
@@ -54,19 +47,17 @@ void LogGeometry(const char* name, const UprightChart& chart) {
 int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vector<float>& sfrVertical,
                               std::vector<float>& sfrHorizontal, float& mtf50Vertical, float& mtf50Horizontal) {
   const char* const name = "GetSFRFromImage";
-  const cv::Mat& gray = ConvertToGray(*this, image);
-  QVDEBUGP("[%s] prop_binary_thr_working_: %d", name, prop_binary_thr_working_);
-  const std::vector<cv::Point> points = GetFinderPoints(Binarise(*this, prop_binary_thr_working_));
-  if (points.size() != kMarks) {
+  FoundChart& chart = FindChart(*this, image, prop_binary_thr_working_, name);
+  if (chart.points.size() != kMarks) {
     QVDEBUGP("[%s] GetSFRFromImage, finder point : %d \n return PATTERN NOT FOUND!", name,
-             static_cast<int>(points.size()));
+             static_cast<int>(chart.points.size()));
     return QV_ERROR_PATTERN_NOT_FOUND;
   }
 
-  const UprightChart chart = Straighten(*this, gray, points);
-  const float scale = static_cast<float>(chart.second.y - chart.corner.y) / kChartSide;
-  const cv::Mat vertical = InFloat(chart.Cut(PlaceRegion(kVerticalRegion, chart.corner, scale)));
-  const cv::Mat horizontal = InFloat(chart.Cut(PlaceRegion(kHorizontalRegion, chart.corner, scale)));
+  SetUpright(*this, chart);
+  PlaceRegions(chart, chart.second.y - chart.corner.y);
+  const cv::Mat vertical = InFloat(Cut(chart, chart.vertical));
+  const cv::Mat horizontal = InFloat(Cut(chart, chart.horizontal));
   CalculateSFR(vertical, freq, sfrVertical, mtf50Vertical);
   std::vector<float> same_freq;  // both regions have the same smaller side, so one axis serves both
   CalculateSFR(horizontal, same_freq, sfrHorizontal, mtf50Horizontal);
@@ -75,27 +66,24 @@ int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vect
 
 int QVTester::GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50Horizontal) {
   const char* const name = "GetMTFFromImage";
-  const cv::Mat& gray = ConvertToGray(*this, image);
-  QVDEBUGP("[%s] prop_binary_thr_working_: %d", name, prop_binary_thr_working_);
-  const std::vector<cv::Point> points = GetFinderPoints(Binarise(*this, prop_binary_thr_working_));
-  const int count = static_cast<int>(points.size());
+  FoundChart& chart = FindChart(*this, image, prop_binary_thr_working_, name);
+  const int count = static_cast<int>(chart.points.size());
   QVDEBUGP("%s %d circle is detected using finder_point algorithm!", name, count);
-  if (points.size() != kMarks) {
+  if (chart.points.size() != kMarks) {
     QVDEBUGP("[%s] finder point : %d \n return PATTERN NOT FOUND!", name, count);
     return QV_ERROR_PATTERN_NOT_FOUND;
   }
 
-  const UprightChart chart = Straighten(*this, gray, points);
+  SetUpright(*this, chart);
   LogGeometry(name, chart);
-  // The absolute distance here, the signed one in GetSFRFromImage.
-  const float scale = static_cast<float>(std::abs(chart.second.y - chart.corner.y)) / kChartSide;
+  PlaceRegions(chart, std::abs(chart.second.y - chart.corner.y));  // its absolute value here, the signed one above
 
-  const cv::Rect v = PlaceRegion(kVerticalRegion, chart.corner, scale);
-  const cv::Mat vertical = chart.Cut(v);
+  const cv::Rect& v = chart.vertical;
+  const cv::Mat vertical = Cut(chart, v);
   QVDEBUGP("%s vertical roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, v.x, v.y,
            v.width, v.height, vertical.rows, vertical.cols);
-  const cv::Rect h = PlaceRegion(kHorizontalRegion, chart.corner, scale);
-  const cv::Mat horizontal = chart.Cut(h);
+  const cv::Rect& h = chart.horizontal;
+  const cv::Mat horizontal = Cut(chart, h);
   QVDEBUGP("%s horizontal roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, h.x, h.y,
            h.width, h.height, horizontal.rows, horizontal.cols);
   CalculateMTF(InFloat(vertical), mtf50Vertical);

@@ -25,7 +25,7 @@ struct CaptureOptions : MeasureOptions {
 
 // Whether the test ended at the standard photo, before it looked at the other.
 bool MissedStandard(const CaptureOptions& options) {
-  const auto& standard = options.front ? theTester->standard_front_ : theTester->standard_main_;
+  const auto& standard = options.front ? theTester->kept_->standard_front : theTester->kept_->standard_main;
   return !options.standard.empty() && !standard.is_extracted;
 }
 

@@ -64,9 +64,10 @@ std::array<int, kBins> ReadReference(const std::string& path) {
 // The blobs that were counted: the first five outside the corners.
 std::vector<cv::KeyPoint> CountedBlobs(QVTester& tester, int count) {
   std::vector<cv::KeyPoint> blobs;
-  for (const cv::KeyPoint& blob : tester.blob_keypoints_) {
+  for (const cv::KeyPoint& blob : tester.kept_->blobs.keypoints) {
     if (static_cast<int>(blobs.size()) == count) break;
-    if (tester.isValidLocation(tester.blob_image_.cols, tester.blob_image_.rows, blob.pt)) blobs.push_back(blob);
+    if (tester.isValidLocation(tester.kept_->blobs.image.cols, tester.kept_->blobs.image.rows, blob.pt))
+      blobs.push_back(blob);
   }
   return blobs;
 }

@@ -130,7 +130,7 @@ CommandBody DeclareRegister(CLI::App& command) {
       return theTester->GetUnwarpedImage(SlotPhoto(QV_RESOURCE_CHART_STANDARD), SlotPhoto(QV_RESOURCE_CHART_PHOTO),
                                          *unwarped);
     };
-    m.collect = [](Phase& phase, const QVResultData& /*results*/) { Collect(phase, theTester->unwarp_); };
+    m.collect = [](Phase& phase, const QVResultData& /*results*/) { Collect(phase, theTester->kept_->unwarp); };
     m.look = Look;
     m.report = Report;
     m.annotate = [](const Record& /*record*/) { return Png(theTester->DrawUnwarpMatches()); };

@@ -129,7 +129,7 @@ TEST_F(Capture, MissesInEitherPhotoStoreNothing) {
     EXPECT_EQ("[TestCameraCapture] TestCameraCapture" + std::string(extracted ? "2" : "1,") +
                   " finder point : 0 \n return PATTERN NOT FOUND!",
               LogLines::Texts().back());
-    EXPECT_EQ(extracted, theTester->standard_main_.is_extracted);
+    EXPECT_EQ(extracted, theTester->kept_->standard_main.is_extracted);
   }
   EXPECT_THAT(LogLines::Texts(), Contains("[TestCameraCapture] finder point : 0"));
   Load(17, cv::Mat(50, 50, CV_16UC3, cv::Scalar::all(9)));

@@ -143,11 +143,11 @@ TEST_F(Dust, FormerPicturesStayWithTheirHolders) {
   std::vector<std::pair<cv::Mat, cv::Mat>> held;  // and a copy of each
   for (const int x : {100, 200, 300}) {
     ASSERT_EQ(1, Measure(DrawDust({{x, 300}})));
-    EXPECT_TRUE(theTester->blob_drawing_.empty()) << "drawn when asked for";
+    EXPECT_TRUE(theTester->kept_->blobs.drawing.empty()) << "drawn when asked for";
     ASSERT_EQ(-95, Measure(cv::Mat(480, 640, CV_16UC3, cv::Scalar::all(200))));
-    for (const cv::Mat& image : {theTester->blob_image_, theTester->DrawBlobs()})
+    for (const cv::Mat& image : {theTester->kept_->blobs.image, theTester->DrawBlobs()})
       held.emplace_back(image, image.clone());
-    EXPECT_EQ(0, theTester->blob_image_.at<uchar>(300, x)) << "the last search that succeeded";
+    EXPECT_EQ(0, theTester->kept_->blobs.image.at<uchar>(300, x)) << "the last search that succeeded";
     cv::Mat channels[3];
     cv::split(held.back().first, channels);
     EXPECT_GT(cv::countNonZero(channels[0] - channels[2] > 50), 10) << "blue rings";

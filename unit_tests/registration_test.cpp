@@ -52,7 +52,7 @@ TEST(Unwarp, ShiftedPicturesAreBroughtBack) {
     ASSERT_EQ(1, tester.GetUnwarpedImage(View(scene, {0, 0}), colour, unwarped));
     EXPECT_EQ(seed, cv::theRNG().state) << "the caller's random numbers are left alone";
     EXPECT_TRUE(unwarped.size() == cv::Size(640, 480) && unwarped.type() == CV_8UC3);
-    errors.push_back(GridError(tester.unwarp_.matrix, shift));
+    errors.push_back(GridError(tester.kept_->unwarp.matrix, shift));
     if (seed > 1) continue;
     cv::Mat again;
     cv::theRNG().state = 99;
@@ -92,7 +92,7 @@ TEST(Unwarp, TooLittleToSeeIsNoRegistration) {
 class ImageList : public ModuleTest {
  protected:
   std::string Write(int i) const { return folder_.Write(std::to_string(i) + ".png", View(scene_, {3 * i, -2 * i})); }
-  static const QVTester::ImageList& Held() { return theTester->image_list_; }
+  static const QVTester::ImageList& Held() { return theTester->kept_->image_list; }
 
   cv::Mat scene_ = DrawScene(5);
   std::vector<std::string> files_ = {Write(0), Write(1), Write(2), Write(3)};

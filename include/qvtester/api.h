@@ -24,9 +24,17 @@ QV_API int InitTestModule();
 /// Destroys the tester and all it holds. Answers 0, also without a tester.
 QV_API int FinalizeTestModule();
 
-/// Runs a test on what its slots hold. fake_mode reaches the two lens-dust tests only.
-/// Answers the test's own code; -97 for an unknown test or one without a routine, -98 when a slot it needs is empty.
-QV_API int RunTest(QV_TEST_INDEX test, bool fake_mode);
+/// Copies a property's value in from, or out to, memory of the property's type (`qvtester list properties`). The
+/// histograms 87 and 88 are not copied in: the tester reads them where the caller keeps them.
+QV_API int SetProperty(QV_PROPERTY_INDEX index, void* value);
+QV_API int GetProperty(QV_PROPERTY_INDEX index, void* out);
+
+/// Stores the caller's step number, which is logged and selects the dirt-location property. Answers 0.
+QV_API int SetStep(int step);
+
+/// Grey level at which chart photos are binarised (property 93). Setting answers 1, without a range check.
+QV_API int setWorkingBinaryThresh(int value);
+QV_API int getWorkingBinaryThresh();
 
 /// Copies a 16-bit image: height x width pixels of three values, rows packed, as they come. Slots 14 to 35.
 QV_API int SetLDRResource(QV_RESOURCE_INDEX index, int width, int height, unsigned short* data);
@@ -49,22 +57,21 @@ QV_API int GetImage(QV_RESOURCE_INDEX index, int* width, int* height, unsigned c
 /// Inert: answers 1 and writes nothing.
 QV_API int SaveHDRImage(QV_RESOURCE_INDEX index, char* path);
 
+/// Empties one of the slots 0 to 13; -97 for any other, which stays as it is until InitTestModule.
+QV_API int ReleaseImage(QV_RESOURCE_INDEX index);
+
+/// Runs a test on what its slots hold. fake_mode reaches the two lens-dust tests only.
+/// Answers the test's own code; -97 for an unknown test or one without a routine, -98 when a slot it needs is empty.
+QV_API int RunTest(QV_TEST_INDEX test, bool fake_mode);
+
 /// Hands out the result block, which stays the tester's own.
 QV_API int GetResult(QVResultData** out);
 
-/// Copies a property's value in from, or out to, memory of the property's type (`qvtester list properties`).
-QV_API int SetProperty(QV_PROPERTY_INDEX index, void* value);
-QV_API int GetProperty(QV_PROPERTY_INDEX index, void* out);
-
-/// Frees input slots and result of one of the tests 0 to 12; -97 for test 3 and any other.
-QV_API int ReleaseDataForTest(QV_TEST_INDEX test);
-/// Empties one of the slots 0 to 13; -97 for any other, which stays as it is until InitTestModule.
-QV_API int ReleaseImage(QV_RESOURCE_INDEX index);
 /// Frees the arrays that a test left in the result block.
 QV_API int ReleaseTestResult(QV_TEST_INDEX test);
 
-/// Stores the caller's step number, which is logged and selects the dirt-location property. Answers 0.
-QV_API int SetStep(int step);
+/// Frees input slots and result of one of the tests 0 to 12; -97 for test 3 and any other.
+QV_API int ReleaseDataForTest(QV_TEST_INDEX test);
 
 /// Sharpness of the photo in slot 17 outside the numbered tests: both MTF50 values, in units of Nyquist
 /// (1.0 = 0.5 cycles/pixel). -91 when three finder marks are not found, -98 when the slot is empty; outputs untouched.
@@ -81,9 +88,5 @@ QV_API int SavePreview(void* data, int frame, int width, int height);
 
 /// Test 16 (false) or 20 (true) by its own name: 1, -91, -87 or -98.
 QV_API int TestCameraCapture(bool front);
-
-/// Grey level at which chart photos are binarised (property 93). Setting answers 1, without a range check.
-QV_API int setWorkingBinaryThresh(int value);
-QV_API int getWorkingBinaryThresh();
 
 #endif  // QVTESTER_API_H_

@@ -5,66 +5,65 @@
 
 #define QV_API __attribute__((visibility("default")))
 
-/// A test. 0 to 12 are validated and released but have no routine; `qvtester list tests` shows the slots each one
-/// needs.
+/// A test, with the slots that it needs. 0 to 12 are validated and released but have no routine.
 enum QV_TEST_INDEX : int {
-  QV_TEST_PHASE1_0 = 0,
-  QV_TEST_PHASE1_1 = 1,
-  QV_TEST_PHASE1_2 = 2,
-  QV_TEST_PHASE1_3 = 3,
-  QV_TEST_PHASE1_4 = 4,
-  QV_TEST_PHASE1_5 = 5,
-  QV_TEST_PHASE1_6 = 6,
-  QV_TEST_PHASE1_7 = 7,
-  QV_TEST_PHASE1_8 = 8,
-  QV_TEST_PHASE1_9 = 9,
-  QV_TEST_PHASE1_10 = 10,
-  QV_TEST_PHASE1_11 = 11,
-  QV_TEST_PHASE1_12 = 12,
-  QV_TEST_CAMERA_PREVIEW = 13,
-  QV_TEST_CAMERA_AUTOFOCUS = 14,
-  QV_TEST_CAMERA_FLASH = 15,
-  QV_TEST_CAMERA_CAPTURE = 16,
-  QV_TEST_LENS_DUST = 17,
-  QV_TEST_CAMERA_FLASH_VT = 18,
-  QV_TEST_CAMERA_PREVIEW_2 = 19,
-  QV_TEST_CAMERA_CAPTURE_2 = 20,
-  QV_TEST_LENS_DUST_2 = 21,
-  QV_TEST_VIDEO_PREVIEW = 22,
-  QV_TEST_VIDEO_AUTOFOCUS = 23,
-  QV_TEST_VIDEO_FLASH = 24,
-  QV_TEST_VIDEO_RECORD = 25,
-  QV_TEST_VIDEO_PLAY = 26,
-  QV_TEST_LED_LIGHT = 27,
-  QV_TEST_TOUCH_PANEL_LED = 28,
-  QV_TEST_TOUCH_PANEL_PRINT = 29,
+  QV_TEST_PHASE1_0 = 0,            // slots 0 and 1
+  QV_TEST_PHASE1_1 = 1,            // slot 2; releases 0, 2 and 3
+  QV_TEST_PHASE1_2 = 2,            // slot 4
+  QV_TEST_PHASE1_3 = 3,            // no slot: refused by validation
+  QV_TEST_PHASE1_4 = 4,            // slot 4
+  QV_TEST_PHASE1_5 = 5,            // slot 13
+  QV_TEST_PHASE1_6 = 6,            // slot 4
+  QV_TEST_PHASE1_7 = 7,            // slot 4
+  QV_TEST_PHASE1_8 = 8,            // slot 9
+  QV_TEST_PHASE1_9 = 9,            // slot 10
+  QV_TEST_PHASE1_10 = 10,          // slot 11
+  QV_TEST_PHASE1_11 = 11,          // slot 12
+  QV_TEST_PHASE1_12 = 12,          // slots 7 and 8
+  QV_TEST_CAMERA_PREVIEW = 13,     // slots 14 and 15: motion between two preview frames, main camera
+  QV_TEST_CAMERA_AUTOFOCUS = 14,   // slot 17: sharpness of a chart photo
+  QV_TEST_CAMERA_FLASH = 15,       // slot 16: brightness of a photo taken with the flash
+  QV_TEST_CAMERA_CAPTURE = 16,     // slot 17, and 18 for a comparison: colour patches, main camera
+  QV_TEST_LENS_DUST = 17,          // slot 19: dark blobs and grey levels of a plain target, main camera
+  QV_TEST_CAMERA_FLASH_VT = 18,    // slot 23: as 15, for the camera of video calls
+  QV_TEST_CAMERA_PREVIEW_2 = 19,   // slots 21 and 22: as 13, front camera
+  QV_TEST_CAMERA_CAPTURE_2 = 20,   // slot 24, and 25 for a comparison: as 16, front camera
+  QV_TEST_LENS_DUST_2 = 21,        // slot 26: as 17, front camera
+  QV_TEST_VIDEO_PREVIEW = 22,      // slots 28 and 29: two frames of a video preview
+  QV_TEST_VIDEO_AUTOFOCUS = 23,    // slot 34: sharpness in a film
+  QV_TEST_VIDEO_FLASH = 24,        // slot 34: the light in a film
+  QV_TEST_VIDEO_RECORD = 25,       // slot 35: a film that the phone recorded
+  QV_TEST_VIDEO_PLAY = 26,         // slot 34: a film of the phone playing one
+  QV_TEST_LED_LIGHT = 27,          // slot 30: the indicator light
+  QV_TEST_TOUCH_PANEL_LED = 28,    // slot 31: lights of the touch panel
+  QV_TEST_TOUCH_PANEL_PRINT = 29,  // slots 32 and 36: print of the touch panel, beside good ones
 };
 
 /// An input slot, 0 to 36. 0-13 take float HDR buffers, 14-33 images, 34-35 video files, 36 a list of image files.
 /// The slots that a test reads have names; any other number is cast.
 enum QV_RESOURCE_INDEX : int {
-  QV_RESOURCE_HDR_FIRST = 0,
-  QV_RESOURCE_HDR_LAST = 13,
-  QV_RESOURCE_PREVIEW_FIRST_FRAME = 14,
-  QV_RESOURCE_PREVIEW_SECOND_FRAME = 15,
-  QV_RESOURCE_FLASH_PHOTO = 16,
-  QV_RESOURCE_CHART_PHOTO = 17,
-  QV_RESOURCE_CHART_STANDARD = 18,
-  QV_RESOURCE_DUST_PHOTO = 19,
-  QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME = 21,
-  QV_RESOURCE_FRONT_PREVIEW_SECOND_FRAME = 22,
-  QV_RESOURCE_VT_FLASH_PHOTO = 23,
-  QV_RESOURCE_FRONT_CHART_PHOTO = 24,
-  QV_RESOURCE_FRONT_CHART_STANDARD = 25,
-  QV_RESOURCE_FRONT_DUST_PHOTO = 26,
-  QV_RESOURCE_VIDEO_PREVIEW_FIRST_FRAME = 28,
-  QV_RESOURCE_VIDEO_PREVIEW_SECOND_FRAME = 29,
-  QV_RESOURCE_LED_PHOTO = 30,
-  QV_RESOURCE_TOUCH_PANEL_LED_PHOTO = 31,
-  QV_RESOURCE_TOUCH_PANEL_PRINT_PHOTO = 32,
-  QV_RESOURCE_VIDEO = 34,
-  QV_RESOURCE_RECORDED_VIDEO = 35,
-  QV_RESOURCE_IMAGE_LIST = 36,
+  QV_RESOURCE_HDR_FIRST = 0,                    // float HDR buffers of the tests 0 to 12
+  QV_RESOURCE_HDR_LAST = 13,                    // the last of them
+  QV_RESOURCE_PREVIEW_FIRST_FRAME = 14,         // test 13: preview frame, main camera
+  QV_RESOURCE_PREVIEW_SECOND_FRAME = 15,        // test 13: a later one of the same size
+  QV_RESOURCE_FLASH_PHOTO = 16,                 // test 15: photo taken with the flash
+  QV_RESOURCE_CHART_PHOTO = 17,                 // tests 14 and 16, both direct checks: photo or frame of the chart
+  QV_RESOURCE_CHART_STANDARD = 18,              // test 16: photo of the chart by a good camera
+  QV_RESOURCE_DUST_PHOTO = 19,                  // test 17: photo of a plain, evenly lit target
+  QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME = 21,   // test 19: preview frame, front camera
+  QV_RESOURCE_FRONT_PREVIEW_SECOND_FRAME = 22,  // test 19: a later one of the same size
+  QV_RESOURCE_VT_FLASH_PHOTO = 23,              // test 18: photo of the camera of video calls, with the flash
+  QV_RESOURCE_FRONT_CHART_PHOTO = 24,           // test 20: photo of the chart, front camera
+  QV_RESOURCE_FRONT_CHART_STANDARD = 25,        // test 20: photo of the chart by a good front camera
+  QV_RESOURCE_FRONT_DUST_PHOTO = 26,            // test 21: photo of a plain, evenly lit target
+  QV_RESOURCE_VIDEO_PREVIEW_FIRST_FRAME = 28,   // test 22: frame of a video preview
+  QV_RESOURCE_VIDEO_PREVIEW_SECOND_FRAME = 29,  // test 22: a later one of the same size
+  QV_RESOURCE_LED_PHOTO = 30,                   // test 27: photo of the indicator light
+  QV_RESOURCE_TOUCH_PANEL_LED_PHOTO = 31,       // test 28: photo of the touch panel's lights
+  QV_RESOURCE_TOUCH_PANEL_PRINT_PHOTO = 32,     // test 29: photo of the touch panel's print
+  QV_RESOURCE_VIDEO = 34,                       // tests 23, 24 and 26: film
+  QV_RESOURCE_RECORDED_VIDEO = 35,              // test 25: film that the phone recorded
+  QV_RESOURCE_IMAGE_LIST = 36,                  // test 29: photos of good prints
 };
 
 /// A property, 0 to 94 with gaps. Those with a known meaning have names; any other number is cast.

@@ -3,6 +3,7 @@
 
 // The block that GetResult hands out. The tester owns it and every array in it: read in place, never free.
 // An array stays valid until its test runs again or its result is released; a released array is null, its count 0.
+// A run that fails stores nothing: the figures of the last good one stand, so read them only when RunTest answered 1.
 
 /// Rectangle in pixels, both corners inside it.
 struct QVRECT {

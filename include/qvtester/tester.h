@@ -18,6 +18,33 @@ struct QVRegionRecord {
   std::int32_t fields[5];
 };
 
+/// How a photo is turned to set its chart upright: about the middle of a square canvas of its longer side.
+struct UprightTurn {
+  cv::Size canvas;
+  cv::Mat map;  // 2 x 3, CV_64F, from photo to canvas
+};
+
+/// What the last search of a chart photo found, kept for whoever draws or explains a result; no test reads it back.
+/// Written by every search (tests 14, 16 and 20, the sharpness measures, CheckPatternCircles); those on grey pictures
+/// of the caller's own (GetFinderPoints) leave it alone.
+struct FoundChart {
+  bool searched = false;               // false: the photo was refused before the search, and nothing below is set
+  bool of_standard = false;            // the photo was a capture test's standard image
+  cv::Mat gray;                        // the picture that was searched, CV_8UC1; the next search draws over it
+  int threshold = 0;                   // grey level; what is above it is light
+  int candidates = 0;                  // before the best three were chosen
+  std::vector<cv::Point> points;       // what GetFinderPoints answered: row in x, column in y
+  std::vector<QVFinderPattern> marks;  // the same: corner, second, third where there are three. From pixel corners
+  float angle_deg = -1;                // with three, in whole degrees; 315 is upright
+
+  // Once the chart was set upright. Row in x, column in y, on the canvas.
+  UprightTurn turn;  // no canvas until then
+  cv::Point corner, second, third;
+
+  // Once the sharpness measures have placed their regions: column, row, width, height on the canvas.
+  cv::Rect vertical, horizontal;
+};
+
 /// The tester: properties, input slots, result block, and every test and measuring step as a member.
 ///
 /// Members answer a QV_RESULT_CODE unless they say otherwise, and may throw cv::Exception; the exported functions of
@@ -30,14 +57,17 @@ class QV_API QVTester {
   QVTester(const QVTester&) = delete;
   QVTester& operator=(const QVTester&) = delete;
 
-  // ---- Life cycle, properties -----------------------------------------------------------------------------------
+  // ---- Life ------------------------------------------------------------------------------------------------------
 
   /// Releases everything held and starts with empty slots and a zeroed result block; properties stay. Answers 1.
   int Initialize();
   /// Frees all slots and results; properties stay. Answers 1.
   int Release();
 
-  /// Copies a property's value in; no range check. -97 for an unknown index or a list with a negative count.
+  // ---- Properties -------------------------------------------------------------------------------------------------
+
+  /// Copies a property's value in; no range check. The histograms 87 and 88 are not copied: the tester reads them where
+  /// the caller keeps them. -97 for an unknown index or a list with a negative count.
   int SetProperty(QV_PROPERTY_INDEX index, void* value);
   /// Copies a property's value out. -97 for an unknown index or a table that was never set; *out is then untouched.
   int GetProperty(QV_PROPERTY_INDEX index, void* out);
@@ -57,10 +87,10 @@ class QV_API QVTester {
   /// Copies height x width pixels of three 16-bit values into one of the slots 14-35, as they come.
   int SetResource(QV_RESOURCE_INDEX index, int width, int height, unsigned short* data);
   /// Converts an NV21 preview frame to CV_8UC4 (BGRA), into any slot.
-  /// @throws cv::Exception for an odd width or half height.
+  /// @throws cv::Exception for an odd width or height.
   int SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data);
   /// Slot 36 only: reads image files as grey (median of 5 x 5), registers each onto the first, binarises it at its own
-  /// mean and takes the lot apart into principal components, into image_list_. All or nothing.
+  /// mean and takes the lot apart into principal components, into the kept image list. All or nothing.
   /// -97 for another slot, an empty list or a file that is missing or unreadable; -90 when one can't be registered.
   int SetResource(QV_RESOURCE_INDEX index, std::vector<std::string> paths);
   /// Image i of the list, rebuilt from its first principal components (property 80 when the list was set says how
@@ -77,7 +107,7 @@ class QV_API QVTester {
   int GetLDRImage(QV_RESOURCE_INDEX index, int* width, int* height, unsigned char** data);
   int SaveHDRImage(QV_RESOURCE_INDEX index, char* path);
 
-  // ---- Dispatch and results -------------------------------------------------------------------------------------
+  // ---- Run, results -----------------------------------------------------------------------------------------------
 
   /// Validates the slots, logs, and runs the test's routine, whose code it answers.
   int RunTest(QV_TEST_INDEX test, bool fake_mode);
@@ -94,6 +124,37 @@ class QV_API QVTester {
   int SetResultImage(QVPhase1Result* r, int width, int height, unsigned char* image);
   int SetResultRawData(QVPhase1Result* r, int width, int height, float* data);
   int SetResultErrorPoint(QVPhase1Result* r, QVRECT* points, int count);
+
+  // ---- Tests, in the order of their numbers ------------------------------------------------------------------------
+
+  /// Tests 13 (main camera) and 19 (front): difference of two preview frames, into the preview_ fields.
+  /// Frames of different sizes are logged, and nothing is stored.
+  void TestCameraPreview(bool front);
+  /// Test 14: the SFR of the chart photo in slot 17, into the af_sfr_ fields. The code of GetSFRFromImage; only 1
+  /// stores.
+  int TestCameraAutofocus();
+  /// Tests 15 and 18: mean of the first channel of the photo in slot 16, or 23. Answer 1.
+  int TestCameraFlash();
+  int TestCameraFlashVT();
+  /// Tests 16 (main camera) and 20 (front): L*a*b* of the chart's colour patches in slot 17 or 24, and their CIE 1976
+  /// difference to those of the standard image in slot 18 or 25, which is measured once in the tester's life.
+  /// @return 1; -91 when either photo does not show three finder marks, -87 when fewer than 15 patches were measured,
+  ///         -98 when the slot is empty. Only 1 stores.
+  int TestCameraCapture(bool front);
+  /// Tests 17 (main camera) and 21 (front): dark blobs in a photo of a plain, evenly lit target, and its grey-level
+  /// histogram beside the reference (properties 88 and 87). With fake_mode the blobs are left out. Answers 1.
+  int TestLensDust(bool front, bool fake_mode);
+
+  // Checks outside the numbered tests.
+  /// GetSFRFromImage on the photo in slot 17, for the MTF50 values alone; -98 when the slot is empty.
+  int CheckMTF(float* mtf50Vertical, float* mtf50Horizontal);
+  /// Looks for the chart's three finder marks in the preview frame of slot 17 and publishes their number, places and
+  /// the chart's centre as system properties, for cam_id 0 (main) and 2 (second rear camera).
+  /// @return 1 when exactly three were found, else 0; -98 when the slot is empty.
+  int CheckPatternCircles(int cam_id);
+  /// Writes an NV21 preview frame as JPEG, three frame numbers to a file. A failed write is silent.
+  /// @throws cv::Exception for a size that NV21 can't have.
+  void SavePreview(void* data, int frame, int width, int height);
 
   // ---- Chart: finder marks --------------------------------------------------------------------------------------
 
@@ -193,43 +254,17 @@ class QV_API QVTester {
                       std::vector<float>& sfrHorizontal, float& mtf50Vertical, float& mtf50Horizontal);
   /// As GetSFRFromImage, for the MTF50 values alone, with the chart's geometry in the log.
   int GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50Horizontal);
-  /// GetSFRFromImage on the photo in slot 17, for the MTF50 values alone; -98 when the slot is empty.
-  int CheckMTF(float* mtf50Vertical, float* mtf50Horizontal);
 
-  // ---- Camera tests ---------------------------------------------------------------------------------------------
+  // ---- Camera steps
+  // ----------------------------------------------------------------------------------------------------
 
-  /// Test 14: the SFR of the chart photo in slot 17, into the af_sfr_ fields. The code of GetSFRFromImage; only 1
-  /// stores.
-  int TestCameraAutofocus();
-  /// Tests 15 and 18: mean of the first channel of the photo in slot 16, or 23. Answer 1.
-  int TestCameraFlash();
-  int TestCameraFlashVT();
-
-  /// Tests 13 (main camera) and 19 (front): difference of two preview frames, into the preview_ fields.
-  /// Frames of different sizes are logged, and nothing is stored.
-  void TestCameraPreview(bool front);
-  /// Looks for the chart's three finder marks in the preview frame of slot 17 and publishes their number, places and
-  /// the chart's centre as system properties, for cam_id 0 (main) and 2 (second rear camera).
-  /// @return 1 when exactly three were found, else 0; -98 when the slot is empty.
-  int CheckPatternCircles(int cam_id);
   /// Publishes the points and the middle of the longest side of the closed polygon that they make. 0, always.
   int GetImageCenter(std::vector<cv::Point>& points, int cam_id);
-  /// Writes an NV21 preview frame as JPEG, three frame numbers to a file. A failed write is silent.
-  /// @throws cv::Exception for a size that NV21 can't have.
-  void SavePreview(void* data, int frame, int width, int height);
 
-  /// Tests 16 (main camera) and 20 (front): L*a*b* of the chart's colour patches in slot 17 or 24, and their CIE 1976
-  /// difference to those of the standard image in slot 18 or 25, which is measured once in the tester's life.
-  /// @return 1; -91 when either photo does not show three finder marks, -87 when fewer than 15 patches were measured,
-  ///         -98 when the slot is empty. Only 1 stores.
-  int TestCameraCapture(bool front);
   /// Mean colour of the patches around an upright chart: six along the top, six along the bottom, six down the left,
   /// six down the right; fewer when a patch reaches outside. x, y, z are red, green, blue, 0 to 255, truncated.
   std::vector<cv::Point3i> GetColorPatchRGB(cv::Mat image, std::vector<cv::Point> finder_points);
 
-  /// Tests 17 (main camera) and 21 (front): dark blobs in a photo of a plain, evenly lit target, and its grey-level
-  /// histogram beside the reference (properties 88 and 87). With fake_mode the blobs are left out. Answers 1.
-  int TestLensDust(bool front, bool fake_mode);
   /// Finds dark blobs in a grey photo (CV_8UC1) and publishes the places of the first five outside the corners.
   /// Sees discs of 4 to 16 pixels where the mean grey level is above 130: tests/camera/QVTester_LensDust.cpp.
   /// @return the number of places published.
@@ -303,6 +338,15 @@ class QV_API QVTester {
   int hdr_height_ = -1;
   bool hdr_flag_ = false;
 
+  // Search for finder marks; each GetFinderPoints starts anew.
+  bool hasSkipped = false;
+  int startSize = 0;  // candidates before the best three were chosen
+  std::vector<QVFinderPattern> possibleCenters;
+  int crossCheckStateCount[5] = {};
+
+  // What the last runs found and may be looked at, and the work images: behind a pointer, so that they don't change the
+  // size of the class.
+
   // The list of slot 36, each picture of the first one's size where not said otherwise.
   struct ImageList {
     std::vector<cv::Mat> gray;        // as read and smoothed, CV_8UC1, each of its own size
@@ -315,7 +359,6 @@ class QV_API QVTester {
     cv::Mat projection;               // images x components, CV_32F
     int components = 0;               // that a rebuild uses: 1 to the number of images
   };
-  ImageList image_list_;
 
   // The last registration that succeeded.
   struct Unwarp {
@@ -325,7 +368,6 @@ class QV_API QVTester {
     cv::Mat matrix;  // 2 x 3, CV_64F: reference coordinates to image coordinates
     cv::Mat drawing;
   };
-  Unwarp unwarp_;
 
   // The standard image's patch colours, one set a camera.
   struct ColorStandard {
@@ -333,22 +375,25 @@ class QV_API QVTester {
     int count = 0;                           // patches
     std::unique_ptr<float[]> standard_lab_;  // triples L*, a*, b*
   };
-  ColorStandard standard_main_, standard_front_;
-
-  // Work images of the camera tests: kept, since new pages cost more than what is written to them. The next test
-  // overwrites them, so nothing that is handed out shares them.
-  cv::Mat gray_, binary_;  // of the photo's size, one channel
 
   // What the last detectBlob saw; a copy that shares it stays as it is when the next one runs.
-  cv::Mat blob_image_;  // CV_8UC1
-  std::vector<cv::KeyPoint> blob_keypoints_;
-  cv::Mat blob_drawing_;
+  struct Blobs {
+    cv::Mat image;  // CV_8UC1
+    std::vector<cv::KeyPoint> keypoints;
+    cv::Mat drawing;
+  };
 
-  // Search for finder marks; each GetFinderPoints starts anew.
-  bool hasSkipped = false;
-  int startSize = 0;  // candidates before the best three were chosen
-  std::vector<QVFinderPattern> possibleCenters;
-  int crossCheckStateCount[5] = {};
+  struct Kept {
+    FoundChart chart;
+    Blobs blobs;
+    Unwarp unwarp;
+    ImageList image_list;
+    ColorStandard standard_main, standard_front;
+    // Work images: kept, since new pages cost more than what is written to them. The next test overwrites them, so
+    // nothing that is handed out shares them.
+    cv::Mat gray, binary;
+  };
+  std::unique_ptr<Kept> kept_;
 
   // Constants that no property reaches.
   float param_f0_ = 0.3909f;

@@ -6,8 +6,8 @@
 #include <opencv2/imgproc.hpp>
 #include <optional>
 
-#include "chart/chart_image.h"
 #include "chart/chart_layout.h"
+#include "chart/find_chart.h"
 #include "chart/points.h"
 #include "chart/region_warp.h"
 #include "chart/upright.h"
@@ -50,16 +50,13 @@ std::optional<cv::Range> PatchRange(const char* axis, int centre, int half, int 
   return std::nullopt;
 }
 
-// Mean colours of the patches around a chart that lies upright in a picture of this size, of which `cut` gives regions.
+// Mean colours of the patches around a chart that lies upright in a picture of this size, of which `cut` gives a range
+// of rows and columns.
 template <typename Cut>
-Patches SampleGrid(QVTester& tester, const std::vector<cv::Point>& points, cv::Size size, Cut&& cut) {
+Patches SampleGrid(cv::Point corner, cv::Point second, cv::Point third, cv::Size size, Cut&& cut) {
   const char* const name = "GetColorPatchRGB";
-  cv::Point p1;
-  cv::Point p2;
-  cv::Point p3;
-  tester.SortPatternPoints(points, p1, p2, p3);
   QVDEBUGP("[%s] img.(rows,cols)=(%d,%d)", name, size.height, size.width);
-  const PatchGrid grid = PlacePatches(p1, p2, p3);
+  const PatchGrid grid = PlacePatches(corner, second, third);
 
   constexpr std::array<const char*, 4> kSides = {"top", "bottom", "left", "right"};
   Patches colours;
@@ -70,7 +67,7 @@ Patches SampleGrid(QVTester& tester, const std::vector<cv::Point>& points, cv::S
     if (!rows) return colours;
     const auto cols = PatchRange("col", grid.centres[i].y, grid.half, size.width, side);
     if (!cols) return colours;
-    const cv::Scalar mean = cv::mean(cut(cv::Rect(cols->start, rows->start, cols->size(), rows->size())));
+    const cv::Scalar mean = cv::mean(cut(*rows, *cols));
     // Red, green, blue of a picture that holds blue first, whatever the grey conversions take it for.
     colours.emplace_back(static_cast<int>(mean[2]), static_cast<int>(mean[1]), static_cast<int>(mean[0]));
   }
@@ -79,19 +76,16 @@ Patches SampleGrid(QVTester& tester, const std::vector<cv::Point>& points, cv::S
 
 // As its plain form, GetColorPatchRGB of what NormalizePatternImage gives, but only the patches are turned upright; a
 // turn by exactly 0 degrees leaves the pixels of an 8-bit photo as they are.
-Patches SamplePatches(QVTester& tester, const cv::Mat& photo, std::vector<cv::Point> points) {
-  const UprightTurn turn = TurnUpright(photo.size(), tester.GetPatternAngle(points));
+Patches SamplePatches(QVTester& tester, const cv::Mat& photo, FoundChart& chart) {
+  SetUpright(tester, chart);
+  const UprightTurn& turn = chart.turn;
   const bool upright = LeavesPixels(turn, photo);
-  CarryMarks(turn, points);
-  return SampleGrid(tester, points, turn.canvas, [&](cv::Rect patch) {
+  return SampleGrid(chart.corner, chart.second, chart.third, turn.canvas, [&](cv::Range rows, cv::Range cols) {
+    CV_Assert(!rows.empty());  // no columns can be cut from a band without rows
+    const cv::Rect patch(cols.start, rows.start, cols.size(), rows.size());
     const bool inside = patch.br().x <= photo.cols && patch.br().y <= photo.rows;
     return upright && inside ? photo(patch) : WarpRegion(photo, turn.map, turn.canvas, patch);
   });
-}
-
-std::vector<cv::Point> FindMarks(QVTester& tester, const cv::Mat& photo, int threshold) {
-  ConvertToGray(tester, photo);
-  return tester.GetFinderPoints(Binarise(tester, threshold));
 }
 
 Triple WhiteOf(QVTester& tester, const Patches& patches) {
@@ -121,18 +115,41 @@ float DeltaE(const float* a, const float* b) {
 // Measures the standard photo, once in the tester's life. 1, or -91.
 int ExtractStandard(QVTester& tester, const cv::Mat& photo, QVTester::ColorStandard& standard) {
   QVDEBUGP("[%s] !(*ptr_is_extracted) and is_standard_image_exists", kName);
-  const std::vector<cv::Point> points = FindMarks(tester, photo, tester.prop_param_86_);
-  const int count = static_cast<int>(points.size());
+  FoundChart& chart = FindChart(tester, photo, tester.prop_param_86_);
+  chart.of_standard = true;
+  const int count = static_cast<int>(chart.points.size());
   QVDEBUGP("[%s] finder point : %d", kName, count);
-  if (points.size() != kMarks) {
+  if (chart.points.size() != kMarks) {
     QVDEBUGP("[%s] TestCameraCapture1, finder point : %d \n return PATTERN NOT FOUND!", kName, count);
     return QV_ERROR_PATTERN_NOT_FOUND;
   }
-  const Patches patches = SamplePatches(tester, photo, points);
+  const Patches patches = SamplePatches(tester, photo, chart);
   standard.standard_lab_ = LabOf(tester, patches, WhiteOf(tester, patches));
   standard.count = static_cast<int>(patches.size());
   standard.is_extracted = true;
   return QV_SUCCESS;
+}
+
+// Extracts the standard that a slot holds, unless that is done or there is none. 1, or -91.
+int PrepareStandard(QVTester& tester, int slot, QVTester::ColorStandard& standard) {
+  if (standard.is_extracted) return QV_SUCCESS;
+  cv::Mat photo;
+  if (tester.resources_[slot] != nullptr) tester.resources_[slot]->GetImage(&photo);
+  if (!photo.empty()) return ExtractStandard(tester, photo, standard);
+  QVDEBUGP("[%s] !(*ptr_is_extracted) just", kName);
+  return QV_SUCCESS;
+}
+
+// Colours of the captured photo's patches. 1, -91, or -87.
+int MeasurePatches(QVTester& tester, const cv::Mat& photo, Patches& patches) {
+  FoundChart& chart = FindChart(tester, photo, tester.prop_binary_thr_working_, kName);
+  if (chart.points.size() != kMarks) {
+    QVDEBUGP("[%s] TestCameraCapture2 finder point : %d \n return PATTERN NOT FOUND!", kName,
+             static_cast<int>(chart.points.size()));
+    return QV_ERROR_PATTERN_NOT_FOUND;
+  }
+  patches = SamplePatches(tester, photo, chart);
+  return patches.size() < kFewestPatches ? QV_ERROR_NO_PATCHES : QV_SUCCESS;
 }
 
 }  // namespace
@@ -142,40 +159,20 @@ int QVTester::TestCameraCapture(bool front) {
   cv::Mat photo;
   const int slot = front ? QV_RESOURCE_FRONT_CHART_PHOTO : QV_RESOURCE_CHART_PHOTO;
   if (const int code = FetchImage(*this, slot, photo); code != QV_SUCCESS) return code;
-  cv::Mat standard_photo;
-  if (const QVResource* slot_of_standard =
-          resources_[front ? QV_RESOURCE_FRONT_CHART_STANDARD : QV_RESOURCE_CHART_STANDARD].get())
-    slot_of_standard->GetImage(&standard_photo);
-
-  ColorStandard& standard = front ? standard_front_ : standard_main_;
-  if (!standard.is_extracted) {
-    if (!standard_photo.empty()) {
-      if (const int code = ExtractStandard(*this, standard_photo, standard); code != QV_SUCCESS) return code;
-    } else {
-      QVDEBUGP("[%s] !(*ptr_is_extracted) just", kName);
-    }
-  }
-
-  ConvertToGray(*this, photo);
-  QVDEBUGP("[%s] prop_binary_thr_working_: %d", kName, prop_binary_thr_working_);
-  const std::vector<cv::Point> points = GetFinderPoints(Binarise(*this, prop_binary_thr_working_));
-  if (points.size() != kMarks) {
-    QVDEBUGP("[%s] TestCameraCapture2 finder point : %d \n return PATTERN NOT FOUND!", kName,
-             static_cast<int>(points.size()));
-    return QV_ERROR_PATTERN_NOT_FOUND;
-  }
-  Patches patches = SamplePatches(*this, photo, points);
-  if (patches.size() < kFewestPatches) return QV_ERROR_NO_PATCHES;
+  ColorStandard& standard = front ? kept_->standard_front : kept_->standard_main;
+  const int slot_of_standard = front ? QV_RESOURCE_FRONT_CHART_STANDARD : QV_RESOURCE_CHART_STANDARD;
+  if (const int code = PrepareStandard(*this, slot_of_standard, standard); code != QV_SUCCESS) return code;
+  Patches patches;
+  if (const int code = MeasurePatches(*this, photo, patches); code != QV_SUCCESS) return code;
 
   const Triple white = WhiteOf(*this, patches);
   std::unique_ptr<float[]> differences;
   int compared = 0;
+  QVDEBUGP("[%s] calculate_differences, %s", kName, standard.is_extracted ? "true" : "false");
   if (standard.is_extracted) {
-    QVDEBUGP("[%s] calculate_differences, true", kName);
     compared = std::min(static_cast<int>(patches.size()), standard.count);
     differences = std::make_unique<float[]>(compared);
   } else {
-    QVDEBUGP("[%s] calculate_differences, false", kName);
     Patches chosen;
     for (const int number : kPatchesWithoutStandard) chosen.push_back(patches[number]);
     patches = chosen;
@@ -193,5 +190,10 @@ int QVTester::TestCameraCapture(bool front) {
 }
 
 std::vector<cv::Point3i> QVTester::GetColorPatchRGB(cv::Mat image, std::vector<cv::Point> finder_points) {
-  return SampleGrid(*this, finder_points, image.size(), [&](cv::Rect patch) { return image(patch); });
+  cv::Point corner;
+  cv::Point second;
+  cv::Point third;
+  SortPatternPoints(finder_points, corner, second, third);
+  return SampleGrid(corner, second, third, image.size(),
+                    [&](cv::Range rows, cv::Range cols) { return image.rowRange(rows).colRange(cols); });
 }

@@ -75,11 +75,12 @@ int QVTester::TestLensDust(bool front, bool fake_mode) {
   cv::Mat photo;
   const int slot = front ? QV_RESOURCE_FRONT_DUST_PHOTO : QV_RESOURCE_DUST_PHOTO;
   if (const int code = FetchImage(*this, slot, photo); code != QV_SUCCESS) return code;
-  cv::cvtColor(photo, gray_, cv::COLOR_RGB2GRAY);
+  cv::Mat& gray = kept_->gray;
+  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
   QVDEBUGP("[%s] fake_mode: %d", "TestLensDust", fake_mode ? 1 : 0);
-  const int blob_count = fake_mode ? -1 : detectBlob(gray_);
+  const int blob_count = fake_mode ? -1 : detectBlob(gray);
 
-  const cv::Mat histogram = Histogram(gray_);
+  const cv::Mat histogram = Histogram(gray);
   auto copy = std::make_unique<int[]>(kBins);
   std::copy_n(histogram.ptr<int>(), kBins, copy.get());
   const cv::Mat& reference = front ? prop_table_0_ : prop_table_1_;
@@ -98,17 +99,19 @@ int QVTester::detectBlob(cv::Mat& gray) {
   const char* const name = "detectBlob";
   const auto mean = static_cast<float>(cv::mean(gray)[0]);
   QVDEBUGP("[%s] means: %.2f", name, mean);
-  cv::adaptiveThreshold(gray, binary_, static_cast<int>(mean), cv::ADAPTIVE_THRESH_MEAN_C, cv::THRESH_BINARY, 15, 7.0);
-  draw_guide_line(binary_, binary_.cols, binary_.rows, 0);
+  cv::Mat& binary = kept_->binary;
+  cv::adaptiveThreshold(gray, binary, static_cast<int>(mean), cv::ADAPTIVE_THRESH_MEAN_C, cv::THRESH_BINARY, 15, 7.0);
+  draw_guide_line(binary, binary.cols, binary.rows, 0);
 
   std::vector<cv::KeyPoint> keypoints;
   QVDEBUGP("[%s] dj_check1", name);
-  cv::SimpleBlobDetector::create(BlobParams())->detect(binary_, keypoints);
+  cv::SimpleBlobDetector::create(BlobParams())->detect(binary, keypoints);
   QVDEBUGP("[%s] dj_check2", name);
-  cv::swap(blob_image_, binary_);
-  if (binary_.u != nullptr && binary_.u->refcount > 1) binary_.release();  // somebody still looks at the former one
-  blob_keypoints_ = keypoints;
-  blob_drawing_.release();
+  Blobs& blobs = kept_->blobs;
+  cv::swap(blobs.image, binary);
+  if (binary.u != nullptr && binary.u->refcount > 1) binary.release();  // somebody still looks at the former one
+  blobs.keypoints = keypoints;
+  blobs.drawing.release();
 
   remove_mung_location(step_);
   if (keypoints.empty()) {
@@ -120,7 +123,7 @@ int QVTester::detectBlob(cv::Mat& gray) {
   for (std::size_t i = 0; i < keypoints.size(); ++i) {
     const cv::Point2f p = keypoints[i].pt;
     QVDEBUGP("[%s] blob(%d) point: (%.2f, %.2f)", name, static_cast<int>(i), p.x, p.y);
-    if (!isValidLocation(blob_image_.cols, blob_image_.rows, p)) continue;
+    if (!isValidLocation(blobs.image.cols, blobs.image.rows, p)) continue;
     QVDEBUGP("[%s] detected mung.", name);
     save_mung_location(p, step_);
     if (++saved == kMostPlaces) {
@@ -177,9 +180,10 @@ int QVTester::detectMung(cv::Mat gray, cv::Rect roi1, cv::Rect roi2) {
 }
 
 const cv::Mat& QVTester::DrawBlobs() {
-  if (blob_drawing_.empty() && !blob_image_.empty()) {
-    cv::drawKeypoints(blob_image_, blob_keypoints_, blob_drawing_, cv::Scalar(255, 0, 0),
+  Blobs& blobs = kept_->blobs;
+  if (blobs.drawing.empty() && !blobs.image.empty()) {
+    cv::drawKeypoints(blobs.image, blobs.keypoints, blobs.drawing, cv::Scalar(255, 0, 0),
                       cv::DrawMatchesFlags::DRAW_RICH_KEYPOINTS);
   }
-  return blob_drawing_;
+  return blobs.drawing;
 }

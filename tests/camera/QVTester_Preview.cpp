@@ -6,7 +6,7 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
-#include "chart/chart_image.h"
+#include "chart/find_chart.h"
 #include "chart/points.h"
 #include "core/slots.h"
 #include "platform/preview_folder.h"
@@ -46,16 +46,19 @@ void QVTester::TestCameraPreview(bool front) {
     QVDEBUGP("[OKAPI] image size does not match");
     return;
   }
-  cv::cvtColor(first, gray_, cv::COLOR_RGB2GRAY);
-  cv::cvtColor(second, binary_, cv::COLOR_RGB2GRAY);
-  cv::absdiff(binary_, gray_, binary_);  // the last step that may refuse the frames: from here on the map is written
+  cv::Mat& gray = kept_->gray;
+  cv::Mat& difference = kept_->binary;
+  cv::cvtColor(first, gray, cv::COLOR_RGB2GRAY);
+  cv::cvtColor(second, difference, cv::COLOR_RGB2GRAY);
+  cv::absdiff(difference, gray,
+              difference);  // the last step that may refuse the frames: from here on the map is written
 
   QVPreviewResult& result = front ? Results(*this).preview_front_ : Results(*this).preview_main_;
-  const bool fits = result.preview_diff_map_ != nullptr && result.preview_diff_cols_ == binary_.cols &&
-                    result.preview_diff_rows_ == binary_.rows;
-  std::unique_ptr<float[]> fresh(fits ? nullptr : new float[binary_.total()]);
-  cv::Mat map(binary_.size(), CV_32F, fits ? result.preview_diff_map_ : fresh.get());
-  binary_.convertTo(map, CV_32F, 1 / 255.0);
+  const bool fits = result.preview_diff_map_ != nullptr && result.preview_diff_cols_ == difference.cols &&
+                    result.preview_diff_rows_ == difference.rows;
+  std::unique_ptr<float[]> fresh(fits ? nullptr : new float[difference.total()]);
+  cv::Mat map(difference.size(), CV_32F, fits ? result.preview_diff_map_ : fresh.get());
+  difference.convertTo(map, CV_32F, 1 / 255.0);
   double maximum = 0;
   cv::minMaxLoc(map, nullptr, &maximum);
   const auto mean = static_cast<float>(cv::mean(map)[0]);
@@ -73,17 +76,15 @@ int QVTester::CheckPatternCircles(int cam_id) {
   const char* const name = "CheckPatternCircles";
   cv::Mat frame;
   if (const int code = FetchImage(*this, QV_RESOURCE_CHART_PHOTO, frame); code != QV_SUCCESS) return code;
-  ConvertToGray(*this, frame);
-  const cv::Mat& binary = Binarise(*this, prop_binary_thr_working_);
-  std::vector<cv::Point> points = GetFinderPoints(binary);
-  QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, binary.rows, binary.cols);
+  FoundChart& chart = FindChart(*this, frame, prop_binary_thr_working_);
+  QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, chart.gray.rows, chart.gray.cols);
 
-  const std::array<char, 32> count = Short("%d", static_cast<int>(points.size()));
+  const std::array<char, 32> count = Short("%d", static_cast<int>(chart.points.size()));
   if (cam_id == kSecondRearCamera) Publish(Short("%s", "t82.vi_c_num_mw"), count);
   if (cam_id == kMainCamera) Publish(Short("%s", "t82.vi_c_num_main"), count);
-  if (cam_id == kMainCamera || cam_id == kSecondRearCamera) GetImageCenter(points, cam_id);
+  if (cam_id == kMainCamera || cam_id == kSecondRearCamera) GetImageCenter(chart.points, cam_id);
 
-  const bool found = points.size() == kMarks;
+  const bool found = chart.points.size() == kMarks;
   QVDEBUGP(found ? "[%s]Find 3Circles in Preview!!" : "[%s]Cannot find 3Circles in Preview!!", name);
   return found ? 1 : 0;
 }
