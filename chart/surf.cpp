@@ -23,8 +23,8 @@ constexpr int kDescriptor = 64;
 // The enlarged, padded picture's place in the picture itself, both counted from pixel centres.
 float Back(double x) { return static_cast<float>((x - kPadding + 0.5) / kZoom - 0.5); }
 
-// Of a place inside the picture, where nothing is below 0.
-int Round(double x) { return static_cast<int>(x + 0.5); }
+// As dlib rounds; of a place inside the picture, where nothing is below 0.
+int Round(double x) { return static_cast<int>(x + 0.5); }  // NOLINT(bugprone-incorrect-roundings)
 
 bool IsUsable(const SurfPoint& point, const SurfSums& sums) {
   if (point.scale < kSmallestSurfScale) return false;

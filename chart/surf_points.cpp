@@ -163,7 +163,7 @@ class Octave {
     if (rows_.first >= rows_.last || cols_.first >= cols_.last) return;
     sorted_.Sort(step_);
     width_ = cols_.last - cols_.first + 2;
-    kept_.resize(static_cast<std::size_t>(kIntervals * kRowsKept * width_));
+    kept_.resize(static_cast<std::size_t>(kIntervals * kRowsKept) * width_);
     for (int r = rows_.first - 1; r <= rows_.last; ++r) {
       for (int i = first_ - 1; i < kIntervals; ++i) ComputeRow(i, r);
       if (r <= rows_.first) continue;
