@@ -20,14 +20,17 @@
 #include <vector>
 
 #include "chart/chart_layout.h"
+#include "desk/base/files.h"
+#include "desk/drawing/plot.h"
+#include "desk/measure/chart_view.h"
+#include "desk/simulation/method_law.h"
+#include "desk/simulation/simulation.h"
 #include "qvtester/host_properties.h"
 #include "qvtester/tester.h"
-#include "tools/chart_view.h"
-#include "tools/method_law.h"
-#include "tools/picture.h"
-#include "tools/simulation.h"
 
 namespace {
+
+using namespace qv;
 
 constexpr int kThreshold = 125;
 

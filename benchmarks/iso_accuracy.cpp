@@ -15,7 +15,7 @@
 #endif
 
 #include "desk/measure/iso_mtf.h"
-#include "tools/method_law.h"
+#include "desk/simulation/method_law.h"
 #include "unit_tests/drawing.h"
 
 namespace {
@@ -79,7 +79,7 @@ Errors Measure(const Method& method, const Setting& setting, double sigma_px) {
     levels += noise;
     cv::Mat photo;
     levels.convertTo(photo, CV_8U);
-    const double truth = method_law::TrueMtf50(sigma_px, view.normal_deg);
+    const double truth = qv::method_law::TrueMtf50(sigma_px, view.normal_deg);
     const double error = (method(photo) / truth - 1) * 100;
     if (!std::isfinite(error)) {
       ++errors.none;

@@ -3,19 +3,20 @@
 #include <cmath>
 #include <map>
 
-#include "tools/camera.h"
-#include "tools/scene.h"
+#include "desk/scenes/charts.h"
+#include "desk/simulation/camera.h"
 #include "unit_tests/drawing.h"
 
 const cv::Mat& ChartPhoto(double turn_deg) {
   static std::map<double, cv::Mat> photos;
   cv::Mat& photo = photos[turn_deg];
   if (photo.empty()) {
-    CameraModel camera;  // 12 megapixels
+    qv::CameraModel camera;  // 12 megapixels
     camera.turn_deg = turn_deg;
     camera.blur_px = 1;
     camera.noise_percent = 1;
-    photo = Sense(camera, Expose(camera, SfrChart({}), PhotoFromScene(camera, SfrChartBounds())), 8);
+    photo =
+        qv::Sense(camera, qv::Expose(camera, qv::SfrChart({}), qv::PhotoFromScene(camera, qv::SfrChartBounds())), 8);
   }
   return photo;
 }

@@ -5,9 +5,13 @@
 #include <opencv2/imgproc.hpp>
 
 #include "chart/chart_layout.h"
-#include "tools/chart_view.h"
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
+#include "desk/measure/chart_view.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
+
+namespace qv {
 
 namespace {
 
@@ -165,3 +169,5 @@ CommandBody DeclareCapture(CLI::App& command) {
     return Measure(*options, m);
   };
 }
+
+}  // namespace qv

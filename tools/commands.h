@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+namespace qv {
+
 /// A command's body; answers the exit status.
 using CommandBody = std::function<int()>;
 
@@ -28,5 +30,7 @@ CommandBody DeclareVerify(CLI::App& command);
 /// Parses the words after the program's name and runs their command; answers the exit status. Throws what the command
 /// throws.
 int RunCommand(const std::vector<std::string>& words);
+
+}  // namespace qv
 
 #endif  // QVTESTER_TOOLS_COMMANDS_H_

@@ -6,9 +6,14 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
 #include "tools/options.h"
+
+namespace qv {
 
 namespace {
 
@@ -254,3 +259,5 @@ CommandBody DeclareDots(CLI::App& command) {
     return Measure(*options, m);
   };
 }
+
+}  // namespace qv

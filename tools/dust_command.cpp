@@ -5,8 +5,16 @@
 #include <numeric>
 #include <sstream>
 
+#include "desk/base/failure.h"
+#include "desk/base/files.h"
+#include "desk/base/json.h"
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
+#include "desk/drawing/plot.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
+
+namespace qv {
 
 namespace {
 
@@ -202,3 +210,5 @@ CommandBody DeclareDust(CLI::App& command) {
     return Measure(*options, m);
   };
 }
+
+}  // namespace qv

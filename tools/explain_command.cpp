@@ -2,9 +2,13 @@
 #include <iostream>
 #include <memory>
 
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/measure/measurements.h"
 #include "tools/commands.h"
-#include "tools/measurements.h"
 #include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
@@ -43,6 +47,8 @@ CommandBody DeclareExplain(CLI::App& command) {
         throw Failure(kWrongUsage, name + ": no measurement has this name; `qvtester explain` lists them");
       }
     }
-    return static_cast<int>(kWithinLimits);
+    return static_cast<int>(kExitWithinLimits);
   };
 }
+
+}  // namespace qv

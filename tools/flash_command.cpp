@@ -1,7 +1,11 @@
 #include <memory>
 
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
+
+namespace qv {
 
 CommandBody DeclareFlash(CLI::App& command) {
   struct Options : MeasureOptions {
@@ -41,3 +45,5 @@ CommandBody DeclareFlash(CLI::App& command) {
     return Measure(*options, m);
   };
 }
+
+}  // namespace qv

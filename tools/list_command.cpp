@@ -5,9 +5,12 @@
 #include "core/property_table.h"
 #include "core/slots.h"
 #include "core/test_table.h"
-#include "tools/codes.h"
+#include "desk/base/text.h"
+#include "desk/measure/codes.h"
 #include "tools/commands.h"
 #include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
@@ -81,6 +84,8 @@ CommandBody DeclareList(CLI::App& command) {
   command.add_option("WHAT", *what, "tests, slots, properties or codes")->required()->check(CLI::IsMember(kLists));
   return [what] {
     kLists.at (*what)();
-    return static_cast<int>(kWithinLimits);
+    return static_cast<int>(kExitWithinLimits);
   };
 }
+
+}  // namespace qv

@@ -4,8 +4,11 @@
 #include <exception>
 #include <iostream>
 
+#include "desk/base/failure.h"
 #include "tools/commands.h"
 #include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
@@ -71,7 +74,7 @@ int RunCommand(const std::vector<std::string>& words) {
     std::vector<std::string> backwards(words.rbegin(), words.rend());  // the parser takes them from the back
     app.parse(backwards);
   } catch (const CLI::ParseError& e) {
-    return app.exit(e) == 0 ? kWithinLimits : kWrongUsage;
+    return app.exit(e) == 0 ? kExitWithinLimits : kExitWrongUsage;
   }
   SetCommandLine(Separate(words));
   const int status = body();
@@ -79,16 +82,18 @@ int RunCommand(const std::vector<std::string>& words) {
   return status;
 }
 
+}  // namespace qv
+
 int main(int argc, char** argv) {
   try {
-    WatchForInterrupts();
+    qv::WatchForInterrupts();
     setenv("OPENCV_IO_ENABLE_OPENEXR", "1", 0);  // NOLINT(concurrency-mt-unsafe): no other thread reads it yet
-    return RunCommand({argv + 1, argv + argc});
-  } catch (const Failure& e) {
+    return qv::RunCommand({argv + 1, argv + argc});
+  } catch (const qv::Failure& e) {
     std::fprintf(stderr, "qvtester: %s\n", e.what());
-    return e.status;
+    return qv::StatusOf(e.kind);
   } catch (const std::exception& e) {
     std::fprintf(stderr, "qvtester: internal fault: %s\n", e.what());
-    return kInternalFault;
+    return qv::kExitInternalFault;
   }
 }

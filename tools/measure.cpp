@@ -7,9 +7,20 @@
 #include <iterator>
 
 #include "core/property_table.h"
+#include "desk/base/clock.h"
+#include "desk/base/digest.h"
+#include "desk/base/failure.h"
+#include "desk/base/files.h"
+#include "desk/base/json.h"
+#include "desk/base/side_output.h"
+#include "desk/base/text.h"
+#include "desk/measure/codes.h"
+#include "desk/measure/limits.h"
 #include "qvtester/host_properties.h"
-#include "tools/codes.h"
 #include "tools/options.h"
+#include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
@@ -263,6 +274,7 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
   }
   Record record;
   record.start_millis = MillisSinceEpoch();
+  record.command = CommandLine();
   record.dut_id = options.dut;
   record.station_id = options.station;
   record.test_name = measuring.test_name;
@@ -313,9 +325,11 @@ int Measure(const MeasureOptions& options, const Measuring& measuring) {
     std::filesystem::remove(options.annotate, ignored);  // one of an earlier run would be taken for this run's
   }
   // What was asked for by name comes last: one that can't be written loses none of the others.
-  if (!options.json.empty()) WriteWholeFile(options.json, record.ToText());
-  if (!picture.empty()) WriteWholeFile(options.annotate, picture);
+  if (!options.json.empty()) WriteOutput(options.json, record.ToText());
+  if (!picture.empty()) WriteOutput(options.annotate, picture);
 
-  if (!measured) return record.phase.code == QV_ERROR_INTERNAL ? kInternalFault : kCouldNotMeasure;
-  return record.outcome() == Outcome::kPass ? kWithinLimits : kLimitBroken;
+  if (!measured) return record.phase.code == QV_ERROR_INTERNAL ? kExitInternalFault : kExitCouldNotMeasure;
+  return record.outcome() == Outcome::kPass ? kExitWithinLimits : kExitLimitBroken;
 }
+
+}  // namespace qv

@@ -7,10 +7,12 @@
 #include <string>
 #include <vector>
 
+#include "desk/drawing/picture.h"
+#include "desk/measure/record.h"
 #include "qvtester/api.h"
 #include "qvtester/tester.h"
-#include "tools/picture.h"
-#include "tools/record.h"
+
+namespace qv {
 
 // The road every measuring command takes: a fresh tester, its properties and slots, one test, a record, a verdict.
 
@@ -68,5 +70,7 @@ std::string FrequencyText(double nyquist, int photo_height, double pixel_pitch_u
 
 /// "  (limit 0.38 to 0.6: FAIL)" for a figure with a limit, nothing for one without.
 std::string LimitText(const Measurement& m);
+
+}  // namespace qv
 
 #endif  // QVTESTER_TOOLS_MEASURE_H_

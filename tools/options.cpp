@@ -4,7 +4,10 @@
 #include <cmath>
 #include <sstream>
 
-#include "tools/program.h"
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+
+namespace qv {
 
 CLI::Option* AddNumber(CLI::App& command, const char* name, double& value, const char* help, double low, double high,
                        const char* type) {
@@ -46,3 +49,5 @@ std::vector<double> ParseNumbers(const char* option, const std::string& text, st
   }
   return numbers;
 }
+
+}  // namespace qv

@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+namespace qv {
+
 /// Declares an option that takes a finite number from low to high.
 CLI::Option* AddNumber(CLI::App& command, const char* name, double& value, const char* help, double low, double high,
                        const char* type);
@@ -16,5 +18,7 @@ cv::Size ParseSize(const char* option, const std::string& text);
 /// "1,0.9,1": as many numbers from low to high as asked for; throws Failure (wrong usage) that names the option.
 std::vector<double> ParseNumbers(const char* option, const std::string& text, std::size_t count, double low,
                                  double high);
+
+}  // namespace qv
 
 #endif  // QVTESTER_TOOLS_OPTIONS_H_

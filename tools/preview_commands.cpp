@@ -2,9 +2,13 @@
 #include <memory>
 #include <opencv2/imgproc.hpp>
 
-#include "tools/chart_view.h"
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
+#include "desk/measure/chart_view.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
+
+namespace qv {
 
 namespace {
 
@@ -161,3 +165,5 @@ CommandBody DeclareCircles(CLI::App& command) {
     return Measure(*options, m);
   };
 }
+
+}  // namespace qv

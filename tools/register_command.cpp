@@ -5,8 +5,14 @@
 #include <numeric>
 #include <opencv2/imgcodecs.hpp>
 
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
+#include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
@@ -141,8 +147,10 @@ CommandBody DeclareRegister(CLI::App& command) {
       std::error_code ignored;
       std::filesystem::remove(options->output, ignored);  // one of an earlier run would be taken for this run's
     } else {
-      WriteWholeFile(options->output, Encode(*unwarped, options->output));
+      WriteOutput(options->output, Encode(*unwarped, options->output));
     }
     return status;
   };
 }
+
+}  // namespace qv

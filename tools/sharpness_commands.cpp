@@ -3,13 +3,21 @@
 #include <memory>
 #include <opencv2/imgproc.hpp>
 
+#include "desk/base/failure.h"
+#include "desk/base/files.h"
+#include "desk/base/json.h"
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
+#include "desk/drawing/plot.h"
+#include "desk/measure/chart_view.h"
 #include "desk/measure/iso_mtf.h"
-#include "tools/camera.h"
-#include "tools/chart_view.h"
+#include "desk/simulation/camera.h"
+#include "desk/simulation/method_law.h"
 #include "tools/commands.h"
 #include "tools/measure.h"
-#include "tools/method_law.h"
 #include "tools/options.h"
+
+namespace qv {
 
 namespace {
 
@@ -44,7 +52,7 @@ void AddIsoFigures(Record& record, const cv::Mat& photo) {
   const UprightPhoto upright = Straighten(*theTester, gray);
   const std::array<cv::Rect, 2> regions = MeasuredRegions(upright);
   for (std::size_t i = 0; i < regions.size(); ++i) {
-    const qv::IsoMtf iso = qv::MeasureIsoMtf(gray, upright.OnPhoto(regions[i]));
+    const IsoMtf iso = MeasureIsoMtf(gray, upright.OnPhoto(regions[i]));
     record.phase.Add(std::string("mtf50_iso_") + kRegionNames[i], iso.mtf50);
     const cv::Mat region = upright.picture(regions[i]);
     if (cv::countNonZero(region == 255) > kMostClipped * static_cast<double>(region.total())) {
@@ -249,3 +257,5 @@ CommandBody DeclareMtf(CLI::App& command) {
   };
   return DeclareSharpness(command, m);
 }
+
+}  // namespace qv

@@ -1,64 +1,24 @@
 #include <filesystem>
 #include <iostream>
 #include <memory>
-#include <opencv2/imgcodecs.hpp>
-#include <opencv2/imgproc.hpp>
 #include <sstream>
 
+#include "desk/base/failure.h"
+#include "desk/base/files.h"
+#include "desk/base/text.h"
+#include "desk/simulation/photo_file.h"
+#include "desk/simulation/simulation.h"
 #include "tools/commands.h"
 #include "tools/options.h"
-#include "tools/simulation.h"
+#include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
-struct Output {
-  std::string path;
-  int bits = 8;
-  int jpeg_quality = 95;
+struct Output : PhotoFile {
   bool quiet = false;
 };
-
-// A preview frame as a phone delivers it: luma, then half-size chroma, V before U.
-std::string Nv21(const cv::Mat& photo) {
-  if (photo.cols % 2 != 0 || photo.rows % 2 != 0) {
-    throw Failure(kWrongUsage, "an NV21 frame needs an even width and height");
-  }
-  cv::Mat planes;  // luma, U plane, V plane
-  cv::cvtColor(photo, planes, cv::COLOR_BGR2YUV_I420);
-  const std::size_t luma = photo.total();
-  const uchar* const u = planes.data + luma;
-  const uchar* const v = u + luma / 4;
-  std::string frame(reinterpret_cast<const char*>(planes.data), luma);
-  for (std::size_t i = 0; i < luma / 4; ++i) {
-    frame += static_cast<char>(v[i]);
-    frame += static_cast<char>(u[i]);
-  }
-  return frame;
-}
-
-std::string Encode(const cv::Mat& photo, const Output& output) {
-  const bool is_hdr = photo.depth() == CV_32F;
-  const std::string extension = output.path == "-" ? (is_hdr ? ".pfm" : ".png") : LowerExtension(output.path);
-  if (is_hdr && extension != ".exr" && extension != ".tif" && extension != ".tiff" && extension != ".pfm") {
-    throw Failure(kWrongUsage, output.path + ": floats are kept without loss in an .exr, .tif or .pfm file");
-  }
-  const bool takes_16_bits = extension == ".png" || extension == ".tif" || extension == ".tiff";
-  if (photo.depth() == CV_16U && !takes_16_bits) {
-    throw Failure(kWrongUsage, output.path + ": 16 bits a channel need a .png or .tif file");
-  }
-  if (extension == ".nv21") return Nv21(photo);
-  std::vector<uchar> file;
-  try {
-    // Fast compression: noise does not compress anyway. A float TIFF would be written as LogLuv unless told not to.
-    constexpr int kLzw = 5;
-    cv::imencode(extension, photo, file,
-                 {cv::IMWRITE_PNG_COMPRESSION, 1, cv::IMWRITE_JPEG_QUALITY, output.jpeg_quality,
-                  cv::IMWRITE_TIFF_COMPRESSION, kLzw});
-  } catch (const cv::Exception&) {
-    throw Failure(kWrongUsage, output.path + ": name a .png, .jpg, .bmp, .tif or .nv21 file");
-  }
-  return {file.begin(), file.end()};
-}
 
 // "photo.png" and "photo.second.png"
 std::string NumberedPath(const std::string& path, std::size_t number) {
@@ -168,14 +128,16 @@ CommandBody DeclareSimulate(CLI::App& command) {
       const cv::Mat photo =
           simulation.is_hdr ? simulation.levels[i] : Sense(sensor, simulation.levels[i], o->output.bits);
       const std::string path = NumberedPath(o->output.path, i);
-      WriteWholeFile(path, Encode(photo, o->output));
+      WriteOutput(path, EncodePhoto(photo, o->output));
       if (!o->output.quiet && path != "-") std::cout << Format("%s  %d x %d\n", path.c_str(), photo.cols, photo.rows);
       sensor.seed += 0x9E3779B97F4A7C15;  // the next photo has noise of its own
     }
-    if (o->output.path == "-") return static_cast<int>(kWithinLimits);
+    if (o->output.path == "-") return static_cast<int>(kExitWithinLimits);
     const std::string truth = std::filesystem::path(o->output.path).replace_extension(".truth.json");
-    WriteWholeFile(truth, simulation.truth.dump(2) + "\n");
+    WriteOutput(truth, simulation.truth.dump(2) + "\n");
     if (!o->output.quiet) std::cout << truth << '\n';
-    return static_cast<int>(kWithinLimits);
+    return static_cast<int>(kExitWithinLimits);
   };
 }
+
+}  // namespace qv

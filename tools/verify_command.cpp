@@ -7,8 +7,16 @@
 #include <memory>
 #include <sstream>
 
+#include "desk/base/digest.h"
+#include "desk/base/failure.h"
+#include "desk/base/files.h"
+#include "desk/base/json.h"
+#include "desk/base/text.h"
+#include "desk/measure/record.h"
 #include "tools/commands.h"
-#include "tools/record.h"
+#include "tools/program.h"
+
+namespace qv {
 
 namespace {
 
@@ -205,6 +213,8 @@ CommandBody DeclareVerify(CLI::App& command) {
     }
     std::cout << Format("%zu records, %d numbers: %d moved, %d records could not be verified\n", records.size(),
                         numbers, moved, failed);
-    return static_cast<int>(failed > 0 ? kCouldNotMeasure : moved > 0 ? kLimitBroken : kWithinLimits);
+    return static_cast<int>(failed > 0 ? kExitCouldNotMeasure : moved > 0 ? kExitLimitBroken : kExitWithinLimits);
   };
 }
+
+}  // namespace qv

@@ -3,7 +3,7 @@
 #include <cmath>
 #include <opencv2/imgproc.hpp>
 
-#include "tools/method_law.h"
+#include "desk/simulation/method_law.h"
 #include "unit_tests/module_test.h"
 #include "unit_tests/plain/chart_mtf.h"
 
@@ -39,7 +39,7 @@ TEST_F(Autofocus, AChartPhotoGivesCurvesAndFigures) {
   EXPECT_EQ(75 / 2 + 1, results.af_sfr_count_);  // 750 chart units at a tenth of a pixel
   EXPECT_EQ(1.0f, results.af_sfr_second_[0]);
   EXPECT_EQ(1.0f, results.af_sfr_third_[0]);
-  const auto [low, high] = method_law::MeasuredMtf50(ChartView().blur_px, 75);
+  const auto [low, high] = qv::method_law::MeasuredMtf50(ChartView().blur_px, 75);
   const auto lawful = AllOf(Gt(0.95 * low), Lt(1.05 * high));  // 5 %: four subpixels and whole grey levels are drawn
   EXPECT_THAT(results.af_sfr_scalar1_, lawful);
   EXPECT_THAT(results.af_sfr_scalar2_, lawful);

@@ -4,7 +4,7 @@
 
 #include <cmath>
 
-#include "tools/method_law.h"
+#include "desk/simulation/method_law.h"
 #include "unit_tests/drawing.h"
 
 namespace qv {

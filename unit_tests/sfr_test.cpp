@@ -4,8 +4,8 @@
 #include <cmath>
 #include <opencv2/imgproc.hpp>
 
+#include "desk/simulation/method_law.h"
 #include "qvtester/tester.h"
-#include "tools/method_law.h"
 #include "unit_tests/drawing.h"
 #include "unit_tests/plain/sfr.h"
 
@@ -37,7 +37,7 @@ class KnownBlur : public ::testing::TestWithParam<double> {};
 TEST_P(KnownBlur, Mtf50LiesWithinTheLaw) {
   const double sigma = GetParam();
   for (const int cols : {100, 151}) {
-    const auto [low, high] = method_law::MeasuredMtf50(sigma, cols);
+    const auto [low, high] = qv::method_law::MeasuredMtf50(sigma, cols);
     for (const double slope_deg : {3.0, 5.0, 8.0}) {
       for (const double place : {0.3, -6.5}) {
         const double slope = std::tan(slope_deg * CV_PI / 180);

@@ -5,7 +5,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "chart/chart_layout.h"
-#include "tools/method_law.h"
+#include "desk/simulation/method_law.h"
 #include "unit_tests/program.h"
 
 // The simulated camera's faults, each by its effect on the photo.
@@ -14,7 +14,7 @@ namespace {
 
 using nlohmann::json;
 
-using method_law::Sinc;
+using qv::method_law::Sinc;
 
 class Simulator : public SimulatedPhotos {
  protected:
@@ -46,7 +46,7 @@ TEST_F(Simulator, LensFaultsHaveTheirAnalyticResponse) {
       const cv::Point2d n = cv::Point2d(edge.y, -edge.x) / cv::norm(edge);
       const auto response = [&, own = blur](double f) { return std::fabs(Sinc(f * n.x) * Sinc(f * n.y)) * own(f, n); };
       const json truth = Truth()["mtf50"][region];
-      const double half = 2 * method_law::HalfPoint(response, 1.0);
+      const double half = 2 * qv::method_law::HalfPoint(response, 1.0);
       EXPECT_NEAR(half, truth["mtf50_nyquist"], 1e-3 * half) << fault;
       for (int i = 1; i <= 20; ++i) {
         EXPECT_NEAR(response(truth["sfr"][i][0].get<double>() / 2), truth["sfr"][i][1], 1e-3) << fault;

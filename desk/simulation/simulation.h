@@ -1,12 +1,15 @@
-#ifndef QVTESTER_TOOLS_SIMULATION_H_
-#define QVTESTER_TOOLS_SIMULATION_H_
+#ifndef QVTESTER_DESK_SIMULATION_SIMULATION_H_
+#define QVTESTER_DESK_SIMULATION_SIMULATION_H_
 
 #include <opencv2/core.hpp>
 #include <string>
 #include <vector>
 
-#include "tools/camera.h"
-#include "tools/record.h"
+#include "desk/base/json.h"
+#include "desk/scenes/charts.h"
+#include "desk/simulation/camera.h"
+
+namespace qv {
 
 // Photos of known scenes by a camera of known faults, with the truth of every figure that a test takes of them.
 
@@ -38,4 +41,6 @@ std::vector<std::string> SceneNames();
 
 Simulation Simulate(const SimulationOptions& options);
 
-#endif  // QVTESTER_TOOLS_SIMULATION_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_SIMULATION_SIMULATION_H_

@@ -1,4 +1,4 @@
-#include "tools/chart_sheet.h"
+#include "desk/scenes/chart_sheet.h"
 
 #include <qrencode.h>
 
@@ -8,7 +8,11 @@
 #include <sstream>
 
 #include "chart/chart_layout.h"
-#include "tools/program.h"
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/scenes/charts.h"
+
+namespace qv {
 
 namespace {
 
@@ -221,3 +225,5 @@ void Draw(cairo_t* cr, const ChartSheet& sheet) {
   }
   QrCode(cr, all, {label.br().x - kQrMm, label.y});
 }
+
+}  // namespace qv

@@ -1,5 +1,5 @@
-#ifndef QVTESTER_TOOLS_CHART_VIEW_H_
-#define QVTESTER_TOOLS_CHART_VIEW_H_
+#ifndef QVTESTER_DESK_MEASURE_CHART_VIEW_H_
+#define QVTESTER_DESK_MEASURE_CHART_VIEW_H_
 
 #include <array>
 #include <opencv2/core.hpp>
@@ -8,9 +8,11 @@
 #include <vector>
 
 #include "chart/chart_layout.h"
+#include "desk/drawing/picture.h"
+#include "desk/measure/record.h"
 #include "qvtester/tester.h"
-#include "tools/picture.h"
-#include "tools/record.h"
+
+namespace qv {
 
 // What the last search for finder marks saw of a chart photo, read back from the tester.
 
@@ -95,4 +97,6 @@ struct RegionView {
 /// Cuts both regions, vertical first, as the measures do.
 std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo);
 
-#endif  // QVTESTER_TOOLS_CHART_VIEW_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_CHART_VIEW_H_

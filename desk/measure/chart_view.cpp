@@ -1,11 +1,15 @@
-#include "tools/chart_view.h"
+#include "desk/measure/chart_view.h"
 
 #include <algorithm>
 #include <cmath>
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
+#include "desk/base/text.h"
+#include "desk/drawing/picture.h"
 #include "qvtester/api.h"
+
+namespace qv {
 
 namespace {
 
@@ -290,3 +294,5 @@ std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo) 
   }
   return views;
 }
+
+}  // namespace qv

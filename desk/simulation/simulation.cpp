@@ -1,4 +1,4 @@
-#include "tools/simulation.h"
+#include "desk/simulation/simulation.h"
 
 #include <algorithm>
 #include <array>
@@ -6,7 +6,14 @@
 #include <opencv2/imgproc.hpp>
 
 #include "chart/chart_layout.h"
-#include "tools/method_law.h"
+#include "desk/base/failure.h"
+#include "desk/base/json.h"
+#include "desk/base/text.h"
+#include "desk/scenes/charts.h"
+#include "desk/scenes/targets.h"
+#include "desk/simulation/method_law.h"
+
+namespace qv {
 
 namespace {
 
@@ -296,3 +303,5 @@ Simulation Simulate(const SimulationOptions& options) {
   }
   throw Failure(kWrongUsage, "--scene " + options.scene + ": no such scene");
 }
+
+}  // namespace qv

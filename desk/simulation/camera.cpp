@@ -1,4 +1,4 @@
-#include "tools/camera.h"
+#include "desk/simulation/camera.h"
 
 #include <algorithm>
 #include <cmath>
@@ -6,8 +6,10 @@
 #include <opencv2/imgproc.hpp>
 #include <vector>
 
-#include "tools/method_law.h"
-#include "tools/program.h"
+#include "desk/base/failure.h"
+#include "desk/simulation/method_law.h"
+
+namespace qv {
 
 namespace {
 
@@ -211,3 +213,5 @@ double LensResponse(const CameraModel& camera, double frequency, cv::Point2d dir
   response *= std::fabs(Sinc(frequency * camera.smear_px.dot(direction)));
   return response * std::fabs(Sinc(frequency * direction.x) * Sinc(frequency * direction.y));
 }
+
+}  // namespace qv

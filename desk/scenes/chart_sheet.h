@@ -1,5 +1,5 @@
-#ifndef QVTESTER_TOOLS_CHART_SHEET_H_
-#define QVTESTER_TOOLS_CHART_SHEET_H_
+#ifndef QVTESTER_DESK_SCENES_CHART_SHEET_H_
+#define QVTESTER_DESK_SCENES_CHART_SHEET_H_
 
 #include <cairo.h>
 
@@ -7,7 +7,10 @@
 #include <string>
 #include <vector>
 
-#include "tools/scene.h"
+#include "desk/scenes/charts.h"
+#include "desk/scenes/scene.h"
+
+namespace qv {
 
 // The test charts as sheets of paper: laid out and drawn once, in millimetres, whatever file they go to.
 
@@ -36,4 +39,6 @@ ChartSheet LayOut(const SheetOptions& options);
 /// Draws the sheet; the target's unit is the millimetre, its origin the paper's top left corner.
 void Draw(cairo_t* cr, const ChartSheet& sheet);
 
-#endif  // QVTESTER_TOOLS_CHART_SHEET_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_SCENES_CHART_SHEET_H_

@@ -1,11 +1,13 @@
-#ifndef QVTESTER_TOOLS_CAMERA_H_
-#define QVTESTER_TOOLS_CAMERA_H_
+#ifndef QVTESTER_DESK_SIMULATION_CAMERA_H_
+#define QVTESTER_DESK_SIMULATION_CAMERA_H_
 
 #include <array>
 #include <cstdint>
 #include <opencv2/core.hpp>
 
-#include "tools/scene.h"
+#include "desk/scenes/scene.h"
+
+namespace qv {
 
 // A camera of known faults. All of them act on the stored levels, with no tone curve, so that what a measure should
 // read is known.
@@ -47,4 +49,6 @@ cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits);
 /// Response of lens and pixel to a frequency (cycles/pixel) along a direction in the photo.
 double LensResponse(const CameraModel& camera, double frequency, cv::Point2d direction);
 
-#endif  // QVTESTER_TOOLS_CAMERA_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_SIMULATION_CAMERA_H_

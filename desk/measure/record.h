@@ -1,38 +1,22 @@
-#ifndef QVTESTER_TOOLS_RECORD_H_
-#define QVTESTER_TOOLS_RECORD_H_
+#ifndef QVTESTER_DESK_MEASURE_RECORD_H_
+#define QVTESTER_DESK_MEASURE_RECORD_H_
 
 #include <cstdint>
-#include <map>
-#include <nlohmann/json.hpp>
 #include <optional>
 #include <string>
 #include <vector>
 
-#include "tools/measurements.h"
-#include "tools/program.h"
+#include "desk/base/json.h"
+#include "desk/base/side_output.h"
+#include "desk/measure/limits.h"
+#include "desk/measure/measurements.h"
+
+namespace qv {
 
 // One run as OpenHTF records it, with limits, method and the input's hash (docs/record.schema.json).
 
-using Json = nlohmann::ordered_json;
-
 enum class Outcome { kPass, kFail, kError, kUnset };
 const char* Name(Outcome outcome);
-
-/// What a figure must keep to; beyond the marginal bounds it passes, marked.
-struct Limit {
-  std::optional<double> min, max, marginal_min, marginal_max;
-  bool given() const { return min || max || marginal_min || marginal_max; }
-};
-
-struct Limits {
-  std::string name, revision;
-  std::map<std::string, Limit> by_name;
-
-  bool given() const { return !by_name.empty(); }
-};
-
-/// Reads a limits file; throws Failure (wrong usage) that names the file and what is wrong with it.
-Limits ReadLimits(const std::string& path);
 
 struct Measurement {
   const MeasurementInfo* info = nullptr;
@@ -75,6 +59,7 @@ struct Record {
   std::string dut_id, station_id, test_name;
   std::optional<int> test_index;
   std::int64_t start_millis = 0, end_millis = 0;
+  std::vector<std::string> command;  // that made it, for people
   Limits limits;
   Json properties = Json::object();  // those that differ from their defaults, by index
   Phase phase;
@@ -94,4 +79,6 @@ struct Record {
   std::string ToText() const;
 };
 
-#endif  // QVTESTER_TOOLS_RECORD_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_RECORD_H_

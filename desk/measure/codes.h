@@ -1,7 +1,9 @@
-#ifndef QVTESTER_TOOLS_CODES_H_
-#define QVTESTER_TOOLS_CODES_H_
+#ifndef QVTESTER_DESK_MEASURE_CODES_H_
+#define QVTESTER_DESK_MEASURE_CODES_H_
 
 #include "qvtester/indices.h"
+
+namespace qv {
 
 // The library's result codes as a person wants them: name, meaning, what to look at.
 
@@ -43,4 +45,6 @@ inline const ResultCode& FindCode(int code) {
   return *found;
 }
 
-#endif  // QVTESTER_TOOLS_CODES_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_CODES_H_

@@ -1,7 +1,9 @@
-#include "tools/measurements.h"
+#include "desk/measure/measurements.h"
 
 #include <algorithm>
 #include <array>
+
+namespace qv {
 
 namespace {
 
@@ -210,3 +212,5 @@ const MeasurementInfo* FindMeasurement(std::string_view name) {
                                   [&](const MeasurementInfo& info) { return info.name == name; });
   return found == AllMeasurements().end() ? nullptr : &*found;
 }
+
+}  // namespace qv

@@ -1,9 +1,11 @@
-#ifndef QVTESTER_TOOLS_MEASUREMENTS_H_
-#define QVTESTER_TOOLS_MEASUREMENTS_H_
+#ifndef QVTESTER_DESK_MEASURE_MEASUREMENTS_H_
+#define QVTESTER_DESK_MEASURE_MEASUREMENTS_H_
 
 #include <string>
 #include <string_view>
 #include <vector>
+
+namespace qv {
 
 // Every figure that a record may hold: name, unit, method, meaning.
 
@@ -65,4 +67,6 @@ const std::vector<MeasurementInfo>& AllMeasurements();
 /// The one of this name; null for an unknown one.
 const MeasurementInfo* FindMeasurement(std::string_view name);
 
-#endif  // QVTESTER_TOOLS_MEASUREMENTS_H_
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_MEASUREMENTS_H_

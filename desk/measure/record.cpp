@@ -1,9 +1,13 @@
-#include "tools/record.h"
+#include "desk/measure/record.h"
 
 #include <algorithm>
 #include <cmath>
 
+#include "desk/base/json.h"
+#include "desk/base/side_output.h"
 #include "qvtester/indices.h"
+
+namespace qv {
 
 namespace {
 
@@ -62,50 +66,6 @@ bool Within(double value, const std::optional<double>& min, const std::optional<
   return std::isfinite(value) && !(min && value < *min) && !(max && value > *max);
 }
 
-Limit ReadLimit(const std::string& where, const std::string& name, const Json& json) {
-  const auto refuse = [&](const std::string& why) { throw Failure(kWrongUsage, where + why); };
-  const MeasurementInfo* info = FindMeasurement(name);
-  if (info == nullptr) refuse("no measurement has this name");
-  if (info->figure->axis != nullptr) refuse("a list has no limits");
-  if (!json.is_object()) refuse("it is " + json.dump() + ", not an object of bounds");
-  Limit limit;
-  for (const auto& [key, value] : json.items()) {
-    if (key == "unit") {
-      const char* const unit = info->figure->unit.suffix;
-      if (value != unit) refuse(std::string("its unit is \"") + unit + "\", not " + value.dump());
-      continue;
-    }
-    std::optional<double>* const bound = key == "min"            ? &limit.min
-                                         : key == "max"          ? &limit.max
-                                         : key == "marginal_min" ? &limit.marginal_min
-                                         : key == "marginal_max" ? &limit.marginal_max
-                                                                 : nullptr;
-    if (bound == nullptr) refuse("\"" + key + "\" is neither a bound nor a unit");
-    if (!value.is_number()) refuse(key + " is " + value.dump() + ", not a number");
-    *bound = value.get<double>();
-  }
-  if (!limit.given()) refuse("it has no bound");
-  if (limit.min && limit.max && *limit.min > *limit.max) refuse("its min lies above its max");
-  return limit;
-}
-
-// Refuses what parsers let pass: a name given twice.
-Json ParseLimits(const std::string& text) {
-  std::vector<std::vector<std::string>> names;  // of the objects that are open
-  return Json::parse(text, [&](int /*depth*/, Json::parse_event_t event, Json& parsed) {
-    if (event == Json::parse_event_t::object_start) names.emplace_back();
-    if (event == Json::parse_event_t::object_end) names.pop_back();
-    if (event == Json::parse_event_t::key) {
-      const auto name = parsed.get<std::string>();
-      if (std::find(names.back().begin(), names.back().end(), name) != names.back().end()) {
-        throw std::runtime_error("\"" + name + "\" stands there twice");
-      }
-      names.back().push_back(name);
-    }
-    return true;
-  });
-}
-
 }  // namespace
 
 const char* Name(Outcome outcome) {
@@ -114,25 +74,6 @@ const char* Name(Outcome outcome) {
     case Outcome::kFail: return "FAIL";
     case Outcome::kError: return "ERROR";
     default: return "UNSET";
-  }
-}
-
-Limits ReadLimits(const std::string& path) {
-  const std::string text = ReadWholeFile(path, kWrongUsage);
-  try {
-    const Json json = ParseLimits(text);
-    if (!json.is_object() || !json.contains("limits") || !json["limits"].is_object()) {
-      throw std::runtime_error("it holds no object \"limits\"");
-    }
-    Limits limits = {json.value("name", ""), json.value("revision", ""), {}};
-    for (const auto& [name, limit] : json["limits"].items()) {
-      limits.by_name[name] = ReadLimit(path + ": limit of " + name + ": ", name, limit);
-    }
-    return limits;
-  } catch (const Failure&) {
-    throw;
-  } catch (const std::exception& e) {
-    throw Failure(kWrongUsage, path + ": not a limits file (" + e.what() + ")");
   }
 }
 
@@ -208,12 +149,12 @@ Json Record::ToJson() const {
   json["metadata"] = {{"test_name", test_name},
                       {"test_index", test_index ? Json(*test_index) : Json()},
                       {"library_version", QVTESTER_VERSION},
-                      {"command", CommandLine()},
+                      {"command", command},
                       {"limits", {{"name", limits.name}, {"revision", limits.revision}}},
                       {"properties", properties}};
 
   Json measurements = Json::object();
-  for (const Measurement& m : phase.measurements) measurements[m.info->name] = ::ToJson(m);
+  for (const Measurement& m : phase.measurements) measurements[m.info->name] = qv::ToJson(m);
   Json attachments = Json::object();
   for (const Attachment& a : phase.attachments) {
     attachments[a.name] = {{"mimetype", a.mimetype}, {"sha1", a.sha1}, {"path", a.path}};
@@ -241,3 +182,5 @@ Json Record::ToJson() const {
   }
   return json;
 }
+
+}  // namespace qv

@@ -1,5 +1,5 @@
-#ifndef QVTESTER_TOOLS_METHOD_LAW_H_
-#define QVTESTER_TOOLS_METHOD_LAW_H_
+#ifndef QVTESTER_DESK_SIMULATION_METHOD_LAW_H_
+#define QVTESTER_DESK_SIMULATION_METHOD_LAW_H_
 
 #include <cmath>
 
@@ -10,7 +10,7 @@
 // from the middle of npix bins: 0 to 0.5 for an even npix, 0 to 1 for an odd one. It therefore reads low, by a known
 // amount.
 
-namespace method_law {
+namespace qv::method_law {
 
 inline constexpr double kPi = 3.14159265358979323846;
 
@@ -66,6 +66,6 @@ inline Bounds MeasuredMtf50(double sigma_px, int npix) {
   return MeasuredMtf50([&](double f) { return TrueResponse(f, sigma_px); }, npix);
 }
 
-}  // namespace method_law
+}  // namespace qv::method_law
 
-#endif  // QVTESTER_TOOLS_METHOD_LAW_H_
+#endif  // QVTESTER_DESK_SIMULATION_METHOD_LAW_H_

@@ -1,5 +1,5 @@
-#ifndef QVTESTER_TOOLS_PICTURE_H_
-#define QVTESTER_TOOLS_PICTURE_H_
+#ifndef QVTESTER_DESK_DRAWING_PICTURE_H_
+#define QVTESTER_DESK_DRAWING_PICTURE_H_
 
 #include <cairo.h>
 
@@ -8,7 +8,9 @@
 #include <string>
 #include <vector>
 
-// A picture for a person to look at: lines, text and plots, drawn with cairo.
+namespace qv {
+
+// A picture for a person to look at: lines and text, drawn with cairo.
 
 struct Colour {
   double red, green, blue;
@@ -53,30 +55,6 @@ class Picture {
   std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr_;
 };
 
-/// One curve in a frame with axes.
-struct Plot {
-  std::string title, x_label, y_label;
-  double x_max = 1, y_min = 0, y_max = 1;  // the x axis starts at 0
-  std::string second_x_label;              // above the frame, empty for none
-  double second_x_factor = 1;              // second axis = first x factor
-  std::vector<cv::Point2d> curve;
-  std::vector<cv::Point2d> second_curve;
-  struct Curve {
-    std::vector<cv::Point2d> points;
-    Colour colour;
-  };
-  std::vector<Curve> more_curves;
-  bool bars = false;  // the curve as bars
-  std::vector<double> horizontal_lines;
-  struct Marker {
-    cv::Point2d at;
-    std::string text;
-    Colour colour;
-  };
-  std::vector<Marker> markers;
-};
+}  // namespace qv
 
-/// Draws the plot into this frame, axis labels included.
-void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area);
-
-#endif  // QVTESTER_TOOLS_PICTURE_H_
+#endif  // QVTESTER_DESK_DRAWING_PICTURE_H_

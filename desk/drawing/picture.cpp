@@ -1,0 +1,104 @@
+#include "desk/drawing/picture.h"
+
+#include <opencv2/imgproc.hpp>
+
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+
+namespace qv {
+
+namespace {
+
+void SetColour(cairo_t* cr, Colour c) { cairo_set_source_rgb(cr, c.red, c.green, c.blue); }
+
+}  // namespace
+
+Picture::Picture(int width, int height)
+    : surface_(cairo_image_surface_create(CAIRO_FORMAT_RGB24, width, height), cairo_surface_destroy),
+      cr_(cairo_create(surface_.get()), cairo_destroy) {
+  if (cairo_status(cr_.get()) != CAIRO_STATUS_SUCCESS) {
+    throw Failure(kInternalFault, Format("no memory for a picture of %d x %d pixels", width, height));
+  }
+  cairo_select_font_face(cr_.get(), "sans-serif", CAIRO_FONT_SLANT_NORMAL, CAIRO_FONT_WEIGHT_NORMAL);
+  SetColour(cr_.get(), {1, 1, 1});
+  cairo_paint(cr_.get());
+}
+
+PhotoPlace Picture::PlacePhoto(const cv::Mat& image, cv::Point2d origin, double scale) {
+  cv::Mat scaled;
+  cv::resize(image, scaled, cv::Size(), scale, scale, scale < 1 ? cv::INTER_AREA : cv::INTER_NEAREST);
+  cv::Mat pixels = scaled;
+  if (scaled.channels() != 4) {
+    cv::cvtColor(scaled, pixels, scaled.channels() == 1 ? cv::COLOR_GRAY2BGRA : cv::COLOR_BGR2BGRA);
+  }
+  const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> source(
+      cairo_image_surface_create_for_data(pixels.data, CAIRO_FORMAT_RGB24, pixels.cols, pixels.rows,
+                                          static_cast<int>(pixels.step)),
+      cairo_surface_destroy);
+  cairo_set_source_surface(cr_.get(), source.get(), origin.x, origin.y);
+  cairo_paint(cr_.get());
+  return {origin, scale};
+}
+
+void Picture::Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed) {
+  SetColour(cr_.get(), colour);
+  cairo_set_line_width(cr_.get(), width);
+  cairo_set_line_join(cr_.get(), CAIRO_LINE_JOIN_ROUND);
+  cairo_new_path(cr_.get());
+  for (const cv::Point2d& p : points) cairo_line_to(cr_.get(), p.x, p.y);
+  if (closed) cairo_close_path(cr_.get());
+  cairo_stroke(cr_.get());
+}
+
+void Picture::FillRectangle(const cv::Rect2d& r, Colour colour) {
+  SetColour(cr_.get(), colour);
+  cairo_rectangle(cr_.get(), r.x, r.y, r.width, r.height);
+  cairo_fill(cr_.get());
+}
+
+void Picture::Circle(cv::Point2d centre, double radius, Colour colour, double width) {
+  SetColour(cr_.get(), colour);
+  cairo_set_line_width(cr_.get(), width);
+  cairo_new_sub_path(cr_.get());
+  cairo_arc(cr_.get(), centre.x, centre.y, radius, 0, 2 * CV_PI);
+  cairo_stroke(cr_.get());
+}
+
+void Picture::Text(const std::string& text, cv::Point2d place, double size, Colour colour, Align align, bool backed) {
+  cairo_set_font_size(cr_.get(), size);
+  cairo_text_extents_t extents;
+  cairo_text_extents(cr_.get(), text.c_str(), &extents);
+  const double share = align == Align::kLeft ? 0 : align == Align::kCentre ? 0.5 : 1;
+  const double left = place.x - share * extents.x_advance;
+  if (backed) {
+    cairo_rectangle(cr_.get(), left - 4, place.y - size, extents.x_advance + 8, size * 1.3);
+    cairo_set_source_rgba(cr_.get(), kInk.red, kInk.green, kInk.blue, 0.8);
+    cairo_fill(cr_.get());
+  }
+  SetColour(cr_.get(), colour);
+  cairo_move_to(cr_.get(), left, place.y);
+  cairo_show_text(cr_.get(), text.c_str());
+}
+
+void Picture::TextUpwards(const std::string& text, cv::Point2d place, double size, Colour colour) {
+  cairo_save(cr_.get());
+  cairo_translate(cr_.get(), place.x, place.y);
+  cairo_rotate(cr_.get(), -CV_PI / 2);
+  Text(text, {0, 0}, size, colour, Align::kCentre);
+  cairo_restore(cr_.get());
+}
+
+std::string Picture::Png() const {
+  std::string file;
+  cairo_surface_flush(surface_.get());
+  const auto append = [](void* out, const unsigned char* data, unsigned int length) {
+    static_cast<std::string*>(out)->append(reinterpret_cast<const char*>(data), length);
+    return CAIRO_STATUS_SUCCESS;
+  };
+  if (cairo_surface_write_to_png_stream(surface_.get(), append, &file) != CAIRO_STATUS_SUCCESS) {
+    throw Failure(kInternalFault, "the picture can't be encoded");
+  }
+  return file;
+}
+
+}  // namespace qv
