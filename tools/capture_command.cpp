@@ -134,12 +134,11 @@ std::string Annotate(const Record& record, const ChartView& view, const CaptureO
 
 }  // namespace
 
-CommandBody DeclareCapture(CLI::App& command) {
+CommandBody DeclareCapture(Options& command) {
   auto options = std::make_shared<CaptureOptions>();
-  command.add_option("PHOTO", options->photo, "Photo of the chart; - is standard input")->required();
-  command.add_option("--standard", options->standard, "Photo of the same chart by a good camera, to compare with")
-      ->type_name("PHOTO");
-  command.add_flag("--front", options->front, "The front camera (test 20)");
+  command.Argument("PHOTO", options->photo, "Photo of the chart; - is standard input");
+  command.Text("--standard", options->standard, "Photo of the same chart by a good camera, to compare with", "PHOTO");
+  command.Flag("--front", options->front, "The front camera (test 20)");
   options->DeclareThresholdOn(command);
   options->DeclareOn(command);
   return [options] {

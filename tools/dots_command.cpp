@@ -216,26 +216,19 @@ std::string Annotate(const Record& record, const Dots& dots) {
 
 }  // namespace
 
-CommandBody DeclareDots(CLI::App& command) {
+CommandBody DeclareDots(Options& command) {
   auto options = std::make_shared<DotsOptions>();
-  command
-      .add_option(
-          "FILE", options->picture,
-          "Float picture of a lit panel; - is standard input. OpenEXR (.exr, lossy when its values are halves), "
-          "Radiance (.hdr, lossy: 8 bits a channel and a common exponent), float TIFF (lossless, unless as LogLuv) and "
-          "PFM (lossless)")
-      ->required();
-  AddNumber(command, "--threshold", options->deviation, "Departure from the local mean that makes a dot, a share [0.1]",
-            0, 1e9, "SHARE");
-  command.add_option("--radius", options->radius, "Half the side of the window of the local mean [10]")
-      ->check(CLI::Range(1, 10'000))
-      ->type_name("PX");
-  command.add_option("--distance", options->distance, "Areas closer than this are merged [8]")
-      ->check(CLI::Range(0, 100'000))
-      ->type_name("PX");
-  command.add_option("--channel", options->channel, "Channel that is searched: red, green or blue [red]")
-      ->check(CLI::IsMember({"red", "green", "blue"}))
-      ->type_name("NAME");
+  command.Argument(
+      "FILE", options->picture,
+      "Float picture of a lit panel; - is standard input. OpenEXR (.exr, lossy when its values are halves), "
+      "Radiance (.hdr, lossy: 8 bits a channel and a common exponent), float TIFF (lossless, unless as LogLuv) and "
+      "PFM (lossless)");
+  command.Number("--threshold", options->deviation, 0, 1e9, "Departure from the local mean that makes a dot, a share",
+                 "SHARE");
+  command.Whole("--radius", options->radius, 1, 10'000, "Half the side of the window of the local mean", "PX");
+  command.Whole("--distance", options->distance, 0, 100'000, "Areas closer than this are merged", "PX");
+  command.Choice("--channel", options->channel, {"red", "green", "blue"},
+                 "Channel that is searched: red, green or blue", "NAME");
   options->DeclareOn(command);
   return [options] {
     auto dots = std::make_shared<Dots>();

@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <array>
+#include <climits>
 #include <cstdint>
 #include <memory>
 #include <numeric>
@@ -167,16 +168,14 @@ std::string Annotate(const Record& record, const DustOptions& options) {
 
 }  // namespace
 
-CommandBody DeclareDust(CLI::App& command) {
+CommandBody DeclareDust(Options& command) {
   auto options = std::make_shared<DustOptions>();
-  command.add_option("PHOTO", options->photo, "Photo of a plain, evenly lit target; - is standard input")->required();
-  command
-      .add_option("--reference", options->reference,
-                  "Histogram to compare with: an earlier dust record, or 256 numbers")
-      ->type_name("FILE");
-  command.add_flag("--front", options->front, "The front camera (test 21)");
-  command.add_option("--step", options->step, "Step number, which names the property that is published [0]")
-      ->type_name("N");
+  command.Argument("PHOTO", options->photo, "Photo of a plain, evenly lit target; - is standard input");
+  command.Text("--reference", options->reference, "Histogram to compare with: an earlier dust record, or 256 numbers",
+               "FILE");
+  command.Flag("--front", options->front, "The front camera (test 21)");
+  command.Whole("--step", options->step, INT_MIN, INT_MAX, "Step number, which names the property that is published",
+                "N");
   options->DeclarePublishOn(command);
   options->DeclareOn(command);
   return [options] {

@@ -26,11 +26,10 @@ std::string Explain(const MeasurementInfo& info) {
 
 }  // namespace
 
-CommandBody DeclareExplain(CLI::App& command) {
+CommandBody DeclareExplain(Options& command) {
   auto names = std::make_shared<std::vector<std::string>>();
-  command
-      .add_option("MEASUREMENT", *names, "Names as records give them, or parts of names; without any, all are listed")
-      ->type_name("NAME");
+  command.Arguments("MEASUREMENT", *names, "Names as records give them, or parts of names; without any, all are listed",
+                    "NAME", false);
   return [names] {
     if (names->empty()) {
       for (const MeasurementInfo& info : AllMeasurements()) std::cout << info.name << '\n';

@@ -7,14 +7,14 @@
 
 namespace qv {
 
-CommandBody DeclareFlash(CLI::App& command) {
+CommandBody DeclareFlash(Options& command) {
   struct Options : MeasureOptions {
     std::string photo;
     bool vt = false;
   };
   auto options = std::make_shared<Options>();
-  command.add_option("PHOTO", options->photo, "Photo taken with the flash; - is standard input")->required();
-  command.add_flag("--vt", options->vt, "The second camera's flash (test 18)");
+  command.Argument("PHOTO", options->photo, "Photo taken with the flash; - is standard input");
+  command.Flag("--vt", options->vt, "The second camera's flash (test 18)");
   options->DeclareOn(command);
   return [options] {
     const QV_TEST_INDEX test = options->vt ? QV_TEST_CAMERA_FLASH_VT : QV_TEST_CAMERA_FLASH;

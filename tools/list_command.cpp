@@ -79,9 +79,11 @@ const std::map<std::string, void (*)()> kLists = {
 
 }  // namespace
 
-CommandBody DeclareList(CLI::App& command) {
+CommandBody DeclareList(Options& command) {
   auto what = std::make_shared<std::string>();
-  command.add_option("WHAT", *what, "tests, slots, properties or codes")->required()->check(CLI::IsMember(kLists));
+  std::vector<std::string> names;
+  for (const auto& [name, print] : kLists) names.push_back(name);
+  command.ChoiceArgument("WHAT", *what, names, "tests, slots, properties or codes");
   return [what] {
     kLists.at (*what)();
     return static_cast<int>(kExitWithinLimits);

@@ -1,4 +1,3 @@
-#include <CLI/CLI.hpp>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
@@ -12,13 +11,7 @@ namespace qv {
 
 namespace {
 
-struct Command {
-  const char* name;
-  const char* purpose;
-  CommandBody (*declare)(CLI::App& command);
-};
-
-constexpr Command kCommands[] = {
+const std::vector<Command> kCommands = {
     {"autofocus", "Measure the sharpness of a chart photo (test 14)", DeclareAutofocus},
     {"mtf", "Measure the two MTF50 values of a chart photo, outside the numbered tests", DeclareMtf},
     {"flash", "Measure the mean brightness of a flash photo (tests 15 and 18)", DeclareFlash},
@@ -58,24 +51,9 @@ std::vector<std::string> Separate(const std::vector<std::string>& words) {
 }  // namespace
 
 int RunCommand(const std::vector<std::string>& words) {
-  CLI::App app("Judges a phone's camera hardware from photos of test charts.", "qvtester");
-  app.set_version_flag("--version", "qvtester " QVTESTER_VERSION);
-  app.require_subcommand(1);
-  app.footer(kFooter);
-  app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
-  app.get_formatter()->column_width(32);
-
-  CommandBody body;
-  for (const Command& row : kCommands) {
-    CLI::App* command = app.add_subcommand(row.name, row.purpose);
-    command->callback([&body, chosen = row.declare(*command)] { body = chosen; });
-  }
-  try {
-    std::vector<std::string> backwards(words.rbegin(), words.rend());  // the parser takes them from the back
-    app.parse(backwards);
-  } catch (const CLI::ParseError& e) {
-    return app.exit(e) == 0 ? kExitWithinLimits : kExitWrongUsage;
-  }
+  const CommandBody body =
+      Parse({"qvtester", "Judges a phone's camera hardware from photos of test charts.", QVTESTER_VERSION, kFooter},
+            kCommands, words);
   SetCommandLine(Separate(words));
   const int status = body();
   if (!std::cout.flush()) throw Failure(kInternalFault, "standard output can't be written");

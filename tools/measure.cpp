@@ -212,28 +212,26 @@ std::string MissSentence(const Record& record, const std::string& look_at) {
 
 }  // namespace
 
-void MeasureOptions::DeclareOn(CLI::App& command, const char* picture, const char* shows) {
-  command.add_option("--json", json, "Write the record to FILE; - is standard output")->type_name("FILE");
-  command.add_option(picture, annotate, shows)->type_name("PNG");
-  command.add_option("--limits", limits, "Judge the figures by this limits file")->type_name("FILE");
-  command.add_option("--dut", dut, "Serial number of the unit, for the record")->type_name("ID");
-  command.add_option("--station", station, "Name of the station, for the record")->type_name("ID");
-  command.add_flag("--verbose", verbose, "Show the library's log and what decoders say");
-  command.add_flag("--quiet", quiet, "Print nothing but what was asked for and errors");
+void MeasureOptions::DeclareOn(Options& command, const char* picture, const char* shows) {
+  command.Text("--json", json, "Write the record to FILE; - is standard output", "FILE");
+  command.Text(picture, annotate, shows, "PNG");
+  command.Text("--limits", limits, "Judge the figures by this limits file", "FILE");
+  command.Text("--dut", dut, "Serial number of the unit, for the record", "ID");
+  command.Text("--station", station, "Name of the station, for the record", "ID");
+  command.Flag("--verbose", verbose, "Show the library's log and what decoders say");
+  command.Flag("--quiet", quiet, "Print nothing but what was asked for and errors");
 }
 
-void MeasureOptions::DeclareThresholdOn(CLI::App& command) {
-  command.add_option("--threshold", threshold, "Grey level above which a pixel is light [125]")
-      ->check(CLI::Range(0, 255))
-      ->type_name("N");
+void MeasureOptions::DeclareThresholdOn(Options& command) {
+  command.Whole("--threshold", threshold, 0, 255, "Grey level above which a pixel is light [125]", "N");
 }
 
-void MeasureOptions::DeclareRawOn(CLI::App& command) {
-  command.add_option("--raw", raw_size, "Frames are raw NV21 of this size, not picture files")->type_name("WxH");
+void MeasureOptions::DeclareRawOn(Options& command) {
+  command.Text("--raw", raw_size, "Frames are raw NV21 of this size, not picture files", "WxH");
 }
 
-void MeasureOptions::DeclarePublishOn(CLI::App& command) {
-  command.add_flag("--publish", publish, "Write the findings to the system properties that other programs read");
+void MeasureOptions::DeclarePublishOn(Options& command) {
+  command.Flag("--publish", publish, "Write the findings to the system properties that other programs read");
 }
 
 void RefuseInputAsOutput(const std::string& output, const std::vector<SlotInput>& inputs) {

@@ -1,7 +1,6 @@
 #ifndef QVTESTER_TOOLS_MEASURE_H_
 #define QVTESTER_TOOLS_MEASURE_H_
 
-#include <CLI/CLI.hpp>
 #include <functional>
 #include <opencv2/core.hpp>
 #include <string>
@@ -11,6 +10,7 @@
 #include "desk/measure/record.h"
 #include "qvtester/api.h"
 #include "qvtester/tester.h"
+#include "tools/options.h"
 
 namespace qv {
 
@@ -24,14 +24,14 @@ struct MeasureOptions {
   std::string raw_size;  // inputs are NV21 frames of this size; none: they are files to decode
 
   /// Declares the options that all measuring commands share; the picture's may go by a name of its own.
-  void DeclareOn(CLI::App& command, const char* picture = "--annotate",
+  void DeclareOn(Options& command, const char* picture = "--annotate",
                  const char* shows = "Write a picture of what was measured");
   /// Declares what commands that look for the chart share.
-  void DeclareThresholdOn(CLI::App& command);
+  void DeclareThresholdOn(Options& command);
   /// Declares --raw, for commands that take preview frames.
-  void DeclareRawOn(CLI::App& command);
+  void DeclareRawOn(Options& command);
   /// Declares --publish, for tests that write system properties.
-  void DeclarePublishOn(CLI::App& command);
+  void DeclarePublishOn(Options& command);
 };
 
 struct SlotInput {

@@ -1,23 +1,119 @@
 #include "tools/options.h"
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
+#include <climits>
 #include <cmath>
 #include <sstream>
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "tools/program.h"
 
 namespace qv {
 
-CLI::Option* AddNumber(CLI::App& command, const char* name, double& value, const char* help, double low, double high,
-                       const char* type) {
+namespace {
+
+std::string WithDefault(const std::string& help, const std::string& value) {
+  return value.empty() ? help : help + " [" + value + "]";
+}
+
+}  // namespace
+
+void Options::Argument(const char* name, std::string& value, const std::string& help) {
+  command_->add_option(name, value, help)->required();
+}
+
+void Options::Arguments(const char* name, std::vector<std::string>& values, const std::string& help, const char* type,
+                        bool required) {
+  command_->add_option(name, values, help)->required(required)->type_name(type);
+}
+
+void Options::Flag(const char* name, bool& value, const std::string& help) { command_->add_flag(name, value, help); }
+
+void Options::Text(const char* name, std::string& value, const std::string& help, const char* type, bool required) {
+  command_->add_option(name, value, WithDefault(help, value))->required(required)->type_name(type);
+}
+
+void Options::Texts(const char* name, std::vector<std::string>& values, const std::string& help, const char* type) {
+  command_->add_option(name, values, help)
+      ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
+      ->expected(1)
+      ->type_name(type);
+}
+
+void Options::Choice(const char* name, std::string& value, const std::vector<std::string>& choices,
+                     const std::string& help, const char* type) {
+  command_->add_option(name, value, WithDefault(help, value))->check(CLI::IsMember(choices))->type_name(type);
+}
+
+void Options::Choice(const char* name, int& value, const std::vector<int>& choices, const std::string& help,
+                     const char* type) {
+  command_->add_option(name, value, WithDefault(help, std::to_string(value)))
+      ->check(CLI::IsMember(choices))
+      ->type_name(type);
+}
+
+void Options::ChoiceArgument(const char* name, std::string& value, const std::vector<std::string>& choices,
+                             const std::string& help) {
+  command_->add_option(name, value, help)->required()->check(CLI::IsMember(choices));
+}
+
+void Options::Number(const char* name, double& value, double low, double high, const std::string& help,
+                     const char* type) {
   const auto within = [low, high](const std::string& text) {
     double number = NAN;
     const bool read = CLI::detail::lexical_cast(text, number);
     return read && number >= low && number <= high ? std::string()
                                                    : Format("%s is no number from %g to %g", text.c_str(), low, high);
   };
-  return command.add_option(name, value, help)->check(within, "", "finite")->type_name(type);
+  command_->add_option(name, value, WithDefault(help, value < low ? "" : Format("%g", value)))
+      ->check(within, "", "finite")
+      ->type_name(type);
+}
+
+void Options::Whole(const char* name, int& value, int low, int high, const std::string& help, const char* type) {
+  CLI::Option* const option = command_->add_option(name, value, WithDefault(help, std::to_string(value)));
+  if (low > INT_MIN || high < INT_MAX) option->check(CLI::Range(low, high));
+  option->type_name(type);
+}
+
+void Options::Whole(const char* name, std::optional<int>& value, int low, int high, const std::string& help,
+                    const char* type) {
+  command_->add_option(name, value, help)->check(CLI::Range(low, high))->type_name(type);
+}
+
+void Options::Seed(const char* name, std::uint64_t& value, const std::string& help) {
+  const auto whole = [](const std::string& text) {
+    const bool digits = !text.empty() && text.size() < 19 && text.find_first_not_of("0123456789") == std::string::npos;
+    return digits ? std::string() : text + " is no whole number of up to 18 digits";
+  };
+  command_->add_option(name, value, WithDefault(help, std::to_string(value)))->check(whole)->type_name("N");
+}
+
+CommandBody Parse(const ProgramText& text, const std::vector<Command>& commands,
+                  const std::vector<std::string>& words) {
+  CLI::App app(text.purpose, text.name);
+  app.set_version_flag("--version", std::string(text.name) + " " + text.version);
+  app.require_subcommand(1);
+  app.footer(text.footer);
+  app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
+  app.get_formatter()->column_width(32);
+
+  CommandBody body;
+  for (const Command& row : commands) {
+    CLI::App* const command = app.add_subcommand(row.name, row.purpose);
+    Options options(*command);
+    command->callback([&body, chosen = row.declare(options)] { body = chosen; });
+  }
+  try {
+    std::vector<std::string> backwards(words.rbegin(), words.rend());  // the parser takes them from the back
+    app.parse(backwards);
+  } catch (const CLI::ParseError& e) {
+    const int status = app.exit(e) == 0 ? kExitWithinLimits : kExitWrongUsage;
+    return [status] { return status; };
+  }
+  return body;
 }
 
 cv::Size ParseSize(const char* option, const std::string& text) {

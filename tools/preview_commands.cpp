@@ -70,15 +70,15 @@ cv::Point2d TargetCentre(const ChartView& view) {
 
 }  // namespace
 
-CommandBody DeclarePreview(CLI::App& command) {
+CommandBody DeclarePreview(Options& command) {
   struct Options : MeasureOptions {
     std::string first, second;
     bool front = false;
   };
   auto options = std::make_shared<Options>();
-  command.add_option("FIRST", options->first, "First preview frame")->required();
-  command.add_option("SECOND", options->second, "Second preview frame, of the same size")->required();
-  command.add_flag("--front", options->front, "The front camera's preview (test 19)");
+  command.Argument("FIRST", options->first, "First preview frame");
+  command.Argument("SECOND", options->second, "Second preview frame, of the same size");
+  command.Flag("--front", options->front, "The front camera's preview (test 19)");
   options->DeclareRawOn(command);
   options->DeclareOn(command);
   return [options] {
@@ -114,12 +114,10 @@ CommandBody DeclarePreview(CLI::App& command) {
   };
 }
 
-CommandBody DeclareCircles(CLI::App& command) {
+CommandBody DeclareCircles(Options& command) {
   auto options = std::make_shared<TargetOptions>();
-  command.add_option("FRAME", options->frame, "Preview frame that shows the chart; - is standard input")->required();
-  command.add_option("--camera", options->camera, "0: main camera, 2: second rear camera [0]")
-      ->check(CLI::IsMember({0, 2}))
-      ->type_name("N");
+  command.Argument("FRAME", options->frame, "Preview frame that shows the chart; - is standard input");
+  command.Choice("--camera", options->camera, {0, 2}, "0: main camera, 2: second rear camera", "N");
   options->DeclareThresholdOn(command);
   options->DeclareRawOn(command);
   options->DeclarePublishOn(command);

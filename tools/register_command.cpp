@@ -110,12 +110,11 @@ std::string Png(const cv::Mat& picture) { return Encode(picture, "-"); }
 
 }  // namespace
 
-CommandBody DeclareRegister(CLI::App& command) {
+CommandBody DeclareRegister(Options& command) {
   auto options = std::make_shared<RegisterOptions>();
-  command.add_option("REFERENCE", options->reference, "Picture whose frame is taken; - is standard input")->required();
-  command.add_option("IMAGE", options->image, "Picture of the same scene, brought into that frame")->required();
-  command.add_option("-o,--output", options->output, "Where the resampled picture goes: .png, .jpg, .bmp or .tif")
-      ->type_name("OUT");
+  command.Argument("REFERENCE", options->reference, "Picture whose frame is taken; - is standard input");
+  command.Argument("IMAGE", options->image, "Picture of the same scene, brought into that frame");
+  command.Text("-o,--output", options->output, "Where the resampled picture goes: .png, .jpg, .bmp or .tif", "OUT");
   options->DeclareOn(command, "--matches", "Draw the good matches between both pictures");
   return [options] {
     if (!options->output.empty()) {

@@ -191,13 +191,13 @@ std::string AnnotateSharpness(const Record& record, const ChartView& view) {
   return picture.Png();
 }
 
-CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
+CommandBody DeclareSharpness(Options& command, const Measuring& test) {
   auto options = std::make_shared<SharpnessOptions>();
-  command.add_option("PHOTO", options->photo, "Photo of the sharpness chart; - is standard input")->required();
+  command.Argument("PHOTO", options->photo, "Photo of the sharpness chart; - is standard input");
   options->DeclareThresholdOn(command);
-  AddNumber(command, "--pixel-pitch", options->pixel_pitch_um, "Pixel pitch of the sensor, for figures in lp/mm", 0.01,
-            1000, "UM");
-  command.add_option("--truth", options->truth, "Truth of a simulated photo, to compare with")->type_name("FILE");
+  command.Number("--pixel-pitch", options->pixel_pitch_um, 0.01, 1000,
+                 "Pixel pitch of the sensor, for figures in lp/mm", "UM");
+  command.Text("--truth", options->truth, "Truth of a simulated photo, to compare with", "FILE");
   options->DeclareOn(command);
   return [options, test] {
     const Json truth = options->truth.empty() ? Json() : ReadTruth(options->truth);
@@ -229,7 +229,7 @@ CommandBody DeclareSharpness(CLI::App& command, const Measuring& test) {
 
 }  // namespace
 
-CommandBody DeclareAutofocus(CLI::App& command) {
+CommandBody DeclareAutofocus(Options& command) {
   Measuring m;
   m.phase = "camera_autofocus";
   m.test_name = "QV_TEST_CAMERA_AUTOFOCUS";
@@ -245,7 +245,7 @@ CommandBody DeclareAutofocus(CLI::App& command) {
   return DeclareSharpness(command, m);
 }
 
-CommandBody DeclareMtf(CLI::App& command) {
+CommandBody DeclareMtf(Options& command) {
   auto figures = std::make_shared<std::array<float, 2>>();
   Measuring m;
   m.phase = "mtf_check";

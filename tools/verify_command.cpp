@@ -185,14 +185,13 @@ std::vector<std::pair<fs::path, Json>> ReadRecords(const std::vector<std::string
 
 }  // namespace
 
-CommandBody DeclareVerify(CLI::App& command) {
+CommandBody DeclareVerify(Options& command) {
   auto paths = std::make_shared<std::vector<std::string>>();
-  command
-      .add_option("RECORD", *paths,
-                  "Records of golden photos, as --json wrote them, or folders of them; a photo is looked for where the "
-                  "record says and beside the record, by its content")
-      ->required()
-      ->type_name("PATH");
+  command.Arguments(
+      "RECORD", *paths,
+      "Records of golden photos, as --json wrote them, or folders of them; a photo is looked for where the "
+      "record says and beside the record, by its content",
+      "PATH", true);
   return [paths] {
     int numbers = 0;
     int moved = 0;
