@@ -104,7 +104,7 @@ TEST_F(Program, LimitsDecideTheVerdict) {
         {R"({"camera_autofocus_mtf50_vertical": 5})", "not an object"},
         {R"({"camera_flash_mean": {"min": 1}, "camera_flash_mean": {"min": 2}})", "stands there twice"},
         {R"([])", "no object"},
-        {R"([)", "not a limits file"}}) {
+        {R"([)", "line 1: this is no JSON"}}) {
     set(limits);
     ExpectComplaint(judge, 2, complaint);
   }

@@ -1,11 +1,8 @@
 #include "desk/measure/limits.h"
 
-#include <algorithm>
 #include <stdexcept>
-#include <vector>
 
 #include "desk/base/failure.h"
-#include "desk/base/files.h"
 #include "desk/base/json.h"
 #include "desk/measure/measurements.h"
 
@@ -40,29 +37,11 @@ Limit ReadLimit(const std::string& where, const std::string& name, const Json& j
   return limit;
 }
 
-// Refuses what parsers let pass: a name given twice.
-Json ParseLimits(const std::string& text) {
-  std::vector<std::vector<std::string>> names;  // of the objects that are open
-  return Json::parse(text, [&](int /*depth*/, Json::parse_event_t event, Json& parsed) {
-    if (event == Json::parse_event_t::object_start) names.emplace_back();
-    if (event == Json::parse_event_t::object_end) names.pop_back();
-    if (event == Json::parse_event_t::key) {
-      const auto name = parsed.get<std::string>();
-      if (std::find(names.back().begin(), names.back().end(), name) != names.back().end()) {
-        throw std::runtime_error("\"" + name + "\" stands there twice");
-      }
-      names.back().push_back(name);
-    }
-    return true;
-  });
-}
-
 }  // namespace
 
 Limits ReadLimits(const std::string& path) {
-  const std::string text = ReadWholeFile(path, kWrongUsage);
   try {
-    const Json json = ParseLimits(text);
+    const Json json = ReadJson(path);
     if (!json.is_object() || !json.contains("limits") || !json["limits"].is_object()) {
       throw std::runtime_error("it holds no object \"limits\"");
     }

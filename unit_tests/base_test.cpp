@@ -1,0 +1,148 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdint>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <string>
+
+#include "desk/base/files.h"
+#include "desk/base/json.h"
+#include "desk/base/text.h"
+#include "unit_tests/drawing.h"
+
+namespace qv {
+
+namespace {
+
+namespace fs = std::filesystem;
+using ::testing::HasSubstr;
+
+std::string Sentence(const std::function<void()>& call) {
+  try {
+    call();
+  } catch (const Failure& failure) {
+    return failure.what();
+  }
+  return "no failure";
+}
+
+struct Refused {
+  std::string text, sentence;
+};
+
+TEST(JsonReader, RefusesWithTheLineAndInItsOwnWords) {
+  const Refused kRefused[] = {
+      {"", "f: line 1: ends before the document does"},
+      {"{\"a\":\n[1,\n2", "f: line 3: ends before the document does"},
+      {"{\"a\": 1,\n\"b\": nul}", "f: line 2: this is no JSON"},
+      {"{\"a\": 1, \"a\": 2}", "f: \"a\" stands there twice"},
+      {"[1e999]", "f: holds a number that no double can take"},
+      {"\"\xff\"", "f: line 1: this is no JSON"},
+      {std::string(150000, '['), "f: line 1: nested deeper than 64 levels"},
+      {"\"[[[\\\"[\"\n" + std::string(65, '['), "f: line 2: nested deeper than 64 levels"},
+  };
+  for (const Refused& row : kRefused) {
+    EXPECT_EQ(row.sentence, Sentence([&] { ParseJson(row.text, "f"); })) << row.text.substr(0, 40);
+  }
+  // Brackets in a text are no levels, and the same name may stand in two objects.
+  EXPECT_NO_THROW(ParseJson("\"" + std::string(70, '[') + "\"", "f"));
+  EXPECT_NO_THROW(ParseJson("[{\"a\": {\"a\": 1}}, {\"a\": 2}]", "f"));
+}
+
+TEST(JsonReader, ViewsNameTheWayToWhatIsWrong) {
+  const Json json = ParseJson(R"({"steps": [{"inputs": 5, "n": -9e18, "big": 18446744073709551615}]})", "plan.json");
+  const JsonView step = JsonView(json, "plan.json").At("steps").Elements().at(0);
+  EXPECT_EQ("plan.json: steps[0]: inputs: is 5, not a list", Sentence([&] { step.At("inputs").Elements(); }));
+  EXPECT_EQ("plan.json: steps[0]: n: is -9e+18, not a whole number from 0 to 9",
+            Sentence([&] { step.At("n").Integer(0, 9); }));
+  EXPECT_THAT(Sentence([&] { step.At("big").Integer(0, INT64_MAX); }), HasSubstr("not a whole number"));
+  EXPECT_EQ("plan.json: steps[0]: holds no \"name\"", Sentence([&] { step.At("name"); }));
+  EXPECT_EQ("plan.json: steps[0]: inputs: is 5, not an object", Sentence([&] { step.At("inputs").At("x"); }));
+  EXPECT_EQ("plan.json: steps[0]: \"inputs\" is not known here; did you mean \"input\"?", Sentence([&] {
+              step.KnowOnly({"input", "n", "big"});
+            }));
+}
+
+TEST(Text, TerminalsSeeNoControlAndWordsFindTheirNeighbour) {
+  EXPECT_EQ("a\\x1b[31mb\\x0a\\xc2\\x9b\\xff\\xc0\\xaf\xc3\xa9", Printable("a\x1b[31mb\n\xc2\x9b\xff\xc0\xaf\xc3\xa9"));
+  EXPECT_EQ("ab...", Shortened("ab\xc3\xa9xyz", 6));
+  EXPECT_EQ("; did you mean \"autofocus\"?", DidYouMean("autofcus", {"capture", "autofocus"}));
+  EXPECT_EQ("", DidYouMean("video", {"capture", "autofocus"}));
+}
+
+class Files : public ::testing::Test {
+ protected:
+  std::string Path(const std::string& name) { return folder_.Path(name); }
+  void Put(const std::string& name, const std::string& text) { std::ofstream(Path(name)) << text; }
+  std::string Get(const std::string& name) { return ReadWholeFile(Path(name), kWrongUsage); }
+  std::size_t Entries() {
+    return static_cast<std::size_t>(std::distance(fs::directory_iterator(Path("")), fs::directory_iterator()));
+  }
+  TemporaryFolder folder_;
+};
+
+// 0 when a file of more bytes than may be written is answered as it should be.
+int WriteBeyondLimit(const std::string& path) {
+  signal(SIGXFSZ, SIG_IGN);
+  const rlimit limit = {4096, 4096};
+  setrlimit(RLIMIT_FSIZE, &limit);
+  const std::string said = Sentence([&] { WriteWholeFile(path, std::string(8192, 'x')); });
+  return said.find("can't be written") != std::string::npos ? 0 : 1;
+}
+
+TEST_F(Files, NothingIsWaitedForAndNoDeviceIsRead) {
+  ASSERT_EQ(0, mkfifo(Path("fifo").c_str(), 0600));
+  EXPECT_EQ("", Get("fifo"));  // at once, without a writer
+  for (const char* path : {"/dev/zero", "/dev/null"}) {
+    EXPECT_EQ(std::string(path) + ": is no regular file", Sentence([&] { ReadWholeFile(path, kWrongUsage); }));
+  }
+  EXPECT_THAT(Sentence([&] { ReadWholeFile(Path(""), kWrongUsage); }), HasSubstr("is a directory"));
+  Put("long", std::string(3 << 20, 'x'));
+  EXPECT_THAT(Sentence([&] { ReadWholeFile(Path("long"), kWrongUsage, 2 << 20); }), HasSubstr("longer than 2 MB"));
+  EXPECT_EQ(std::size_t{3} << 20, Get("long").size());
+}
+
+TEST_F(Files, AWriteThatFailsKeepsWhatWasThere) {
+  Put("record", "whole");
+  ASSERT_EQ(0, chmod(Path("record").c_str(), 0640));
+  fs::create_symlink("record", Path("link"));
+  WriteWholeFile(Path("link"), "new");
+  EXPECT_TRUE(fs::is_symlink(Path("link")));
+  EXPECT_EQ("new", Get("record"));
+  struct stat status = {};
+  stat(Path("record").c_str(), &status);
+  EXPECT_EQ(0640U, status.st_mode & 0777U);
+
+  // A limit on the file's size stands for a full disk.
+  EXPECT_EXIT(_exit(WriteBeyondLimit(Path("record"))), ::testing::ExitedWithCode(0), "");
+  EXPECT_EQ("new", Get("record"));
+  EXPECT_EQ(2U, Entries());
+}
+
+TEST_F(Files, OutputsAreCheckedBeforeAnythingIsDone) {
+  Put("photo", "x");
+  fs::create_hard_link(Path("photo"), Path("same"));
+  fs::create_directory(Path("folder"));
+  const auto said = [&](const std::string& first, const std::string& second = "") {
+    return Sentence([&] {
+      CheckOutputs({{"the photo", Path("photo")}}, {{"the record", first}, {"the picture", second}});
+    });
+  };
+  EXPECT_EQ("no failure", said(Path("record"), "-"));
+  EXPECT_THAT(said(Path("same")), HasSubstr("same: the record would overwrite the photo"));
+  EXPECT_THAT(said(Path("folder/../new"), Path("new")), HasSubstr("can't take both the record and the picture"));
+  EXPECT_THAT(said("-", "-"), HasSubstr("standard output: can't take both"));
+  EXPECT_THAT(said(Path("folder")), HasSubstr("is a directory"));
+  EXPECT_THAT(said(Path("none/record")), HasSubstr("can't be written"));
+  EXPECT_EQ(3U, Entries());
+}
+
+}  // namespace
+
+}  // namespace qv
