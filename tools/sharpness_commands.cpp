@@ -52,8 +52,8 @@ void AddIsoFigures(Record& record, const cv::Mat& photo) {
   const UprightPhoto upright = Straighten(*theTester, gray);
   const std::array<cv::Rect, 2> regions = MeasuredRegions(upright);
   for (std::size_t i = 0; i < regions.size(); ++i) {
-    const IsoMtf iso = MeasureIsoMtf(gray, upright.OnPhoto(regions[i]));
-    record.phase.Add(std::string("mtf50_iso_") + kRegionNames[i], iso.mtf50);
+    const IsoMtf iso = MeasureIsoMtf(gray, upright.OnPhoto(regions[i]), {Transfer::Kind::kLinear, 1});
+    record.phase.Add(std::string("mtf50_iso_") + kRegionNames[i], iso.figures.mtf50);
     const cv::Mat region = upright.picture(regions[i]);
     if (cv::countNonZero(region == 255) > kMostClipped * static_cast<double>(region.total())) {
       record.details.push_back(

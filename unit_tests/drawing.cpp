@@ -81,26 +81,46 @@ std::vector<cv::Point2d> MarkCentres(const ChartView& view) {
   return {Place(view, 0, 0) - half, Place(view, kChartSide, 0) - half, Place(view, 0, kChartSide) - half};
 }
 
+double EdgeRise(double distance, double sigma_px, double normal_deg) {
+  if (std::fabs(distance) >= 8 * sigma_px + 1) return distance > 0 ? 1 : 0;
+  // Along the normal the pixel's square is two boxes, one after the other; none is let shrink to nothing.
+  const double angle = normal_deg * CV_PI / 180;
+  const double a = std::max(std::fabs(std::cos(angle)), 1e-3);
+  const double b = std::max(std::fabs(std::sin(angle)), 1e-3);
+  const auto ramp = [&](double t) { return BlurredRamp(distance + t, sigma_px); };
+  return (ramp((a + b) / 2) - ramp((a - b) / 2) - ramp((b - a) / 2) + ramp(-(a + b) / 2)) / (a * b);
+}
+
 cv::Mat DrawEdgePhoto(const EdgePhoto& view) {
   const double angle = view.normal_deg * CV_PI / 180;
   const cv::Point2d normal(std::cos(angle), std::sin(angle));
-  // Along the normal the pixel's square is two boxes, one after the other; none is let shrink to nothing.
-  const double a = std::max(std::fabs(normal.x), 1e-3);
-  const double b = std::max(std::fabs(normal.y), 1e-3);
-  const double far = 8 * view.sigma_px + 1;
+  const double fall_angle = view.fall_towards_deg * CV_PI / 180;
+  const cv::Point2d fall(std::cos(fall_angle) / view.size.width, std::sin(fall_angle) / view.size.height);
+  const cv::Point2d middle(view.size.width / 2.0, view.size.height / 2.0);
   cv::Mat photo(view.size, CV_32F);
   for (int row = 0; row < photo.rows; ++row) {
     for (int column = 0; column < photo.cols; ++column) {
-      const double d = (cv::Point2d(column, row) - view.through).dot(normal);
-      const auto ramp = [&](double t) { return BlurredRamp(d + t, view.sigma_px); };
-      double share = d > 0 ? 1 : 0;
-      if (std::fabs(d) < far) {
-        share = (ramp((a + b) / 2) - ramp((a - b) / 2) - ramp((b - a) / 2) + ramp(-(a + b) / 2)) / (a * b);
-      }
-      photo.at<float>(row, column) = static_cast<float>(view.dark + (view.light - view.dark) * share);
+      const cv::Point2d place(column, row);
+      const double along = (place - view.through).dot({-normal.y, normal.x}) * 2 / view.size.height;
+      const double distance = (place - view.through).dot(normal) + view.bow_px * along * along;
+      const double lit = 1 - view.fall * (place - middle).dot(fall);
+      const double share = EdgeRise(distance, view.sigma_px, view.normal_deg);
+      photo.at<float>(row, column) = static_cast<float>(lit * (view.dark + (view.light - view.dark) * share));
     }
   }
   return photo;
+}
+
+cv::Mat EncodeSrgb(const cv::Mat& light) {
+  cv::Mat stored(light.size(), CV_32F);
+  for (int row = 0; row < light.rows; ++row) {
+    for (int column = 0; column < light.cols; ++column) {
+      const double share = light.at<float>(row, column) / 255.0;
+      const double level = share <= 0.0031308 ? 12.92 * share : 1.055 * std::pow(share, 1 / 2.4) - 0.055;
+      stored.at<float>(row, column) = static_cast<float>(255 * level);
+    }
+  }
+  return stored;
 }
 
 cv::Mat DrawEdge(const EdgeView& view) {

@@ -45,10 +45,19 @@ struct EdgePhoto {
   double normal_deg = 5;             // from the columns' direction towards the rows': that way it gets lighter
   double sigma_px = 1.0;
   double dark = 47, light = 235;
+  double bow_px = 0;            // how far the edge's middle stands out against its ends, at the photo's sides
+  double fall = 0;              // share by which light falls across the photo, side to side
+  double fall_towards_deg = 0;  // from the columns' direction towards the rows'
 };
+
+/// How far an edge of this blur has risen, 0 to 1, in a square pixel whose middle lies so far from it.
+double EdgeRise(double distance, double sigma_px, double normal_deg);
 
 /// One edge at any turn, each pixel the exact integral of the blurred edge over its square. CV_32F, not rounded.
 cv::Mat DrawEdgePhoto(const EdgePhoto& view);
+
+/// Levels, CV_32F, of light on the same scale (0 to 255) as a camera encodes it (IEC 61966-2-1); not rounded.
+cv::Mat EncodeSrgb(const cv::Mat& light);
 
 /// Corners of a rectangle in order, its longer side turned by turn_deg from the rows' direction of counting (down),
 /// clockwise as seen.
