@@ -7,23 +7,12 @@
 #include "benchmarks/ratios.h"
 #include "chart/registration.h"
 #include "qvtester/tester.h"
+#include "unit_tests/drawing.h"
 #include "unit_tests/plain/surf.h"
 
 namespace {
 
-// Polygons, of which the second view is shifted.
-cv::Mat View(int shift) {
-  cv::RNG random(5);
-  cv::Mat scene(520, 680, CV_8UC1, cv::Scalar(128));
-  for (int i = 0; i < 500; ++i) {
-    std::vector<cv::Point> corners;
-    const cv::Point at(random.uniform(0, scene.cols), random.uniform(0, scene.rows));
-    for (int k = 0; k < 5; ++k) corners.push_back(at + cv::Point(random.uniform(-40, 40), random.uniform(-40, 40)));
-    cv::fillConvexPoly(scene, corners, cv::Scalar(random.uniform(0, 256)), cv::LINE_AA);
-  }
-  cv::GaussianBlur(scene, scene, {}, 1);
-  return scene(cv::Rect(20 + shift, 20, 640, 480)).clone();
-}
+cv::Mat View(int shift) { return DrawScene(5)(cv::Rect(20 + shift, 20, 640, 480)).clone(); }
 
 void GetUnwarpedImage(benchmark::State& state) {
   const cv::Mat reference = View(0);

@@ -4,6 +4,7 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
+#include "chart/image_list.h"
 #include "chart/registration.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
@@ -80,16 +81,21 @@ int QVTester::SetResource(QV_RESOURCE_INDEX index, std::vector<std::string> path
   return QV_SUCCESS;
 }
 
-cv::Mat QVTester::RebuildListImage(int i) {
-  const ImageList& list = kept_->image_list;
-  if (i < 0 || i >= list.projection.rows) CV_Error_(cv::Error::StsOutOfRange, ("the list holds no image %d", i));
+int UsableComponents(const QVTester::ImageList& list, int wanted) {
   // As many images span one direction less than their number: the last component's is rounding alone.
   constexpr float kNothing = 1e-6f;
   int components = 0;
-  while (components < std::min(list.components, list.eigenvectors.rows) &&
+  while (components < std::min(wanted, list.eigenvectors.rows) &&
          list.eigenvalues.at<float>(components) > kNothing * list.eigenvalues.at<float>(0)) {
     ++components;
   }
+  return components;
+}
+
+cv::Mat QVTester::RebuildListImage(int i) {
+  const ImageList& list = kept_->image_list;
+  if (i < 0 || i >= list.projection.rows) CV_Error_(cv::Error::StsOutOfRange, ("the list holds no image %d", i));
+  const int components = UsableComponents(list, list.components);
   cv::Mat row = list.mean.clone();
   if (components > 0) {
     row += list.projection.row(i).colRange(0, components) * list.eigenvectors.rowRange(0, components);

@@ -54,7 +54,7 @@ struct Setter {
     if (count < 0) return QV_ERROR_INVALID_ARGUMENT;
     auto records = std::make_unique<QVRegionRecord[]>(count);
     std::copy_n(Values<QVRegionRecord>(), count, records.get());
-    tester.*p.member = std::move(records);
+    tester.*p.member = {std::move(records), count};
     return QV_SUCCESS;
   }
   int operator()(const SharedTable& p) const {
@@ -89,7 +89,7 @@ struct Getter {
     return Copy(values.data(), sizeof(values));
   }
   int operator()(const RegionList& p) const {
-    const QVRegionRecord* records = (tester.*p.member).get();
+    const QVRegionRecord* records = (tester.*p.member).records.get();
     return Copy(&records, sizeof(void*));
   }
   int operator()(const SharedTable& p) const {

@@ -14,7 +14,7 @@ struct IntProperty { int QVTester::*member; int initial; };
 struct FloatProperty { float QVTester::*member; float initial; };
 struct FloatArray { float (QVTester::*member)[9]; std::array<float, 9> initial; };
 struct MatrixProperty { cv::Mat QVTester::*member; int rows, cols; std::array<float, 9> initial; };
-struct RegionList { std::unique_ptr<QVRegionRecord[]> QVTester::*member; int QVTester::*count; };
+struct RegionList { QVRegionList QVTester::*member; int QVTester::*count; };
 struct SharedTable { cv::Mat QVTester::*member; int length; };  // ints that stay in the caller's memory
 struct PatchValues { float (QVTester::*member)[72]; bool QVTester::*set; };
 using PropertyKind = std::variant<IntProperty, FloatProperty, FloatArray, MatrixProperty, RegionList, SharedTable,

@@ -58,9 +58,9 @@ inline constexpr QVTest kTests[] = {
     ROW(QV_TEST_VIDEO_FLASH, Of(34), Of(), nullptr),
     ROW(QV_TEST_VIDEO_RECORD, Of(35), Of(), nullptr),
     ROW(QV_TEST_VIDEO_PLAY, Of(34), Of(), nullptr),
-    ROW(QV_TEST_LED_LIGHT, Of(30), Of(), nullptr),
-    ROW(QV_TEST_TOUCH_PANEL_LED, Of(31), Of(), nullptr),
-    ROW(QV_TEST_TOUCH_PANEL_PRINT, Of(32, 36), Of(), nullptr),
+    ROW(QV_TEST_LED_LIGHT, Of(30), Of(), RUN(TestLEDLight())),
+    ROW(QV_TEST_TOUCH_PANEL_LED, Of(31), Of(), RUN(TestTouchPanelLED())),
+    ROW(QV_TEST_TOUCH_PANEL_PRINT, Of(32, 36), Of(), RUN(TestTouchPanelPrint())),
 };
 #undef RUN_QUIETLY
 #undef RUN

@@ -59,6 +59,9 @@ cv::Mat DrawEdgePhoto(const EdgePhoto& view);
 /// Levels, CV_32F, of light on the same scale (0 to 255) as a camera encodes it (IEC 61966-2-1); not rounded.
 cv::Mat EncodeSrgb(const cv::Mat& light);
 
+/// A textured scene with few repeats, CV_8UC1: polygons of all greys, blurred a little unless blur_px is 0.
+cv::Mat DrawScene(unsigned seed, cv::Size size = {680, 520}, int polygons = 500, double blur_px = 1);
+
 /// Corners of a rectangle in order, its longer side turned by turn_deg from the rows' direction of counting (down),
 /// clockwise as seen.
 std::array<cv::Point2d, 4> TurnedRectangle(cv::Point2d middle, double length, double width, double turn_deg);

@@ -3,6 +3,7 @@
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
+#include "unit_tests/drawing.h"
 #include "unit_tests/module_test.h"
 
 namespace {
@@ -10,20 +11,7 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 
-// A textured scene with few repeats, and a view of it: the part that a camera shifted by (dx, dy) sees.
-cv::Mat DrawScene(unsigned seed) {
-  cv::RNG random(seed);
-  cv::Mat scene(520, 680, CV_8UC1, cv::Scalar(128));
-  for (int i = 0; i < 500; ++i) {
-    const cv::Point at(random.uniform(0, scene.cols), random.uniform(0, scene.rows));
-    std::vector<cv::Point> corners;
-    for (int k = 0; k < 5; ++k) corners.push_back(at + cv::Point(random.uniform(-40, 40), random.uniform(-40, 40)));
-    cv::fillConvexPoly(scene, corners, cv::Scalar(random.uniform(0, 256)), cv::LINE_AA);
-  }
-  cv::GaussianBlur(scene, scene, {}, 1);
-  return scene;
-}
-
+// What a camera sees that is shifted by (dx, dy).
 cv::Mat View(const cv::Mat& scene, cv::Point shift) {
   return scene(cv::Rect(20 + shift.x, 20 + shift.y, 640, 480)).clone();
 }

@@ -2,26 +2,18 @@
 
 #include <gtest/gtest.h>
 
+#include "unit_tests/drawing.h"
 #include "unit_tests/plain/surf.h"
 
 namespace {
 
 // Noise of this grain, or polygons with sharp edges when it is 0.
 cv::Mat DrawTexture(unsigned seed, cv::Size size, double grain) {
-  cv::RNG random(seed);
-  cv::Mat picture(size, CV_8UC1, cv::Scalar(128));
-  if (grain > 0) {
-    random.fill(picture, cv::RNG::UNIFORM, 0, 256);
-    cv::GaussianBlur(picture, picture, {}, grain);
-    cv::normalize(picture, picture, 0, 255, cv::NORM_MINMAX);
-    return picture;
-  }
-  for (int i = 0; i < size.area() / 1000; ++i) {
-    std::vector<cv::Point> corners;
-    const cv::Point at(random.uniform(0, size.width), random.uniform(0, size.height));
-    for (int k = 0; k < 5; ++k) corners.push_back(at + cv::Point(random.uniform(-40, 40), random.uniform(-40, 40)));
-    cv::fillConvexPoly(picture, corners, cv::Scalar(random.uniform(0, 256)), cv::LINE_AA);
-  }
+  if (grain == 0) return DrawScene(seed, size, size.area() / 1000, 0);
+  cv::Mat picture(size, CV_8UC1);
+  cv::RNG(seed).fill(picture, cv::RNG::UNIFORM, 0, 256);
+  cv::GaussianBlur(picture, picture, {}, grain);
+  cv::normalize(picture, picture, 0, 255, cv::NORM_MINMAX);
   return picture;
 }
 

@@ -69,15 +69,19 @@ enum QV_RESOURCE_INDEX : int {
 /// A property, 0 to 94 with gaps. Those with a known meaning have names; any other number is cast.
 enum QV_PROPERTY_INDEX : int {
   QV_PROPERTY_COLOR_MATRIX = 52,             // float[9], row by row
+  QV_PROPERTY_DOT_THRESHOLD = 53,            // float, share of the local mean (tests 27 and 28)
+  QV_PROPERTY_DOT_RADIUS = 55,               // int, pixels (tests 27 and 28)
+  QV_PROPERTY_AREA_DISTANCE = 59,            // int, pixels: areas closer than this are merged (tests 27 to 29)
+  QV_PROPERTY_AREA_LEAST_PIXELS = 60,        // int: smaller areas are dropped (tests 27 to 29)
   QV_PROPERTY_CAMERA_MATRIX_0 = 62,          // float[9], row by row
   QV_PROPERTY_CAMERA_MATRIX_1 = 63,          // float[9], row by row
   QV_PROPERTY_DIST_COEFFS_0 = 64,            // float[5]: k1, k2, p1, p2, k3; reading gives nine floats
   QV_PROPERTY_DIST_COEFFS_1 = 65,            // float[5]: k1, k2, p1, p2, k3; reading gives nine floats
   QV_PROPERTY_REGION_COUNT_0 = 75,           // int; set before the list
-  QV_PROPERTY_REGION_LIST_0 = 76,            // records of five 32-bit fields
+  QV_PROPERTY_REGION_LIST_0 = 76,            // left, top, width, height, label of each (test 27)
   QV_PROPERTY_REGION_COUNT_1 = 77,           // int; set before the list
-  QV_PROPERTY_REGION_LIST_1 = 78,            // records of five 32-bit fields
-  QV_PROPERTY_LIST_COMPONENTS = 80,          // int
+  QV_PROPERTY_REGION_LIST_1 = 78,            // left, top, width, height, label of each (test 28)
+  QV_PROPERTY_LIST_COMPONENTS = 80,          // int: principal components of a rebuild (slot 36, test 29)
   QV_PROPERTY_STANDARD_BINARY_THR = 86,      // int, grey level
   QV_PROPERTY_FRONT_DUST_HISTOGRAM = 87,     // int[256], stays in the caller's memory
   QV_PROPERTY_DUST_HISTOGRAM = 88,           // int[256], stays in the caller's memory

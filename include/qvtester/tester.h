@@ -13,9 +13,15 @@
 #include "qvtester/resource.h"
 #include "qvtester/results.h"
 
-/// One record of the region lists (properties 76 and 78).
+/// One record of the region lists (properties 76 and 78): left, top, width, height in pixels, and a label.
 struct QVRegionRecord {
   std::int32_t fields[5];
+};
+
+/// A region list as it was set: its length stays, whatever the property that counted it is set to later.
+struct QVRegionList {
+  std::unique_ptr<QVRegionRecord[]> records;
+  int count = 0;
 };
 
 /// How a photo is turned to set its chart upright: about the middle of a square canvas of its longer side.
@@ -144,6 +150,23 @@ class QV_API QVTester {
   /// Tests 17 (main camera) and 21 (front): dark blobs in a photo of a plain, evenly lit target, and its grey-level
   /// histogram beside the reference (properties 88 and 87). With fake_mode the blobs are left out. Answers 1.
   int TestLensDust(bool front, bool fake_mode);
+  /// Tests 27 and 28: light, colour and dots of the photo in slot 30 or 31, into led_ or touch_led_, over each region
+  /// of property 76 or 78 (the first 75 or 77 of them), or over the whole photo without a list. Dots: DetectDot on the
+  /// grey levels of each region by itself (threshold 53, radius 55), merged within the distance of property 59 over the
+  /// whole photo; areas under 60 pixels are dropped. Over 20,000 separate spots are noise: logged, and not merged.
+  /// @return 1, or -98 when the slot is empty. @throws cv::Exception for a photo of another depth than 8 bits, and for
+  ///         a region that does not lie inside it.
+  int TestLEDLight();
+  int TestTouchPanelLED();
+  /// Test 29: the print in slot 32 against those of the list in slot 36, into the print_ fields and print_map_. The
+  /// photo (grey, median of 5 x 5) is registered onto the list's first picture (GetUnwarpedImage, RefineUnwarp), made
+  /// black and white about its mean and rebuilt from the list's mean and first principal components (property 80);
+  /// where it departs by more than half the range, after an opening of 3 x 3, is an error area, merged and dropped as
+  /// in test 27. What the photo does not show is not judged.
+  /// @return 1; -90 when it can't be registered, -98 when slot 32 is empty. @throws cv::Exception for another depth
+  /// than
+  ///         8 bits, and when slot 36 holds no list.
+  int TestTouchPanelPrint();
 
   // Checks outside the numbered tests.
   /// GetSFRFromImage on the photo in slot 17, for the MTF50 values alone; -98 when the slot is empty.
@@ -200,6 +223,14 @@ class QV_API QVTester {
   /// @throws cv::Exception for an empty picture or another depth.
   /// SURF (Bay et al. 2006), FLANN, and the affine map of the three best matches: chart/QVTester_Unwarp.cpp.
   int GetUnwarpedImage(cv::Mat reference, cv::Mat image, cv::Mat& unwarped);
+  /// Refines an affine map to a fraction of a pixel where it is right to some ten pixels: enhanced correlation
+  /// (Evangelidis, Psarakis 2008; cv::findTransformECC), from coarse pictures to fine ones of at most two megapixels.
+  ///
+  /// @param reference, image  CV_8UC1.
+  /// @param[in,out] map       2 x 3, CV_64F: reference coordinates to image coordinates; left as it is where the search
+  ///                          does not converge.
+  /// @return the correlation of the two where both are seen, up to 1; NaN where the search does not converge.
+  float RefineUnwarp(cv::Mat reference, cv::Mat image, cv::Mat& map);
   /// The good matches of the last registration that succeeded, drawn (CV_8UC3) when asked for; empty before the first.
   const cv::Mat& DrawUnwarpMatches();
 
@@ -394,6 +425,7 @@ class QV_API QVTester {
     cv::Mat gray, binary;
   };
   std::unique_ptr<Kept> kept_;
+  cv::Mat print_map_;  // of the last test 29 that answered 1: 2 x 3, CV_64F, the list's first picture to the photo
 
   // Constants that no property reaches.
   float param_f0_ = 0.3909f;
@@ -422,7 +454,7 @@ class QV_API QVTester {
   float prop_param_70_;
   int prop_param_71_, prop_param_74_;
   int prop_region_count_0_, prop_region_count_1_;
-  std::unique_ptr<QVRegionRecord[]> prop_region_list_0_, prop_region_list_1_;
+  QVRegionList prop_region_list_0_, prop_region_list_1_;
   float prop_param_79_;
   int prop_param_80_, prop_param_81_, prop_param_82_, prop_param_83_, prop_param_84_, prop_param_85_, prop_param_86_;
   cv::Mat prop_table_0_, prop_table_1_;  // 1 x 256, CV_32S, over the caller's memory

@@ -11,6 +11,7 @@
 #include <opencv2/core/hal/intrin.hpp>
 
 #include "qvtester/tester.h"
+#include "tests/camera/colour.h"
 
 namespace {
 
@@ -97,9 +98,10 @@ void QVTester::ConvertRGB2XYZ(int r, int g, int b, float& X, float& Y, float& Z)
   const float red = Linear(r);
   const float green = Linear(g);
   const float blue = Linear(b);
-  X = 0.4124f * red + 0.3576f * green + 0.1805f * blue;
-  Y = 0.2126f * red + 0.7152f * green + 0.0722f * blue;
-  Z = 0.0193f * red + 0.1192f * green + 0.9505f * blue;
+  const std::array<float, 3> xyz = LinearToXyz(red, green, blue);
+  X = xyz[0];
+  Y = xyz[1];
+  Z = xyz[2];
 }
 
 float QVTester::GetFValue(float t) {

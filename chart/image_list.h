@@ -1,0 +1,9 @@
+#ifndef QVTESTER_CHART_IMAGE_LIST_H_
+#define QVTESTER_CHART_IMAGE_LIST_H_
+
+#include "qvtester/tester.h"
+
+/// Of so many first principal components wanted, those that hold more than rounding.
+int UsableComponents(const QVTester::ImageList& list, int wanted);
+
+#endif  // QVTESTER_CHART_IMAGE_LIST_H_
