@@ -40,12 +40,14 @@ cv::Mat Shrunk(const cv::Mat& picture, double scale) {
 bool Overlap(const cv::Mat& map, cv::Size reference, cv::Size image) {
   constexpr int kGrid = 16;
   int seen = 0;
-  for (int i = 0; i < kGrid * kGrid; ++i) {
-    const double x = (i % kGrid + 0.5) * reference.width / kGrid;
-    const double y = (i / kGrid) * reference.height / kGrid;
-    const double u = map.at<double>(0, 0) * x + map.at<double>(0, 1) * y + map.at<double>(0, 2);
-    const double v = map.at<double>(1, 0) * x + map.at<double>(1, 1) * y + map.at<double>(1, 2);
-    seen += static_cast<int>(u >= 0 && v >= 0 && u < image.width && v < image.height);
+  for (int i = 0; i < kGrid; ++i) {
+    for (int k = 0; k < kGrid; ++k) {
+      const double x = (i + 0.5) * reference.width / kGrid;
+      const double y = (k + 0.5) * reference.height / kGrid;
+      const double u = map.at<double>(0, 0) * x + map.at<double>(0, 1) * y + map.at<double>(0, 2);
+      const double v = map.at<double>(1, 0) * x + map.at<double>(1, 1) * y + map.at<double>(1, 2);
+      seen += static_cast<int>(u >= 0 && v >= 0 && u < image.width && v < image.height);
+    }
   }
   return seen >= kGrid * kGrid / 4;
 }
@@ -87,14 +89,14 @@ float QVTester::RefineUnwarp(cv::Mat reference, cv::Mat image, cv::Mat& map) {
   }
   constexpr auto kNone = std::numeric_limits<float>::quiet_NaN();
   if (!Overlap(map, reference.size(), image.size())) return kNone;
-  double finest = 1;
-  while (reference.total() * finest * finest > kFinest) finest /= 2;
-  double scale = finest;
+  int finest = 0;  // halvings
+  while (std::ldexp(static_cast<double>(reference.total()), -2 * finest) > kFinest) ++finest;
   const int side = std::min({reference.rows, reference.cols, image.rows, image.cols});
-  for (int i = 0; i < kMostHalvings && side * scale / 2 >= kCoarsest; ++i) scale /= 2;
+  int halvings = finest;
+  while (halvings < finest + kMostHalvings && (side >> (halvings + 1)) >= kCoarsest) ++halvings;
   cv::Mat found = map.clone();
   double correlation = kNone;
-  for (; scale <= finest; scale *= 2) correlation = Climb(reference, image, scale, found);
+  for (; halvings >= finest; --halvings) correlation = Climb(reference, image, std::ldexp(1.0, -halvings), found);
   if (std::isnan(correlation) || !Overlap(found, reference.size(), image.size())) return kNone;
   if (!ShowsAnything(image, found, reference.size())) return kNone;
   map = found;

@@ -76,8 +76,8 @@ ErrorAreas FindErrorAreas(QVTester& tester, const char* test, const cv::Mat& fla
     Merge(tester, flagged.size(), spots);
   }
   ErrorAreas found;
-  found.areas.reset(new QVRECT[spots.size()]);
-  found.pixels.reset(new int[spots.size()]);
+  found.areas = std::make_unique<QVRECT[]>(spots.size());
+  found.pixels = std::make_unique<int[]>(spots.size());
   for (const Spot& spot : spots) {
     if (spot.pixels < tester.prop_param_60_) continue;
     found.areas[found.count] = {spot.first.x, spot.first.y, spot.last.x, spot.last.y};
