@@ -47,7 +47,7 @@ void DeclareCamera(Options& command, CameraModel& c) {
 CommandBody DeclareSimulate(Options& command) {
   struct Options : SimulationOptions {
     Output output;
-    std::string size = "4000x3000", cast = "1,1,1", smear = "0,0", motion = "4,0";
+    std::string size = "4000x3000", cast = "1,1,1", smear = "0,0", motion = "4,0", tint = "1,1,1";
   };
   auto o = std::make_shared<Options>();
   command.Text("-o,--output", o->output.path,
@@ -57,7 +57,7 @@ CommandBody DeclareSimulate(Options& command) {
   command.Choice("--scene", o->scene, SceneNames(),
                  "What stands before the camera: the sharpness chart, the three marks of an "
                  "aiming target, two preview frames of a moving chart, a plain target seen through dust, two photos of "
-                 "a textured scene, a lit panel with dots in high dynamic range",
+                 "a textured scene, a lit panel with dots in high dynamic range, a phone's display",
                  "SCENE");
   command.Text("--size", o->size, "Pixels of the photo", "WxH");
   DeclareCamera(command, o->camera);
@@ -80,6 +80,14 @@ CommandBody DeclareSimulate(Options& command) {
   command.Whole("--dots", o->dots, 0, 100'000, "hdr: number of dots, half of them bright, half dark", "N");
   command.Whole("--dot-size", o->dot_px, 1, 1000, "hdr: side of a dot", "PX");
   command.Number("--dot-contrast", o->dot_contrast, 0, 1, "hdr: how much brighter or darker than the panel", "SHARE");
+  command.Choice("--pattern", o->display.pattern, kDisplayPatterns, "display: what it shows", "PATTERN");
+  command.Number("--surround", o->display.surround, 0, 255, "display: level of what lies around it", "LEVEL");
+  command.Number("--bezel", o->display.bezel, 0, 400, "display: its dark rim, of a width of 1600", "UNITS");
+  command.Text("--tint", o->tint, "display: factors on the red, green and blue that it shows", "R,G,B");
+  command.Number("--dim-corner", o->dim_corner, 0, 1, "display: share of the light that its first corner lacks",
+                 "SHARE");
+  command.Whole("--defects", o->defects, 0, 1000, "display: black points, or white ones in black", "N");
+  command.Number("--defect-size", o->display.defect_side, 0.5, 100, "display: their side, of a width of 1600", "UNITS");
   command.Choice("--bits", o->output.bits, {8, 16}, "Bits a channel, 8 or 16", "N");
   command.Whole("--quality", o->output.jpeg_quality, 1, 100, "Quality of a JPEG file", "N");
   command.Flag("--quiet", o->output.quiet, "Print nothing");
@@ -88,6 +96,8 @@ CommandBody DeclareSimulate(Options& command) {
     const std::vector<double> cast = ParseNumbers("--cast", o->cast, 3, 0, 16);
     const std::vector<double> smear = ParseNumbers("--smear", o->smear, 2, -100, 100);
     const std::vector<double> motion = ParseNumbers("--motion", o->motion, 2, -30000, 30000);
+    const std::vector<double> tint = ParseNumbers("--tint", o->tint, 3, 0, 4);
+    o->display.tint = {tint[0], tint[1], tint[2]};
     o->camera.cast = {cast[0], cast[1], cast[2]};
     o->camera.smear_px = {smear[0], smear[1]};
     o->motion_px = {motion[0], motion[1]};

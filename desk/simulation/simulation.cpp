@@ -11,6 +11,7 @@
 #include "desk/base/text.h"
 #include "desk/scenes/charts.h"
 #include "desk/scenes/targets.h"
+#include "desk/simulation/display_photo.h"
 #include "desk/simulation/method_law.h"
 
 namespace qv {
@@ -281,8 +282,9 @@ struct SceneRow {
   Simulation (*simulate)(const SimulationOptions& options);
 };
 
-constexpr SceneRow kScenes[] = {{"chart", ChartPhoto}, {"target", TargetPhoto}, {"preview", PreviewFrames},
-                                {"dust", DustPhoto},   {"pair", PhotoPair},     {"hdr", HdrCapture}};
+constexpr SceneRow kScenes[] = {{"chart", ChartPhoto},    {"target", TargetPhoto}, {"preview", PreviewFrames},
+                                {"dust", DustPhoto},      {"pair", PhotoPair},     {"hdr", HdrCapture},
+                                {"display", DisplayPhoto}};
 
 }  // namespace
 

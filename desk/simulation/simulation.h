@@ -7,6 +7,7 @@
 
 #include "desk/base/json.h"
 #include "desk/scenes/charts.h"
+#include "desk/scenes/display.h"
 #include "desk/simulation/camera.h"
 
 namespace qv {
@@ -28,6 +29,9 @@ struct SimulationOptions {
   int dots = 100;                  // hdr
   int dot_px = 1;                  // side of a dot
   double dot_contrast = 0.5;       // how much brighter, or darker, than the panel
+  DisplayStyle display;
+  int defects = 0;        // display: points at random places
+  double dim_corner = 0;  // display: share of the light that its first corner lacks
 };
 
 struct Simulation {             // NOLINT(bugprone-exception-escape): moving Json does not throw

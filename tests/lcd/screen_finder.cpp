@@ -549,6 +549,25 @@ Line Through(std::vector<cv::Point2d> points, const Line& coarse) {
   return line;
 }
 
+// Without what lies beyond a narrow bezel: outside, where the level comes back by more than a 25th of the step.
+void CutAtNextEdge(std::vector<Sample>& profile) {
+  constexpr std::size_t kMean = 3;
+  const double inside = profile.front().level;
+  const auto depth = [&](std::size_t i) {  // of kMean samples from i on, below or above the inside
+    double sum = 0;
+    for (std::size_t k = i; k < i + kMean; ++k) sum += profile[k].level / kMean;
+    return std::abs(inside - sum);
+  };
+  double deepest = 0;
+  for (std::size_t i = profile.size() / 2; i + kMean <= profile.size(); ++i) {
+    deepest = std::max(deepest, depth(i));
+    if (depth(i) > 0.96 * deepest) continue;
+    while (i > profile.size() / 2 && depth(i - 1) < 0.99 * deepest) --i;
+    profile.resize(i + 1);
+    return;
+  }
+}
+
 // Of the profiles of one piece by channel, the one with the highest step: the brightest channel at each place would
 // bend the profile where noise decides which that is.
 std::vector<Sample> BestProfile(const std::vector<Levels>& channels, cv::Point2d from, cv::Point2d to, const Line& line,
@@ -566,6 +585,7 @@ std::vector<Sample> BestProfile(const std::vector<Levels>& channels, cv::Point2d
     highest = step;
     best.swap(profile);
   }
+  CutAtNextEdge(best);
   return best;
 }
 
