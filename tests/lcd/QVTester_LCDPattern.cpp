@@ -135,9 +135,9 @@ void ClusterDots(const QVTester_LCD& rules, const cv::Mat& mask, QVLcdResult& re
   const int found = cv::connectedComponentsWithStats(mask, labels, boxes, centres, 8) - 1;
   if (found > kMost) QVDEBUGP("[%s] %d groups of dots, of which the first %d count", "JudgePattern", found, kMost);
   const int count = std::min(found, kMost);
-  int* counts = Array<int>(count);
-  cv::Point* first = Array<cv::Point>(count);
-  cv::Point* last = Array<cv::Point>(count);
+  auto* counts = Array<int>(count);
+  auto* first = Array<cv::Point>(count);
+  auto* last = Array<cv::Point>(count);
   std::vector<int> areas(count);
   for (int i = 0; i < count; ++i) {
     const int* const box = boxes.ptr<int>(i + 1);

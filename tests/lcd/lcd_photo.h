@@ -27,8 +27,10 @@ int GuardedLcd(const char* name, Call&& call) noexcept {
     return e.code == cv::Error::StsNoMem ? QV_ERROR_INTERNAL : QV_ERROR_UNUSABLE_INPUT;
   } catch (const std::exception& e) {
     QVDEBUGP("[%s] %s", name, e.what());
-    return QV_ERROR_INTERNAL;
+  } catch (...) {
+    QVDEBUGP("[%s] unknown exception", name);
   }
+  return QV_ERROR_INTERNAL;
 }
 
 #endif  // QV_TESTS_LCD_LCD_PHOTO_H_

@@ -99,7 +99,8 @@ std::vector<Quad> QuadsOf(const std::vector<cv::Point>& hull) {
   std::vector<Quad> quads;
   const double perimeter = cv::arcLength(hull, true);
   std::vector<cv::Point> rough;
-  for (double share = 0.01; share < 0.1 && quads.empty(); share *= 1.5) {
+  for (const double share : {0.01, 0.015, 0.022, 0.034, 0.05, 0.076}) {
+    if (!quads.empty()) break;
     cv::approxPolyDP(hull, rough, share * perimeter, true);
     if (rough.size() == 4) quads.push_back(InOrder({rough[0], rough[1], rough[2], rough[3]}));
     if (rough.size() < 4) break;
