@@ -35,18 +35,15 @@ bool LeavesPixels(const UprightTurn& turn, const cv::Mat& picture) {
          (depth == CV_8U || depth == CV_16U || depth == CV_16S) && std::max(picture.cols, picture.rows) < SHRT_MAX;
 }
 
+// The map in single precision times (column, row, 1), each product and sum rounded in this order: the coordinate is
+// truncated, so a build of OpenCV that fuses them in its matrix product could move a mark by a pixel.
 void CarryMarks(const UprightTurn& turn, std::vector<cv::Point>& marks) {
-  cv::Mat places(3, 3, CV_32F);  // a column per mark: column, row, 1
-  for (int k = 0; k < 3; ++k) {
-    places.at<float>(0, k) = static_cast<float>(marks[k].y);
-    places.at<float>(1, k) = static_cast<float>(marks[k].x);
-    places.at<float>(2, k) = 1.0f;
-  }
-  cv::Mat map;
-  turn.map.convertTo(map, CV_32F);
-  const cv::Mat moved = map * places;
-  for (int k = 0; k < 3; ++k) {
-    marks[k] = {static_cast<int>(moved.at<float>(1, k)), static_cast<int>(moved.at<float>(0, k))};
+  const cv::Matx23f map(cv::Matx23d{turn.map});
+  for (std::size_t k = 0; k < kMarks; ++k) {
+    const auto column = static_cast<float>(marks[k].y);
+    const auto row = static_cast<float>(marks[k].x);
+    const auto carried = [&](int i) { return static_cast<int>(map(i, 0) * column + map(i, 1) * row + map(i, 2)); };
+    marks[k] = {carried(1), carried(0)};
   }
 }
 

@@ -6,6 +6,7 @@
 
 #include <cstdint>
 #include <cstring>
+#include <opencv2/core.hpp>
 #include <opencv2/core/hal/intrin.hpp>
 
 namespace {

@@ -7,6 +7,7 @@
 #include "chart/region_warp.h"
 
 #include <algorithm>
+#include <opencv2/core.hpp>
 #include <opencv2/core/hal/intrin.hpp>
 #include <opencv2/imgproc.hpp>
 #include <vector>

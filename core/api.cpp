@@ -2,6 +2,7 @@
 
 #include "qvtester/api.h"
 
+#include <memory>
 #include <opencv2/core.hpp>
 
 #include "qvtester/log.h"
@@ -26,9 +27,11 @@ int CodeOfException(const char* name) noexcept {
   return QV_ERROR_INTERNAL;
 }
 
+// Without a tester that is the answer, whatever the arguments.
 template <typename Call>
-int Guarded(const char* name, Call&& call) noexcept {
+int Guarded(const char* name, bool valid, Call&& call) noexcept {
   if (theTester == nullptr) return QV_ERROR_NO_TESTER;
+  if (!valid) return QV_ERROR_INVALID_ARGUMENT;
   try {
     return call(*theTester);
   } catch (...) {
@@ -40,8 +43,11 @@ int Guarded(const char* name, Call&& call) noexcept {
 
 int InitTestModule() {
   try {
-    if (theTester == nullptr) theTester = new QVTester();
-    return theTester->Initialize();
+    if (theTester != nullptr) return theTester->Initialize();
+    auto fresh = std::make_unique<QVTester>();
+    const int code = fresh->Initialize();
+    theTester = fresh.release();  // only when it is complete
+    return code;
   } catch (...) {
     return CodeOfException("InitTestModule");
   }
@@ -55,105 +61,100 @@ int FinalizeTestModule() {
 }
 
 int RunTest(QV_TEST_INDEX test, bool fake_mode) {
-  return Guarded("RunTest", [&](QVTester& tester) { return tester.RunTest(test, fake_mode); });
+  return Guarded("RunTest", true, [&](QVTester& tester) { return tester.RunTest(test, fake_mode); });
 }
 
 int SetLDRResource(QV_RESOURCE_INDEX index, int width, int height, unsigned short* data) {
-  if (width < 1 || height < 1 || data == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("SetLDRResource", [&](QVTester& tester) { return tester.SetResource(index, width, height, data); });
+  return Guarded("SetLDRResource", width > 0 && height > 0 && data != nullptr,
+                 [&](QVTester& tester) { return tester.SetResource(index, width, height, data); });
 }
 
 int SetHDRResource(QV_RESOURCE_INDEX index, int width, int height, bool flag, float* data) {
-  if (width < 1 || height < 1 || data == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("SetHDRResource",
+  return Guarded("SetHDRResource", width > 0 && height > 0 && data != nullptr,
                  [&](QVTester& tester) { return tester.SetHDRResource(index, width, height, flag, data); });
 }
 
 int SetResource(QV_RESOURCE_INDEX index, char* path) {
-  if (path == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("SetResource", [&](QVTester& tester) { return tester.SetResource(index, path); });
+  return Guarded("SetResource", path != nullptr, [&](QVTester& tester) { return tester.SetResource(index, path); });
 }
 
 int SetResource(QV_RESOURCE_INDEX index, int width, int height, void* data) {
-  if (width < 1 || height < 1 || data == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("SetResource", [&](QVTester& tester) { return tester.SetResource(index, width, height, data); });
+  return Guarded("SetResource", width > 0 && height > 0 && data != nullptr,
+                 [&](QVTester& tester) { return tester.SetResource(index, width, height, data); });
 }
 
 int SetResourceWithList(QV_RESOURCE_INDEX index, std::vector<std::string> paths) {
-  return Guarded("SetResourceWithList", [&](QVTester& tester) { return tester.SetResource(index, paths); });
+  return Guarded("SetResourceWithList", true, [&](QVTester& tester) { return tester.SetResource(index, paths); });
 }
 
 int SetResourceWithLDRs(QV_RESOURCE_INDEX index, int width, int height, bool flag, unsigned short* first,
                         unsigned short* second, unsigned short* third, unsigned short* fourth) {
-  return Guarded("SetResourceWithLDRs", [&](QVTester& tester) {
+  return Guarded("SetResourceWithLDRs", true, [&](QVTester& tester) {
     return tester.SetResource(index, width, height, flag, first, second, third, fourth);
   });
 }
 
 int GetImage(QV_RESOURCE_INDEX index, int* width, int* height, unsigned char** data) {
-  return Guarded("GetImage", [&](QVTester& tester) { return tester.GetLDRImage(index, width, height, data); });
+  return Guarded("GetImage", true, [&](QVTester& tester) { return tester.GetLDRImage(index, width, height, data); });
 }
 
 int SaveHDRImage(QV_RESOURCE_INDEX index, char* path) {
-  return Guarded("SaveHDRImage", [&](QVTester& tester) { return tester.SaveHDRImage(index, path); });
+  return Guarded("SaveHDRImage", true, [&](QVTester& tester) { return tester.SaveHDRImage(index, path); });
 }
 
 int GetResult(QVResultData** out) {
-  if (out == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("GetResult", [&](QVTester& tester) { return tester.GetResult(out); });
+  return Guarded("GetResult", out != nullptr, [&](QVTester& tester) { return tester.GetResult(out); });
 }
 
 int SetProperty(QV_PROPERTY_INDEX index, void* value) {
-  if (value == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("SetProperty", [&](QVTester& tester) { return tester.SetProperty(index, value); });
+  return Guarded("SetProperty", value != nullptr, [&](QVTester& tester) { return tester.SetProperty(index, value); });
 }
 
 int GetProperty(QV_PROPERTY_INDEX index, void* out) {
-  if (out == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("GetProperty", [&](QVTester& tester) { return tester.GetProperty(index, out); });
+  return Guarded("GetProperty", out != nullptr, [&](QVTester& tester) { return tester.GetProperty(index, out); });
 }
 
 int ReleaseDataForTest(QV_TEST_INDEX test) {
-  return Guarded("ReleaseDataForTest", [&](QVTester& tester) { return tester.ReleaseDataForTest(test); });
+  return Guarded("ReleaseDataForTest", true, [&](QVTester& tester) { return tester.ReleaseDataForTest(test); });
 }
 
 int ReleaseImage(QV_RESOURCE_INDEX index) {
-  return Guarded("ReleaseImage", [&](QVTester& tester) { return tester.ReleaseImage(index); });
+  return Guarded("ReleaseImage", true, [&](QVTester& tester) { return tester.ReleaseImage(index); });
 }
 
 int ReleaseTestResult(QV_TEST_INDEX test) {
-  return Guarded("ReleaseTestResult", [&](QVTester& tester) { return tester.ReleaseTestResult(test); });
+  return Guarded("ReleaseTestResult", true, [&](QVTester& tester) { return tester.ReleaseTestResult(test); });
 }
 
 int SetStep(int step) {
-  return Guarded("SetStep", [&](QVTester& tester) { return tester.SetStep(step); });
+  return Guarded("SetStep", true, [&](QVTester& tester) { return tester.SetStep(step); });
 }
 
 int CheckMTF(float* mtf50Vertical, float* mtf50Horizontal) {
-  if (mtf50Vertical == nullptr || mtf50Horizontal == nullptr) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("CheckMTF", [&](QVTester& tester) { return tester.CheckMTF(mtf50Vertical, mtf50Horizontal); });
+  return Guarded("CheckMTF", mtf50Vertical != nullptr && mtf50Horizontal != nullptr,
+                 [&](QVTester& tester) { return tester.CheckMTF(mtf50Vertical, mtf50Horizontal); });
 }
 
 int CheckPatternCircles(int cam_id) {
-  return Guarded("CheckPatternCircles", [&](QVTester& tester) { return tester.CheckPatternCircles(cam_id); });
+  return Guarded("CheckPatternCircles", true, [&](QVTester& tester) { return tester.CheckPatternCircles(cam_id); });
 }
 
 int SavePreview(void* data, int frame, int width, int height) {
-  if (data == nullptr || width < 1 || height < 1) return QV_ERROR_INVALID_ARGUMENT;
-  return Guarded("SavePreview", [&](QVTester& tester) {
+  return Guarded("SavePreview", data != nullptr && width > 0 && height > 0, [&](QVTester& tester) {
     tester.SavePreview(data, frame, width, height);
     return QV_SUCCESS;
   });
 }
 
 int TestCameraCapture(bool front) {
-  return Guarded("TestCameraCapture", [&](QVTester& tester) { return tester.TestCameraCapture(front); });
+  return Guarded("TestCameraCapture", true, [&](QVTester& tester) { return tester.TestCameraCapture(front); });
 }
 
 int setWorkingBinaryThresh(int value) {
-  return Guarded("setWorkingBinaryThresh", [&](QVTester& tester) { return tester.setWorkingBinaryThresh(value); });
+  return Guarded("setWorkingBinaryThresh", true,
+                 [&](QVTester& tester) { return tester.setWorkingBinaryThresh(value); });
 }
 
 int getWorkingBinaryThresh() {
-  return Guarded("getWorkingBinaryThresh", [](QVTester& tester) { return tester.getWorkingBinaryThresh(); });
+  return Guarded("getWorkingBinaryThresh", true, [](QVTester& tester) { return tester.getWorkingBinaryThresh(); });
 }

@@ -1,5 +1,6 @@
 #include <gmock/gmock.h>
 
+#include <climits>
 #include <opencv2/imgproc.hpp>
 
 #include "chart/chart_layout.h"
@@ -135,6 +136,24 @@ TEST_F(Capture, MissesInEitherPhotoStoreNothing) {
   Load(17, cv::Mat(50, 50, CV_16UC3, cv::Scalar::all(9)));
   EXPECT_EQ(-95, TestCameraCapture(false));
   EXPECT_EQ(0, Main().capture_lab_count_);
+}
+
+TEST_F(Capture, ChartsThatOpenCvCannotCutAreRefused) {  // as the whole upright picture and its patches would be
+  cv::Mat tiny;
+  cv::cvtColor(DrawMarks({60, 60}, 1, {{10, 10}, {10, 20}, {20, 10}}), tiny, cv::COLOR_GRAY2BGR);
+  const cv::Mat wide(DrawChart({3, 0, 0.04, {SHRT_MAX, 360}, 0.5}));
+  for (const cv::Mat& refused : {tiny, wide}) {
+    Load(17, refused);
+    EXPECT_EQ(-95, TestCameraCapture(false)) << refused.size;
+    EXPECT_EQ(3u, theTester->kept_->chart.marks.size()) << "found, but of no use";
+    Load(17, DrawChart());
+    Load(18, refused);
+    EXPECT_EQ(-95, TestCameraCapture(false)) << refused.size << " as the standard";
+    EXPECT_FALSE(theTester->kept_->standard_main.is_extracted);
+  }
+  EXPECT_EQ(nullptr, Main().capture_lab_);
+  Load(18, wide.colRange(0, SHRT_MAX - 1));
+  EXPECT_EQ(1, TestCameraCapture(false));
 }
 
 }  // namespace

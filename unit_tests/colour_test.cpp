@@ -70,6 +70,7 @@ TEST(Colour, TemperaturesAreThePublishedOnes) {  // CIE 15's A, D50, D65, D75 an
   for (const auto& xyz : {std::array{0.0f, 0.0f, 0.0f}, {NAN, 1.0f, 1.0f}, {1.0f, -1.0f, 0.0f}}) {
     EXPECT_EQ(0.0f, Temperature(xyz));
   }
+  EXPECT_EQ(5550.0f, Temperature({0.333083928f, 0.464719504f, 0.202196568f})) << "in double it is not 5550";
   // x = 0.331 in single precision belongs to the cool side: sums that are exact, so that x is the quotient itself.
   EXPECT_NEAR(Temperature(0.331f, 0.34f), Temperature(0.33f, 0.34f), 60);
 }

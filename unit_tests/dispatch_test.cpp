@@ -1,5 +1,8 @@
 #include <gmock/gmock.h>
 
+#include <set>
+
+#include "unit_tests/failing_new.h"
 #include "unit_tests/module_test.h"
 
 namespace {
@@ -68,11 +71,25 @@ TEST_F(Dispatch, RecordsOwnTheirArrays) {  // the address sanitizer sees what is
 }
 
 TEST_F(Dispatch, ReleasingATestsDataEmptiesItsSlots) {
-  for (const int slot : {0, 1, 2, 3, 14, 17}) Fill(slot);
-  EXPECT_EQ(1, ReleaseDataForTest(Index(1)));  // slot 0 as well
-  for (const int refused : {3, 13, 14, 29, 30, -1}) EXPECT_EQ(-97, ReleaseDataForTest(Index(refused)));
-  for (const int slot : {0, 2, 3}) EXPECT_EQ(nullptr, theTester->resources_[slot]) << slot;
-  for (const int slot : {1, 14, 17}) EXPECT_NE(nullptr, theTester->resources_[slot]) << slot;
+  const std::vector<std::set<int>> releases = {{0, 1}, {0, 2, 3}, {4},  {},   {4},  {13},  {4},
+                                               {4},    {9},       {10}, {11}, {12}, {7, 8}};
+  for (int test = -1; test <= 30; ++test) {
+    InitTestModule();
+    for (int slot = 0; slot < QVTester::kSlotCount; ++slot) Fill(slot);
+    const std::set<int> emptied = test >= 0 && test <= 12 ? releases[test] : std::set<int>();
+    EXPECT_EQ(emptied.empty() ? -97 : 1, ReleaseDataForTest(Index(test))) << "test " << test;
+    for (int slot = 0; slot < QVTester::kSlotCount; ++slot) {
+      EXPECT_EQ(emptied.count(slot) == 1, theTester->resources_[slot] == nullptr) << "test " << test << ", " << slot;
+    }
+  }
+}
+
+TEST_F(Dispatch, ASecondSuccessTakesTheFirstOnesPlace) {  // the address sanitizer sees what the first one left
+  for (const int slot : {16, 17, 18, 23, 24, 25}) Load(slot, DrawChart());
+  for (const int slot : {14, 15, 19, 21, 22, 26}) Load(slot, cv::Mat(60, 80, CV_8UC3, cv::Scalar::all(180 + slot)));
+  for (int test = QV_TEST_CAMERA_PREVIEW; test <= QV_TEST_LENS_DUST_2; ++test) {
+    for (int run = 0; run < 2; ++run) EXPECT_EQ(1, RunTest(Index(test), false)) << "test " << test;
+  }
 }
 
 TEST_F(Dispatch, TheTesterOutlivesASecondInit) {
@@ -114,8 +131,33 @@ TEST(WithoutATester, EveryFunctionSaysSo) {
                           GetResult(&results), SetProperty(QV_PROPERTY_BINARY_THR_WORKING, &value),
                           ReleaseImage(QV_RESOURCE_HDR_FIRST), SetStep(1), CheckMTF(&value, &value),
                           getWorkingBinaryThresh(), GetImage(QV_RESOURCE_CHART_PHOTO, nullptr, nullptr, nullptr),
-                          SaveHDRImage(QV_RESOURCE_HDR_FIRST, nullptr)}),
+                          SaveHDRImage(QV_RESOURCE_HDR_FIRST, nullptr), SetResource(QV_RESOURCE_CHART_PHOTO, nullptr),
+                          SetLDRResource(QV_RESOURCE_CHART_PHOTO, 0, 0, nullptr), GetResult(nullptr),
+                          SetHDRResource(QV_RESOURCE_HDR_FIRST, 0, 0, true, nullptr), CheckMTF(nullptr, nullptr),
+                          SetResource(QV_RESOURCE_CHART_PHOTO, 0, 0, static_cast<void*>(nullptr)),
+                          SetProperty(QV_PROPERTY_BINARY_THR_WORKING, nullptr), SavePreview(nullptr, 0, 0, 0),
+                          GetProperty(QV_PROPERTY_BINARY_THR_WORKING, nullptr)}),
               Each(-96));
+}
+
+TEST(WithoutATester, HalfATesterIsNone) {
+  const auto init = [](int allocations) {
+    new_left = allocations;
+    const int code = InitTestModule();
+    new_left = -1;
+    return code;
+  };
+  QVResultData* results = nullptr;
+  int allowed = 0;
+  for (; init(allowed) != 1; ++allowed) {
+    ASSERT_LT(allowed, 100);
+    EXPECT_EQ(-96, GetResult(&results)) << allowed << " allocations";
+  }
+  EXPECT_GT(allowed, 2) << "nothing was refused";
+  EXPECT_EQ(1, GetResult(&results));
+  EXPECT_EQ(-99, init(0)) << "no memory for a new result block";
+  EXPECT_EQ(1, GetResult(&results)) << "the tester there is stays";
+  FinalizeTestModule();
 }
 
 }  // namespace

@@ -8,6 +8,7 @@
 #include <array>
 #include <cmath>
 #include <cstdlib>
+#include <opencv2/core.hpp>
 #include <opencv2/core/hal/intrin.hpp>
 
 #include "qvtester/tester.h"
@@ -43,22 +44,23 @@ float CoolTemperature(float xf, float yf) {
 }
 
 // Warm side, 0.331 < x <= 0.61; in double, A and k narrowed to float, the last power in single precision.
-float WarmTemperature(float xf, float yf) {
+double WarmTemperature(float xf, float yf) {
   const double x = xf;
   const auto a = static_cast<float>(xf <= 0.556f ? 2267.8 * x - 1702 : 1167.8 * x - 1080);
   const double e = std::exp((x - 0.331) / (0.1118 * x - 0.0928));
   const auto k = static_cast<float>(1282240.0 * std::pow(x - 0.29, 1.664) * std::exp(-15.69 * (x - 0.29)) + 3200.0);
   const float power = std::pow(yf, static_cast<float>(1 - e));
-  return static_cast<float>(a + static_cast<double>(k) * power);
+  return a + static_cast<double>(k) * power;
 }
 
 // Fits to either side of the pivot of 5550 K; breakpoints are held against x in single precision. Chromaticities are
-// clamped to 0 to 1, but no x beyond that is looked at further. Black pixels come as 0 / 0, and end here too.
+// clamped to 0 to 1, but no x beyond that is looked at further. Black pixels come as 0 / 0, and end here too. The warm
+// side is held against 5550 and 0 in double, and narrowed once.
 float Temperature(float x, float y) {
   if (!(x > 0 && x <= 0.61f)) return 0;
   y = std::clamp(y, 0.0f, 1.0f);
-  const float cct = x <= 0.331f ? CoolTemperature(x, y) : WarmTemperature(x, y);
-  return cct == 5550.0f || cct <= 0 ? 0 : cct;
+  const double cct = x <= 0.331f ? CoolTemperature(x, y) : WarmTemperature(x, y);
+  return cct == 5550.0 || cct <= 0 ? 0 : static_cast<float>(cct);
 }
 
 constexpr std::size_t kStretch = 64;

@@ -34,8 +34,9 @@ inline void NormalizePatternImage(QVTester& tester, const cv::Mat& image, std::v
   }
 }
 
-/// Both regions of a photo, CV_32F; empty when the chart does not show exactly three marks.
+/// Both regions of a photo, CV_32F; not found when the chart does not show exactly three marks.
 struct EdgeRegions {
+  bool found = false;
   cv::Mat vertical, horizontal;
 };
 
@@ -53,7 +54,7 @@ inline EdgeRegions CutEdgeRegions(QVTester& tester, const cv::Mat& photo) {
   cv::Point third;
   tester.SortPatternPoints(points, corner, second, third);
   const float scale = static_cast<float>(second.y - corner.y) / kChartSide;
-  EdgeRegions regions;
+  EdgeRegions regions = {true, {}, {}};
   normalized(PlaceRegion(kVerticalRegion, corner, scale)).convertTo(regions.vertical, CV_32F);
   normalized(PlaceRegion(kHorizontalRegion, corner, scale)).convertTo(regions.horizontal, CV_32F);
   return regions;
@@ -64,7 +65,7 @@ inline int GetSFRFromImage(QVTester& tester, const cv::Mat& photo, std::vector<f
                            std::vector<float>& sfrVertical, std::vector<float>& sfrHorizontal, float& mtf50Vertical,
                            float& mtf50Horizontal) {
   const EdgeRegions regions = CutEdgeRegions(tester, photo);
-  if (regions.vertical.empty()) return QV_ERROR_PATTERN_NOT_FOUND;
+  if (!regions.found) return QV_ERROR_PATTERN_NOT_FOUND;
   CalculateSFR(tester, regions.vertical, freq, sfrVertical, mtf50Vertical);
   std::vector<float> same_freq;
   CalculateSFR(tester, regions.horizontal, same_freq, sfrHorizontal, mtf50Horizontal);

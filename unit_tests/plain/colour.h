@@ -40,13 +40,13 @@ inline float CoolTemperature(float xf, float yf) {
 }
 
 // Warm side, 0.331 < x <= 0.61; in double, A and k narrowed to float, the last power in single precision.
-inline float WarmTemperature(float xf, float yf) {
+inline double WarmTemperature(float xf, float yf) {
   const double x = xf;
   const auto a = static_cast<float>(xf <= 0.556f ? 2267.8 * x - 1702 : 1167.8 * x - 1080);
   const double e = std::exp((x - 0.331) / (0.1118 * x - 0.0928));
   const auto k = static_cast<float>(1282240.0 * std::pow(x - 0.29, 1.664) * std::exp(-15.69 * (x - 0.29)) + 3200.0);
   const float power = std::pow(yf, static_cast<float>(1 - e));
-  return static_cast<float>(a + static_cast<double>(k) * power);
+  return a + static_cast<double>(k) * power;
 }
 
 // Fits to either side of the pivot of 5550 K; breakpoints are held against x in single precision.
@@ -56,8 +56,8 @@ inline float Temperature(float X, float Y, float Z) {
   const float x = std::clamp(X / sum, 0.0f, 1.0f);
   const float y = std::clamp(Y / sum, 0.0f, 1.0f);
   if (!(x > 0 && x <= 0.61f)) return 0;
-  const float cct = x <= 0.331f ? CoolTemperature(x, y) : WarmTemperature(x, y);
-  return cct == 5550.0f || cct <= 0 ? 0 : cct;
+  const double cct = x <= 0.331f ? CoolTemperature(x, y) : WarmTemperature(x, y);
+  return cct == 5550.0 || cct <= 0 ? 0 : static_cast<float>(cct);
 }
 
 inline void xyz2cct(const float* xyz, std::size_t pixels, float* cct) {
