@@ -26,7 +26,7 @@ cv::Mat& Capture() {
   random.fill(capture, cv::RNG::UNIFORM, 0.98, 1.02);
   for (int x = 0; x < kSize.width; ++x) capture.col(x) *= 200 - 0.02 * x;
   for (int i = 0; i < 300; ++i) {
-    capture.at<cv::Vec3f>(random.uniform(0, kSize.height), random.uniform(0, kSize.width)) = {400, 400, 400};
+    capture.at<cv::Vec3f>(cv::Point{random.uniform(0, kSize.width), random.uniform(0, kSize.height)}) = {400, 400, 400};
   }
   return capture;
 }

@@ -77,8 +77,10 @@ TEST(Dots, AreThoseOfTheWholeTable) {
     const float spread = std::ldexp(1.0f, -random.uniform(0, 24));
     for (int i = 0; i < height * width; ++i) capture.data[3 * i] *= 1 + spread * random.uniform(0.0f, 1.0f);
     const float other = random.uniform(0, 2) == 0 ? kLevels[random.uniform(0, 10)] : kOdd[random.uniform(0, 9)];
-    for (int n = random.uniform(0, 4); n > 0; --n)
-      capture.at(random.uniform(0, height), random.uniform(0, width)) = other;
+    for (int n = random.uniform(0, 4); n > 0; --n) {
+      const int row = random.uniform(0, height);
+      capture.at(row, random.uniform(0, width)) = other;
+    }
     const float threshold = random.uniform(0, 2) == 0 ? spread : kThresholds[random.uniform(0, 13)];
     std::vector<unsigned char> expected(capture.data.size() / 3, 7);  // what is not flagged is not written
     std::vector<unsigned char> mask = expected;
@@ -166,8 +168,8 @@ TEST(Areas, ChangedAreasAreAllThatNeedsASecondLook) {
     const int width = any.uniform(2, 301);
     const int height = any.uniform(2, 201);
     for (int n = any.uniform(2, 151); n > 0; --n) {
-      const cv::Point at(any.uniform(0, width), any.uniform(0, height));
-      const cv::Point size(any.uniform(0, 9), any.uniform(0, 40) == 0 ? 59 : any.uniform(0, 9));
+      const cv::Point at{any.uniform(0, width), any.uniform(0, height)};
+      const cv::Point size{any.uniform(0, 9), any.uniform(0, 40) == 0 ? 59 : any.uniform(0, 9)};
       areas.push_back({at, at + size, any.uniform(0, 10), 0});
     }
     const auto merged = plain::ClusterByTester(distance, width, height, areas);

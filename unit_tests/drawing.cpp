@@ -135,9 +135,9 @@ cv::Mat DrawScene(unsigned seed, cv::Size size, int polygons, double blur_px) {
   cv::RNG random(seed);
   cv::Mat scene(size, CV_8UC1, cv::Scalar(128));
   for (int i = 0; i < polygons; ++i) {
-    const cv::Point at(random.uniform(0, scene.cols), random.uniform(0, scene.rows));
+    const cv::Point at{random.uniform(0, scene.cols), random.uniform(0, scene.rows)};
     std::vector<cv::Point> corners;
-    for (int k = 0; k < 5; ++k) corners.push_back(at + cv::Point(random.uniform(-40, 40), random.uniform(-40, 40)));
+    for (int k = 0; k < 5; ++k) corners.push_back(at + cv::Point{random.uniform(-40, 40), random.uniform(-40, 40)});
     cv::fillConvexPoly(scene, corners, cv::Scalar(random.uniform(0, 256)), cv::LINE_AA);
   }
   if (blur_px > 0) cv::GaussianBlur(scene, scene, {}, blur_px);

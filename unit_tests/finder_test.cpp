@@ -170,8 +170,9 @@ cv::Mat Marks(cv::RNG& random) {
   cv::Mat canvas;
   cv::copyMakeBorder(image, canvas, margin, margin, margin, margin, cv::BORDER_CONSTANT);
   for (int marks = random.uniform(0, 7); marks > 0; --marks) {
-    DrawMark(canvas, random.uniform(margin / 2, image.rows + margin / 2),
-             random.uniform(margin / 2, image.cols + margin / 2), std::max(1, module + random.uniform(-1, 2)));
+    const int row = random.uniform(margin / 2, image.rows + margin / 2);
+    const int column = random.uniform(margin / 2, image.cols + margin / 2);
+    DrawMark(canvas, row, column, std::max(1, module + random.uniform(-1, 2)));
   }
   return canvas({margin, margin, std::min(width, image.cols), image.rows}).clone();
 }

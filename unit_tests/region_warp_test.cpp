@@ -30,8 +30,8 @@ TEST(RegionWarp, EveryPixelIsThatOfTheWholeWarpAtAllDegrees) {
     for (int degrees = 0; degrees < 360 && !HasFailure(); ++degrees) {
       cv::Mat image(size, degrees % 3 == 0 ? CV_8UC3 : CV_8UC1);
       cv::randu(image, 0, 256);
-      const cv::Point at(any.uniform(0, side), any.uniform(0, side));
-      const cv::Size part(any.uniform(1, side - at.x + 1), any.uniform(1, side - at.y + 1));
+      const cv::Point at{any.uniform(0, side), any.uniform(0, side)};
+      const cv::Size part{any.uniform(1, side - at.x + 1), any.uniform(1, side - at.y + 1)};
       ExpectPartsOfTheWhole(image, degrees,
                             {{0, 0, side, side},
                              {at, part},

@@ -152,7 +152,9 @@ void ExpectPlainOutcome(const cv::Mat& region, int round) {
 // Blurred edges of any slant, direction and polarity, noise, stripes and plain grey; part of a larger matrix.
 cv::Mat RandomRegion(cv::RNG& random) {
   const bool large = random.uniform(0, 10) == 0;
-  cv::Mat_<float> region(random.uniform(1, large ? 400 : 60), random.uniform(1, large ? 180 : 60));
+  const int rows = random.uniform(1, large ? 400 : 60);
+  const int cols = random.uniform(1, large ? 180 : 60);
+  cv::Mat_<float> region(rows, cols);
   random.fill(region, cv::RNG::NORMAL, 0, random.uniform(0, 3) == 0 ? 0 : random.uniform(0.0, 60.0));
   const double slope = random.uniform(0, 4) == 0 ? 0 : random.gaussian(0.2);
   const double place = region.cols * random.uniform(0.2, 0.8);
@@ -182,8 +184,8 @@ TEST(SfrForms, AgreeOnAnyRegion) {
     } else {
       levels.convertTo(region, CV_32F);
       for (int i = round % 2 == 0 ? round % 3 : 0; i > 0; --i) {
-        region.at<float>(random.uniform(0, region.rows), random.uniform(0, region.cols)) =
-            limits[random.uniform(0, 12)];
+        const cv::Point at{random.uniform(0, region.cols), random.uniform(0, region.rows)};
+        region.at<float>(at) = limits[random.uniform(0, 12)];
       }
     }
     ExpectPlainOutcome(region, round);
@@ -205,7 +207,7 @@ TEST(SfrForms, AgreeOnBinsOfAnySlope) {
   }
   for (const float slope : slopes) {
     for (const int fac : {1, 2, 4}) {
-      const cv::Mat part = region(cv::Rect(0, 0, random.uniform(1, 91), random.uniform(1, 301)));
+      const cv::Mat part = region(cv::Rect{0, 0, random.uniform(1, 91), random.uniform(1, 301)});
       ASSERT_EQ(plain::Bits(Values(plain::ProjectData(part, slope, fac))),
                 plain::Bits(Values(tester.ProjectData(part, slope, 0, fac))))
           << slope << " " << fac << " " << part.size;

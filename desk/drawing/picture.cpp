@@ -4,6 +4,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/drawing/cairo_check.h"
 
 namespace qv {
 
@@ -89,6 +90,7 @@ void Picture::TextUpwards(const std::string& text, cv::Point2d place, double siz
 }
 
 std::string Picture::Png() const {
+  CheckDrawn(cr_.get(), "the picture");
   std::string file;
   cairo_surface_flush(surface_.get());
   const auto append = [](void* out, const unsigned char* data, unsigned int length) {

@@ -44,7 +44,7 @@ class Picture {
             bool backed = false);
   /// As Text, reading upwards.
   void TextUpwards(const std::string& text, cv::Point2d place, double size, Colour colour);
-  /// The picture as a PNG file's content.
+  /// The picture as a PNG file's content; throws Failure when anything before could not be drawn.
   std::string Png() const;
 
   int width() const { return cairo_image_surface_get_width(surface_.get()); }

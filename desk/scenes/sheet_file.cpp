@@ -11,6 +11,7 @@
 #include "desk/base/failure.h"
 #include "desk/base/files.h"
 #include "desk/base/text.h"
+#include "desk/drawing/cairo_check.h"
 
 namespace qv {
 
@@ -30,9 +31,7 @@ void DrawOn(cairo_surface_t* surface, double units_per_mm, const ChartSheet& she
   const std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr(cairo_create(surface), cairo_destroy);
   cairo_scale(cr.get(), units_per_mm, units_per_mm);
   Draw(cr.get(), sheet);
-  if (const cairo_status_t status = cairo_status(cr.get()); status != CAIRO_STATUS_SUCCESS) {
-    throw Failure(kInternalFault, Format("the sheet can't be drawn (%s)", cairo_status_to_string(status)));
-  }
+  CheckDrawn(cr.get(), "the sheet");
 }
 
 std::string Svg(const ChartSheet& sheet, int /*dpi*/) {

@@ -25,7 +25,9 @@ Scene TexturedScene(double side, std::uint64_t seed) {
   cv::RNG random(seed);
   Scene scene;
   for (int i = 0; i < kShapes; ++i) {
-    const cv::Point2d centre(random.uniform(0.0, side), random.uniform(0.0, side));
+    const double x = random.uniform(0.0, side);  // one draw a statement: arguments have no order
+    const double y = random.uniform(0.0, side);
+    const cv::Point2d centre(x, y);
     std::vector<double> directions;
     for (int k = 0; k < kCorners; ++k) directions.push_back(random.uniform(0.0, 2 * CV_PI));
     std::sort(directions.begin(), directions.end());

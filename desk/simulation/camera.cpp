@@ -6,7 +6,7 @@
 #include <opencv2/imgproc.hpp>
 #include <vector>
 
-#include "desk/base/failure.h"
+#include "desk/drawing/cairo_check.h"
 #include "desk/simulation/method_law.h"
 
 namespace qv {
@@ -31,11 +31,11 @@ cv::Mat DrawTile(const Scene& scene, const cv::Matx33d& tile_from_scene, cv::Siz
   const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface(
       cairo_image_surface_create(CAIRO_FORMAT_RGB24, size.width, size.height), cairo_surface_destroy);
   const std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr(cairo_create(surface.get()), cairo_destroy);
-  if (cairo_status(cr.get()) != CAIRO_STATUS_SUCCESS) throw Failure(kInternalFault, "no memory to draw the scene");
   cairo_set_antialias(cr.get(), CAIRO_ANTIALIAS_BEST);
   cairo_set_source_rgb(cr.get(), scene.paper[0] / 255, scene.paper[1] / 255, scene.paper[2] / 255);
   cairo_paint(cr.get());
   Fill(cr.get(), scene, tile_from_scene);
+  CheckDrawn(cr.get(), "the scene");
   cairo_surface_flush(surface.get());
 
   const cv::Mat drawn(size, CV_8UC4, cairo_image_surface_get_data(surface.get()),

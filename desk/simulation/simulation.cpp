@@ -183,8 +183,9 @@ Simulation DustPhoto(const SimulationOptions& options) {
   std::vector<DustSpeck> specks;
   for (int tries = 0; static_cast<int>(specks.size()) < options.specks && tries < 1000 * (options.specks + 1);
        ++tries) {
-    const cv::Point2d at(random.uniform(border, camera.size.width - border),
-                         random.uniform(border, camera.size.height - border));
+    const double x = random.uniform(border, camera.size.width - border);
+    const double y = random.uniform(border, camera.size.height - border);
+    const cv::Point2d at(x, y);
     const bool free = std::none_of(specks.begin(), specks.end(),
                                    [&](const DustSpeck& speck) { return cv::norm(speck.centre - at) < apart; });
     if (free) specks.push_back({at, options.speck_px});
@@ -250,9 +251,13 @@ Simulation HdrCapture(const SimulationOptions& options) {
   const std::vector<cv::Point> first = {{0, 0},         {right, 0},          {0, bottom},         {right, bottom},
                                         {right / 2, 0}, {right, bottom / 2}, {right / 2, bottom}, {0, bottom / 2}};
   for (int tries = 0; static_cast<int>(dots.size()) < options.dots && tries < 1000 * options.dots; ++tries) {
-    const cv::Point at = tries < static_cast<int>(first.size())
-                             ? first[tries]
-                             : cv::Point(random.uniform(0, right + 1), random.uniform(0, bottom + 1));
+    cv::Point at;
+    if (tries < static_cast<int>(first.size())) {
+      at = first[tries];
+    } else {
+      at.x = random.uniform(0, right + 1);
+      at.y = random.uniform(0, bottom + 1);
+    }
     if (taken.at<uchar>(at) != 0) continue;
     taken(cv::Rect(at - cv::Point(apart, apart), cv::Size(2 * apart + 1, 2 * apart + 1)) & cv::Rect({}, camera.size)) =
         1;
