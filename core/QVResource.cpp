@@ -1,6 +1,7 @@
 #include "qvtester/resource.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/videoio/registry.hpp>
 
@@ -20,6 +21,20 @@ cv::Mat ReadColour(const char* path) {
     QVDEBUGP("[%s] %s: %s", "SetImage", path, e.what());
     return cv::Mat();
   }
+}
+
+cv::VideoCapture OpenFilm(const std::string& path) {
+  cv::VideoCapture video;
+  for (const cv::VideoCaptureAPIs backend : cv::videoio_registry::getStreamBackends()) {
+    if (backend == cv::CAP_GPHOTO2) continue;  // would look for a USB camera of that name, and lose memory doing so
+    if (video.open(path, backend)) break;
+  }
+  if (video.isOpened()) {
+    video.set(cv::CAP_PROP_ORIENTATION_AUTO, 0);
+  } else {
+    QVDEBUGP("[%s] %s: not a video that can be opened", "SetVideo", path.c_str());
+  }
+  return video;
 }
 
 }  // namespace
@@ -42,17 +57,10 @@ int QVResource::SetImage(unsigned char* data, int width, int height) {
 }
 
 int QVResource::SetVideo(char* path) {
-  cv::VideoCapture video;
-  for (const cv::VideoCaptureAPIs backend : cv::videoio_registry::getStreamBackends()) {
-    if (backend == cv::CAP_GPHOTO2) continue;  // would look for a USB camera of that name, and lose memory doing so
-    if (video.open(path, backend)) break;
-  }
-  if (!video.isOpened()) {
-    QVDEBUGP("[%s] %s: not a video that can be opened", "SetVideo", path);
-    return QV_ERROR_INVALID_ARGUMENT;
-  }
-  video.set(cv::CAP_PROP_ORIENTATION_AUTO, 0);
+  const cv::VideoCapture video = OpenFilm(path);
+  if (!video.isOpened()) return QV_ERROR_INVALID_ARGUMENT;
   video_ = video;
+  video_path_ = std::filesystem::absolute(path).string();
   return QV_SUCCESS;
 }
 
@@ -87,6 +95,12 @@ int QVResource::GetHeight(int* height) const {
 int QVResource::GetVideo(cv::VideoCapture* video) const {
   *video = video_;
   return QV_SUCCESS;
+}
+
+int QVResource::OpenVideo(cv::VideoCapture* video) const {
+  if (video_path_.empty()) return QV_ERROR_INVALID_ARGUMENT;
+  *video = OpenFilm(video_path_);
+  return video->isOpened() ? QV_SUCCESS : QV_ERROR_INVALID_ARGUMENT;
 }
 
 int QVResource::GetHDRImage(float** data) {

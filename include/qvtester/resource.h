@@ -3,6 +3,7 @@
 
 #include <opencv2/core.hpp>
 #include <opencv2/videoio.hpp>
+#include <string>
 #include <vector>
 
 #include "qvtester/indices.h"
@@ -30,6 +31,8 @@ class QV_API QVResource {
   int GetHeight(int* height) const;
   /// Shares the video source and its position.
   int GetVideo(cv::VideoCapture* video) const;
+  /// Opens the video file anew, at its start. -97 when there is none, or it can't be opened any more.
+  int OpenVideo(cv::VideoCapture* video) const;
   /// First float of the HDR buffer, null when there is none.
   int GetHDRImage(float** data);
   int GetHDRWidth(int* width) const;
@@ -38,6 +41,7 @@ class QV_API QVResource {
  private:
   cv::Mat image_;
   cv::VideoCapture video_;
+  std::string video_path_;  // absolute; empty without a video
   std::vector<float> hdr_;
   int hdr_width_ = 0;
   int hdr_height_ = 0;

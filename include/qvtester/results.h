@@ -79,6 +79,7 @@ struct QVLightResult {
   int* error_pixels_;  // flagged pixels of each area
 };
 
+// NOLINTNEXTLINE(clang-analyzer-optin.performance.Padding): in the order of the tests
 struct QVResultData {
   QVPhase1Result phase1_[13];
 

@@ -3,6 +3,7 @@
 
 #include <array>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <opencv2/core.hpp>
 #include <string>
@@ -167,6 +168,21 @@ class QV_API QVTester {
   /// than
   ///         8 bits, and when slot 36 holds no list.
   int TestTouchPanelPrint();
+
+  // Films are read from their start at each run, frame by frame, so that memory does not grow with them. -98 when the
+  // slot is empty, -95 with a log line when it holds no film or no frame: tests/video/film.h.
+  /// Test 22: as test 13, of the frames in slots 28 and 29, into preview_video_. Answers 1, or -98.
+  int TestVideoPreview();
+  /// Test 23: GetMTFFromImage on every frame of the film in slot 34, into the video_af_ fields.
+  /// @return 1, or -91 when no frame could be measured. Only 1 stores.
+  int TestVideoAutofocus();
+  /// Test 24: brightness of each frame of slot 34 and the pulse in it, into the video_flash_ fields. Property 89 limits
+  /// the frames read; 0 or less means all. Answers 1.
+  int TestVideoFlash();
+  /// Tests 25 and 26: frames, time stamps and the chart's marks in the film of slot 35, or 34.
+  /// @return 1 when the chart was seen in at least one frame, else -91. Both store.
+  int TestVideoRecord();
+  int TestVideoPlay();
 
   // Checks outside the numbered tests.
   /// GetSFRFromImage on the photo in slot 17, for the MTF50 values alone; -98 when the slot is empty.
@@ -423,6 +439,10 @@ class QV_API QVTester {
     // Work images: kept, since new pages cost more than what is written to them. The next test overwrites them, so
     // nothing that is handed out shares them.
     cv::Mat gray, binary;
+    class ChartRows* rows = nullptr;  // makes the binary picture as a search reads it; null: all of it is there
+    // Called after each frame of a film with the frames so far and those that the container promises (0 where it says
+    // nothing); may be empty.
+    std::function<void(int frames, int promised)> film_progress;
   };
   std::unique_ptr<Kept> kept_;
   cv::Mat print_map_;  // of the last test 29 that answered 1: 2 x 3, CV_64F, the list's first picture to the photo

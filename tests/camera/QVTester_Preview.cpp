@@ -13,6 +13,7 @@
 #include "platform/properties.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
+#include "tests/camera/preview_measure.h"
 
 namespace {
 
@@ -35,25 +36,22 @@ int Middle(int a, int b) { return static_cast<int>((static_cast<std::int64_t>(a)
 
 }  // namespace
 
-void QVTester::TestCameraPreview(bool front) {
+int MeasurePreview(QVTester& tester, int first_slot, QV_TEST_INDEX test, QVPreviewResult QVResultData::*fields) {
   cv::Mat first;
   cv::Mat second;
-  const int first_slot = front ? QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME : QV_RESOURCE_PREVIEW_FIRST_FRAME;
-  if (FetchImage(*this, first_slot, first) != QV_SUCCESS || FetchImage(*this, first_slot + 1, second) != QV_SUCCESS) {
-    return;
-  }
+  if (const int code = FetchImage(tester, first_slot, first); code != QV_SUCCESS) return code;
+  if (const int code = FetchImage(tester, first_slot + 1, second); code != QV_SUCCESS) return code;
   if (first.size() != second.size()) {
     QVDEBUGP("[OKAPI] image size does not match");
-    return;
+    return QV_SUCCESS;
   }
-  cv::Mat& gray = kept_->gray;
-  cv::Mat& difference = kept_->binary;
+  cv::Mat& gray = tester.kept_->gray;
+  cv::Mat& difference = tester.kept_->binary;
   cv::cvtColor(first, gray, cv::COLOR_RGB2GRAY);
   cv::cvtColor(second, difference, cv::COLOR_RGB2GRAY);
-  cv::absdiff(difference, gray,
-              difference);  // the last step that may refuse the frames: from here on the map is written
+  cv::absdiff(difference, gray, difference);  // the last step that may refuse: from here on the map is written
 
-  QVPreviewResult& result = front ? Results(*this).preview_front_ : Results(*this).preview_main_;
+  QVPreviewResult& result = Results(tester).*fields;
   const bool fits = result.preview_diff_map_ != nullptr && result.preview_diff_cols_ == difference.cols &&
                     result.preview_diff_rows_ == difference.rows;
   std::unique_ptr<float[]> fresh(fits ? nullptr : new float[difference.total()]);
@@ -64,12 +62,22 @@ void QVTester::TestCameraPreview(bool front) {
   const auto mean = static_cast<float>(cv::mean(map)[0]);
   map /= maximum;  // identical frames give 0 / 0, and are stored so
   if (!fits) {
-    ReleaseTestResult(front ? QV_TEST_CAMERA_PREVIEW_2 : QV_TEST_CAMERA_PREVIEW);
+    tester.ReleaseTestResult(test);
     result.preview_diff_map_ = fresh.release();
   }
   result.preview_diff_cols_ = map.cols;
   result.preview_diff_rows_ = map.rows;
   result.preview_diff_mean_ = mean;
+  return QV_SUCCESS;
+}
+
+void QVTester::TestCameraPreview(bool front) {
+  if (front) {
+    MeasurePreview(*this, QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME, QV_TEST_CAMERA_PREVIEW_2,
+                   &QVResultData::preview_front_);
+  } else {
+    MeasurePreview(*this, QV_RESOURCE_PREVIEW_FIRST_FRAME, QV_TEST_CAMERA_PREVIEW, &QVResultData::preview_main_);
+  }
 }
 
 int QVTester::CheckPatternCircles(int cam_id) {

@@ -1,0 +1,88 @@
+// Time stamps of a film, and the search that makes only the rows that it reads.
+
+#include <gmock/gmock.h>
+
+#include <opencv2/imgproc.hpp>
+
+#include "chart/chart_rows.h"
+#include "chart/find_chart.h"
+#include "tests/video/film.h"
+#include "unit_tests/drawing.h"
+
+namespace {
+
+using ::testing::DoubleNear;
+using ::testing::Pointwise;
+
+struct Stamps {
+  const char* name;
+  std::vector<double> stamps, times;
+  int extended, lost;
+  double rate, gap;
+};
+
+TEST(FilmTime, StampsBecomeTimes) {
+  const double third = 1000 / 30.0;  // the nominal interval here
+  const double nan = std::nan("");
+  const std::vector<Stamps> cases = {
+      {"one frame", {70}, {0}, 0, 0, 0, 0},
+      {"even", {40, 80, 120, 160}, {0, 40, 80, 120}, 0, 0, 25, 40},
+      {"gaps of one and of two", {0, 10, 20, 40, 50, 80}, {0, 10, 20, 40, 50, 80}, 0, 3, 62.5, 30},
+      {"a gap of just 1.5", {0, 10, 20, 35}, {0, 10, 20, 35}, 0, 0, 3000 / 35.0, 15},
+      {"more than 1.5", {0, 10, 20, 35.1}, {0, 10, 20, 35.1}, 0, 1, 3000 / 35.1, 15.1},
+      {"zeros at the end", {5, 15, 25, 0, 0}, {0, 10, 20, 30, 40}, 2, 0, 100, 10},
+      {"back and on", {0, 10, 20, 5, 40}, {0, 10, 20, 30, 40}, 1, 0, 100, 10},
+      {"a repeat", {0, 10, 10, 30}, {0, 10, 20, 30}, 1, 0, 100, 10},
+      {"none usable", {0, 0, 0}, {0, third, 2 * third}, 2, 0, 30, third},
+      {"no numbers", {nan, 10, nan, 30}, {0, 10, 20, 30}, 1, 0, 100, 10},
+      {"even count of intervals", {0, 10, 22, 34, 44}, {0, 10, 22, 34, 44}, 0, 0, 4000 / 44.0, 12},
+      {"from 30 to 15", {0, 1, 2, 3, 4, 6, 8}, {0, 1, 2, 3, 4, 6, 8}, 0, 2, 750, 2},
+      {"endless", {0, 1, 1e300}, {0, 1, 1e300}, 0, 1, 0, 1e300},
+  };
+  for (const Stamps& c : cases) {
+    Film film;
+    EXPECT_EQ(c.extended, KeepTime(c.stamps, third, film)) << c.name;
+    EXPECT_THAT(film.time, Pointwise(DoubleNear(1e-9), c.times)) << c.name;
+    EXPECT_EQ(c.lost, film.lost) << c.name;
+    EXPECT_NEAR(c.rate, film.mean_rate, 1e-9) << c.name;
+    EXPECT_DOUBLE_EQ(c.gap, film.longest_gap) << c.name;
+  }
+}
+
+// Marks and blots anywhere, also cut and overlapping, in colours around the threshold.
+cv::Mat RandomPhoto(cv::RNG& any) {
+  cv::Mat photo(any.uniform(1, 200), any.uniform(1, 240), any.uniform(0, 4) == 0 ? CV_8UC4 : CV_8UC3);
+  cv::randu(photo, 150, 256);
+  for (int k = any.uniform(0, 5); k > 0; --k) {
+    const int module = any.uniform(2, 7);
+    const cv::Point at(any.uniform(-9, photo.cols), any.uniform(-9, photo.rows));
+    for (const int side : {7, 5, 3}) {
+      const cv::Rect square(at + cv::Point(7 - side, 7 - side) * module / 2, cv::Size(side, side) * module);
+      cv::Mat part = photo(square & cv::Rect({}, photo.size()));
+      if (!part.empty()) cv::randu(part, side == 5 ? 150 : 0, side == 5 ? 256 : 100);
+    }
+  }
+  return photo;
+}
+
+TEST(ChartRows, FindWhatTheWholePictureShows) {
+  cv::RNG any(7);
+  std::size_t found = 0;
+  for (int i = 0; i < 3000 && !HasFailure(); ++i) {
+    const cv::Mat photo = RandomPhoto(any);
+    const int threshold = std::array{125, 125, 125, -1, 0, 254, 255, 400}[static_cast<std::size_t>(i % 8)];
+    QVTester whole;
+    QVTester rows;
+    rows.kept_->binary = cv::Mat(200, 240, CV_8UC1, cv::Scalar(i % 2 == 0 ? 0 : 255));  // what the frame before left
+    const auto expected = whole.GetFinderPoints(Binarise(whole, photo, threshold, nullptr));
+    ASSERT_EQ(expected, FindMarks(rows, photo, threshold)) << i;
+    ASSERT_EQ(whole.possibleCenters.size(), rows.possibleCenters.size()) << i;
+    found += expected.size();
+  }
+  EXPECT_GT(found, 600U) << "too few marks to tell anything";
+  QVTester tester;
+  EXPECT_THROW(FindMarks(tester, cv::Mat(40, 40, CV_16UC3), 125), cv::Exception);
+  EXPECT_EQ(nullptr, tester.kept_->rows);
+}
+
+}  // namespace
