@@ -18,6 +18,7 @@ namespace {
 // The window reaches kWindow / (frequency of response 0.5) to each side, and never less than kNarrowest pixels.
 constexpr double kWindow = 1.7;
 constexpr double kNarrowest = 6;
+constexpr double kOfTheMethod = 0.001;  // what the steps themselves leave, as a share of a figure
 constexpr double kHalo = 0.03;  // an overshoot from which on the window is twice as wide: sharpening reaches further
 constexpr double kLeastWindow = 1.2;  // where the region is narrower
 
@@ -102,6 +103,12 @@ IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corn
   iso.edge_angle_deg = edge.angle_deg();
   iso.response = ResponseCurve(Differentiate(spreads.whole, window), kIsoStep / 2, static_cast<int>(2 / kIsoStep) + 1);
   return iso;
+}
+
+Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure) {
+  std::vector<double> readings;
+  for (const IsoFigures& band : iso.bands) readings.push_back(band.*figure);
+  return OfMean(readings, kOfTheMethod * iso.figures.*figure, kBandsMethod);
 }
 
 }  // namespace qv

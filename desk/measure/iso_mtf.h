@@ -7,6 +7,7 @@
 
 #include "desk/measure/slanted_edge.h"
 #include "desk/measure/transfer.h"
+#include "desk/measure/uncertainty.h"
 
 // Sharpness by ISO 12233. These figures stand beside the tests' own, which limits refer to, and have no part in them.
 
@@ -44,6 +45,9 @@ inline constexpr double kSharpenedOvershoot = 0.05;
 /// @throws cv::Exception for another type or an empty picture.
 /// Slanted edge after ISO 12233:2014 in linear light, four bins a pixel; steps: slanted_edge.cpp, iso_mtf.cpp.
 IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer);
+
+/// Of one figure, from the scatter of its bands; NaN where a band gives none.
+Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure);
 
 }  // namespace qv
 

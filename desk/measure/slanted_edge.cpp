@@ -282,28 +282,39 @@ struct Bins {
   }
 };
 
+// Bins to each side of the middle up to which no two neighbours are empty.
+int FilledReach(const Bins& bins) {
+  const int middle = static_cast<int>(bins.pixels.size()) / 2;
+  const auto gap = [&](int k) { return bins.pixels[k] == 0 && bins.pixels[k + 1] == 0; };
+  int reach = 0;
+  while (reach < middle && !gap(middle + reach) && !gap(middle - reach - 1)) ++reach;
+  while (reach > 0 && (bins.pixels[middle - reach] == 0 || bins.pixels[middle + reach] == 0)) --reach;
+  return reach;
+}
+
 // Mean of each bin, carried from where its pixels lie in the mean to its middle. A lone empty bin is filled from its
-// neighbours.
-EdgeSpread Means(Bins bins) {
-  const int count = static_cast<int>(bins.sums.size());
-  int empty = 0;
+// neighbours. The spread ends where bins stay empty, and is none when that is before `least` bins.
+EdgeSpread Means(const Bins& bins, int least) {
+  const int reach = FilledReach(bins);
+  const int count = 2 * reach + 1;
+  const int first = static_cast<int>(bins.pixels.size()) / 2 - reach;
+  if (reach < least) return {};
+  const auto empty = [&](int k) { return bins.pixels[first + k] == 0; };
+  std::vector<double> means(count);
+  std::vector<double> off(count);
+  int filled = 0;
   for (int k = 0; k < count; ++k) {
-    if (bins.pixels[k] > 0) {
-      bins.sums[k] /= bins.pixels[k];
-      bins.distances[k] /= bins.pixels[k];
-      continue;
-    }
-    if (k == 0 || k == count - 1 || bins.pixels[k - 1] == 0 || bins.pixels[k + 1] == 0) return {};
-    ++empty;
+    if (empty(k)) continue;
+    means[k] = bins.sums[first + k] / bins.pixels[first + k];
+    off[k] = bins.distances[first + k] / bins.pixels[first + k];
+    ++filled;
   }
-  if (empty > kMostEmptyBins * count) return {};
-  for (int k = 0; k < count; ++k) {
-    if (bins.pixels[k] == 0) bins.sums[k] = (bins.sums[k - 1] + bins.sums[k + 1]) / 2;
+  if (count - filled > kMostEmptyBins * count) return {};
+  for (int k = 1; k + 1 < count; ++k) {
+    if (empty(k)) means[k] = (means[k - 1] + means[k + 1]) / 2;
   }
-  EdgeSpread spread = {(count - 1) / 2, bins.sums};
-  for (int k = 1; k < count - 1; ++k) {
-    spread.levels[k] -= bins.distances[k] * (bins.sums[k + 1] - bins.sums[k - 1]) * kBinsPerPixel / 2;
-  }
+  EdgeSpread spread = {reach, means};
+  for (int k = 1; k + 1 < count; ++k) spread.levels[k] -= off[k] * (means[k + 1] - means[k - 1]) * kBinsPerPixel / 2;
   return spread;
 }
 
@@ -337,9 +348,9 @@ EdgeSpreads ProjectEdge(const SlantedEdge& edge, double reach) {
   Bins whole(count);
   for (int band = 0; band < kBands; ++band) {
     whole.Add(bands[band]);
-    spreads.bands[band] = Means(std::move(bands[band]));
+    spreads.bands[band] = Means(bands[band], middle * 2 / 5);
   }
-  spreads.whole = Means(std::move(whole));
+  spreads.whole = Means(whole, middle);
   return spreads;
 }
 

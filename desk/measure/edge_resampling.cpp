@@ -1,0 +1,104 @@
+#include "desk/measure/edge_resampling.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+#include "desk/measure/slanted_edge.h"
+
+namespace qv {
+
+namespace {
+
+constexpr int kBlockRows = 8;       // kept together: interpolation and JPEG tie neighbouring rows
+constexpr double kSmoothing = 0.6;  // half the width of the smoothing, in sigmas of the edge
+constexpr double kSpreads =
+    4;  // sigmas and kBeyond pixels to each side of the edge, where it differs from its plateaus
+constexpr double kBeyond = 2;
+
+// A parabola through 2 m + 1 neighbours, its value at the middle (Savitzky and Golay).
+std::vector<double> Smoothed(const std::vector<double>& levels, int m) {
+  std::vector<double> smooth = levels;
+  const int count = static_cast<int>(levels.size());
+  for (int k = m; k + m < count; ++k) {
+    double sum = 0;
+    for (int i = -m; i <= m; ++i) sum += (3 * m * m + 3 * m - 1 - 5 * i * i) * levels[k + i];
+    smooth[k] = 3 * sum / ((2 * m + 3) * (2 * m + 1) * (2 * m - 1));
+  }
+  return smooth;
+}
+
+// The region without its noise: each pixel by its distance from the edge.
+cv::Mat Noiseless(const SlantedEdge& edge) {
+  const double reach = std::min(kSpreads * edge.sigma_px + kBeyond, edge.room);
+  const EdgeSpread spread = ProjectEdge(edge, reach).whole;
+  if (spread.levels.empty()) return {};
+  const std::vector<double> share =
+      Smoothed(spread.levels, std::max(1, cvRound(kSmoothing * edge.sigma_px * kBinsPerPixel)));
+  const int last = static_cast<int>(share.size()) - 1;
+  cv::Mat picture(edge.light.size(), CV_64F);
+  for (int row = 0; row < picture.rows; ++row) {
+    const double across = 1 / std::hypot(1, edge.curve.Slope(row));
+    const double place = edge.curve.Column(row);
+    const double t = row - edge.curve.middle_row;
+    for (int i = 0; i < picture.cols; ++i) {
+      const double d = (i - place) * across;
+      const double bin = d * kBinsPerPixel + spread.middle;
+      const int below = std::clamp(cvFloor(bin), 0, last - 1);
+      double risen = d > 0 ? 1 : 0;
+      if (bin >= 0 && bin < last) risen = share[below] + (share[below + 1] - share[below]) * (bin - below);
+      const double left = edge.left.At(d, t);
+      picture.at<double>(row, i) = left + (edge.right.At(d, t) - left) * risen;
+    }
+  }
+  return picture;
+}
+
+// Blocks of the noise's rows in another order, some twice, each row where it lay as seen from the edge.
+cv::Mat Redrawn(const cv::Mat& noiseless, const cv::Mat& noise, const EdgeCurve& curve, cv::RNG& random) {
+  cv::Mat picture(noise.size(), CV_32F);  // what was rounded has its rounding in the noise
+  const int block = std::min(kBlockRows, noise.rows);
+  int source = 0;
+  for (int row = 0; row < noise.rows; ++row, ++source) {
+    if (row % block == 0) source = random.uniform(0, noise.rows - block + 1);
+    const int shift = cvRound(curve.Column(source) - curve.Column(row));
+    const auto* from = noise.ptr<double>(source);
+    const auto* without = noiseless.ptr<double>(row);
+    auto* to = picture.ptr<float>(row);
+    for (int i = 0; i < noise.cols; ++i) {
+      const int column = ((i + shift) % noise.cols + noise.cols) % noise.cols;
+      to[i] = static_cast<float>(255 * (without[i] + from[column]));
+    }
+  }
+  return picture;
+}
+
+}  // namespace
+
+Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
+  CV_Assert(region.type() == CV_8UC1);
+  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+  const double right = region.cols - 0.5;
+  const double bottom = region.rows - 0.5;
+  const SlantedEdge edge = LocateEdge(region, {{{-0.5, -0.5}, {right, -0.5}, {right, bottom}, {-0.5, bottom}}},
+                                      {Transfer::Kind::kLinear, 1});
+  const cv::Mat noiseless = edge.reason == nullptr ? Noiseless(edge) : cv::Mat();
+  if (noiseless.empty()) return {kNone, kNone, kNone, kResamplingMethod};
+  const cv::Mat noise = edge.light - noiseless;
+  const auto as_found = [&](const cv::Mat& picture) {
+    cv::Mat turned = picture;
+    if (edge.lying) cv::transpose(picture, turned);
+    return read(turned);
+  };
+  cv::Mat plain;
+  noiseless.convertTo(plain, CV_32F, 255);
+  const double centre = as_found(plain);
+  cv::RNG random(50);
+  std::vector<double> errors;
+  for (int run = 0; run < kResamplings; ++run) {
+    errors.push_back(as_found(Redrawn(noiseless, noise, edge.curve, random)) - centre);
+  }
+  return FromErrors(std::move(errors), kResamplingMethod);
+}
+
+}  // namespace qv

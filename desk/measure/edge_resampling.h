@@ -1,0 +1,24 @@
+#ifndef QVTESTER_DESK_MEASURE_EDGE_RESAMPLING_H_
+#define QVTESTER_DESK_MEASURE_EDGE_RESAMPLING_H_
+
+#include <functional>
+#include <opencv2/core.hpp>
+#include <vector>
+
+#include "desk/measure/uncertainty.h"
+
+namespace qv {
+
+inline constexpr int kResamplings = 50;
+
+/// What a region's own noise does to a figure that is read off its edge and has no formula for it: the noise about the
+/// edge spread is drawn again in blocks of rows, and each picture is read.
+///
+/// @param region  CV_8UC1, one edge along its longer side.
+/// @param read    the figure of a region like it, CV_8UC1 or CV_32FC1 of the same levels.
+/// @return the uncertainty of `read(region)`; NaN where no edge is found.
+Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read);
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_EDGE_RESAMPLING_H_

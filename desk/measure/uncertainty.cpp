@@ -1,0 +1,166 @@
+#include "desk/measure/uncertainty.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <numeric>
+
+namespace qv {
+
+namespace {
+
+constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+constexpr double kShare = 0.95;
+
+// Student's distribution function for whole degrees of freedom (Abramowitz and Stegun 26.7.3 and 26.7.4): what lies
+// between -t and t.
+double StudentShare(double t, int degrees) {
+  const double theta = std::atan2(t, std::sqrt(static_cast<double>(degrees)));
+  const double cosine = std::cos(theta);
+  const bool odd = degrees % 2 != 0;
+  double term = odd ? cosine : 1;
+  double sum = degrees == 1 ? 0 : term;
+  for (int k = odd ? 3 : 2; k < degrees; k += 2) {
+    term *= cosine * cosine * (k - 1) / k;
+    sum += term;
+  }
+  return odd ? 2 / CV_PI * (theta + std::sin(theta) * sum) : std::sin(theta) * sum;
+}
+
+// Differences between neighbours along a row, halved: the variance of a pixel's noise, without the scene's slope.
+cv::Matx33d NeighbourCovariance(const cv::Mat& patch) {
+  cv::Matx33d sum = cv::Matx33d::zeros();
+  double count = 0;
+  for (int row = 0; row < patch.rows; ++row) {
+    const auto* pixels = patch.ptr<cv::Vec3b>(row);
+    for (int i = 0; i + 2 < patch.cols; ++i) {
+      const cv::Vec3d difference = cv::Vec3d(pixels[i]) - 2 * cv::Vec3d(pixels[i + 1]) + cv::Vec3d(pixels[i + 2]);
+      sum += difference * difference.t();
+      ++count;
+    }
+  }
+  return count == 0 ? cv::Matx33d::zeros() : sum * (1 / (6 * count));
+}
+
+}  // namespace
+
+const std::vector<UncertaintyMethod>& UncertaintyMethods() {
+  static const std::vector<UncertaintyMethod> methods = {
+      {kBandsMethod,
+       "Each quarter of the edge gives a reading of its own; their scatter over the root of four is the standard "
+       "uncertainty, with three degrees of freedom. Type B: 0.1 % for what the method itself leaves (bins, plateaus, "
+       "rounding of levels). What JPEG does to edges sharper than 0.8 px, and what light or chart do to the edge "
+       "itself, "
+       "is not in it."},
+      {kResamplingMethod,
+       "The region is taken apart into its edge spread and its noise; the noise is drawn again in blocks of rows, "
+       "50 times, and each picture is measured anew. The 95 % quantile of the readings' distance from the one without "
+       "noise is the expanded uncertainty; jumps of the reading are in it. It tells how far the reading lies from the "
+       "noiseless one, not how far that lies from the lens's own figure."},
+      {kPixelMethod,
+       "The variance of the patch's pixels, from differences between neighbours, over their number, is carried through "
+       "the colour formulas to first order. Type B: patch means are cut to whole levels (1/12 level squared, and half "
+       "a "
+       "level low, which the standard photo shares)."},
+      {kMeanMethod,
+       "The variance of the pixels, from differences between neighbours, over their number. Type B: none; what light "
+       "and exposure do from photo to photo is not in it (take several photos)."},
+      {kResidualMethod,
+       "How far the points lie from the fit, carried through it by least squares with what degrees of freedom are "
+       "left."},
+      {kRepeatMethod,
+       "The spread of several photos of one unit, over the root of their number, with Student's factor; the median's "
+       "is "
+       "wider than the mean's by sqrt(pi / 2)."},
+  };
+  return methods;
+}
+
+double StudentFactor(double degrees_of_freedom) {
+  constexpr double kNormal = 1.959964;
+  if (!(degrees_of_freedom >= 1)) return std::isnan(degrees_of_freedom) ? kNone : StudentFactor(1);
+  if (degrees_of_freedom > 200) return kNormal * (1 + (kNormal * kNormal + 1) / (4 * degrees_of_freedom));
+  const auto whole = static_cast<int>(degrees_of_freedom);  // cut: the factor is rather too large than too small
+  double low = 1;
+  double high = 13;
+  for (int step = 0; step < 50; ++step) {
+    const double middle = (low + high) / 2;
+    (StudentShare(middle, whole) < kShare ? low : high) = middle;
+  }
+  return high;
+}
+
+Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, const char* method) {
+  const double standard = std::hypot(type_a, type_b);
+  const double share = standard == 0 ? 1 : type_a / standard;
+  const double factor = StudentFactor(degrees_of_freedom / std::pow(share, 4));
+  return {standard, factor * standard, factor, method};
+}
+
+Uncertainty OfMean(const std::vector<double>& readings, double type_b, const char* method) {
+  const auto n = static_cast<double>(readings.size());
+  if (readings.size() < 2) return {kNone, kNone, kNone, method};
+  const double mean = std::accumulate(readings.begin(), readings.end(), 0.0) / n;
+  double squares = 0;
+  for (const double reading : readings) squares += (reading - mean) * (reading - mean);
+  return Combined(std::sqrt(squares / (n - 1) / n), n - 1, type_b, method);
+}
+
+Uncertainty OfMedian(const std::vector<double>& readings) {
+  const double wider = readings.size() > 2 ? std::sqrt(CV_PI / 2) : 1;  // the median of two is their mean
+  Uncertainty u = OfMean(readings, 0, kRepeatMethod);
+  u.standard *= wider;
+  u.expanded *= wider;
+  return u;
+}
+
+double Median(std::vector<double> readings) {
+  if (readings.empty()) return kNone;
+  std::sort(readings.begin(), readings.end());
+  const std::size_t half = readings.size() / 2;
+  return readings.size() % 2 != 0 ? readings[half] : (readings[half - 1] + readings[half]) / 2;
+}
+
+Uncertainty FromErrors(std::vector<double> errors, const char* method) {
+  if (errors.empty()) return {kNone, kNone, kNone, method};
+  double squares = 0;
+  for (double& error : errors) {
+    error = std::isfinite(error) ? std::fabs(error) : std::numeric_limits<double>::infinity();
+    squares += error * error;
+  }
+  std::sort(errors.begin(), errors.end());
+  // A further error lies below the k-th of n in k of n + 1 cases.
+  const auto n = static_cast<double>(errors.size());
+  const double place = std::clamp(kShare * (n + 1) - 1, 0.0, n - 1);
+  const auto below = static_cast<std::size_t>(place);
+  const double above = errors[std::min(below + 1, errors.size() - 1)];
+  const double expanded =
+      std::isinf(above) ? above : errors[below] + (above - errors[below]) * (place - std::floor(place));
+  const double standard = std::sqrt(squares / n);
+  return {standard, expanded, standard == 0 ? 1 : expanded / standard, method};
+}
+
+Uncertainty OfMeanLevel(const cv::Mat& picture) {
+  cv::Mat levels;
+  picture.convertTo(levels, CV_64F);
+  double squares = 0;
+  double count = 0;
+  for (int row = 0; row < levels.rows; ++row) {
+    const auto* pixels = levels.ptr<double>(row);
+    for (int i = 0; i + 2 < levels.cols; ++i) {
+      const double difference = pixels[i] - 2 * pixels[i + 1] + pixels[i + 2];
+      squares += difference * difference;
+      ++count;
+    }
+  }
+  if (count == 0) return {kNone, kNone, kNone, kMeanMethod};
+  const double noise = squares / (6 * count);
+  return Combined(std::sqrt(noise / static_cast<double>(levels.total())), count, 0, kMeanMethod);
+}
+
+cv::Matx33d CovarianceOfMean(const cv::Mat& patch, double rounding) {
+  CV_Assert(patch.type() == CV_8UC3 && !patch.empty());
+  return NeighbourCovariance(patch) * (1.0 / static_cast<double>(patch.total())) + cv::Matx33d::eye() * rounding;
+}
+
+}  // namespace qv

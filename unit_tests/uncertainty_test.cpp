@@ -1,0 +1,108 @@
+#include "desk/measure/uncertainty.h"
+
+#include <gmock/gmock.h>
+
+#include <cmath>
+
+#include "desk/measure/decision.h"
+#include "desk/measure/edge_resampling.h"
+#include "unit_tests/drawing.h"
+
+namespace qv {
+namespace {
+
+TEST(Uncertainty, StudentsFactorIsThePublishedOne) {
+  // JCGM 100:2008, table G.2, 95 %.
+  for (const auto& [degrees, factor] :
+       {std::pair{1.0, 12.71}, {2.0, 4.30}, {3.0, 3.18}, {7.0, 2.36}, {20.0, 2.09}, {50.0, 2.01}, {INFINITY, 1.960}}) {
+    EXPECT_NEAR(factor, StudentFactor(degrees), 0.006) << degrees;
+  }
+  EXPECT_DOUBLE_EQ(StudentFactor(3), StudentFactor(3.9));  // cut, which is the safe side
+}
+
+TEST(Uncertainty, MeansMediansAndErrors) {
+  // Readings of JCGM 100:2008, H.3-like: mean 4, s 2, u = s / sqrt(4), three degrees of freedom.
+  const Uncertainty mean = OfMean({4 - std::sqrt(6.0), 4, 4, 4 + std::sqrt(6.0)}, 0, kBandsMethod);
+  EXPECT_NEAR(1, mean.standard, 1e-12);
+  EXPECT_NEAR(3.182, mean.expanded, 1e-3);
+  // A type B part of infinite freedom as large again: Welch and Satterthwaite give 12 degrees.
+  EXPECT_NEAR(2.179 * std::sqrt(2.0), OfMean({4 - std::sqrt(6.0), 4, 4, 4 + std::sqrt(6.0)}, 1, kBandsMethod).expanded,
+              1e-3);
+  EXPECT_TRUE(std::isnan(OfMean({1, NAN, 2}, 0, kBandsMethod).expanded));
+  EXPECT_TRUE(std::isnan(OfMean({1}, 0, kBandsMethod).expanded));
+  EXPECT_DOUBLE_EQ(3, Median({9, 1, 3}));
+  EXPECT_DOUBLE_EQ(2, Median({3, 1}));
+  std::vector<double> errors;
+  for (int i = 1; i <= 99; ++i) errors.push_back(i % 2 == 0 ? i : -i);
+  EXPECT_DOUBLE_EQ(95, FromErrors(errors, kResamplingMethod).expanded);  // a hundredth error exceeds it 5 times in 100
+  EXPECT_TRUE(std::isinf(FromErrors({1, NAN}, kResamplingMethod).expanded));
+}
+
+TEST(Uncertainty, PixelsTellTheirNoiseWhateverTheLight) {
+  cv::Mat patch(60, 80, CV_8UC3);
+  cv::theRNG().state = 5;
+  cv::randn(patch, cv::Scalar(100, 120, 140), cv::Scalar(2, 4, 6));
+  for (int column = 0; column < patch.cols; ++column)
+    patch.col(column) += cv::Scalar::all(std::floor(column * 0.5));  // falls off
+  const cv::Matx33d covariance = CovarianceOfMean(patch, 0);
+  for (int channel = 0; channel < 3; ++channel) {
+    const double noise = 2.0 * (channel + 1);
+    EXPECT_NEAR(noise / std::sqrt(4800.0), std::sqrt(covariance(channel, channel)), 0.1 * noise / std::sqrt(4800.0));
+  }
+  cv::Mat green;
+  cv::extractChannel(patch, green, 1);
+  EXPECT_NEAR(4 / std::sqrt(4800.0), OfMeanLevel(green).standard, 0.1 * 4 / std::sqrt(4800.0));
+  const auto product = [](const cv::Vec3d& x) { return x[0] * x[1]; };
+  EXPECT_NEAR(5, Propagated(product, {3, 4, 0}, cv::Matx33d::eye(), 0.1), 1e-9);
+}
+
+TEST(Uncertainty, ResamplingFindsWhatNoiseDoes) {
+  const EdgePhoto view = {{90, 260}, {45, 130}, 5, 0.8, 60, 180};
+  const cv::Mat edge = DrawEdgePhoto(view);
+  const auto mean = [](const cv::Mat& region) { return cv::mean(region)[0]; };  // whose law is known: sigma / sqrt(n)
+  for (const double sigma : {2.0, 8.0}) {
+    cv::Mat noise(edge.size(), CV_32F);
+    cv::RNG(3).fill(noise, cv::RNG::NORMAL, 0, sigma);
+    cv::Mat photo;
+    cv::Mat(edge + noise).convertTo(photo, CV_8U);
+    const double law = sigma / std::sqrt(90.0 * 260);
+    EXPECT_NEAR(law, ResampleEdge(photo, mean).standard, 0.35 * law);  // of 50 runs
+  }
+  EXPECT_TRUE(std::isnan(ResampleEdge(cv::Mat(260, 90, CV_8U, cv::Scalar(9)), mean).expanded));
+}
+
+struct Verdict {
+  const char* rule;
+  double reading, standard, expanded;
+  Tolerance limits;
+  double factor;
+  bool pass, near_limit;
+  double wrong;  // JCGM 106:2012, 7.3: of the normal distribution
+};
+
+TEST(Decision, ByTheRule) {
+  const Tolerance min = {0.4, {}};
+  const Tolerance both = {0.4, 0.5};
+  for (const Verdict& v : std::vector<Verdict>{
+           {"simple", 0.41, 0.01, 0.02, min, 1, true, true, 0.1587},
+           {"simple", 0.39, 0.01, 0.02, min, 1, false, true, 0.1587},
+           {"simple", 0.44, 0.01, 0.02, min, 1, true, false, 3.2e-5},
+           {"guarded", 0.41, 0.01, 0.02, min, 1, false, true, 0.8413},  // surely good enough is what it is not
+           {"guarded", 0.42, 0.01, 0.02, min, 0.5, true, true, 0.0228},
+           {"guarded_rejection", 0.39, 0.01, 0.02, min, 1, true, true, 0.8413},
+           {"guarded_rejection", 0.37, 0.01, 0.02, min, 1, false, false, 0.0013},
+           {"simple", 0.49, 0.01, 0.02, both, 1, true, true, 0.1587},
+           {"guarded", 0.45, 0.03, 0.06, both, 1, false, true, 0.9044},  // no reading passes between such limits
+           {"simple", 0.4, 0, 0, min, 1, true, false, 0},
+           {"guarded", 0.399, 0, 0, min, 1, false, false, 0},
+           {"guarded_rejection", NAN, 0.01, 0.02, min, 1, false, false, 0}}) {
+    const Decision d = Decide(v.reading, v.standard, v.expanded, v.limits, {*ParseDecisionRule(v.rule), v.factor});
+    EXPECT_EQ(v.pass, d.pass) << v.rule << v.reading;
+    EXPECT_EQ(v.near_limit, d.near_limit) << v.rule << v.reading;
+    EXPECT_NEAR(v.wrong, d.wrong_probability, 1e-4) << v.rule << v.reading;
+  }
+  EXPECT_FALSE(ParseDecisionRule("strict"));
+}
+
+}  // namespace
+}  // namespace qv
