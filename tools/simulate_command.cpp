@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <filesystem>
 #include <iostream>
 #include <memory>
@@ -6,6 +7,7 @@
 #include "desk/base/failure.h"
 #include "desk/base/files.h"
 #include "desk/base/text.h"
+#include "desk/simulation/film.h"
 #include "desk/simulation/photo_file.h"
 #include "desk/simulation/simulation.h"
 #include "tools/commands.h"
@@ -42,24 +44,63 @@ void DeclareCamera(Options& command, CameraModel& c) {
   command.Seed("--seed", c.seed, "Seed of the noise");
 }
 
+void DeclareFilm(Options& command, FilmStyle& f, std::string& lost) {
+  command.Whole("--frames", f.frames, 3, 100'000, "film: frames filmed, lost ones among them", "N");
+  command.Number("--rate", f.rate, 1, 1000, "film: frames a second", "RATE");
+  command.Number("--jitter", f.jitter, 0, 0.2, "film: how far frames come early or late, in intervals", "SHARE");
+  command.Text("--lost", lost, "film: numbers of the frames that are lost, from 0", "N,N,...");
+  command.Number("--focus-from", f.from_px, 0, 30, "film-focus: blur at the start, beside the camera's own", "PX");
+  command.Number("--focus-time", f.sweep_ms, 1, 1e6, "film-focus: until the lens first comes to its best", "MS");
+  command.Number("--overshoot", f.overshoot_px, 0, 30, "film-focus: blur where it has gone too far", "PX");
+  command.Number("--return-time", f.return_ms, 1, 1e6, "film-focus: until it is back for good", "MS");
+  command.Number("--pulse", f.pulse_ms, 1, 1e6, "film-flash: width of the pulse at half height", "MS");
+  command.Number("--pulse-at", f.pulse_at_ms, -1e6, 1e6, "film-flash: time of its peak", "MS");
+  command.Number("--base", f.base, 0, 1, "film-flash: light without the flash, over that with it", "SHARE");
+  command.Number("--turn-rate", f.turn_deg_s, -3600, 3600, "film-chart: degrees a second", "DEG");
+}
+
+// The film, and its truth beside it.
+int WriteFilm(const SimulationOptions& options, FilmStyle style, const std::string& lost, const Output& output) {
+  std::istringstream words(lost);
+  for (std::string word; std::getline(words, word, ',');) {
+    style.lost.push_back(static_cast<int>(ParseNumbers("--lost", word, 1, 0, 100'000)[0]));
+  }
+  const Film film = SimulateFilm(options, style);
+  WriteOutput(output.path, EncodeFilm(film, style, output.path));
+  const std::string truth = std::filesystem::path(output.path).replace_extension(".truth.json");
+  WriteOutput(truth, film.truth.dump(2) + "\n");
+  if (!output.quiet) {
+    std::cout << Format("%s  %zu frames of %d x %d\n%s\n", output.path.c_str(), film.kept.size(),
+                        options.camera.size.width, options.camera.size.height, truth.c_str());
+  }
+  return static_cast<int>(kExitWithinLimits);
+}
+
 }  // namespace
 
 CommandBody DeclareSimulate(Options& command) {
   struct Options : SimulationOptions {
     Output output;
-    std::string size = "4000x3000", cast = "1,1,1", smear = "0,0", motion = "4,0", tint = "1,1,1";
+    FilmStyle film;
+    std::string lost;
+    std::string size, cast = "1,1,1", smear = "0,0", motion = "4,0", tint = "1,1,1";
   };
   auto o = std::make_shared<Options>();
   command.Text("-o,--output", o->output.path,
                "Photo to write: .png, .jpg, .bmp, .tif, or .nv21 for a raw preview frame; .exr, .tif or .pfm for "
-               "hdr; - is standard output, as PNG or PFM. Its truth goes beside it: that of p.png to p.truth.json",
+               "hdr; .mp4, .mkv or .mov for a film; - is standard output, as PNG or PFM. Its truth goes beside it: "
+               "that of p.png to p.truth.json",
                "PHOTO", true);
-  command.Choice("--scene", o->scene, SceneNames(),
-                 "What stands before the camera: the sharpness chart, the three marks of an "
-                 "aiming target, two preview frames of a moving chart, a plain target seen through dust, two photos of "
-                 "a textured scene, a lit panel with dots in high dynamic range, a phone's display",
-                 "SCENE");
-  command.Text("--size", o->size, "Pixels of the photo", "WxH");
+  std::vector<std::string> scenes = SceneNames();
+  scenes.insert(scenes.end(), FilmScenes().begin(), FilmScenes().end());
+  command.Choice(
+      "--scene", o->scene, scenes,
+      "What stands before the camera: the sharpness chart, the three marks of an "
+      "aiming target, two preview frames of a moving chart, a plain target seen through dust, two photos of "
+      "a textured scene, a lit panel with dots in high dynamic range, a phone's display; films of a lens that "
+      "finds its focus, of a flash, of a turning chart",
+      "SCENE");
+  command.Text("--size", o->size, "Pixels of the photo, 4000x3000; of a film, 1280x720", "WxH");
   DeclareCamera(command, o->camera);
   command.Text("--smear", o->smear, "Straight motion during the exposure", "DX,DY");
   command.Text("--cast", o->cast, "Colour cast: factors on red, green and blue", "R,G,B");
@@ -88,10 +129,13 @@ CommandBody DeclareSimulate(Options& command) {
                  "SHARE");
   command.Whole("--defects", o->defects, 0, 1000, "display: black points, or white ones in black", "N");
   command.Number("--defect-size", o->display.defect_side, 0.5, 100, "display: their side, of a width of 1600", "UNITS");
+  DeclareFilm(command, o->film, o->lost);
   command.Choice("--bits", o->output.bits, {8, 16}, "Bits a channel, 8 or 16", "N");
   command.Whole("--quality", o->output.jpeg_quality, 1, 100, "Quality of a JPEG file", "N");
   command.Flag("--quiet", o->output.quiet, "Print nothing");
   return [o] {
+    const bool is_film = std::find(FilmScenes().begin(), FilmScenes().end(), o->scene) != FilmScenes().end();
+    if (o->size.empty()) o->size = is_film ? "1280x720" : "4000x3000";
     o->camera.size = ParseSize("--size", o->size);
     const std::vector<double> cast = ParseNumbers("--cast", o->cast, 3, 0, 16);
     const std::vector<double> smear = ParseNumbers("--smear", o->smear, 2, -100, 100);
@@ -101,6 +145,7 @@ CommandBody DeclareSimulate(Options& command) {
     o->camera.cast = {cast[0], cast[1], cast[2]};
     o->camera.smear_px = {smear[0], smear[1]};
     o->motion_px = {motion[0], motion[1]};
+    if (is_film) return WriteFilm(*o, o->film, o->lost, o->output);
     Simulation simulation = Simulate(*o);
     simulation.truth["parameters"]["bits"] = o->output.bits;
     if (LowerExtension(o->output.path) == ".jpg")
