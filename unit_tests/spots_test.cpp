@@ -1,0 +1,87 @@
+#include "desk/measure/spots.h"
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+
+namespace {
+
+struct Target {
+  cv::Size size = {640, 480};
+  double noise = 0.01;   // of 255
+  double shading = 0.4;  // at the corners
+  std::uint64_t seed = 1;
+};
+
+struct Speck {
+  cv::Point2d at;
+  double diameter, contrast;
+  bool soft = false;  // a Gaussian of that full width at half its depth
+};
+
+cv::Mat Photo(const Target& target, const std::vector<Speck>& specks) {
+  cv::Mat photo(target.size, CV_32F);
+  const cv::Point2d middle(target.size.width / 2.0, target.size.height / 2.0);
+  for (int y = 0; y < photo.rows; ++y) {
+    for (int x = 0; x < photo.cols; ++x) {
+      const cv::Point2d off = cv::Point2d(x, y) - middle;
+      double level = 200 * (1 - target.shading * off.dot(off) / middle.dot(middle));
+      for (const Speck& s : specks) {
+        const double r = cv::norm(cv::Point2d(x, y) - s.at);
+        const double edge = std::clamp(s.diameter / 2 - r + 0.5, 0.0, 1.0);
+        level *= 1 - s.contrast * (s.soft ? std::exp2(-4 * r * r / (s.diameter * s.diameter)) : edge);
+      }
+      photo.at<float>(y, x) = static_cast<float>(level);
+    }
+  }
+  cv::Mat noise(photo.size(), CV_32F);
+  cv::RNG random(target.seed);
+  random.fill(noise, cv::RNG::NORMAL, 0, 255 * target.noise);
+  photo += noise;
+  photo.convertTo(photo, CV_8U);
+  return photo;
+}
+
+TEST(Spots, AreFoundAtAnySizeSharpOrSoftWithTheirAreaAndContrast) {
+  for (const double diameter : {6.0, 12.0, 40.0, 100.0}) {
+    for (const bool soft : {false, true}) {
+      const Speck speck = {{250.3, 200.6}, diameter, 0.1, soft};
+      const qv::SpotFinding found = qv::FindSpots(Photo({}, {speck}));
+      ASSERT_EQ(1U, found.spots.size()) << diameter << (soft ? " soft" : " sharp");
+      EXPECT_LT(cv::norm(found.spots[0].centre - speck.at), 1 + 0.1 * diameter) << diameter;
+      EXPECT_NEAR(1, found.spots[0].diameter_px() / diameter, 0.3) << diameter << (soft ? " soft" : " sharp");
+      EXPECT_NEAR(1, found.spots[0].contrast / 0.1, 0.35) << diameter << (soft ? " soft" : " sharp");
+    }
+  }
+}
+
+TEST(Spots, AreSeenWhereTheyStandNineTimesOutOfTheNoise) {
+  int seen = 0;
+  int false_ones = 0;
+  int count = 0;
+  for (const double diameter : {6.0, 16.0, 50.0}) {
+    for (std::uint64_t seed = 0; seed < 10; ++seed, ++count) {
+      const double contrast = 9 * 0.01 * (255.0 / 200) / (diameter / 2 * std::sqrt(CV_PI));
+      const Speck speck = {{310, 230}, diameter, contrast, false};
+      const auto spots = qv::FindSpots(Photo({{640, 480}, 0.01, 0.3, seed}, {speck})).spots;
+      for (const qv::Spot& spot : spots) (cv::norm(spot.centre - speck.at) < diameter ? seen : false_ones) += 1;
+    }
+  }
+  EXPECT_GE(seen, 0.9 * count);
+  EXPECT_LE(false_ones, 0.1 * count);
+}
+
+TEST(Spots, EmptyTargetsHaveNone) {
+  for (const double noise : {0.0, 0.005, 0.03}) {
+    for (const double shading : {0.0, 0.6}) {
+      EXPECT_EQ(0U, qv::FindSpots(Photo({{640, 480}, noise, shading}, {})).spots.size()) << noise << " " << shading;
+    }
+  }
+  for (const cv::Size size : {cv::Size(1, 1), cv::Size(5, 3), cv::Size(700, 2)}) {
+    EXPECT_EQ(0U, qv::FindSpots(cv::Mat(size, CV_16UC3, cv::Scalar::all(30000))).spots.size());
+  }
+  EXPECT_THROW(qv::FindSpots(cv::Mat()), cv::Exception);
+}
+
+}  // namespace
