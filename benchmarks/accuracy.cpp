@@ -208,11 +208,8 @@ void PrintNoise() {
 
 std::vector<Mark> FindMarks(const cv::Mat& photo) {
   QVTester tester;
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-  cv::threshold(gray, gray, kThreshold, 255, cv::THRESH_BINARY);
-  if (tester.GetFinderPoints(gray).size() != 3) return {};
-  return LookAtChart(tester, kThreshold).marks;
+  const ChartView view = LookAtChart(tester.FindChart(photo, kThreshold));
+  return view.complete() ? view.marks : std::vector<Mark>();
 }
 
 double LargestMarkError(const std::vector<Mark>& marks, const Json& truth) {

@@ -12,8 +12,6 @@
 
 namespace {
 
-constexpr float kUprightAngle = 315.0f;
-
 void CopyOntoCanvas(const cv::Mat& image, cv::Size size, cv::Mat& canvas) {
   canvas.create(size, image.type());
   image.copyTo(canvas({0, 0, image.cols, image.rows}));

@@ -82,8 +82,10 @@ struct ChartPatch {
 /// a degree off moves the furthest of them.
 inline constexpr double kPatchHalf = 470;
 
-// In sampling order: six along the top, six along the bottom, six down the left side, six down the right. The white is
-// number 9; 12, 13 and 14 are the three that are measured without a standard.
+inline constexpr int kWhitePatch = 9;
+inline constexpr std::array<int, 4> kPatchesWithoutStandard = {12, 13, 14, kWhitePatch};  // that are measured then
+
+// In sampling order: six along the top, six along the bottom, six down the left side, six down the right.
 inline constexpr std::array<ChartPatch, 24> kPatches = {{
     {"grey 20", 20, 20, 20}, {"yellow", 250, 225, 110},   {"purple", 90, 40, 110},    {"light cyan", 150, 240, 245},
     {"brown", 110, 60, 40},  {"grey 240", 240, 240, 240}, {"dark teal", 20, 90, 100}, {"pink", 250, 190, 205},

@@ -40,17 +40,17 @@ const cv::Mat& Binarise(QVTester& tester, const cv::Mat& photo, int threshold, c
   return binary;
 }
 
-FoundChart& FindChart(QVTester& tester, const cv::Mat& photo, int threshold, const char* name) {
-  FoundChart& chart = tester.kept_->chart;
+FoundChart& QVTester::FindChart(cv::Mat photo, int threshold, const char* name) {
+  FoundChart& chart = kept_->chart;
   FoundChart fresh;
   cv::swap(fresh.gray, chart.gray);
   chart = fresh;
-  chart.points = tester.GetFinderPoints(Binarise(tester, photo, threshold, name));
+  chart.points = GetFinderPoints(Binarise(*this, photo, threshold, name));
   chart.searched = true;
   chart.threshold = threshold;
-  chart.candidates = tester.startSize;
-  chart.marks = MarksInOrder(tester, chart.points);
-  chart.angle_deg = tester.GetPatternAngle(chart.points);
+  chart.candidates = startSize;
+  chart.marks = MarksInOrder(*this, chart.points);
+  chart.angle_deg = GetPatternAngle(chart.points);
   return chart;
 }
 

@@ -8,10 +8,6 @@
 /// Throws cv::Exception for a photo without three or four channels, or (StsUnsupportedFormat) of other than 8 bits.
 const cv::Mat& Binarise(QVTester& tester, const cv::Mat& photo, int threshold, const char* name);
 
-/// Looks for the finder marks of a chart photo, binarised as above, and keeps what it finds in the tester, the marks in
-/// their order.
-FoundChart& FindChart(QVTester& tester, const cv::Mat& photo, int threshold, const char* name = nullptr);
-
 /// Turns a chart with three marks upright: its turn, and the marks carried along and put in order.
 /// Throws cv::Exception for a photo of 32,767 pixels or more a side, as cv::warpAffine does.
 void SetUpright(QVTester& tester, FoundChart& chart);

@@ -5,6 +5,9 @@
 
 #include "qvtester/tester.h"
 
+/// GetPatternAngle of an upright chart, degrees.
+inline constexpr float kUprightAngle = 315.0f;
+
 /// The turn of a picture of this size, by the chart's angle (QVTester::GetPatternAngle).
 UprightTurn TurnUpright(cv::Size picture, float pattern_angle);
 

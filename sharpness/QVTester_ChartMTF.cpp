@@ -47,7 +47,7 @@ void LogGeometry(const char* name, const FoundChart& chart) {
 int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vector<float>& sfrVertical,
                               std::vector<float>& sfrHorizontal, float& mtf50Vertical, float& mtf50Horizontal) {
   const char* const name = "GetSFRFromImage";
-  FoundChart& chart = FindChart(*this, image, prop_binary_thr_working_, name);
+  FoundChart& chart = FindChart(image, prop_binary_thr_working_, name);
   if (chart.points.size() != kMarks) {
     QVDEBUGP("[%s] GetSFRFromImage, finder point : %d \n return PATTERN NOT FOUND!", name,
              static_cast<int>(chart.points.size()));
@@ -56,17 +56,17 @@ int QVTester::GetSFRFromImage(cv::Mat image, std::vector<float>& freq, std::vect
 
   SetUpright(*this, chart);
   PlaceRegions(chart, chart.second.y - chart.corner.y);
-  const cv::Mat vertical = InFloat(Cut(chart, chart.vertical));
-  const cv::Mat horizontal = InFloat(Cut(chart, chart.horizontal));
-  CalculateSFR(vertical, freq, sfrVertical, mtf50Vertical);
+  chart.vertical_pixels = Cut(chart, chart.vertical);
+  chart.horizontal_pixels = Cut(chart, chart.horizontal);
+  CalculateSFR(InFloat(chart.vertical_pixels), freq, sfrVertical, mtf50Vertical);
   std::vector<float> same_freq;  // both regions have the same smaller side, so one axis serves both
-  CalculateSFR(horizontal, same_freq, sfrHorizontal, mtf50Horizontal);
+  CalculateSFR(InFloat(chart.horizontal_pixels), same_freq, sfrHorizontal, mtf50Horizontal);
   return QV_SUCCESS;
 }
 
 int QVTester::GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50Horizontal) {
   const char* const name = "GetMTFFromImage";
-  FoundChart& chart = FindChart(*this, image, prop_binary_thr_working_, name);
+  FoundChart& chart = FindChart(image, prop_binary_thr_working_, name);
   const int count = static_cast<int>(chart.points.size());
   QVDEBUGP("%s %d circle is detected using finder_point algorithm!", name, count);
   if (chart.points.size() != kMarks) {
@@ -79,11 +79,11 @@ int QVTester::GetMTFFromImage(cv::Mat image, float& mtf50Vertical, float& mtf50H
   PlaceRegions(chart, std::abs(chart.second.y - chart.corner.y));  // its absolute value here, the signed one above
 
   const cv::Rect& v = chart.vertical;
-  const cv::Mat vertical = Cut(chart, v);
+  const cv::Mat& vertical = chart.vertical_pixels = Cut(chart, v);
   QVDEBUGP("%s vertical roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, v.x, v.y,
            v.width, v.height, vertical.rows, vertical.cols);
   const cv::Rect& h = chart.horizontal;
-  const cv::Mat horizontal = Cut(chart, h);
+  const cv::Mat& horizontal = chart.horizontal_pixels = Cut(chart, h);
   QVDEBUGP("%s horizontal roi region x : %d, y : %d, width : %d, height : %d, row : %d, col : %d", name, h.x, h.y,
            h.width, h.height, horizontal.rows, horizontal.cols);
   CalculateMTF(InFloat(vertical), mtf50Vertical);

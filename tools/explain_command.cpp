@@ -4,7 +4,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
-#include "desk/measure/measurements.h"
+#include "desk/measure/figures.h"
 #include "tools/commands.h"
 #include "tools/program.h"
 
@@ -12,7 +12,7 @@ namespace qv {
 
 namespace {
 
-std::string Explain(const MeasurementInfo& info) {
+std::string Explain(const FigureInfo& info) {
   const Figure& figure = *info.figure;
   std::string unit = figure.unit.name;
   if (figure.axis != nullptr) unit += std::string(", over ") + figure.axis->name;
@@ -32,12 +32,12 @@ CommandBody DeclareExplain(Options& command) {
                     "NAME", false);
   return [names] {
     if (names->empty()) {
-      for (const MeasurementInfo& info : AllMeasurements()) std::cout << info.name << '\n';
+      for (const FigureInfo& info : AllFigures()) std::cout << info.name << '\n';
     }
     for (const std::string& name : *names) {
       bool found = false;
-      for (const MeasurementInfo& info : AllMeasurements()) {
-        const bool exact = FindMeasurement(name) != nullptr;
+      for (const FigureInfo& info : AllFigures()) {
+        const bool exact = FindFigure(name) != nullptr;
         if (exact ? info.name != name : info.name.find(name) == std::string::npos) continue;
         std::cout << (found ? "\n" : "") << Explain(info);
         found = true;

@@ -2,11 +2,8 @@
 #include <map>
 #include <memory>
 
-#include "core/property_table.h"
-#include "core/slots.h"
-#include "core/test_table.h"
 #include "desk/base/text.h"
-#include "desk/measure/codes.h"
+#include "desk/measure/library_tables.h"
 #include "tools/commands.h"
 #include "tools/program.h"
 

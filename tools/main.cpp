@@ -11,16 +11,34 @@ namespace qv {
 
 namespace {
 
+MeasuringCommand Sharpness(const char* measurement) {
+  MeasuringCommand command = {measurement};
+  command.extra = MakeTruthComparison;
+  return command;
+}
+
+MeasuringCommand Registration() {
+  MeasuringCommand command = {"registration"};
+  command.picture = "--matches";
+  command.picture_help = "Draw the good matches between both pictures";
+  command.extra = MakeProductOutput;
+  return command;
+}
+
 const std::vector<Command> kCommands = {
-    {"autofocus", "Measure the sharpness of a chart photo (test 14)", DeclareAutofocus},
-    {"mtf", "Measure the two MTF50 values of a chart photo, outside the numbered tests", DeclareMtf},
-    {"flash", "Measure the mean brightness of a flash photo (tests 15 and 18)", DeclareFlash},
-    {"capture", "Measure the colour patches of a chart photo (tests 16 and 20)", DeclareCapture},
-    {"dust", "Find dust on the lens in a photo of a plain target (tests 17 and 21)", DeclareDust},
-    {"preview", "Measure how much two preview frames differ (tests 13 and 19)", DeclarePreview},
-    {"circles", "Look for the chart's three marks in a preview frame", DeclareCircles},
-    {"dots", "Find bright and dark dots in a high-dynamic-range picture of a lit panel", DeclareDots},
-    {"register", "Bring a picture into the frame of a reference", DeclareRegister},
+    {"autofocus", "Measure the sharpness of a chart photo (test 14)", Sharpness("camera_autofocus")},
+    {"mtf", "Measure the two MTF50 values of a chart photo, outside the numbered tests", Sharpness("mtf_check")},
+    {"flash", "Measure the mean brightness of a flash photo (tests 15 and 18)",
+     MeasuringCommand{"camera_flash", "--vt", "The second camera's flash (test 18)", "camera_flash_vt"}},
+    {"capture", "Measure the colour patches of a chart photo (tests 16 and 20)",
+     MeasuringCommand{"camera_capture", "--front", "The front camera (test 20)", "camera_capture_front"}},
+    {"dust", "Find dust on the lens in a photo of a plain target (tests 17 and 21)",
+     MeasuringCommand{"lens_dust", "--front", "The front camera (test 21)", "lens_dust_front"}},
+    {"preview", "Measure how much two preview frames differ (tests 13 and 19)",
+     MeasuringCommand{"camera_preview", "--front", "The front camera's preview (test 19)", "camera_preview_front"}},
+    {"circles", "Look for the chart's three marks in a preview frame", MeasuringCommand{"circle_check"}},
+    {"dots", "Find bright and dark dots in a high-dynamic-range picture of a lit panel", MeasuringCommand{"hdr_dots"}},
+    {"register", "Bring a picture into the frame of a reference", Registration()},
     {"chart", "Draw the test chart", DeclareChart},
     {"simulate", "Take a photo of the chart with a camera of known faults", DeclareSimulate},
     {"verify", "Measure golden photos again and tell which number moved", DeclareVerify},

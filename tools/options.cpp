@@ -35,6 +35,10 @@ void Options::Text(const char* name, std::string& value, const std::string& help
   command_->add_option(name, value, WithDefault(help, value))->required(required)->type_name(type);
 }
 
+void Options::Text(const char* name, std::optional<std::string>& value, const std::string& help, const char* type) {
+  command_->add_option(name, value, help)->type_name(type);
+}
+
 void Options::Texts(const char* name, std::vector<std::string>& values, const std::string& help, const char* type) {
   command_->add_option(name, values, help)
       ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)

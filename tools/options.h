@@ -31,6 +31,8 @@ class Options {
                  bool required);
   void Flag(const char* name, bool& value, const std::string& help);
   void Text(const char* name, std::string& value, const std::string& help, const char* type, bool required = false);
+  /// Empty when it is not given.
+  void Text(const char* name, std::optional<std::string>& value, const std::string& help, const char* type);
   /// May be given again and again.
   void Texts(const char* name, std::vector<std::string>& values, const std::string& help, const char* type);
   void Choice(const char* name, std::string& value, const std::vector<std::string>& choices, const std::string& help,

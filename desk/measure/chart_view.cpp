@@ -5,42 +5,26 @@
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
+#include "chart/points.h"
+#include "chart/upright.h"
 #include "desk/base/text.h"
 #include "desk/drawing/picture.h"
-#include "qvtester/api.h"
+#include "desk/measure/histogram.h"
 
 namespace qv {
+
+const Method kScanMethod = {
+    "row scan for 1:1:3:1:1 with three cross-checks",
+    "Centres are good to 0.3 to 0.9 px, at most a fifth of a module on charts turned by about 30 degrees.",
+    "Moved by threshold and light where they reach a mark's edges, and by modules under 3 px."};
 
 namespace {
 
 constexpr double kSmallestModulePx = 3;
 constexpr double kLeastContrast = 20;  // grey levels between the two peaks
 
-// The points that the search handed out: row in x, column in y.
-std::vector<cv::Point> FoundPoints(const QVTester& tester) {
-  std::vector<cv::Point> points;
-  for (const QVFinderPattern& mark : tester.possibleCenters) {
-    if (points.size() < 3) points.emplace_back(mark.getY(), mark.getX());
-  }
-  return points;
-}
-
-Mark MarkAt(const QVTester& tester, cv::Point point) {
-  for (const QVFinderPattern& mark : tester.possibleCenters) {
-    // The search counts from pixel corners.
-    if (cv::Point(mark.getY(), mark.getX()) == point) {
-      return {{mark.x - 0.5, mark.y - 0.5}, mark.estimatedModuleSize};
-    }
-  }
-  return {};
-}
-
-// Levels of the photo as the tests weigh them: the first channel is taken for red.
-cv::Mat Gray(const cv::Mat& photo) {
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-  return gray;
-}
+// The search counts from pixel corners.
+Mark MarkOf(const QVFinderPattern& mark) { return {{mark.x - 0.5, mark.y - 0.5}, mark.estimatedModuleSize}; }
 
 // The commonest level, neighbours counted in, on each side of the level that parts dark from light best (Otsu's).
 struct GreyHistogram {
@@ -48,10 +32,13 @@ struct GreyHistogram {
   int parting;
 };
 
-GreyHistogram LookAtLevels(const cv::Mat& gray) {
+// Of the photo as the tests weigh it: the first channel is taken for red.
+GreyHistogram LookAtLevels(const cv::Mat& photo) {
+  cv::Mat gray;
+  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
   cv::Mat light;
   const int parting = cvRound(cv::threshold(gray, light, 0, 255, cv::THRESH_BINARY | cv::THRESH_OTSU));
-  std::array<double, 256> counts = {};
+  std::array<double, kGreyLevels> counts = {};
   for (int i = 0; i < gray.rows; ++i) {
     const auto* row = gray.ptr<uchar>(i);
     for (int j = 0; j < gray.cols; ++j) ++counts[row[j]];
@@ -76,6 +63,21 @@ GreyHistogram LookAtLevels(const cv::Mat& gray) {
   return {{dark < 0 ? bright : dark, bright < 0 ? dark : bright}, parting};  // one level alone is both
 }
 
+// The first threshold between the peaks at which a search succeeds.
+void TryThresholds(Miss& miss, const ChartView& view, const cv::Mat& photo, int parting) {
+  const auto [dark, light] = miss.peaks;
+  for (const int threshold :
+       {cvRound((dark + light) / 2), parting, cvRound((3 * dark + light) / 4), cvRound((dark + 3 * light) / 4)}) {
+    if (threshold == view.threshold) continue;
+    QVTester trial;
+    const ChartView found = LookAtChart(trial.FindChart(photo, threshold));
+    if (!found.complete() || !found.plausible()) continue;
+    miss.threshold = threshold;
+    miss.marks = found.marks;
+    return;
+  }
+}
+
 std::string MissSentence(const Miss& miss, const std::string& photo_path, QV_PROPERTY_INDEX threshold_property) {
   std::string sentence = photo_path + ": ";
   for (const std::string& reason : miss.reasons) sentence += (sentence.back() == ' ' ? "" : ", ") + reason;
@@ -85,43 +87,63 @@ std::string MissSentence(const Miss& miss, const std::string& photo_path, QV_PRO
                          : Format("; tried: property %d at %d finds all three", threshold_property, *miss.threshold));
 }
 
-std::vector<double> EdgeProfile(QVTester& tester, const cv::Mat& region) {
-  // The line through each row's steepest place is enough to draw the profile by.
-  cv::Mat derivative;
-  float taps[] = {0.5f, -0.5f};
-  tester.GetFirstDerivative(region, region.rows, region.cols, taps, 2, derivative);
-  derivative = cv::abs(derivative);
-  cv::Mat loc(region.rows, 1, CV_32F);
-  for (int i = 0; i < region.rows; ++i)
-    loc.at<float>(i) = tester.GetCentroid(derivative.row(i).mul(derivative.row(i)).t());
-  float slope = 0;
-  float offset = 0;
-  tester.FindEdge(loc, region.rows, &slope, &offset);
-  const cv::Mat profile = tester.ProjectData(region, slope, offset, 1);
-  return {profile.begin<float>(), profile.end<float>()};
-}
-
 }  // namespace
 
-ChartView LookAtChart(QVTester& tester, int threshold) {
+ChartView LookAtChart(const FoundChart& found) {
   ChartView view;
-  view.candidates = tester.startSize;
-  view.threshold = threshold;
-  std::vector<cv::Point> points = FoundPoints(tester);
-  if (points.size() != 3) {
-    for (const cv::Point& point : points) view.marks.push_back(MarkAt(tester, point));
-    return view;
-  }
-  std::array<cv::Point, 3> ordered;
-  tester.SortPatternPoints(points, ordered[0], ordered[1], ordered[2]);
-  for (const cv::Point& point : ordered) view.marks.push_back(MarkAt(tester, point));
+  view.candidates = found.candidates;
+  view.threshold = found.threshold;
+  for (const QVFinderPattern& mark : found.marks) view.marks.push_back(MarkOf(mark));
+  if (!view.complete()) return view;
   const cv::Point2d right = view.marks[1].centre - view.marks[0].centre;
   const cv::Point2d down = view.marks[2].centre - view.marks[0].centre;
   view.legs_ratio = cv::norm(right) / cv::norm(down);
   view.legs_angle_deg = std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI;
   view.turn_deg = std::atan2(0.0 - right.y, right.x) * 180 / CV_PI;  // never -0
-  view.straightened_by_deg = cvRound(std::remainder(tester.GetPatternAngle(points) - 315.0, 360.0));
+  view.straightened_by_deg = cvRound(std::remainder(found.angle_deg - static_cast<double>(kUprightAngle), 360.0));
   return view;
+}
+
+const std::vector<Figure>& ChartFigures() {
+  static const std::vector<Figure> figures = {
+      {"marks_found", kOne, Number::kWhole, nullptr, kScanMethod, "Finder marks that came back; three are needed."},
+      {"mark_candidates", kOne, Number::kWhole, nullptr, kScanMethod,
+       "Places that passed as finder marks before the best three were chosen; more than three deserve a look."},
+      {"marks", kPixel, Number::kReal, &kColumnAxis, kScanMethod,
+       "Centres of the marks that came back, column and row, pixel centres at whole numbers: corner, second, third."},
+      {"module_size", kPixel, Number::kReal, nullptr, kScanMethod,
+       "Mean module of the marks, a seventh of a mark's width along the scanned rows. Under 3 px marks may be "
+       "missed."},
+      {"legs_ratio", kOne, Number::kReal, nullptr, kScanMethod,
+       "Distance of corner and second mark over that of corner and third; 1 when the chart is seen straight on."},
+      {"legs_angle", kDegree, Number::kReal, nullptr, kScanMethod,
+       "Angle between the two legs at the corner mark; 90 when the chart is seen straight on."},
+      {"chart_turn", kDegree, Number::kReal, nullptr, kScanMethod,
+       "Turn of the chart in the photo, counter-clockwise: of the leg from the corner to the second mark."},
+      {"straightened_by", kDegree, Number::kWhole, nullptr, kScanMethod,
+       "Whole degrees, clockwise, by which the photo was turned upright before it was measured."},
+      {"threshold", kGreyLevel, Number::kWhole, nullptr, kScanMethod,
+       "Grey level above which a pixel counts as light."},
+      {"grey_peak_dark", kGreyLevel, Number::kWhole, nullptr, kBins,
+       "After a miss: the commonest level of what is dark in the photo."},
+      {"grey_peak_light", kGreyLevel, Number::kWhole, nullptr, kBins,
+       "After a miss: the commonest level of what is light in the photo."},
+      {"suggested_threshold", kGreyLevel, Number::kWhole, nullptr, kScanMethod,
+       "After a miss: a threshold between the grey peaks at which a search found three marks."},
+  };
+  return figures;
+}
+
+Parameter ThresholdParameter() {
+  return {"threshold",
+          Parameter::kWhole,
+          "N",
+          "Grey level above which a pixel is light",
+          nullptr,
+          0,
+          255,
+          {},
+          QV_PROPERTY_BINARY_THR_WORKING};
 }
 
 bool ChartView::plausible() const {
@@ -154,9 +176,7 @@ Miss ExplainMiss(const ChartView& view, const cv::Mat& photo) {
   Miss miss;
   const char* const counts[] = {"no finder mark was", "1 of 3 finder marks was", "2 of 3 finder marks were"};
   miss.reasons.push_back(Format("%s found", counts[std::min<std::size_t>(view.marks.size(), 2)]));
-
-  const cv::Mat gray = Gray(photo);
-  const GreyHistogram levels = LookAtLevels(gray);
+  const GreyHistogram levels = LookAtLevels(photo);
   miss.peaks = levels.peaks;
   const auto [dark, light] = levels.peaks;
   const double margin = (light - dark) / 8;
@@ -173,45 +193,35 @@ Miss ExplainMiss(const ChartView& view, const cv::Mat& photo) {
         Format("the marks are small (%.1f pixels a module; %.0f are needed)", mark.module_px, kSmallestModulePx));
     break;
   }
-
-  for (const int threshold : {cvRound((dark + light) / 2), levels.parting, cvRound((3 * dark + light) / 4),
-                              cvRound((dark + 3 * light) / 4)}) {
-    if (threshold == view.threshold) continue;
-    QVTester trial;
-    trial.GetFinderPoints(gray > threshold);
-    const ChartView found = LookAtChart(trial, threshold);
-    if (!found.complete() || !found.plausible()) continue;
-    miss.threshold = threshold;
-    miss.marks = found.marks;
-    break;
-  }
+  TryThresholds(miss, view, photo, levels.parting);
   return miss;
 }
 
-ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo,
+ChartView DescribeChart(Record& record, const FoundChart& found, const std::string& photo_path, const cv::Mat& photo,
                         QV_PROPERTY_INDEX threshold_property) {
-  int threshold = 0;
-  theTester->GetProperty(threshold_property, &threshold);
-  ChartView view = LookAtChart(*theTester, threshold);
+  ChartView view = LookAtChart(found);
   AddChartFigures(record.phase, view);
   if (!view.complete()) {
     view.miss = ExplainMiss(view, photo);
     record.phase.Add("grey_peak_dark", view.miss->peaks.dark);
     record.phase.Add("grey_peak_light", view.miss->peaks.light);
     if (view.miss->threshold) record.phase.Add("suggested_threshold", *view.miss->threshold);
-    record.details.push_back(MissSentence(*view.miss, photo_path, threshold_property));
+    record.Say(Remark::kMiss, "marks_not_found", MissSentence(*view.miss, photo_path, threshold_property),
+               "marks_found");
     return view;
   }
   if (!view.plausible()) {
-    record.doubtful = true;
-    record.details.push_back(
-        Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "
-               "not as 1 to 1 at 90; is the chart seen straight on, and nothing else like a mark?",
-               photo_path.c_str(), view.legs_ratio, view.legs_angle_deg));
+    record.Say(Remark::kDoubt, "implausible_marks",
+               Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "
+                      "not as 1 to 1 at 90; is the chart seen straight on, and nothing else like a mark?",
+                      photo_path.c_str(), view.legs_ratio, view.legs_angle_deg),
+               "legs_ratio");
   }
-  if (view.candidates > 3) {
-    record.details.push_back(Format("%s: %d places passed as finder marks; the three most alike were used",
-                                    photo_path.c_str(), view.candidates));
+  if (view.candidates > static_cast<int>(kMarks)) {
+    record.Say(Remark::kWarning, "more_candidates",
+               Format("%s: %d places passed as finder marks; the three most alike were used", photo_path.c_str(),
+                      view.candidates),
+               "mark_candidates");
   }
   return view;
 }
@@ -251,7 +261,9 @@ void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place)
   }
 }
 
-std::array<cv::Point2d, 4> UprightPhoto::OnPhoto(const cv::Rect& region) const {
+std::array<cv::Point2d, 4> OnPhoto(const FoundChart& found, const cv::Rect& region) {
+  cv::Matx23d photo_from_upright;
+  cv::invertAffineTransform(found.turn.map, photo_from_upright);
   const double left = region.x - 0.5;
   const double top = region.y - 0.5;
   const cv::Vec3d corners[] = {{left, top, 1},
@@ -264,35 +276,6 @@ std::array<cv::Point2d, 4> UprightPhoto::OnPhoto(const cv::Rect& region) const {
     outline[i] = {p[0], p[1]};
   }
   return outline;
-}
-
-UprightPhoto Straighten(QVTester& tester, const cv::Mat& photo) {
-  UprightPhoto upright;
-  std::vector<cv::Point> points = FoundPoints(tester);
-  const float rotation = 315.0f - tester.GetPatternAngle(points);
-  tester.NormalizePatternImage(photo, points, upright.picture);
-  tester.SortPatternPoints(points, upright.corner, upright.second, upright.third);
-  const float middle = static_cast<float>(upright.picture.cols) * 0.5f;
-  cv::invertAffineTransform(cv::getRotationMatrix2D({middle, middle}, rotation, 1.0), upright.photo_from_upright);
-  return upright;
-}
-
-std::array<cv::Rect, 2> MeasuredRegions(const UprightPhoto& upright) {
-  const float scale = static_cast<float>(upright.second.y - upright.corner.y) / kChartSide;
-  return {PlaceRegion(kVerticalRegion, upright.corner, scale), PlaceRegion(kHorizontalRegion, upright.corner, scale)};
-}
-
-std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo) {
-  const UprightPhoto upright = Straighten(tester, Gray(photo));
-  const std::array<cv::Rect, 2> regions = MeasuredRegions(upright);
-  std::array<RegionView, 2> views;
-  for (std::size_t i = 0; i < views.size(); ++i) {
-    views[i].outline = upright.OnPhoto(regions[i]);
-    upright.picture(regions[i]).convertTo(views[i].pixels, CV_32F);
-    views[i].pixels = tester.ConvertToVertical(views[i].pixels);
-    views[i].edge_profile = EdgeProfile(tester, views[i].pixels);
-  }
-  return views;
 }
 
 }  // namespace qv

@@ -7,14 +7,14 @@
 #include <string>
 #include <vector>
 
-#include "chart/chart_layout.h"
 #include "desk/drawing/picture.h"
+#include "desk/measure/measurement.h"
 #include "desk/measure/record.h"
 #include "qvtester/tester.h"
 
 namespace qv {
 
-// What the last search for finder marks saw of a chart photo, read back from the tester.
+// What a search for finder marks saw of a chart photo, told to people.
 
 struct Mark {
   cv::Point2d centre;  // column, row; pixel centres at whole numbers
@@ -50,20 +50,26 @@ struct ChartView {
   bool complete() const { return marks.size() == 3; }
 };
 
-/// Looks at the tester's search state; call right after the test that searched, at this threshold.
-ChartView LookAtChart(QVTester& tester, int threshold);
-
-/// Adds marks, module size, legs, turn and threshold to the phase.
-void AddChartFigures(Phase& phase, const ChartView& view);
+/// What a search has found, in photo coordinates.
+ChartView LookAtChart(const FoundChart& found);
 
 /// Why three marks did not come back: how many did, a threshold off the picture's two grey peaks, marks too small. A
 /// threshold between the peaks is suggested only when a search at it succeeds.
 Miss ExplainMiss(const ChartView& view, const cv::Mat& photo);
 
-/// Looks at the chart after a test on this photo: adds its figures to the record, and a sentence about a miss, a
-/// doubtful find or more candidates than marks. `threshold_property` is the one that the test's search read.
-ChartView DescribeChart(Record& record, const std::string& photo_path, const cv::Mat& photo,
+/// Looks at what a test has found on this photo: adds its figures to the record, and a remark about a miss, a doubtful
+/// find or more candidates than marks. `threshold_property` is the one that the test's search read.
+ChartView DescribeChart(Record& record, const FoundChart& found, const std::string& photo_path, const cv::Mat& photo,
                         QV_PROPERTY_INDEX threshold_property = QV_PROPERTY_BINARY_THR_WORKING);
+
+/// How the marks are found.
+extern const Method kScanMethod;
+
+/// The figures that DescribeChart adds.
+const std::vector<Figure>& ChartFigures();
+
+/// The threshold of the marks' search, as all measurements that look for the chart offer it.
+Parameter ThresholdParameter();
 
 /// "marks ..." and "chart ..." lines for a person.
 std::string ReportChart(const ChartView& view);
@@ -72,30 +78,8 @@ std::string ReportChart(const ChartView& view);
 /// finds, and the reasons.
 void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place);
 
-/// A photo straightened as the measures do it, and the way back.
-struct UprightPhoto {
-  cv::Mat picture;
-  cv::Point corner, second, third;  // row in x, column in y
-  cv::Matx23d photo_from_upright;
-
-  std::array<cv::Point2d, 4> OnPhoto(const cv::Rect& region) const;  // corners, column and row
-};
-
-/// Straightens by the three marks that the last search left in the tester.
-UprightPhoto Straighten(QVTester& tester, const cv::Mat& photo);
-
-/// Where the sharpness measures cut their two regions from the upright picture, vertical first.
-std::array<cv::Rect, 2> MeasuredRegions(const UprightPhoto& upright);
-
-/// A measured sharpness region in detail.
-struct RegionView {
-  std::array<cv::Point2d, 4> outline;  // on the photo, column and row
-  cv::Mat pixels;                      // of the straightened picture, CV_32F, the edge running down the rows
-  std::vector<double> edge_profile;    // mean grey level a bin of one pixel, across the edge
-};
-
-/// Cuts both regions, vertical first, as the measures do.
-std::array<RegionView, 2> LookAtRegions(QVTester& tester, const cv::Mat& photo);
+/// Corners of a rectangle of the upright picture where they lie on the photo: column and row, from top left clockwise.
+std::array<cv::Point2d, 4> OnPhoto(const FoundChart& found, const cv::Rect& region);
 
 }  // namespace qv
 

@@ -4,7 +4,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/json.h"
-#include "desk/measure/measurements.h"
+#include "desk/measure/figures.h"
 
 namespace qv {
 
@@ -12,7 +12,7 @@ namespace {
 
 Limit ReadLimit(const std::string& where, const std::string& name, const Json& json) {
   const auto refuse = [&](const std::string& why) { throw Failure(kWrongUsage, where + why); };
-  const MeasurementInfo* info = FindMeasurement(name);
+  const FigureInfo* info = FindFigure(name);
   if (info == nullptr) refuse("no measurement has this name");
   if (info->figure->axis != nullptr) refuse("a list has no limits");
   if (!json.is_object()) refuse("it is " + json.dump() + ", not an object of bounds");

@@ -2,27 +2,29 @@
 
 #include <algorithm>
 #include <cmath>
+#include <stdexcept>
 
 #include "desk/base/json.h"
-#include "desk/base/side_output.h"
+#include "desk/base/text.h"
+#include "desk/measure/codes.h"
 #include "qvtester/indices.h"
 
 namespace qv {
 
 namespace {
 
-Json ToJson(const Unit& unit) {
+Json JsonOf(const Unit& unit) {
   return {{"name", unit.name}, {"code", unit.code == nullptr ? Json() : Json(unit.code)}, {"suffix", unit.suffix}};
 }
 
 const char* NonFiniteName(double value) { return std::isnan(value) ? "nan" : value > 0 ? "inf" : "-inf"; }
 
-Json ToJson(double value, Number number) {
+Json JsonOf(double value, Number number) {
   if (!std::isfinite(value)) return nullptr;
   return number == Number::kWhole ? Json(static_cast<std::int64_t>(value)) : Json(value);
 }
 
-Json ToJson(const Limit& limit) {
+Json JsonOf(const Limit& limit) {
   Json json = Json::object();
   const auto add = [&](const char* key, const std::optional<double>& bound) {
     if (bound) json[key] = *bound;
@@ -34,7 +36,12 @@ Json ToJson(const Limit& limit) {
   return json;
 }
 
-Json ToJson(const Measurement& m) {
+Json JsonOf(const Uncertainty& u) {
+  return {
+      {"standard", u.standard}, {"expanded", u.expanded}, {"coverage_factor", u.coverage_factor}, {"method", u.method}};
+}
+
+Json JsonOf(const Reading& m) {
   Json json = {{"name", m.info->name}, {"outcome", Name(m.outcome)}};
   if (m.marginal) json["marginal"] = true;
   if (m.outcome == Outcome::kUnset) {
@@ -44,22 +51,61 @@ Json ToJson(const Measurement& m) {
     const std::string axis_suffix = m.info->figure->axis->suffix;
     const bool whole_axis = axis_suffix == "1" || axis_suffix == "level";
     for (std::size_t i = 0; i < m.values.size(); ++i) {
-      points.push_back({ToJson(m.axis[i], whole_axis ? Number::kWhole : Number::kReal),
-                        ToJson(m.values[i], m.info->figure->number)});
+      points.push_back({JsonOf(m.axis[i], whole_axis ? Number::kWhole : Number::kReal),
+                        JsonOf(m.values[i], m.info->figure->number)});
     }
-    Json dimension = ToJson(*m.info->figure->axis);
+    Json dimension = JsonOf(*m.info->figure->axis);
     dimension["description"] = "";
     json["dimensions"] = Json::array({dimension});  // braces alone are a copy to some compilers
   } else {
-    json["measured_value"] = ToJson(m.value(), m.info->figure->number);
+    json["measured_value"] = JsonOf(m.value(), m.info->figure->number);
   }
   const auto bad = std::find_if(m.values.begin(), m.values.end(), [](double v) { return !std::isfinite(v); });
   if (bad != m.values.end()) json["non_finite"] = NonFiniteName(*bad);
-  json["units"] = ToJson(m.info->figure->unit);
+  if (m.uncertainty) json["uncertainty"] = JsonOf(*m.uncertainty);
+  json["units"] = JsonOf(m.info->figure->unit);
   json["method"] = m.info->figure->method.name;
-  if (const Json limits = ToJson(m.limit); !limits.empty()) json["limits"] = limits;
+  if (const Json limits = JsonOf(m.limit); !limits.empty()) json["limits"] = limits;
   json["docstring"] = Explanation(*m.info->figure);
   return json;
+}
+
+Json JsonOf(const Remark& remark, int code) {
+  constexpr const char* kWeights[] = {"warning", "miss", "doubt", "no judgement"};
+  Json json = {
+      {"code", code}, {"description", remark.sentence}, {"name", remark.name}, {"weight", kWeights[remark.weight]}};
+  if (!remark.figure.empty()) json["figure"] = remark.figure;
+  return json;
+}
+
+Json JsonOf(const RecordedInput& input) {
+  return {{"slot", input.slot},
+          {"path", input.path},
+          {"sha256", input.sha256.empty() ? Json() : Json(input.sha256)},
+          {"pixels_hash", input.pixels_hash.empty() ? Json() : Json(input.pixels_hash)},
+          {"width", input.width},
+          {"height", input.height}};
+}
+
+Json JsonOf(const Record& record, const Phase& phase) {
+  Json measurements = Json::object();
+  for (const Reading& m : phase.readings) measurements[m.info->name] = JsonOf(m);
+  Json attachments = Json::object();
+  for (const Attachment& a : phase.attachments) {
+    attachments[a.name] = {{"mimetype", a.mimetype}, {"sha1", a.sha1}, {"path", a.path}};
+  }
+  return {{"name", phase.name},
+          {"outcome", Name(record.outcome())},
+          {"result_code", phase.code},
+          {"marginal", record.marginal()},
+          {"start_time_millis", phase.start_millis},
+          {"end_time_millis", phase.end_millis},
+          {"measurements", measurements},
+          {"attachments", attachments}};
+}
+
+bool Holds(const std::vector<Remark>& remarks, Remark::Weight weight) {
+  return std::any_of(remarks.begin(), remarks.end(), [=](const Remark& remark) { return remark.weight == weight; });
 }
 
 bool Within(double value, const std::optional<double>& min, const std::optional<double>& max) {
@@ -77,23 +123,28 @@ const char* Name(Outcome outcome) {
   }
 }
 
-Measurement& Phase::New(const std::string& figure) {
-  Measurement m;
-  m.info = FindMeasurement(name + "_" + figure);
-  if (m.info == nullptr) throw std::logic_error("no such measurement: " + name + "_" + figure);
-  return measurements.emplace_back(std::move(m));
+Reading& Phase::New(const std::string& figure) {
+  Reading m;
+  m.info = FindFigure(name + "_" + figure);
+  if (m.info == nullptr) throw std::logic_error("no such figure: " + name + "_" + figure);
+  return readings.emplace_back(std::move(m));
 }
 
-void Phase::Add(const std::string& figure, double value) { New(figure).values = {value}; }
+Reading& Phase::Add(const std::string& figure, double value) {
+  Reading& m = New(figure);
+  m.values = {value};
+  return m;
+}
 
-void Phase::Add(const std::string& figure, std::vector<double> axis, std::vector<double> values) {
-  Measurement& m = New(figure);
+Reading& Phase::Add(const std::string& figure, std::vector<double> axis, std::vector<double> values) {
+  Reading& m = New(figure);
   m.axis = std::move(axis);
   m.values = std::move(values);
+  return m;
 }
 
-const Measurement* Phase::Find(const std::string& figure) const {
-  for (const Measurement& m : measurements) {
+const Reading* Phase::Find(const std::string& figure) const {
+  for (const Reading& m : readings) {
     if (m.info->name == name + "_" + figure) return &m;
   }
   return nullptr;
@@ -101,11 +152,15 @@ const Measurement* Phase::Find(const std::string& figure) const {
 
 void Record::Judge() {
   for (const auto& [name, limit] : limits.by_name) {  // what was asked of this test and not measured is shown as such
-    const MeasurementInfo* const info = FindMeasurement(name);
-    if (info->phase != phase.name || phase.Find(info->figure->name) != nullptr) continue;
-    phase.measurements.push_back({info, {}, {}, limit, Outcome::kUnset, false});
+    const FigureInfo* const info = FindFigure(name);
+    if (info->measurement != phase.name || phase.Find(info->figure->name) != nullptr) continue;
+    Reading unset;
+    unset.info = info;
+    unset.limit = limit;
+    unset.outcome = Outcome::kUnset;
+    phase.readings.push_back(unset);
   }
-  for (Measurement& m : phase.measurements) {
+  for (Reading& m : phase.readings) {
     const auto limit = limits.by_name.find(m.info->name);
     if (limit == limits.by_name.end() || m.outcome == Outcome::kUnset) continue;
     m.limit = limit->second;
@@ -114,37 +169,47 @@ void Record::Judge() {
   }
 }
 
+bool Record::measured() const { return phase.code == QV_SUCCESS && !Holds(remarks, Remark::kNoJudgement); }
+
 Outcome Record::outcome() const {
-  if (phase.code != QV_SUCCESS || cannot_judge) return Outcome::kError;
-  const bool failed = std::any_of(phase.measurements.begin(), phase.measurements.end(),
-                                  [](const Measurement& m) { return m.outcome == Outcome::kFail; });
-  return failed || doubtful ? Outcome::kFail : Outcome::kPass;
+  if (!measured()) return Outcome::kError;
+  const bool failed = std::any_of(phase.readings.begin(), phase.readings.end(),
+                                  [](const Reading& m) { return m.outcome == Outcome::kFail; });
+  return failed || Holds(remarks, Remark::kDoubt) ? Outcome::kFail : Outcome::kPass;
 }
 
 bool Record::limited() const {
-  return std::any_of(phase.measurements.begin(), phase.measurements.end(),
-                     [](const Measurement& m) { return m.limit.given(); });
+  return std::any_of(phase.readings.begin(), phase.readings.end(), [](const Reading& m) { return m.limit.given(); });
 }
 
-std::string Record::ToText() const { return ToJson().dump(2, ' ', false, Json::error_handler_t::replace) + "\n"; }
-
 bool Record::marginal() const {
-  return std::any_of(phase.measurements.begin(), phase.measurements.end(),
-                     [](const Measurement& m) { return m.marginal; });
+  return std::any_of(phase.readings.begin(), phase.readings.end(), [](const Reading& m) { return m.marginal; });
+}
+
+std::string Record::MissSentence() const {
+  std::string text;
+  for (const Remark& remark : remarks) text += (text.empty() ? "" : "; ") + remark.sentence;
+  if (phase.code == QV_SUCCESS) return text;
+  // The circle check answers a miss with 0.
+  const ResultCode& row = FindCode(phase.code == QV_DONE ? QV_ERROR_PATTERN_NOT_FOUND : phase.code);
+  if (text.empty()) text = row.meaning;
+  const std::string look_at = advice.empty() || row.code != QV_ERROR_INVALID_ARGUMENT ? row.look_at : advice;
+  if (row.code != phase.code) {
+    return Format("%s (code %d: %s); %s", text.c_str(), phase.code, row.meaning, look_at.c_str());
+  }
+  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name, row.meaning, look_at.c_str());
 }
 
 Json Record::ToJson() const {
   Json json;
-  json["schema"] = "qvtester-record-1";
+  json["schema"] = kRecordSchema;
   json["dut_id"] = dut_id;
   json["station_id"] = station_id;
   json["start_time_millis"] = start_millis;
   json["end_time_millis"] = end_millis;
   json["outcome"] = Name(outcome());
   json["outcome_details"] = Json::array();
-  for (const std::string& sentence : details) {
-    json["outcome_details"].push_back({{"code", phase.code}, {"description", sentence}});
-  }
+  for (const Remark& remark : remarks) json["outcome_details"].push_back(JsonOf(remark, phase.code));
   json["marginal"] = marginal();
   json["metadata"] = {{"test_name", test_name},
                       {"test_index", test_index ? Json(*test_index) : Json()},
@@ -152,29 +217,10 @@ Json Record::ToJson() const {
                       {"command", command},
                       {"limits", {{"name", limits.name}, {"revision", limits.revision}}},
                       {"properties", properties}};
-
-  Json measurements = Json::object();
-  for (const Measurement& m : phase.measurements) measurements[m.info->name] = qv::ToJson(m);
-  Json attachments = Json::object();
-  for (const Attachment& a : phase.attachments) {
-    attachments[a.name] = {{"mimetype", a.mimetype}, {"sha1", a.sha1}, {"path", a.path}};
-  }
-  json["phases"] = {{{"name", phase.name},
-                     {"outcome", Name(outcome())},
-                     {"result_code", phase.code},
-                     {"marginal", marginal()},
-                     {"start_time_millis", phase.start_millis},
-                     {"end_time_millis", phase.end_millis},
-                     {"measurements", measurements},
-                     {"attachments", attachments}}};
+  json["request"] = qv::ToJson(request);
+  json["phases"] = Json::array({JsonOf(*this, phase)});
   json["inputs"] = Json::array();
-  for (const Input& input : inputs) {
-    json["inputs"].push_back({{"slot", input.slot},
-                              {"path", input.path},
-                              {"sha256", input.sha256},
-                              {"width", input.width},
-                              {"height", input.height}});
-  }
+  for (const RecordedInput& input : inputs) json["inputs"].push_back(JsonOf(input));
   json["log_records"] = Json::array();
   for (const LogLine& line : log_lines) {
     json["log_records"].push_back(
@@ -182,5 +228,7 @@ Json Record::ToJson() const {
   }
   return json;
 }
+
+std::string Record::ToText() const { return ToJson().dump(2, ' ', false, Json::error_handler_t::replace) + "\n"; }
 
 }  // namespace qv

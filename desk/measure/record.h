@@ -2,26 +2,40 @@
 #define QVTESTER_DESK_MEASURE_RECORD_H_
 
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "desk/base/json.h"
-#include "desk/base/side_output.h"
+#include "desk/base/log_lines.h"
+#include "desk/measure/figures.h"
 #include "desk/measure/limits.h"
-#include "desk/measure/measurements.h"
+#include "desk/measure/request.h"
 
 namespace qv {
 
-// One run as OpenHTF records it, with limits, method and the input's hash (docs/record.schema.json).
+class Finding;
+
+// One run as OpenHTF records it, with request, limits, method and the inputs' hashes (docs/record.schema.json).
+
+inline constexpr const char kRecordSchema[] = "qvtester-record-1";
 
 enum class Outcome { kPass, kFail, kError, kUnset };
 const char* Name(Outcome outcome);
 
-struct Measurement {
-  const MeasurementInfo* info = nullptr;
+/// How far a value may be trusted, in its own unit (GUM).
+struct Uncertainty {
+  double standard, expanded, coverage_factor;
+  std::string method;
+};
+
+/// A figure's value.
+struct Reading {
+  const FigureInfo* info = nullptr;
   std::vector<double> values;  // one, or those of a list
   std::vector<double> axis;    // of a list: frequencies in units of Nyquist, or columns
+  std::optional<Uncertainty> uncertainty;
   Limit limit;
   Outcome outcome = Outcome::kPass;
   bool marginal = false;
@@ -37,43 +51,70 @@ struct Phase {
   std::string name;
   int code = 0;
   std::int64_t start_millis = 0, end_millis = 0;
-  std::vector<Measurement> measurements;
+  std::vector<Reading> readings;
   std::vector<Attachment> attachments;
 
   /// Adds a figure by the last part of its name ("mtf50_vertical"); the phase's name is put in front.
-  void Add(const std::string& figure, double value);
-  void Add(const std::string& figure, std::vector<double> axis, std::vector<double> values);
-  const Measurement* Find(const std::string& figure) const;
+  Reading& Add(const std::string& figure, double value);
+  Reading& Add(const std::string& figure, std::vector<double> axis, std::vector<double> values);
+  const Reading* Find(const std::string& figure) const;
 
  private:
-  Measurement& New(const std::string& figure);
+  Reading& New(const std::string& figure);
 };
 
-struct Input {
+struct RecordedInput {
   int slot = 0;
-  std::string path, sha256;
+  std::string path;         // or what people call it
+  std::string sha256;       // of the file; empty for a picture from memory
+  std::string pixels_hash;  // of the pixels as they lie in the slot: 128 bits of XXH3
   int width = 0, height = 0;
+};
+
+/// A sentence about a run.
+struct Remark {
+  enum Weight {
+    kWarning,      // worth knowing
+    kMiss,         // why there is no result
+    kDoubt,        // measured, but not to be trusted: never a PASS
+    kNoJudgement,  // the test ran, but its figures say nothing about the unit
+  };
+  Weight weight;
+  std::string name;  // "clipped": by which it may be told from others
+  std::string sentence;
+  std::string figure = {};  // that it rests on, without the phase's name; may be empty
 };
 
 struct Record {
   std::string dut_id, station_id, test_name;
   std::optional<int> test_index;
   std::int64_t start_millis = 0, end_millis = 0;
+  Request request;                   // resolved: what to run again
   std::vector<std::string> command;  // that made it, for people
   Limits limits;
   Json properties = Json::object();  // those that differ from their defaults, by index
   Phase phase;
-  std::vector<Input> inputs;
+  std::vector<RecordedInput> inputs;
   std::vector<LogLine> log_lines;
-  std::vector<std::string> details;  // why a run is an ERROR or what to doubt, a sentence each
-  bool doubtful = false;             // measured, but not to be trusted: never a PASS
-  bool cannot_judge = false;         // the test ran, but its figures say nothing about the unit
+  std::vector<std::string> chatter;  // what decoders wrote on the side; not stored
+  std::vector<Remark> remarks;
+  std::optional<std::size_t> refused;      // the input that the library refused, where that is known
+  std::string advice;                      // what to look at when an input is refused; empty: the code's own
+  std::shared_ptr<const Finding> finding;  // none when an input could not be loaded
+
+  void Say(Remark::Weight weight, std::string name, std::string sentence, std::string figure = {}) {
+    remarks.push_back({weight, std::move(name), std::move(sentence), std::move(figure)});
+  }
 
   /// Holds every figure against its limit. Call once, when all figures are in.
   void Judge();
   Outcome outcome() const;
+  /// Code 1, and nothing that forbids a judgement.
+  bool measured() const;
   bool marginal() const;
   bool limited() const;  // some figure of this test has a limit
+  /// Why it could not be measured: where, why, which code, what to do about it.
+  std::string MissSentence() const;
   Json ToJson() const;
   /// The record as a file's content; what is not UTF-8 is replaced.
   std::string ToText() const;

@@ -48,8 +48,13 @@ struct FoundChart {
   UprightTurn turn;  // no canvas until then
   cv::Point corner, second, third;
 
-  // Once the sharpness measures have placed their regions: column, row, width, height on the canvas.
+  // Once the sharpness measures have placed their regions: column, row, width, height on the canvas, and the pixels
+  // that were measured, CV_8UC1.
   cv::Rect vertical, horizontal;
+  cv::Mat vertical_pixels, horizontal_pixels;
+
+  // Once the capture test has sampled them, as GetColorPatchRGB answers them.
+  std::vector<cv::Point3i> patches;
 };
 
 /// The tester: properties, input slots, result block, and every test and measuring step as a member.
@@ -205,6 +210,10 @@ class QV_API QVTester {
   /// Row scan with three cross-checks, after the finder search of QR codes (ISO/IEC 18004); where and why ours
   /// differs: chart/QVTester_Finder.cpp.
   std::vector<cv::Point> GetFinderPoints(cv::Mat image);
+  /// Looks for the finder marks of a chart photo and keeps what it finds: grey picture, light above the threshold,
+  /// search, marks in their order. `name` is the measure that logs the threshold; null: none does.
+  /// @throws cv::Exception for a photo without three or four channels, or (StsUnsupportedFormat) of other than 8 bits.
+  FoundChart& FindChart(cv::Mat photo, int threshold, const char* name = nullptr);
 
   // Steps of the search, on its state below. Counts are the five run lengths dark, light, dark, light, dark.
   bool foundPatternCross(int* stateCount);
@@ -421,6 +430,7 @@ class QV_API QVTester {
     bool is_extracted = false;
     int count = 0;                           // patches
     std::unique_ptr<float[]> standard_lab_;  // triples L*, a*, b*
+    std::vector<cv::Point3i> patches;        // as GetColorPatchRGB answers them
   };
 
   // What the last detectBlob saw; a copy that shares it stays as it is when the next one runs.

@@ -18,8 +18,6 @@
 namespace {
 
 constexpr const char* kName = "TestCameraCapture";
-constexpr int kWhitePatch = 9;
-constexpr std::array<int, 4> kPatchesWithoutStandard = {12, 13, 14, kWhitePatch};
 constexpr std::size_t kFewestPatches = 15;  // up to the last of those
 
 struct Triple {
@@ -115,7 +113,7 @@ float DeltaE(const float* a, const float* b) {
 // Measures the standard photo, once in the tester's life. 1, or -91.
 int ExtractStandard(QVTester& tester, const cv::Mat& photo, QVTester::ColorStandard& standard) {
   QVDEBUGP("[%s] !(*ptr_is_extracted) and is_standard_image_exists", kName);
-  FoundChart& chart = FindChart(tester, photo, tester.prop_param_86_);
+  FoundChart& chart = tester.FindChart(photo, tester.prop_param_86_);
   chart.of_standard = true;
   const int count = static_cast<int>(chart.points.size());
   QVDEBUGP("[%s] finder point : %d", kName, count);
@@ -123,7 +121,8 @@ int ExtractStandard(QVTester& tester, const cv::Mat& photo, QVTester::ColorStand
     QVDEBUGP("[%s] TestCameraCapture1, finder point : %d \n return PATTERN NOT FOUND!", kName, count);
     return QV_ERROR_PATTERN_NOT_FOUND;
   }
-  const Patches patches = SamplePatches(tester, photo, chart);
+  const Patches& patches = chart.patches = SamplePatches(tester, photo, chart);
+  standard.patches = patches;
   standard.standard_lab_ = LabOf(tester, patches, WhiteOf(tester, patches));
   standard.count = static_cast<int>(patches.size());
   standard.is_extracted = true;
@@ -142,13 +141,13 @@ int PrepareStandard(QVTester& tester, int slot, QVTester::ColorStandard& standar
 
 // Colours of the captured photo's patches. 1, -91, or -87.
 int MeasurePatches(QVTester& tester, const cv::Mat& photo, Patches& patches) {
-  FoundChart& chart = FindChart(tester, photo, tester.prop_binary_thr_working_, kName);
+  FoundChart& chart = tester.FindChart(photo, tester.prop_binary_thr_working_, kName);
   if (chart.points.size() != kMarks) {
     QVDEBUGP("[%s] TestCameraCapture2 finder point : %d \n return PATTERN NOT FOUND!", kName,
              static_cast<int>(chart.points.size()));
     return QV_ERROR_PATTERN_NOT_FOUND;
   }
-  patches = SamplePatches(tester, photo, chart);
+  patches = chart.patches = SamplePatches(tester, photo, chart);
   return patches.size() < kFewestPatches ? QV_ERROR_NO_PATCHES : QV_SUCCESS;
 }
 

@@ -18,12 +18,10 @@
 #include "platform/properties.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
+#include "tests/camera/lens_dust.h"
 
 namespace {
 
-constexpr int kBins = 256;
-constexpr int kCornerPx = 20;
-constexpr int kMostPlaces = 5;
 constexpr double kDarkShare = 0.5;  // of the mean: darker pixels count in detectMung
 
 struct DustResult {
@@ -40,8 +38,8 @@ DustResult DustFields(QVResultData& r, bool front) {
 // One row of 256 counts.
 cv::Mat Histogram(const cv::Mat& gray) {
   const int channel = 0;
-  const int bins = kBins;
-  const float range[] = {0, kBins};
+  const int bins = kGreyLevels;
+  const float range[] = {0, kGreyLevels};
   const float* ranges[] = {range};
   cv::Mat histogram;
   cv::calcHist(&gray, 1, &channel, cv::noArray(), histogram, 1, &bins, ranges);
@@ -81,8 +79,8 @@ int QVTester::TestLensDust(bool front, bool fake_mode) {
   const int blob_count = fake_mode ? -1 : detectBlob(gray);
 
   const cv::Mat histogram = Histogram(gray);
-  auto copy = std::make_unique<int[]>(kBins);
-  std::copy_n(histogram.ptr<int>(), kBins, copy.get());
+  auto copy = std::make_unique<int[]>(kGreyLevels);
+  std::copy_n(histogram.ptr<int>(), kGreyLevels, copy.get());
   const cv::Mat& reference = front ? prop_table_0_ : prop_table_1_;
   const DustResult result = DustFields(Results(*this), front);
   if (!reference.empty()) {

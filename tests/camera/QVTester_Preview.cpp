@@ -84,7 +84,7 @@ int QVTester::CheckPatternCircles(int cam_id) {
   const char* const name = "CheckPatternCircles";
   cv::Mat frame;
   if (const int code = FetchImage(*this, QV_RESOURCE_CHART_PHOTO, frame); code != QV_SUCCESS) return code;
-  FoundChart& chart = FindChart(*this, frame, prop_binary_thr_working_);
+  FoundChart& chart = FindChart(frame, prop_binary_thr_working_);
   QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, chart.gray.rows, chart.gray.cols);
 
   const std::array<char, 32> count = Short("%d", static_cast<int>(chart.points.size()));

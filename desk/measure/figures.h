@@ -1,5 +1,5 @@
-#ifndef QVTESTER_DESK_MEASURE_MEASUREMENTS_H_
-#define QVTESTER_DESK_MEASURE_MEASUREMENTS_H_
+#ifndef QVTESTER_DESK_MEASURE_FIGURES_H_
+#define QVTESTER_DESK_MEASURE_FIGURES_H_
 
 #include <string>
 #include <string_view>
@@ -7,7 +7,7 @@
 
 namespace qv {
 
-// Every figure that a record may hold: name, unit, method, meaning.
+// Every figure that a record may hold: name, unit, method, meaning. Each measurement names its own in its row.
 
 /// As OpenHTF writes units: a name, the UNECE code (null where there is none) and the suffix shown behind a value.
 struct Unit {
@@ -40,18 +40,23 @@ struct Method {
   const char* moved_by;  // what changes them
 };
 
-/// One kind of figure; the measurement's name is that of the test (its phase), "_", and the figure's.
+/// The grey levels of a photo, counted.
+inline constexpr Method kBins = {"256 bins of one grey level", "Exact for the photo as stored.",
+                                 "Moved by exposure, shading and noise."};
+
+/// One kind of figure; in a record its name follows that of the measurement and "_".
 struct Figure {
   const char* name;
-  const Unit& unit;
+  Unit unit;
   Number number;
   const Unit* axis;  // null for a single value; otherwise the figure is a list of [axis, value]
-  const Method& method;
+  Method method;
   const char* docstring;  // what it means
 };
 
-struct MeasurementInfo {
-  std::string name, phase;
+struct FigureInfo {
+  std::string name;         // in full: camera_autofocus_mtf50_vertical
+  std::string measurement;  // camera_autofocus
   const Figure* figure;
 };
 
@@ -61,12 +66,12 @@ std::string Explanation(const Figure& figure);
 /// The largest difference that the same photo may show; whole numbers show none.
 double Repeatability(const Figure& figure);
 
-/// All of them, by test.
-const std::vector<MeasurementInfo>& AllMeasurements();
+/// All of them, by measurement.
+const std::vector<FigureInfo>& AllFigures();
 
-/// The one of this name; null for an unknown one.
-const MeasurementInfo* FindMeasurement(std::string_view name);
+/// The one of this full name; null for an unknown one.
+const FigureInfo* FindFigure(std::string_view name);
 
 }  // namespace qv
 
-#endif  // QVTESTER_DESK_MEASURE_MEASUREMENTS_H_
+#endif  // QVTESTER_DESK_MEASURE_FIGURES_H_

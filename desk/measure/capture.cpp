@@ -1,0 +1,196 @@
+// Tests 16 and 20: the colour patches of a chart photo, beside those of a standard photo.
+
+#include <algorithm>
+#include <numeric>
+
+#include "chart/chart_layout.h"
+#include "desk/base/text.h"
+#include "desk/measure/chart_view.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kLab = {"mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1",
+                         "Within 0.3 of the colour as photographed in the mean, 0.7 at most on an upright chart; patch "
+                         "means are cut to whole levels.",
+                         "Moved by exposure, white balance, light and shading; by clipping."};
+constexpr Method kDelta = {"CIE 1976 difference to the standard photo's patch",
+                           "As good as the two L*a*b* readings: about 0.4 in the mean.",
+                           "Moved by whatever makes the photo's light or colour unlike the standard's."};
+
+using PatchColours = std::vector<cv::Point3i>;
+
+void CollectPatches(Phase& phase, const QVCaptureResult& result) {
+  std::vector<double> numbers;
+  std::array<std::vector<double>, 3> lab;
+  for (int i = 0; i < result.capture_lab_count_; ++i) {
+    numbers.push_back(result.capture_delta_e_count_ == 0 ? kPatchesWithoutStandard[i] : i);
+    for (int k = 0; k < 3; ++k) lab[k].push_back(result.capture_lab_[3 * i + k]);
+  }
+  phase.Add("lab_l", numbers, lab[0]);
+  phase.Add("lab_a", numbers, lab[1]);
+  phase.Add("lab_b", numbers, lab[2]);
+  const int compared = result.capture_delta_e_count_;
+  if (compared == 0) return;
+  const std::vector<double> delta(result.capture_delta_e_, result.capture_delta_e_ + compared);
+  numbers.resize(delta.size());
+  phase.Add("delta_e_76", numbers, delta);
+  phase.Add("delta_e_76_mean", std::accumulate(delta.begin(), delta.end(), 0.0) / compared);
+  phase.Add("delta_e_76_max", *std::max_element(delta.begin(), delta.end()));
+  phase.Add("patches", result.capture_lab_count_);
+}
+
+void Swatch(Picture& picture, const cv::Rect2d& area, const cv::Point3i& colour) {
+  picture.FillRectangle(area, {colour.x / 255.0, colour.y / 255.0, colour.z / 255.0});
+}
+
+class CaptureFinding : public Finding {
+ public:
+  std::string Report(const Record& record) const override;
+  std::optional<Picture> Draw(const Record& record) const override;
+
+  ChartView view;
+  cv::Mat photo;                                     // that was searched last
+  std::vector<std::array<cv::Point2d, 4>> outlines;  // of the patches on the photo
+  PatchColours measured, standard;
+
+ private:
+  void DrawPatch(Picture& picture, const Record& record, const PhotoPlace& place, std::size_t i,
+                 cv::Point2d swatches) const;
+};
+
+std::string CaptureFinding::Report(const Record& record) const {
+  const Phase& phase = record.phase;
+  std::string text = ReportChart(view);
+  const Reading* const delta = phase.Find("delta_e_76");
+  text += delta != nullptr ? "patch  drawn as        L*      a*      b*   delta E 76\n"
+                           : "patch  drawn as        L*      a*      b*   (no standard photo to compare with)\n";
+  const Reading& l = *phase.Find("lab_l");
+  for (std::size_t i = 0; i < l.values.size(); ++i) {
+    const auto number = static_cast<std::size_t>(l.axis[i]);
+    text += Format("%5zu  %-11s  %6.2f  %6.2f  %6.2f", number, kPatches[number].name, l.values[i],
+                   phase.Find("lab_a")->values[i], phase.Find("lab_b")->values[i]);
+    text += delta != nullptr && i < delta->values.size() ? Format("       %6.2f\n", delta->values[i]) : "\n";
+  }
+  for (const char* figure : {"delta_e_76_mean", "delta_e_76_max"}) {
+    const Reading* m = phase.Find(figure);
+    if (m != nullptr) text += Format("%-16s %.2f%s\n", figure, m->value(), LimitText(*m).c_str());
+  }
+  return text;
+}
+
+void CaptureFinding::DrawPatch(Picture& picture, const Record& record, const PhotoPlace& place, std::size_t i,
+                               cv::Point2d swatches) const {
+  std::vector<cv::Point2d> outline;
+  for (const cv::Point2d& corner : outlines[i]) outline.push_back(place(corner));
+  picture.Line(outline, kGood, 2, true);
+  picture.Text(std::to_string(i), (outline[0] + outline[2]) / 2 + cv::Point2d(0, 6), 15, kGood, Align::kCentre, true);
+
+  picture.Text(std::to_string(i), swatches + cv::Point2d(18, 34), 14, kInk, Align::kRight);
+  const Reading* const delta = record.phase.Find("delta_e_76");
+  const bool compared = delta != nullptr && i < standard.size() && i < delta->values.size();
+  if (compared) Swatch(picture, {swatches.x + 26, swatches.y + 4, 84, 52}, standard[i]);
+  Swatch(picture, {swatches.x + 38, swatches.y + 14, 60, 32}, measured[i]);
+  if (compared) picture.Text(Format("dE %.1f", delta->values[i]), swatches + cv::Point2d(120, 34), 14, kInk);
+}
+
+// Patches outlined and numbered on the photo; beside it, measured inside the standard's colour, and the difference.
+std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
+  constexpr std::size_t kRows = 12;
+  constexpr double kRow = 62;
+  constexpr double kColumn = 230;
+  if (!ShowsPhoto(record.phase.code)) return std::nullopt;
+  const double scale = FitScale(photo, 1000);
+  const double width = photo.cols * scale;
+  Picture picture(cvRound(width + 2 * kColumn + 20), cvRound(std::max(photo.rows * scale, kRows * kRow) + kHeadPx));
+  picture.Text(Format("%s: %s", record.test_name.c_str(), Name(record.outcome())), {12, 28}, 18, kInk);
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
+  DrawMarks(picture, view, place);
+  if (record.phase.code != QV_SUCCESS) return picture;
+  for (std::size_t i = 0; i < measured.size(); ++i) {
+    const auto column = static_cast<double>(i / kRows);
+    const auto row = static_cast<double>(i % kRows);
+    DrawPatch(picture, record, place, i, {width + 16 + column * kColumn, kHeadPx + row * kRow});
+  }
+  picture.Text(standard.empty() ? "measured" : "measured, framed by the standard", {width + 16, 28}, 14, kInk);
+  return picture;
+}
+
+class Capture : public Measurement {
+ public:
+  explicit Capture(bool front) : front_(front) {
+    spec_.name = front ? "camera_capture_front" : "camera_capture";
+    spec_.test = front ? QV_TEST_CAMERA_CAPTURE_2 : QV_TEST_CAMERA_CAPTURE;
+    spec_.inputs = {{"photo", front ? QV_RESOURCE_FRONT_CHART_PHOTO : QV_RESOURCE_CHART_PHOTO, "Photo of the chart"},
+                    {"standard", front ? QV_RESOURCE_FRONT_CHART_STANDARD : QV_RESOURCE_CHART_STANDARD,
+                     "Photo of the same chart by a good camera, to compare with", true}};
+    spec_.parameters = {ThresholdParameter()};
+    spec_.figures = Figures();
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
+      CollectPatches(record.phase, front_ ? results->capture_front_ : results->capture_main_);
+    }
+    auto finding = std::make_unique<CaptureFinding>();
+    const FoundChart& found = tester.kept_->chart;
+    const std::size_t searched = found.of_standard ? 1 : 0;
+    record.refused = searched;
+    finding->photo = SlotPhoto(tester, spec_.inputs[searched].slot);
+    const int code = record.phase.code;
+    if (code == QV_SUCCESS || code == QV_ERROR_PATTERN_NOT_FOUND || code == QV_ERROR_NO_PATCHES) {
+      finding->view =
+          DescribeChart(record, found, record.inputs[searched].path, finding->photo,
+                        found.of_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
+    }
+    if (code == QV_SUCCESS) TakePatches(*finding, tester);
+    return finding;
+  }
+
+ private:
+  static std::vector<Figure> Figures() {
+    constexpr auto kWhole = Number::kWhole;
+    constexpr auto kReal = Number::kReal;
+    std::vector<Figure> figures = {
+        {"patches", kOne, kWhole, nullptr, kLab, "Patches measured; 24 when the whole ring is in view."},
+        {"lab_l", kOne, kReal, &kPatchAxis, kLab, "L* of each patch."},
+        {"lab_a", kOne, kReal, &kPatchAxis, kLab, "a* of each patch."},
+        {"lab_b", kOne, kReal, &kPatchAxis, kLab, "b* of each patch."},
+        {"delta_e_76", kOne, kReal, &kPatchAxis, kDelta, "Colour difference of each patch to the standard photo's."},
+        {"delta_e_76_mean", kOne, kReal, nullptr, kDelta, "Mean colour difference over the patches."},
+        {"delta_e_76_max", kOne, kReal, nullptr, kDelta, "Largest colour difference of a patch."},
+    };
+    for (const Figure& figure : ChartFigures()) figures.push_back(figure);
+    return figures;
+  }
+
+  void TakePatches(CaptureFinding& finding, const QVTester& tester) const {
+    const FoundChart& found = tester.kept_->chart;
+    finding.measured = found.patches;
+    finding.standard = (front_ ? tester.kept_->standard_front : tester.kept_->standard_main).patches;
+    const PatchGrid grid = PlacePatches(found.corner, found.second, found.third);
+    for (std::size_t i = 0; i < found.patches.size(); ++i) {
+      finding.outlines.push_back(OnPhoto(
+          found, cv::Rect(grid.centres[i].y - grid.half, grid.centres[i].x - grid.half, 2 * grid.half, 2 * grid.half)));
+    }
+  }
+
+  bool front_;
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& CaptureMeasurement(bool front) {
+  static const Capture main(false);
+  static const Capture second(true);
+  return front ? second : main;
+}
+
+}  // namespace qv

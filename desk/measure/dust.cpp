@@ -1,0 +1,213 @@
+// Tests 17 and 21: dust on the lens, in a photo of a plain target.
+
+#include <algorithm>
+#include <numeric>
+
+#include "desk/base/text.h"
+#include "desk/drawing/plot.h"
+#include "desk/measure/histogram.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+#include "tests/camera/lens_dust.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kBlob = {
+    "local threshold 15 x 15, blob detector at levels 0 and 125",
+    "Of discs 0.3 or more darker than the target, all of 4 to 16 px are found, none of 20 px and more.",
+    "Moved by focus on the target, by light (photos of mean level under 126 show none), by noise near the local "
+    "threshold."};
+
+constexpr double kDarkestToJudge = 126;  // the blob search sees nothing in photos whose mean is below
+
+class DustFinding : public Finding {
+ public:
+  std::string Report(const Record& record) const override;
+  std::optional<Picture> Draw(const Record& record) const override;
+
+  cv::Mat photo;
+  std::vector<cv::KeyPoint> blobs;  // that were counted
+
+ private:
+  void DrawPhoto(Picture& picture, double scale) const;
+};
+
+// The blobs that were counted: the first five outside the corners.
+std::vector<cv::KeyPoint> CountedBlobs(QVTester& tester, int count) {
+  std::vector<cv::KeyPoint> counted;
+  const QVTester::Blobs& blobs = tester.kept_->blobs;
+  for (const cv::KeyPoint& blob : blobs.keypoints) {
+    if (static_cast<int>(counted.size()) == count) break;
+    if (tester.isValidLocation(blobs.image.cols, blobs.image.rows, blob.pt)) counted.push_back(blob);
+  }
+  return counted;
+}
+
+std::string DustFinding::Report(const Record& record) const {
+  const Phase& phase = record.phase;
+  const Reading& count = *phase.Find("blob_count");
+  std::string text = Format("blobs      %.0f%s%s\n", count.value(), count.value() == kMostPlaces ? " or more" : "",
+                            LimitText(count).c_str());
+  const Reading& places = *phase.Find("blobs");
+  for (std::size_t i = 0; i < places.values.size(); ++i) {
+    text += Format("           column %.0f, row %.0f\n", places.axis[i], places.values[i]);
+  }
+  text += Format("mean level %.2f of 255\n", phase.Find("mean_level")->value());
+  if (const Reading* m = phase.Find("histogram_difference")) {
+    text += Format("histogram  differs from the reference by %.0f pixels%s\n", m->value(), LimitText(*m).c_str());
+  }
+  return text;
+}
+
+void DustFinding::DrawPhoto(Picture& picture, double scale) const {
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
+  for (const cv::Point corner : {cv::Point(0, 0), {1, 0}, {0, 1}, {1, 1}}) {
+    const cv::Point2d at(corner.x * (photo.cols - kCornerPx) - 0.5, corner.y * (photo.rows - kCornerPx) - 0.5);
+    picture.Line({place(at), place(at + cv::Point2d(kCornerPx, 0)), place(at + cv::Point2d(kCornerPx, kCornerPx)),
+                  place(at + cv::Point2d(0, kCornerPx))},
+                 kFaint, 1.5, true);
+  }
+  for (const cv::KeyPoint& blob : blobs) {
+    picture.Circle(place(blob.pt), std::max(10.0, blob.size * scale), kPoor, 2.5);
+  }
+}
+
+Plot HistogramPlot(const Record& record) {
+  const Json& reference = record.request.parameters.value("reference", Json::array());
+  Plot plot;
+  plot.title = reference.empty() ? "Grey levels" : "Grey levels; the line is the reference";
+  plot.x_label = "grey level";
+  plot.y_label = "share of pixels, %";
+  plot.x_max = kGreyLevels - 1;
+  plot.bars = true;
+  const std::vector<double>& counts = record.phase.Find("histogram")->values;
+  const double pixels = std::accumulate(counts.begin(), counts.end(), 0.0);
+  plot.y_max = 1;
+  for (int i = 0; i < kGreyLevels; ++i) {
+    plot.curve.emplace_back(i, 100 * counts[i] / pixels);
+    plot.y_max = std::max(plot.y_max, 105 * counts[i] / pixels);
+  }
+  const auto levels = reference.get<std::vector<double>>();
+  const double all = std::accumulate(levels.begin(), levels.end(), 0.0);
+  for (std::size_t i = 0; all > 0 && i < levels.size(); ++i) {
+    plot.second_curve.emplace_back(static_cast<double>(i), 100 * levels[i] / all);
+  }
+  return plot;
+}
+
+std::optional<Picture> DustFinding::Draw(const Record& record) const {
+  constexpr double kPlot = 460;
+  if (record.phase.code != QV_SUCCESS) return std::nullopt;
+  const double scale = FitScale(photo, 1080);
+  const double width = photo.cols * scale;
+  Picture picture(cvRound(width + kPlot + 10), cvRound(std::max(photo.rows * scale, 400.0) + kHeadPx));
+  const Reading* const count = record.phase.Find("blob_count");
+  picture.Text(count != nullptr && count->outcome != Outcome::kUnset
+                   ? Format("%s: %.0f blobs, %s", record.test_name.c_str(), count->value(), Name(record.outcome()))
+                   : record.test_name + ": too dark to judge",
+               {12, 28}, 18, kInk);
+  DrawPhoto(picture, scale);
+  DrawPlot(picture, HistogramPlot(record), {width + 10, kHeadPx, kPlot, 380});
+  return picture;
+}
+
+class Dust : public Measurement {
+ public:
+  explicit Dust(bool front) : front_(front) {
+    spec_.name = front ? "lens_dust_front" : "lens_dust";
+    spec_.test = front ? QV_TEST_LENS_DUST_2 : QV_TEST_LENS_DUST;
+    spec_.inputs = {{"photo", front ? QV_RESOURCE_FRONT_DUST_PHOTO : QV_RESOURCE_DUST_PHOTO,
+                     "Photo of a plain, evenly lit target"}};
+    spec_.parameters = {{"reference",
+                         Parameter::kHistogram,
+                         "FILE",
+                         "Histogram to compare with: an earlier dust record, or 256 numbers",
+                         nullptr,
+                         0,
+                         0,
+                         {},
+                         front ? QV_PROPERTY_FRONT_DUST_HISTOGRAM : QV_PROPERTY_DUST_HISTOGRAM},
+                        {"step", Parameter::kWhole, "N", "Step number, which names the property that is published", 0,
+                         INT32_MIN, INT32_MAX}};
+    spec_.figures = Figures();
+    spec_.publishes = true;
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    tester.SetStep(request.parameters.at("step"));
+    auto finding = std::make_unique<DustFinding>();
+    finding->photo = SlotPhoto(tester, spec_.inputs[0].slot);
+    const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase);
+    if (results == nullptr) return finding;
+    AddHistogram(record.phase, *results, request);
+    const double mean = record.phase.Find("mean_level")->value();
+    if (mean < kDarkestToJudge) {
+      record.Say(Remark::kNoJudgement, "too_dark",
+                 Format("%s: too dark to judge: the mean grey level is %.0f, and blobs are seen from %.0f "
+                        "up; use more light or a longer exposure",
+                        record.inputs[0].path.c_str(), mean, kDarkestToJudge),
+                 "mean_level");
+      return finding;
+    }
+    const int count = front_ ? results->dust_blob_count_front_ : results->dust_blob_count_main_;
+    finding->blobs = CountedBlobs(tester, count);
+    AddBlobs(record.phase, count, finding->blobs);
+    return finding;
+  }
+
+ private:
+  static std::vector<Figure> Figures() {
+    constexpr auto kWhole = Number::kWhole;
+    constexpr auto kReal = Number::kReal;
+    return {
+        {"blob_count", kOne, kWhole, nullptr, kBlob,
+         "Dark blobs outside the corners, counted up to five. Discs of 4 to 16 pixels are seen."},
+        {"blobs", kPixel, kReal, &kColumnAxis, kBlob, "Places of the counted blobs, column and row."},
+        {"mean_level", kGreyLevel, kReal, nullptr, kBins, "Mean grey level of the photo; blobs are seen from 126 up."},
+        {"histogram", kOne, kWhole, &kLevelAxis, kBins, "Pixels of each grey level."},
+        {"histogram_difference", kOne, kWhole, nullptr, kBins,
+         "Sum of absolute differences to the reference histogram, pixels."},
+    };
+  }
+
+  void AddHistogram(Phase& phase, const QVResultData& results, const Request& request) const {
+    const int* const bins = front_ ? results.dust_hist_front_ : results.dust_hist_main_;
+    std::vector<double> levels(kGreyLevels);
+    std::iota(levels.begin(), levels.end(), 0);
+    const std::vector<double> counts(bins, bins + kGreyLevels);
+    const double pixels = std::accumulate(counts.begin(), counts.end(), 0.0);
+    phase.Add("mean_level", std::inner_product(levels.begin(), levels.end(), counts.begin(), 0.0) / pixels);
+    phase.Add("histogram", levels, counts);
+    if (!request.parameters.contains("reference")) return;
+    phase.Add("histogram_difference", front_ ? results.dust_hist_diff_front_ : results.dust_hist_diff_main_);
+  }
+
+  static void AddBlobs(Phase& phase, int count, const std::vector<cv::KeyPoint>& blobs) {
+    phase.Add("blob_count", count);
+    std::vector<double> columns;
+    std::vector<double> rows;
+    for (const cv::KeyPoint& blob : blobs) {
+      columns.push_back(blob.pt.x);
+      rows.push_back(blob.pt.y);
+    }
+    phase.Add("blobs", columns, rows);
+  }
+
+  bool front_;
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& DustMeasurement(bool front) {
+  static const Dust main(false);
+  static const Dust second(true);
+  return front ? second : main;
+}
+
+}  // namespace qv

@@ -1,0 +1,74 @@
+// Tests 15 and 18: mean brightness of a flash photo.
+
+#include <algorithm>
+
+#include "desk/base/text.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kMean = {
+    "mean over all pixels of the first channel", "Exact for the photo as stored.",
+    "Moved by exposure, flash, shading and clipping; the first channel of a photo read from a file is blue."};
+
+class FlashFinding : public Finding {
+ public:
+  explicit FlashFinding(cv::Mat photo) : photo_(std::move(photo)) {}
+
+  std::string Report(const Record& record) const override {
+    const Reading& mean = *record.phase.Find("mean");
+    return Format("mean of the first channel  %.2f of 255%s\n", mean.value(), LimitText(mean).c_str());
+  }
+
+  std::optional<Picture> Draw(const Record& record) const override {
+    if (record.phase.code != QV_SUCCESS) return std::nullopt;
+    const double scale = FitScale(photo_, 1200);
+    Picture picture(std::max(640, cvRound(photo_.cols * scale)), cvRound(photo_.rows * scale) + 40);
+    picture.Text(Format("Flash: mean of the first channel %.2f of 255 (%s)", record.phase.Find("mean")->value(),
+                        Name(record.outcome())),
+                 {12, 26}, 16, kInk);
+    picture.PlacePhoto(photo_, {0, 40}, scale);
+    return picture;
+  }
+
+ private:
+  cv::Mat photo_;
+};
+
+class Flash : public Measurement {
+ public:
+  explicit Flash(bool vt) {
+    spec_.name = vt ? "camera_flash_vt" : "camera_flash";
+    spec_.test = vt ? QV_TEST_CAMERA_FLASH_VT : QV_TEST_CAMERA_FLASH;
+    spec_.inputs = {{"photo", vt ? QV_RESOURCE_VT_FLASH_PHOTO : QV_RESOURCE_FLASH_PHOTO, "Photo taken with the flash"}};
+    spec_.figures = {
+        {"mean", kGreyLevel, Number::kReal, nullptr, kMean, "Mean brightness of the flash photo, 0 to 255."}};
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
+      const bool vt = spec_.test == QV_TEST_CAMERA_FLASH_VT;
+      record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_);
+    }
+    return std::make_unique<FlashFinding>(SlotPhoto(tester, spec_.inputs[0].slot));
+  }
+
+ private:
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& FlashMeasurement(bool vt) {
+  static const Flash main(false);
+  static const Flash second(true);
+  return vt ? second : main;
+}
+
+}  // namespace qv

@@ -1,0 +1,261 @@
+// Bright and dark dots in a high-dynamic-range picture of a lit panel.
+
+#include <algorithm>
+#include <cfloat>
+#include <cmath>
+#include <cstdlib>
+#include <opencv2/imgproc.hpp>
+
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kDots = {
+    "relative difference to the mean of a square window, single precision",
+    "All of 1,000 dots of contrast 0.2 are found at a threshold of 0.1 and 0.5 % noise, corners included; the means "
+    "are single precision, whose rounding counts on large pictures with small windows.",
+    "Moved by the picture's noise, by neighbouring dots in the same window, by formats that round."};
+constexpr Method kAreas = {"connected dots, then rectangles closer than the distance, merged until none are",
+                           "Exact for the dots that were found.", "Moved by the dots and by the distance."};
+
+constexpr int kMostSpots = 20'000;  // merging is quadratic; so many are noise, not defects
+
+struct Dots {
+  cv::Mat mask;  // CV_8UC1, 1 at a dot
+  std::vector<cv::Rect> areas;
+  std::vector<int> pixels;  // dots in each area
+  int spots = 0;            // connected dots, before they are merged
+  int non_finite = 0;       // pixels
+};
+
+// What malloc gave and the clustering exchanges.
+template <typename T>
+struct CArray {
+  explicit CArray(std::size_t count) : data(static_cast<T*>(std::malloc(std::max<std::size_t>(count, 1) * sizeof(T)))) {
+    if (data == nullptr) throw Failure(kInternalFault, "no memory for the areas");
+  }
+  ~CArray() { std::free(data); }
+  CArray(const CArray&) = delete;
+  CArray& operator=(const CArray&) = delete;
+  T* data;
+};
+
+void MergeSpots(QVTester& tester, Dots& dots, const cv::Mat& stats, int distance) {
+  CArray<int> counts(dots.spots);
+  CArray<cv::Point> top_left(dots.spots);
+  CArray<cv::Point> bottom_right(dots.spots);
+  std::vector<int> indices(dots.spots);
+  for (int i = 0; i < dots.spots; ++i) {
+    const int* const spot = stats.ptr<int>(i + 1);  // row 0 is the ground
+    const cv::Rect box(spot[cv::CC_STAT_LEFT], spot[cv::CC_STAT_TOP], spot[cv::CC_STAT_WIDTH],
+                       spot[cv::CC_STAT_HEIGHT]);
+    indices[i] = i;
+    counts.data[i] = spot[cv::CC_STAT_AREA];
+    new (&top_left.data[i]) cv::Point(box.tl());
+    new (&bottom_right.data[i]) cv::Point(box.br() - cv::Point(1, 1));
+  }
+  const int areas = tester.ErrorAreaClustering(distance, dots.mask.cols, dots.mask.rows, &indices, &counts.data,
+                                               &top_left.data, &bottom_right.data);
+  for (int i = 0; i < areas; ++i) {
+    dots.areas.emplace_back(top_left.data[i], bottom_right.data[i] + cv::Point(1, 1));
+    dots.pixels.push_back(counts.data[i]);
+  }
+}
+
+// The channel that is searched first, as the test reads it.
+cv::Mat WithChannelFirst(const cv::Mat& rgb, const std::string& channel) {
+  cv::Mat picture = rgb.clone();
+  cv::Mat first;
+  cv::extractChannel(rgb, first, channel == "red" ? 0 : channel == "green" ? 1 : 2);
+  cv::insertChannel(first, picture, 0);
+  return picture;
+}
+
+Dots FindDots(QVTester& tester, cv::Mat& picture, const Json& parameters) {
+  Dots dots;
+  dots.mask = cv::Mat::zeros(picture.size(), CV_8U);
+  tester.DetectDot(picture.ptr<float>(), picture.rows, picture.cols, parameters.at("threshold").get<float>(),
+                   parameters.at("radius"), dots.mask.data);
+  cv::Mat first;
+  cv::extractChannel(picture, first, 0);
+  dots.non_finite = static_cast<int>(
+      std::count_if(first.begin<float>(), first.end<float>(), [](float value) { return !std::isfinite(value); }));
+  cv::Mat labels;
+  cv::Mat stats;
+  cv::Mat centres;
+  dots.spots = cv::connectedComponentsWithStats(dots.mask, labels, stats, centres) - 1;
+  if (dots.spots <= kMostSpots) MergeSpots(tester, dots, stats, parameters.at("distance"));
+  return dots;
+}
+
+void Collect(Phase& phase, const Dots& dots) {
+  phase.Add("dot_count", cv::countNonZero(dots.mask));
+  if (dots.spots > kMostSpots) return;
+  phase.Add("area_count", static_cast<double>(dots.areas.size()));
+  std::vector<double> columns, rows, numbers, pixels, widths, heights;  // NOLINT(readability-isolate-declaration)
+  for (std::size_t i = 0; i < dots.areas.size(); ++i) {
+    const cv::Rect& area = dots.areas[i];
+    columns.push_back(area.x + (area.width - 1) / 2.0);
+    rows.push_back(area.y + (area.height - 1) / 2.0);
+    numbers.push_back(static_cast<double>(i));
+    pixels.push_back(dots.pixels[i]);
+    widths.push_back(area.width);
+    heights.push_back(area.height);
+  }
+  phase.Add("areas", columns, rows);
+  phase.Add("area_pixels", numbers, pixels);
+  phase.Add("area_width", numbers, widths);
+  phase.Add("area_height", numbers, heights);
+}
+
+void Look(Record& record, const Dots& dots) {
+  const char* const path = record.inputs[0].path.c_str();
+  const int side = 2 * record.request.parameters.at("radius").get<int>() + 1;
+  const auto refuse = [&](const char* name, const std::string& sentence) {
+    record.Say(Remark::kNoJudgement, name, sentence, "dot_count");
+  };
+  if (dots.mask.cols < side || dots.mask.rows < side) {
+    refuse(
+        "picture_smaller_than_window",
+        Format("%s: the picture is smaller than the window, %d x %d pixels; use a smaller --radius", path, side, side));
+  }
+  if (dots.spots > kMostSpots) {
+    refuse("too_many_dots",
+           Format("%s: %d separate dots are noise, not defects; use a higher --threshold", path, dots.spots));
+  }
+  if (dots.non_finite > 0) {
+    refuse("pixels_not_finite", Format("%s: %d pixels are not finite, and no dot is seen below and to the right of one",
+                                       path, dots.non_finite));
+  }
+}
+
+// As grey levels for people, dots in red. One hot dot does not black out the rest.
+cv::Mat Seen(const cv::Mat& picture, const cv::Mat& mask) {
+  cv::Mat floats = picture.clone();
+  floats.setTo(0, cv::Mat(cv::abs(floats.reshape(1)) <= FLT_MAX).reshape(3) == 0);
+  cv::Mat first;
+  cv::extractChannel(floats, first, 0);
+  cv::Scalar mean;
+  cv::Scalar deviation;
+  cv::meanStdDev(first, mean, deviation);
+  cv::insertChannel(cv::min(first, mean[0] + 4 * deviation[0]), floats, 0);
+  QVTester painter;
+  cv::Mat seen;
+  cv::cvtColor(painter.HDR2UCHAR(floats), seen, cv::COLOR_GRAY2BGR);
+  seen.setTo(cv::Scalar(25, 25, 230), mask);
+  return seen;
+}
+
+class DotsFinding : public Finding {
+ public:
+  std::string Report(const Record& record) const override {
+    constexpr std::size_t kShown = 20;
+    const Reading& count = *record.phase.Find("dot_count");
+    const Reading& areas = *record.phase.Find("area_count");
+    std::string text = Format("dots       %.0f%s\nareas      %.0f%s\n", count.value(), LimitText(count).c_str(),
+                              areas.value(), LimitText(areas).c_str());
+    for (std::size_t i = 0; i < std::min(dots.areas.size(), kShown); ++i) {
+      const cv::Rect& area = dots.areas[i];
+      text += Format("           column %d, row %d, %d x %d, %d dots\n", area.x, area.y, area.width, area.height,
+                     dots.pixels[i]);
+    }
+    if (dots.areas.size() > kShown) text += Format("           and %zu more\n", dots.areas.size() - kShown);
+    return text;
+  }
+
+  // Every dot as a ring of its own would hide small areas: dots are coloured pixels, areas frames with their numbers.
+  std::optional<Picture> Draw(const Record& record) const override {
+    constexpr double kSide = 1280;
+    if (record.phase.code != QV_SUCCESS) return std::nullopt;
+    const cv::Mat seen = Seen(searched, dots.mask);
+    const int longer = std::max(seen.cols, seen.rows);
+    const double scale = longer < kSide / 2 ? std::floor(kSide / longer) : std::min(1.0, kSide / longer);
+    Picture picture(std::max(640, cvRound(seen.cols * scale)), cvRound(seen.rows * scale + kHeadPx));
+    picture.Text(Format("HDR dots: %d dots in %zu areas, %s", cv::countNonZero(dots.mask), dots.areas.size(),
+                        Name(record.outcome())),
+                 {12, 28}, 18, kInk);
+    const PhotoPlace place = picture.PlacePhoto(seen, {0, kHeadPx}, scale);
+    for (std::size_t i = 0; i < dots.areas.size(); ++i) DrawArea(picture, place, dots.areas[i], i);
+    return picture;
+  }
+
+  cv::Mat searched;  // CV_32FC3, the channel that was searched first
+  Dots dots;
+
+ private:
+  static void DrawArea(Picture& picture, const PhotoPlace& place, const cv::Rect& area, std::size_t number) {
+    constexpr double kFrame = 6;  // picture pixels around an area
+    const cv::Point2d from = place(cv::Point2d(area.tl()) - cv::Point2d(0.5, 0.5)) - cv::Point2d(kFrame, kFrame);
+    const cv::Point2d to = place(cv::Point2d(area.br()) - cv::Point2d(0.5, 0.5)) + cv::Point2d(kFrame, kFrame);
+    picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, kDoubtful, 2, true);
+    const bool at_right = to.x + 30 > picture.width();
+    picture.Text(std::to_string(number), {at_right ? from.x - 4 : to.x + 4, std::max(from.y + 10, kHeadPx + 12)}, 13,
+                 kDoubtful, at_right ? Align::kRight : Align::kLeft, true);
+  }
+};
+
+class HdrDots : public Measurement {
+ public:
+  HdrDots() {
+    spec_.name = "hdr_dots";
+    spec_.routine = "DetectDot";
+    spec_.inputs = {{"file", QV_RESOURCE_HDR_FIRST,
+                     "Float picture of a lit panel. OpenEXR (.exr, lossy when its values are halves), "
+                     "Radiance (.hdr, lossy: 8 bits a channel and a common exponent), float TIFF (lossless, unless as "
+                     "LogLuv) and PFM (lossless)"}};
+    spec_.parameters = {
+        {"threshold", Parameter::kReal, "SHARE", "Departure from the local mean that makes a dot, a share", 0.1, 0,
+         1e9},
+        {"radius", Parameter::kWhole, "PX", "Half the side of the window of the local mean", 10, 1, 10'000},
+        {"distance", Parameter::kWhole, "PX", "Areas closer than this are merged", 8, 0, 100'000},
+        {"channel", Parameter::kWord, "NAME", "Channel that is searched", "red", 0, 0, {"red", "green", "blue"}}};
+    spec_.figures = Figures();
+    spec_.advice = "is it a float picture of an evenly lit panel?";
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    auto finding = std::make_unique<DotsFinding>();
+    const bool done = RunRoutine(record.phase, spec_.routine, [&] {
+      finding->searched = WithChannelFirst(SlotFloats(tester, spec_.inputs[0].slot), request.parameters.at("channel"));
+      finding->dots = FindDots(tester, finding->searched, request.parameters);
+      return static_cast<int>(QV_SUCCESS);
+    });
+    if (!done) return finding;
+    Collect(record.phase, finding->dots);
+    Look(record, finding->dots);
+    return finding;
+  }
+
+ private:
+  static std::vector<Figure> Figures() {
+    constexpr auto kWhole = Number::kWhole;
+    constexpr auto kReal = Number::kReal;
+    return {
+        {"dot_count", kOne, kWhole, nullptr, kDots, "Pixels that depart from their local mean."},
+        {"area_count", kOne, kWhole, nullptr, kAreas, "Areas that the dots make."},
+        {"areas", kPixel, kReal, &kColumnAxis, kAreas, "Middle of each area's rectangle, column and row."},
+        {"area_pixels", kPixel, kWhole, &kAreaAxis, kAreas, "Dots in each area."},
+        {"area_width", kPixel, kWhole, &kAreaAxis, kAreas, "Columns of each area's rectangle."},
+        {"area_height", kPixel, kWhole, &kAreaAxis, kAreas, "Rows of each area's rectangle."},
+    };
+  }
+
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& DotsMeasurement() {
+  static const HdrDots dots;
+  return dots;
+}
+
+}  // namespace qv

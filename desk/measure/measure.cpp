@@ -1,0 +1,111 @@
+#include "desk/measure/measure.h"
+
+#include <mutex>
+#include <optional>
+
+#include "desk/base/clock.h"
+#include "desk/base/log_lines.h"
+#include "desk/measure/guarded.h"
+#include "desk/measure/load.h"
+#include "desk/measure/measurement.h"
+#include "desk/measure/properties.h"
+#include "qvtester/host_properties.h"
+
+namespace qv {
+
+namespace {
+
+// While one lives, system properties go nowhere. The store is one for all threads: the first sets it, the last takes it
+// back.
+class Unpublished {
+ public:
+  Unpublished() {
+    const std::lock_guard<std::mutex> lock(Mutex());
+    if (Count()++ == 0) SetHostPropertyStore("/dev/null/nowhere");
+  }
+  ~Unpublished() {
+    const std::lock_guard<std::mutex> lock(Mutex());
+    if (--Count() == 0) SetHostPropertyStore(nullptr);
+  }
+  Unpublished(const Unpublished&) = delete;
+  Unpublished& operator=(const Unpublished&) = delete;
+
+ private:
+  static std::mutex& Mutex() {
+    static std::mutex mutex;
+    return mutex;
+  }
+  static int& Count() {
+    static int count = 0;
+    return count;
+  }
+};
+
+std::string NamesOf(const std::vector<RecordedInput>& inputs) {
+  std::string names;
+  for (const RecordedInput& input : inputs) names += (names.empty() ? "" : ", ") + input.path;
+  return names;
+}
+
+// The library's last line says what was refused; which input it was, only the measurement may know.
+void SayCause(Record& record, const std::vector<LogLine>& lines) {
+  const int code = record.phase.code;
+  if ((code != QV_ERROR_UNUSABLE_INPUT && code != QV_ERROR_INTERNAL) || lines.empty()) return;
+  const std::string whose = record.refused ? record.inputs.at(*record.refused).path : NamesOf(record.inputs);
+  record.Say(Remark::kMiss, "refused_input", whose + ": " + lines.back().text);
+}
+
+// Those of the request, and those that its parameters set.
+Json PropertiesOf(const Spec& spec, const Request& request) {
+  Json properties = request.properties;
+  for (const Parameter& parameter : spec.parameters) {
+    if (!parameter.property || !request.parameters.contains(parameter.name)) continue;
+    properties[std::to_string(*parameter.property)] = request.parameters[parameter.name];
+  }
+  return CheckedProperties(properties);
+}
+
+Record NewRecord(const Request& request, const Spec& spec, const Limits& limits) {
+  Record record;
+  record.start_millis = MillisSinceEpoch();
+  record.request = request;
+  record.test_name = spec.test_name();
+  if (spec.test) record.test_index = *spec.test;
+  record.phase.name = spec.name;
+  record.limits = limits;
+  record.advice = request.parameters.contains("raw") ? "is that the frame's size, and the file whole?" : spec.advice;
+  return record;
+}
+
+}  // namespace
+
+Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
+  const Request resolved = Resolved(request);
+  const Measurement& measurement = *FindMeasurement(resolved.measurement);
+  const Spec& spec = measurement.spec();
+  Record record = NewRecord(resolved, spec, limits);
+  LogCollector log;
+  std::optional<Unpublished> unpublished;
+  if (spec.publishes && !resolved.publish) unpublished.emplace();
+
+  tester.Initialize();
+  const SetProperties properties(tester, PropertiesOf(spec, resolved));
+  const bool loaded = LoadInputs(tester, spec, resolved, record, log);
+  record.phase.start_millis = record.phase.end_millis = MillisSinceEpoch();
+  if (loaded) {
+    // Whatever a measurement of the desk throws is a code, too: one photo must not end a batch.
+    const int code = Guarded(spec.name, [&] {
+      record.finding = measurement.Run(tester, resolved, record);
+      return static_cast<int>(QV_SUCCESS);
+    });
+    if (code != QV_SUCCESS) record.phase.code = code;
+    SayCause(record, log.lines());
+  }
+  record.properties = PropertiesOffDefault(tester);
+  record.Judge();
+  record.log_lines = std::move(log.lines());
+  record.end_millis = MillisSinceEpoch();
+  return record;
+}
+
+}  // namespace qv

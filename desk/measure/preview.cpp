@@ -1,0 +1,122 @@
+// Tests 13 and 19: how much two preview frames differ.
+
+#include <opencv2/imgproc.hpp>
+
+#include "desk/base/text.h"
+#include "desk/measure/frames.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kDifference = {"mean absolute difference of the grey frames over 255",
+                                "Exact for the frames as delivered.",
+                                "Moved by motion, noise, flicker and exposure between the frames."};
+
+// A column of the map's colours, largest above.
+cv::Mat ColourBar(int steps) {
+  cv::Mat bar(steps, 1, CV_8U);
+  for (int i = 0; i < steps; ++i) bar.at<uchar>(i) = static_cast<uchar>(255 - 255 * i / (steps - 1));
+  cv::resize(bar, bar, {20, steps}, 0, 0, cv::INTER_NEAREST);
+  cv::applyColorMap(bar, bar, cv::COLORMAP_VIRIDIS);
+  return bar;
+}
+
+class PreviewFinding : public Finding {
+ public:
+  PreviewFinding(cv::Mat first, cv::Mat map) : first_(std::move(first)), map_(std::move(map)) {}
+
+  std::string Report(const Record& record) const override {
+    const Reading& mean = *record.phase.Find("difference_mean");
+    return Format("mean difference  %.5f of full scale (%.2f grey levels)%s\n", mean.value(), 255 * mean.value(),
+                  LimitText(mean).c_str());
+  }
+
+  // The difference map beside the first frame; the map's own largest value is its lightest colour.
+  std::optional<Picture> Draw(const Record& record) const override {
+    if (!record.measured()) return std::nullopt;
+    constexpr int kSteps = 200;
+    const double scale = FitScale(first_, 760);
+    const double width = first_.cols * scale;
+    Picture picture(cvRound(2 * width + 120), cvRound(std::max(first_.rows * scale, kSteps + 20.0) + kHeadPx + 20));
+    picture.Text(Format("%s: mean difference %.5f of full scale, %s", record.test_name.c_str(),
+                        record.phase.Find("difference_mean")->value(), Name(record.outcome())),
+                 {12, 28}, 18, kInk);
+    picture.PlacePhoto(first_, {0, kHeadPx}, scale);
+    cv::Mat colours;
+    map_.convertTo(colours, CV_8U, 255);
+    cv::applyColorMap(colours, colours, cv::COLORMAP_VIRIDIS);
+    picture.PlacePhoto(colours, {width + 8, kHeadPx}, scale);
+    const double bar_left = 2 * width + 20;
+    picture.PlacePhoto(ColourBar(kSteps), {bar_left, kHeadPx + 20}, 1);
+    picture.Text("largest", {bar_left + 26, kHeadPx + 30}, 13, kInk);
+    picture.Text("none", {bar_left + 26, kHeadPx + 20 + kSteps}, 13, kInk);
+    return picture;
+  }
+
+ private:
+  cv::Mat first_;
+  cv::Mat map_;  // CV_32F, 0 to 1
+};
+
+class Preview : public Measurement {
+ public:
+  explicit Preview(bool front) : front_(front) {
+    spec_.name = front ? "camera_preview_front" : "camera_preview";
+    spec_.test = front ? QV_TEST_CAMERA_PREVIEW_2 : QV_TEST_CAMERA_PREVIEW;
+    spec_.inputs = {{"first", front ? QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME : QV_RESOURCE_PREVIEW_FIRST_FRAME,
+                     "First preview frame"},
+                    {"second", front ? QV_RESOURCE_FRONT_PREVIEW_SECOND_FRAME : QV_RESOURCE_PREVIEW_SECOND_FRAME,
+                     "Second preview frame, of the same size"}};
+    spec_.parameters = {RawParameter()};
+    spec_.figures = {{"difference_mean", kOne, Number::kReal, nullptr, kDifference,
+                      "Mean difference of the two frames, 0 to 1: how much the preview moves."}};
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    cv::Mat map;
+    if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
+      const QVPreviewResult& result = front_ ? results->preview_front_ : results->preview_main_;
+      if (result.preview_diff_map_ != nullptr) {
+        record.phase.Add("difference_mean", result.preview_diff_mean_);
+        map = cv::Mat(result.preview_diff_rows_, result.preview_diff_cols_, CV_32F, result.preview_diff_map_).clone();
+        cv::patchNaNs(map, 0);  // identical frames: no difference anywhere
+      } else {
+        SayFramesDiffer(record);
+      }
+    }
+    return std::make_unique<PreviewFinding>(SlotPhoto(tester, spec_.inputs[0].slot), map);
+  }
+
+ private:
+  // The test answers 1 all the same.
+  static void SayFramesDiffer(Record& record) {
+    const RecordedInput& first = record.inputs[0];
+    const RecordedInput& second = record.inputs[1];
+    record.Say(Remark::kNoJudgement, "frames_of_different_sizes",
+               Format("%s and %s: the frames are of different sizes, %d x %d and %d x %d", first.path.c_str(),
+                      second.path.c_str(), first.width, first.height, second.width, second.height));
+  }
+
+  bool front_;
+  Spec spec_;
+};
+
+}  // namespace
+
+Parameter RawParameter() {
+  return {"raw", Parameter::kSize, "WxH", "Frames are raw NV21 of this size, not picture files"};
+}
+
+const Measurement& PreviewMeasurement(bool front) {
+  static const Preview main(false);
+  static const Preview second(true);
+  return front ? second : main;
+}
+
+}  // namespace qv

@@ -1,0 +1,169 @@
+// A picture brought into the frame of a reference.
+
+#include <algorithm>
+#include <cmath>
+#include <numeric>
+
+#include "desk/base/text.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kSurf = {"SURF key points, the affine map of the three best of the good matches",
+                          "Median error 1.4 px on textured pairs with shift, turn, scale, gain and 3 % noise; 30 in "
+                          "100 are off by over 3 px, 14 by over 10.",
+                          "Moved by false matches among the three best: repeated texture, noise, blur."};
+
+constexpr double kAgreePx = 3;
+constexpr double kLeastAgreeing = 0.25;  // of the good matches
+constexpr double kMostStretch = 1.2;
+
+struct Pose {
+  cv::Point2d shift;  // of the reference's middle
+  double turn_deg, scale, stretch;
+};
+
+// The parts of an affine map: its linear part is a turn after a stretch along some direction (polar decomposition).
+Pose Decompose(const cv::Matx23d& m, cv::Size reference) {
+  const cv::Vec3d middle((reference.width - 1) / 2.0, (reference.height - 1) / 2.0, 1);
+  const cv::Vec2d to = m * middle;
+  const cv::Matx22d linear(m(0, 0), m(0, 1), m(1, 0), m(1, 1));
+  cv::Vec2d enlargements;
+  cv::SVD::compute(linear, enlargements, cv::SVD::NO_UV);
+  // Rows run down, so a turn that raises columns with rows is counter-clockwise.
+  return {{to[0] - middle[0], to[1] - middle[1]},
+          std::atan2(m(0, 1) - m(1, 0), m(0, 0) + m(1, 1)) * 180 / CV_PI,
+          std::sqrt(std::fabs(cv::determinant(linear))),
+          enlargements[0] / enlargements[1]};
+}
+
+int CountAgreeing(const QVTester::Unwarp& found) {
+  const cv::Matx23d map(found.matrix);
+  return static_cast<int>(std::count_if(found.good.begin(), found.good.end(), [&](const cv::DMatch& match) {
+    const cv::Point2d from = found.reference_keypoints[match.queryIdx].pt;
+    const cv::Point2d to = found.image_keypoints[match.trainIdx].pt;
+    const cv::Vec2d at = map * cv::Vec3d(from.x, from.y, 1);
+    return std::hypot(at[0] - to.x, at[1] - to.y) <= kAgreePx;
+  }));
+}
+
+void Collect(Phase& phase, const QVTester::Unwarp& found) {
+  phase.Add("good_matches", static_cast<double>(found.good.size()));
+  phase.Add("agreeing_matches", CountAgreeing(found));
+  const std::vector<double> matrix(found.matrix.begin<double>(), found.matrix.end<double>());
+  std::vector<double> numbers(matrix.size());
+  std::iota(numbers.begin(), numbers.end(), 0);
+  phase.Add("matrix", numbers, matrix);
+  const Pose pose = Decompose(cv::Matx23d(found.matrix), found.reference.size());
+  phase.Add("shift_columns", pose.shift.x);
+  phase.Add("shift_rows", pose.shift.y);
+  phase.Add("turn", pose.turn_deg);
+  phase.Add("scale", pose.scale);
+  phase.Add("stretch", pose.stretch);
+}
+
+// The method trusts its three best matches: what the others say of them tells a false map.
+void Look(Record& record) {
+  if (record.phase.code != QV_SUCCESS) return;
+  const double good = record.phase.Find("good_matches")->value();
+  const double agreeing = record.phase.Find("agreeing_matches")->value();
+  const double stretch = record.phase.Find("stretch")->value();
+  if (agreeing >= kLeastAgreeing * good && agreeing > 3 && stretch <= kMostStretch) return;
+  const std::string shape = stretch < 1000 ? Format("stretches the picture by %.2f", stretch) : "folds it to a line";
+  record.Say(Remark::kDoubt, "map_not_agreed",
+             Format("%s: doubtful: %.0f of %.0f good matches agree with the map, which %s; one of the "
+                    "three matches that make it may be false",
+                    record.inputs[1].path.c_str(), agreeing, good, shape.c_str()),
+             "agreeing_matches");
+}
+
+class RegistrationFinding : public Finding {
+ public:
+  std::string Report(const Record& record) const override {
+    const auto value = [&](const char* figure) { return record.phase.Find(figure)->value(); };
+    const std::vector<double>& m = record.phase.Find("matrix")->values;
+    return Format("matches    %.0f good, %.0f agree with the map\n", value("good_matches"), value("agreeing_matches")) +
+           Format("shift      %.2f columns, %.2f rows\n", value("shift_columns"), value("shift_rows")) +
+           Format("turn       %.3f degrees counter-clockwise\n", value("turn")) +
+           Format("scale      %.4f, stretch %.4f\n", value("scale"), value("stretch")) +
+           Format("matrix     %11.6f %11.6f %11.3f\n           %11.6f %11.6f %11.3f\n", m[0], m[1], m[2], m[3], m[4],
+                  m[5]);
+  }
+
+  // The good matches between both pictures.
+  std::optional<Picture> Draw(const Record& record) const override {
+    if (record.phase.code != QV_SUCCESS) return std::nullopt;
+    QVTester painter;
+    painter.kept_->unwarp = unwarp;
+    const cv::Mat& matches = painter.DrawUnwarpMatches();
+    Picture picture(matches.cols, matches.rows);
+    picture.PlacePhoto(matches, {0, 0}, 1);
+    return picture;
+  }
+
+  cv::Mat Product() const override { return unwarped; }
+
+  cv::Mat unwarped;
+  QVTester::Unwarp unwarp;
+};
+
+class Registration : public Measurement {
+ public:
+  Registration() {
+    spec_.name = "registration";
+    spec_.routine = "GetUnwarpedImage";
+    spec_.inputs = {{"reference", QV_RESOURCE_CHART_STANDARD, "Picture whose frame is taken"},
+                    {"image", QV_RESOURCE_CHART_PHOTO, "Picture of the same scene, brought into that frame"}};
+    spec_.figures = Figures();
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& /*request*/, Record& record) const override {
+    auto finding = std::make_unique<RegistrationFinding>();
+    const bool found = RunRoutine(record.phase, spec_.routine, [&] {
+      return tester.GetUnwarpedImage(SlotPhoto(tester, QV_RESOURCE_CHART_STANDARD),
+                                     SlotPhoto(tester, QV_RESOURCE_CHART_PHOTO), finding->unwarped);
+    });
+    if (!found) return finding;
+    finding->unwarp = tester.kept_->unwarp;
+    Collect(record.phase, finding->unwarp);
+    Look(record);
+    return finding;
+  }
+
+ private:
+  static std::vector<Figure> Figures() {
+    constexpr auto kWhole = Number::kWhole;
+    constexpr auto kReal = Number::kReal;
+    return {
+        {"good_matches", kOne, kWhole, nullptr, kSurf, "Feature matches within the distance limit; three are needed."},
+        {"agreeing_matches", kOne, kWhole, nullptr, kSurf,
+         "Good matches that the map explains to within 3 px. The three that make the map always agree: a map that few "
+         "others agree with is doubtful."},
+        {"matrix", kOne, kReal, &kMatrixAxis, kSurf,
+         "a, b, c, d, e, f: column = a x + b y + c and row = d x + e y + f in the image, for column x and row y of the "
+         "reference."},
+        {"shift_columns", kPixel, kReal, nullptr, kSurf, "How far the reference's middle has moved to the right."},
+        {"shift_rows", kPixel, kReal, nullptr, kSurf, "How far the reference's middle has moved down."},
+        {"turn", kDegree, kReal, nullptr, kSurf, "Turn of the image against the reference, counter-clockwise."},
+        {"scale", kOne, kReal, nullptr, kSurf, "Size of the scene in the image over that in the reference."},
+        {"stretch", kOne, kReal, nullptr, kSurf,
+         "Largest over smallest enlargement along any direction; 1 when the map keeps shapes."},
+    };
+  }
+
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& RegistrationMeasurement() {
+  static const Registration registration;
+  return registration;
+}
+
+}  // namespace qv

@@ -1,0 +1,141 @@
+#include "desk/measure/request.h"
+
+#include <algorithm>
+
+#include "desk/base/failure.h"
+#include "desk/measure/measurement.h"
+#include "desk/measure/properties.h"
+
+namespace qv {
+
+namespace {
+
+[[noreturn]] void Refuse(const std::string& sentence) { throw Failure(kWrongUsage, sentence); }
+
+const Spec& SpecOf(const Request& request) {
+  const Measurement* const measurement = FindMeasurement(request.measurement);
+  if (measurement == nullptr) {
+    Refuse(request.measurement + ": no such measurement; `qvtester list measurements` shows them");
+  }
+  return measurement->spec();
+}
+
+const Parameter* FindParameter(const Spec& spec, const std::string& name) {
+  const auto found = std::find_if(spec.parameters.begin(), spec.parameters.end(),
+                                  [&](const Parameter& parameter) { return name == parameter.name; });
+  return found == spec.parameters.end() ? nullptr : &*found;
+}
+
+void TakeOptionalInputs(const Spec& spec, Request& request) {
+  for (std::size_t i = 0; i < spec.inputs.size(); ++i) {
+    const char* const name = spec.inputs[i].name;
+    if (!spec.inputs[i].optional || !request.parameters.contains(name)) continue;
+    const Json& path = request.parameters[name];
+    if (!path.is_string()) Refuse(std::string(name) + ": " + path.dump() + " is no path");
+    if (request.inputs.size() != i) Refuse(std::string(name) + ": given twice, or without the inputs before it");
+    request.inputs.emplace_back(path.get<std::string>());
+    request.parameters.erase(name);
+  }
+}
+
+void CheckInputs(const Spec& spec, const Request& request) {
+  const auto least = static_cast<std::size_t>(
+      std::count_if(spec.inputs.begin(), spec.inputs.end(), [](const InputSpec& input) { return !input.optional; }));
+  const std::size_t given = request.inputs.size();
+  if (given >= least && given <= spec.inputs.size()) return;
+  std::string names;
+  for (const InputSpec& input : spec.inputs) {
+    names += (names.empty() ? "" : ", ") + std::string(input.name) + (input.optional ? " (may be left out)" : "");
+  }
+  Refuse(std::string(spec.name) + ": " + std::to_string(given) + " inputs given; it takes " + names);
+}
+
+// A parameter that sets a property and the property itself are one value.
+Json ValueOf(const Parameter& parameter, Request& request) {
+  const std::string property = parameter.property ? std::to_string(*parameter.property) : "";
+  const bool by_property = !property.empty() && request.properties.contains(property);
+  const bool given = request.parameters.contains(parameter.name);
+  if (!given && !by_property) return InitialValue(parameter);
+  Json value = Checked(parameter, given ? request.parameters[parameter.name] : request.properties[property]);
+  if (!by_property) return value;
+  if (given && value != request.properties[property]) {
+    Refuse(std::string(parameter.name) + " and property " + property + " are one, and differ");
+  }
+  request.properties.erase(property);
+  return value;
+}
+
+}  // namespace
+
+Request Resolved(const Request& request) {
+  Request full = request;
+  const Spec& spec = SpecOf(request);
+  if (!full.parameters.is_object()) Refuse("parameters: an object of values by name is needed");
+  TakeOptionalInputs(spec, full);
+  CheckInputs(spec, full);
+  for (const auto& [name, value] : full.parameters.items()) {
+    if (FindParameter(spec, name) == nullptr) Refuse(std::string(spec.name) + " has no parameter " + name);
+  }
+  full.properties = CheckedProperties(full.properties);
+  Json values = Json::object();
+  for (const Parameter& parameter : spec.parameters) {
+    if (Json value = ValueOf(parameter, full); !value.is_null()) values[parameter.name] = std::move(value);
+  }
+  full.parameters = std::move(values);
+  return full;
+}
+
+Json ToJson(const Request& request) {
+  const Measurement* const measurement = FindMeasurement(request.measurement);
+  Json inputs = Json::array();
+  Json parameters = request.parameters;
+  for (std::size_t i = 0; i < request.inputs.size(); ++i) {
+    const Input& input = request.inputs[i];
+    const Json path = input.is_path() ? Json(input.name) : Json();
+    const bool optional =
+        measurement != nullptr && i < measurement->spec().inputs.size() && measurement->spec().inputs[i].optional;
+    if (optional) {
+      parameters[measurement->spec().inputs[i].name] = path;
+    } else {
+      inputs.push_back(path);
+    }
+  }
+  return {{"measurement", request.measurement},
+          {"inputs", inputs},
+          {"parameters", parameters},
+          {"properties", request.properties},
+          {"fake", request.fake}};
+}
+
+Request RequestFromJson(const Json& json) {
+  if (!json.is_object()) Refuse("a request is an object");
+  Request request;
+  for (const auto& [key, value] : json.items()) {
+    const auto want = [&, &name = key, &held = value](bool fits, const char* what) {
+      if (!fits) Refuse(name + ": " + held.dump() + " is not " + what);
+    };
+    if (key == "measurement") {
+      want(value.is_string(), "a name");
+      request.measurement = value.get<std::string>();
+    } else if (key == "inputs") {
+      want(value.is_array(), "a list of paths");
+      for (const Json& path : value) {
+        want(path.is_string(), "a list of paths");
+        request.inputs.emplace_back(path.get<std::string>());
+      }
+    } else if (key == "parameters" || key == "properties") {
+      want(value.is_object(), "an object");
+      (key == "parameters" ? request.parameters : request.properties) = value;
+    } else if (key == "fake") {
+      want(value.is_boolean(), "true or false");
+      request.fake = value.get<bool>();
+    } else {
+      Refuse("\"" + key + "\" is no part of a request");
+    }
+  }
+  if (request.measurement.empty()) Refuse("a request names its measurement");
+  SpecOf(request);
+  return request;
+}
+
+}  // namespace qv

@@ -1,0 +1,30 @@
+#ifndef QVTESTER_DESK_MEASURE_TELLING_H_
+#define QVTESTER_DESK_MEASURE_TELLING_H_
+
+#include <opencv2/core.hpp>
+#include <string>
+
+#include "desk/measure/record.h"
+
+namespace qv {
+
+// Words and measures that the findings' reports and pictures share.
+
+/// Above the photo of a picture, for its heading.
+inline constexpr double kHeadPx = 44;
+
+/// The scale at which a photo's longer side fits; never enlarges.
+double FitScale(const cv::Mat& photo, double side);
+
+/// Whether a picture of the photo tells something: it was measured, or marks were looked for and not found.
+bool ShowsPhoto(int code);
+
+/// "0.3124 Nyquist  0.1562 c/p  937 LW/PH", and lp/mm when the pixel pitch is known (not 0).
+std::string FrequencyText(double nyquist, int photo_height, double pixel_pitch_um);
+
+/// "  (at least 0.38, at most 0.6, FAIL)" for a figure with a limit, nothing for one without.
+std::string LimitText(const Reading& m);
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_TELLING_H_
