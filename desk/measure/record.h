@@ -12,6 +12,7 @@
 #include "desk/measure/figures.h"
 #include "desk/measure/limits.h"
 #include "desk/measure/request.h"
+#include "desk/measure/uncertainty.h"
 
 namespace qv {
 
@@ -23,12 +24,6 @@ inline constexpr const char kRecordSchema[] = "qvtester-record-1";
 
 enum class Outcome { kPass, kFail, kError, kUnset };
 const char* Name(Outcome outcome);
-
-/// How far a value may be trusted, in its own unit (GUM).
-struct Uncertainty {
-  double standard, expanded, coverage_factor;
-  std::string method;
-};
 
 /// A figure's value.
 struct Reading {
