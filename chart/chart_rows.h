@@ -13,9 +13,12 @@ class ChartRows {
   /// Throws cv::Exception (StsUnsupportedFormat) for a photo that is not of 8 bits and three or four channels.
   ChartRows(QVTester& tester, const cv::Mat& photo, int threshold);
 
-  /// Makes the row if it is not there yet.
+  // Rows are made some together, since each call costs as much as a row or two.
+
+  /// Makes the row if it is not there yet, and with it others about it: the scan, once it has found something, has made
+  /// every other row.
   void Need(int row) {
-    if (!made_[static_cast<std::size_t>(row)]) Make(row, 1, 1);
+    if (!made_[static_cast<std::size_t>(row)]) Make(row - row % (2 * kTogether) + row % 2, 2, kTogether);
   }
   /// Makes the row if it is not there yet, and with it the next few, so many rows apart.
   void NeedSome(int row, int step) {
