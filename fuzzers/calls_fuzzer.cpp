@@ -13,6 +13,7 @@
 #include "qvtester/api.h"
 #include "qvtester/host_properties.h"
 #include "unit_tests/drawing.h"
+#include "unit_tests/film_file.h"
 
 namespace {
 
@@ -27,16 +28,24 @@ const std::vector<std::string>& Files() {
     cv::Mat dust(240, 320, CV_8UC3, cv::Scalar(220, 225, 210));
     for (int i = 1; i < 8; ++i) cv::circle(dust, {40 * i, 30 * i}, 5, cv::Scalar::all(120), cv::FILLED);
     const cv::Mat chart = DrawChart({3, 0, 0.04, {360, 360}, 0.5});
-    return std::vector<std::string>{folder.Write("chart.png", chart),
-                                    folder.Write("turned.png", DrawChart({3, 118, 0.04, {480, 400}, 0.5})),
-                                    folder.Write("two.png", DrawChart({2, 0, 0.04, {360, 360}, 0.5})),
-                                    folder.Write("cut.png", chart(cv::Rect(0, 0, 340, 300))),
-                                    folder.Write("dust.png", dust),
-                                    folder.Write("gray.png", cv::Mat(9, 1, CV_16UC1, cv::Scalar(4000))),
-                                    folder.Write("none.jpg", std::string("no picture")),
-                                    folder.Write("empty.png", std::string()),
-                                    folder.Path("missing.png"),
-                                    folder.Path("")};
+    const std::vector<cv::Mat> frames = {chart, chart, DrawChart({2, 0, 0.04, {360, 360}, 0.5}), chart};
+    const std::string film = WriteFilm(folder.Path("film.mp4"), frames, kH264);
+    const std::string bytes = ReadFile(film);
+    return std::vector<std::string>{
+        film,
+        WriteFilm(folder.Path("film.avi"), {dust, 2 * dust, dust}),
+        folder.Write("cut.mkv", ReadFile(WriteFilm(folder.Path("a.mkv"), frames, kH264)).substr(0, bytes.size() / 2)),
+        folder.Write("cut.mp4", bytes.substr(0, bytes.size() - 9)),
+        folder.Write("chart.png", chart),
+        folder.Write("turned.png", DrawChart({3, 118, 0.04, {480, 400}, 0.5})),
+        folder.Write("two.png", DrawChart({2, 0, 0.04, {360, 360}, 0.5})),
+        folder.Write("cut.png", chart(cv::Rect(0, 0, 340, 300))),
+        folder.Write("dust.png", dust),
+        folder.Write("gray.png", cv::Mat(9, 1, CV_16UC1, cv::Scalar(4000))),
+        folder.Write("none.jpg", std::string("no picture")),
+        folder.Write("empty.png", std::string()),
+        folder.Path("missing.png"),
+        folder.Path("")};
   }();
   return files;
 }
@@ -49,7 +58,7 @@ void ReadAll(const T* array, int count) {
 void ReadResults() {
   QVResultData* results = nullptr;
   if (GetResult(&results) != 1) return;
-  for (const QVPreviewResult* preview : {&results->preview_main_, &results->preview_front_}) {
+  for (const QVPreviewResult* preview : {&results->preview_main_, &results->preview_front_, &results->preview_video_}) {
     ReadAll(preview->preview_diff_map_, preview->preview_diff_rows_ * preview->preview_diff_cols_);
   }
   for (const float* sfr : {results->af_sfr_first_, results->af_sfr_second_, results->af_sfr_third_})
@@ -57,6 +66,17 @@ void ReadResults() {
   for (const QVCaptureResult* capture : {&results->capture_main_, &results->capture_front_}) {
     ReadAll(capture->capture_lab_, 3 * capture->capture_lab_count_);
     ReadAll(capture->capture_delta_e_, capture->capture_delta_e_count_);
+  }
+  ReadAll(results->video_af_time_, results->video_af_frame_count_);
+  ReadAll(results->video_af_mtf50_vertical_, results->video_af_frame_count_);
+  ReadAll(results->video_af_mtf50_horizontal_, results->video_af_frame_count_);
+  ReadAll(results->video_flash_time_, results->video_flash_frame_count_);
+  ReadAll(results->video_flash_mean_, results->video_flash_frame_count_);
+  for (const QVVideoChartResult* film : {&results->video_record_, &results->video_play_}) {
+    ReadAll(film->time_, film->frame_count_);
+    for (const int* array : {film->mark_count_, film->corner_row_, film->corner_column_})
+      ReadAll(array, film->frame_count_);
+    ReadAll(film->angle_, film->frame_count_);
   }
   for (const int* histogram : {results->dust_hist_main_, results->dust_hist_front_})
     if (histogram != nullptr) ReadAll(histogram, 256);

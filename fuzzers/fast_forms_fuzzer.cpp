@@ -9,6 +9,7 @@
 #include <cstring>
 #include <opencv2/imgproc.hpp>
 
+#include "chart/chart_rows.h"
 #include "chart/region_warp.h"
 #include "unit_tests/plain/colour.h"
 #include "unit_tests/plain/error_areas.h"
@@ -65,6 +66,12 @@ void Finder(Bytes& bytes) {
     return values;
   };
   Demand(plain::Bits(left(plain)) == plain::Bits(left(fast)), "GetFinderPoints' candidates");
+  if (image.empty()) return;
+  cv::Mat photo;
+  cv::cvtColor(image, photo, cv::COLOR_GRAY2BGR);
+  QVTester rows;
+  Demand(plain.GetFinderPoints(image) == FindMarks(rows, photo, 0), "FindMarks");
+  Demand(plain::Bits(left(plain)) == plain::Bits(left(rows)), "FindMarks' candidates");
 }
 
 void Dots(Bytes& bytes) {
