@@ -15,14 +15,14 @@ constexpr int kMedianAperture = 5;
 
 // A grey, smoothed picture, as stored; empty when the file can't be read, with one line in the log.
 cv::Mat ReadGray(const std::string& path) {
+  std::vector<unsigned char> bytes;
+  std::string reason;
   cv::Mat image;
-  try {
-    image = cv::imread(path, cv::IMREAD_GRAYSCALE | cv::IMREAD_IGNORE_ORIENTATION);
-  } catch (const cv::Exception& e) {
-    if (e.code == cv::Error::StsNoMem) throw;
+  if (QVResource::ReadPicture(path.c_str(), bytes, reason)) {
+    image = QVResource::DecodePicture(bytes, reason, cv::IMREAD_GRAYSCALE);
   }
   if (image.empty()) {
-    QVDEBUGP("[%s] %s: not an image that can be decoded", "SetResource", path.c_str());
+    QVDEBUGP("[%s] %s: %s", "SetResource", path.c_str(), reason.c_str());
     return image;
   }
   cv::medianBlur(image, image, kMedianAperture);

@@ -1,47 +1,85 @@
 #include "qvtester/resource.h"
 
 #include <algorithm>
+#include <climits>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
-#include <opencv2/videoio/registry.hpp>
 
+#include "core/file_gate.h"
 #include "core/slots.h"
 #include "qvtester/log.h"
 
 namespace {
 
-// Pixels as stored: neither turned nor mirrored by orientation tags, since a test's geometry is the sensor's.
-cv::Mat ReadColour(const char* path) {
-  try {
-    cv::Mat image = cv::imread(path, cv::IMREAD_COLOR | cv::IMREAD_IGNORE_ORIENTATION);
-    if (image.empty()) QVDEBUGP("[%s] %s: not an image that can be decoded", "SetImage", path);
-    return image;
-  } catch (const cv::Exception& e) {
-    if (e.code == cv::Error::StsNoMem) throw;
-    QVDEBUGP("[%s] %s: %s", "SetImage", path, e.what());
-    return cv::Mat();
-  }
-}
-
+// By FFmpeg alone, and under a name that is no protocol and no pattern of file names.
 cv::VideoCapture OpenFilm(const std::string& path) {
+  const RegularFile file(path.c_str());
+  const bool film = file.valid() && StartsAsFilm(file.Read(kFilmHead));
   cv::VideoCapture video;
-  for (const cv::VideoCaptureAPIs backend : cv::videoio_registry::getStreamBackends()) {
-    if (backend == cv::CAP_GPHOTO2) continue;  // would look for a USB camera of that name, and lose memory doing so
-    if (video.open(path, backend)) break;
-  }
-  if (video.isOpened()) {
+  if (film && video.open(file.Name(), cv::CAP_FFMPEG)) {
     video.set(cv::CAP_PROP_ORIENTATION_AUTO, 0);
   } else {
-    QVDEBUGP("[%s] %s: not a video that can be opened", "SetVideo", path.c_str());
+    QVDEBUGP("[%s] %s: %s", "SetVideo", path.c_str(), film ? "not a video that can be opened" : "not a video file");
   }
   return video;
 }
 
 }  // namespace
 
+std::int64_t QVResource::most_pixels_ = 200'000'000;
+
+bool QVResource::ReadPicture(const char* path, std::vector<unsigned char>& bytes, std::string& reason) {
+  constexpr std::int64_t kHead = 256;  // as much as tells a picture from the rest
+  const RegularFile file(path);
+  if (!file.valid()) {
+    reason = "not a regular file that can be read";
+  } else if (!StartsAsPicture(file.Read(kHead))) {
+    reason = "not an image that can be decoded";
+  } else if (file.size() > INT_MAX - 2) {
+    reason = "a file too large for an image";
+  } else {
+    bytes = file.Read(file.size());
+    const char* const refused = RefusePicture(bytes, most_pixels_);
+    if (refused == nullptr) return true;
+    reason = refused;
+  }
+  return false;
+}
+
+// Pixels as stored: neither turned nor mirrored by orientation tags, since a test's geometry is the sensor's.
+cv::Mat QVResource::DecodePicture(const std::vector<unsigned char>& bytes, std::string& reason, int flags) {
+  if (const char* const refused = RefusePicture(bytes, most_pixels_)) {
+    reason = refused;
+    return {};
+  }
+  cv::Mat image;
+  try {
+    const std::size_t size = bytes.size();
+    if (bytes[0] == 0xFF && bytes[1] == 0xD8 && (bytes[size - 2] != 0xFF || bytes[size - 1] != 0xD9)) {
+      // A cut JPEG is filled up as from a file, where libjpeg adds the mark of the end itself.
+      std::vector<unsigned char> ended(bytes);
+      ended.insert(ended.end(), {0xFF, 0xD9});
+      image = cv::imdecode(ended, flags | cv::IMREAD_IGNORE_ORIENTATION);
+    } else {
+      image = cv::imdecode(bytes, flags | cv::IMREAD_IGNORE_ORIENTATION);
+    }
+    if (image.empty()) reason = "not an image that can be decoded";
+  } catch (const cv::Exception& e) {
+    if (e.code == cv::Error::StsNoMem) throw;
+    reason = e.what();
+  }
+  return image;
+}
+
 int QVResource::SetImage(char* path) {
-  cv::Mat image = ReadColour(path);
-  if (image.empty()) return QV_ERROR_INVALID_ARGUMENT;
+  std::vector<unsigned char> bytes;
+  std::string reason;
+  cv::Mat image;
+  if (ReadPicture(path, bytes, reason)) image = DecodePicture(bytes, reason);
+  if (image.empty()) {
+    QVDEBUGP("[%s] %s: %s", "SetImage", path, reason.c_str());
+    return QV_ERROR_INVALID_ARGUMENT;
+  }
   image_ = image;
   return QV_SUCCESS;
 }

@@ -11,6 +11,7 @@
 
 #include "chart/chart_rows.h"
 #include "chart/region_warp.h"
+#include "core/file_gate.h"
 #include "unit_tests/plain/colour.h"
 #include "unit_tests/plain/error_areas.h"
 #include "unit_tests/plain/finder.h"
@@ -141,10 +142,23 @@ void Warp(Bytes& bytes) {
          "WarpRegion");
 }
 
+// No plain form: whatever a file holds, its header is read within its bytes.
+void Gate(Bytes& bytes) {
+  static const char* const kStarts[] = {"\xFF\xD8\xFF", "\xFF\x4F\xFF\x51", "BM", "P6\n", "P7\n",
+                                        "#?RGBE\n",     "\x76\x2F\x31\x01"};
+  const std::string start = bytes.PickValueInArray(kStarts);
+  std::vector<unsigned char> file(start.begin(), start.end());
+  const std::vector<unsigned char> rest = bytes.ConsumeRemainingBytes<unsigned char>();
+  if (!rest.empty() && rest[0] % 2 == 0) file.clear();
+  file.insert(file.end(), rest.begin(), rest.end());
+  Demand(RefusePicture(file, 0) != nullptr, "RefusePicture");
+  static_cast<void>(StartsAsFilm(file));
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  static constexpr std::array kSubjects = {Finder, Dots, Sfr, Areas, Temperatures, Warp};
+  static constexpr std::array kSubjects = {Finder, Dots, Sfr, Areas, Temperatures, Warp, Gate};
   Bytes bytes(data, size);
   kSubjects[bytes.ConsumeIntegralInRange<std::size_t>(0, kSubjects.size() - 1)](bytes);
   return 0;

@@ -1,0 +1,139 @@
+// Files that lead a decoder elsewhere, keep it waiting or ask for the whole memory; and all that must still be read.
+
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+#include <opencv2/imgcodecs.hpp>
+
+#include "unit_tests/film_file.h"
+#include "unit_tests/module_test.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+class Files : public ModuleTest {
+ protected:
+  ~Files() override { QVResource::most_pixels_ = 200'000'000; }
+
+  static int LoadInto(int slot, std::string path) {
+    return SetResource(static_cast<QV_RESOURCE_INDEX>(slot), path.data());
+  }
+
+  // Refused as a photo, as a film and in a list of photos, each with one line that names it.
+  static void ExpectRefused(const std::string& path) {
+    for (const int slot : {17, 34, 36}) {
+      const LogLines log;
+      EXPECT_EQ(-97, slot == 36 ? SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {path}) : LoadInto(slot, path)) << path;
+      EXPECT_THAT(LogLines::Texts(), ElementsAre(HasSubstr(path))) << slot;
+      EXPECT_EQ(nullptr, theTester->resources_[slot]) << path;
+    }
+  }
+};
+
+TEST_F(Files, EveryFormatIsReadUpToTheLimitOfPixels) {
+  cv::Mat levels(37, 90, CV_32FC3);
+  cv::randu(levels, 0, 1);
+  cv::Mat picture;
+  levels.convertTo(picture, CV_8U, 255);
+  const cv::Mat gray(levels.size(), CV_8UC1, cv::Scalar(80));
+  const std::pair<const char*, const cv::Mat&> files[] = {
+      {"a.jpg", picture},  {"a.jp2", picture}, {"a.png", picture}, {"a.bmp", picture}, {"a.tif", levels},
+      {"a.webp", picture}, {"a.ppm", picture}, {"a.pgm", gray},    {"a.pbm", gray},    {"a.pam", picture},
+      {"a.ras", picture},  {"a.hdr", levels},  {"a.exr", levels},  {"a.pfm", levels}};
+  for (const auto& [name, content] : files) {
+    const std::string path = folder_.Write(name, content);
+    QVResource::most_pixels_ = 37 * 90;
+    ASSERT_EQ(1, LoadInto(17, path)) << name;
+    const cv::Mat read = cv::imread(path, cv::IMREAD_COLOR | cv::IMREAD_IGNORE_ORIENTATION);
+    EXPECT_EQ(0, cv::norm(Loaded(17), read, cv::NORM_INF)) << name;
+    theTester->resources_[17].reset();
+    QVResource::most_pixels_ = 37 * 90 - 1;
+    ExpectRefused(path);
+    QVResource::most_pixels_ = 0;  // headers alone are read: the sanitizers look on
+    const std::string whole = ReadFile(path);
+    for (std::size_t length = 0; length < std::min<std::size_t>(whole.size(), 600); ++length) {
+      std::string reason;
+      EXPECT_TRUE(QVResource::DecodePicture({whole.data(), whole.data() + length}, reason).empty());
+    }
+  }
+}
+
+TEST_F(Files, EveryFilmIsOpened) {
+  const std::vector<cv::Mat> frames(12, cv::Mat(48, 64, CV_8UC3, cv::Scalar::all(90)));
+  const std::string h265 = "-c:v libx265 -x265-params log-level=none";
+  for (const auto& [name, options] :
+       std::vector<std::pair<std::string, std::string>>{{"a.mp4", kH264},
+                                                        {"a.mov", kH264},
+                                                        {"a.3gp", kH264},
+                                                        {"a.mkv", kH264},
+                                                        {"a.avi", kLossless},
+                                                        {"a.ts", kH264},
+                                                        {"a.m2ts", kH264},
+                                                        {"a.mpg", "-c:v mpeg2video"},
+                                                        {"a.webm", "-c:v libvpx"},
+                                                        {"a.h264", kH264},
+                                                        {"a.h265", h265},
+                                                        {"a%03d.jpg", kH264 + " -f mp4 -update 1"}}) {
+    ASSERT_EQ(1, LoadInto(34, WriteFilm(folder_.Path(name), frames, options))) << name;
+    cv::VideoCapture film;
+    cv::Mat frame;
+    theTester->resources_[34]->GetVideo(&film);
+    EXPECT_TRUE(film.read(frame) && frame.size() == cv::Size(64, 48)) << name;
+  }
+}
+
+TEST_F(Files, WhatIsNoPictureOrFilmReachesNoDecoder) {
+  const std::string playlist = "#EXTM3U\n#EXTINF:1,\nother.ts\n";
+  std::string raster = "<VRTDataset rasterXSize=\"9\" rasterYSize=\"9\"><!--";
+  raster.resize(140, ' ');
+  raster += "DTED--><VRTRasterBand><SimpleSource><SourceFilename>/etc/passwd</SourceFilename></SimpleSource>";
+  std::string tagged = ReadFile(folder_.Write("a.bmp", cv::Mat(9, 20, CV_8UC3, cv::Scalar(3))));
+  tagged.replace(140, 4, "DTED");
+  std::string huge = ReadFile(folder_.Write("a.png", cv::Mat(9, 9, CV_8UC3)));
+  huge.replace(16, 8, std::string("\0\0\x40\0\0\0\x40\0", 8));  // 16384 x 16384
+  const std::pair<const char*, std::string> files[] = {
+      {"vrt.png", raster},
+      {"tagged.bmp", tagged},
+      {"huge.png", huge},
+      {"hls.avi", playlist},
+      {"list.mp4", "ffconcat version 1.0\nfile '/etc/passwd'\n"},
+      {"session.mp4", "v=0\nm=video 5000 RTP/AVP 96\n"},
+      {"manifest.mp4", "<?xml version=\"1.0\"?><MPD xmlns=\"urn:mpeg:dash:schema:mpd:2011\"/>"},
+      {"drawing.png", "<svg xmlns=\"http://www.w3.org/2000/svg\"><image href=\"/etc/passwd\"/></svg>"},
+      {"none.tif", std::string("II*\0\x08\0\0\0\0\0", 10)},
+      {"loop.jp2", std::string("\0\0\0\x0CjP  \r\n\x87\n\0\0\0\0junk", 20)},
+      {"empty", ""},
+  };
+  for (const auto& [name, content] : files) ExpectRefused(folder_.Write(name, content));
+}
+
+TEST_F(Files, WhatIsNoFileEndsAtOnce) {
+  const std::string pipe = folder_.Path("pipe.png");
+  ASSERT_EQ(0, mkfifo(pipe.c_str(), 0600));
+  const std::string link = folder_.Path("link.png");
+  std::filesystem::create_symlink(pipe, link);
+  for (const std::string& path : {pipe, link, std::string("/dev/zero"), std::string("/dev/tty"), folder_.Path("")}) {
+    ExpectRefused(path);
+  }
+}
+
+// A header of the other byte order, as cameras write it: tag, type 3 or 4, count 1, value.
+TEST_F(Files, SizesOfTiffsAreReadInBothByteOrders) {
+  const std::string start = "MM" + std::string("\0*\0\0\0\x08\0\x02", 8);
+  const auto entry = [](char tag, int value) {
+    return std::string("\x01", 1) + tag + std::string("\0\x03\0\0\0\x01", 6) + static_cast<char>(value >> 8) +
+           static_cast<char>(value & 255) + std::string(2, '\0');
+  };
+  std::string reason;
+  for (const auto& [height, expected] :
+       {std::pair{20000, "too many pixels"}, {9, "not an image that can be decoded"}}) {
+    const std::string file = start + entry('\0', 20000) + entry('\1', height) + std::string(4, '\0');
+    EXPECT_TRUE(QVResource::DecodePicture({file.begin(), file.end()}, reason).empty());
+    EXPECT_THAT(reason, HasSubstr(expected));
+  }
+}
+
+}  // namespace
