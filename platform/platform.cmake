@@ -11,9 +11,9 @@ target_include_directories(qvtester_platform SYSTEM INTERFACE "${QV_LIBLOG_INCLU
 target_link_libraries(qvtester_platform INTERFACE "${QV_LIBLOG_LIBRARY}")
 
 if(ANDROID)
-  set(QV_PLATFORM_SOURCES platform/log.cpp platform/android.cpp)
+  set(QV_PLATFORM_SOURCES platform/files.cpp platform/log.cpp platform/android.cpp)
 else()
-  set(QV_PLATFORM_SOURCES platform/log.cpp platform/host.cpp)
+  set(QV_PLATFORM_SOURCES platform/files.cpp platform/log.cpp platform/host.cpp)
 endif()
 
 # Debian keeps liblog outside the loader's path.

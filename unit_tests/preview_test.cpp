@@ -135,10 +135,21 @@ TEST_F(Preview, SavedFramesShareAFileByThrees) {
   EXPECT_EQ(-95, SavePreview(frame.data(), 0, 63, 48));
   EXPECT_EQ(-97, SavePreview(nullptr, 0, 64, 48));
   EXPECT_EQ(-97, SavePreview(frame.data(), 0, 0, 48));
-  for (const std::string& folder : {folder_.Path("missing"), std::string(200, 'x')}) {
-    SetHostPreviewFolder(folder.c_str());
-    EXPECT_EQ(1, SavePreview(frame.data(), 0, 64, 48)) << "a failed write is silent";
+  const std::string victim = folder_.Write("victim", std::string("words"));
+  std::filesystem::create_symlink(victim, folder_.Path("vi_pview_7.jpg"));
+  std::filesystem::create_directory(folder_.Path("vi_pview_8.jpg"));
+  for (const int number : {21, 24}) EXPECT_EQ(1, SavePreview(frame.data(), number, 64, 48));
+  EXPECT_EQ("words", ReadFile(victim)) << "a link is replaced, not followed";
+  EXPECT_EQ(cv::Size(64, 48), cv::imread(folder_.Path("vi_pview_7.jpg")).size());
+  for (const auto& entry : std::filesystem::directory_iterator(folder_.Path(""))) {
+    EXPECT_NE('.', entry.path().filename().string()[0]) << "what was written aside is gone";
   }
+  std::filesystem::create_directory_symlink(folder_.Path(""), folder_.Path("linked"));
+  for (const std::string& folder : {folder_.Path("missing"), folder_.Path("linked"), std::string(200, 'x')}) {
+    SetHostPreviewFolder(folder.c_str());
+    EXPECT_EQ(1, SavePreview(frame.data(), 30, 64, 48)) << "a failed write is silent";
+  }
+  EXPECT_FALSE(std::filesystem::exists(folder_.Path("vi_pview_10.jpg"))) << "nor is a linked folder followed";
 }
 
 }  // namespace

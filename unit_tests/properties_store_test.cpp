@@ -50,6 +50,28 @@ TEST_F(Store, KeysStayInTheirDirectory) {
   EXPECT_GT(0, platform::property_set(std::string(5000, 'k').c_str(), "x"));
 }
 
+TEST_F(Store, WhatIsNoValueIsNeitherReadNorFollowed) {
+  ASSERT_EQ(0, platform::property_set("k", "own"));
+  ASSERT_EQ(0, mkfifo((path_ + "/pipe").c_str(), 0600));
+  std::filesystem::create_directory(path_ + "/folder");
+  for (const char* key : {"pipe", "folder"}) {  // and nobody waits for the pipe's other end
+    EXPECT_GT(0, platform::property_set(key, "x")) << key;
+    EXPECT_EQ("none", Get(key, "none")) << key;
+  }
+  std::filesystem::create_symlink(folder_.Write("outside", std::string("secret")), path_ + "/link");
+  EXPECT_EQ("none", Get("link", "none"));
+  EXPECT_EQ(0, platform::property_set("link", "x"));
+  EXPECT_EQ("x", Get("link"));
+  EXPECT_EQ("secret", ReadFile(folder_.Path("outside")));
+  const std::filesystem::directory_iterator files(path_);
+  EXPECT_EQ(4, std::distance(begin(files), end(files))) << "what was written aside is gone";
+  for (const mode_t others : {0720, 0702}) {
+    ASSERT_EQ(0, chmod(path_.c_str(), others));
+    EXPECT_GT(0, platform::property_set("k", "x")) << std::oct << others;
+    EXPECT_EQ("none", Get("k", "none"));
+  }
+}
+
 TEST_F(Store, WhatIsNotItsOwnIsNoStore) {
   EXPECT_EQ(-97, SetHostPropertyStore(""));
   std::filesystem::create_directory_symlink(path_, folder_.Path("link"));

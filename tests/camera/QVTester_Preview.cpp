@@ -9,7 +9,7 @@
 #include "chart/find_chart.h"
 #include "chart/points.h"
 #include "core/slots.h"
-#include "platform/preview_folder.h"
+#include "platform/files.h"
 #include "platform/properties.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
@@ -123,5 +123,7 @@ int QVTester::GetImageCenter(std::vector<cv::Point>& points, int cam_id) {
 void QVTester::SavePreview(void* data, int frame, int width, int height) {
   cv::Mat picture;
   ConvertPreviewFrame(data, width, height, picture);
-  cv::imwrite(platform::PreviewFolder() + "/" + Short("vi_pview_%d.jpg", frame / 3).data(), picture);
+  std::vector<unsigned char> file;
+  cv::imencode(".jpg", picture, file);
+  platform::WritePreview(Short("vi_pview_%d.jpg", frame / 3).data(), file);
 }
