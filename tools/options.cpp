@@ -18,6 +18,15 @@ std::string WithDefault(const std::string& help, const std::string& value) {
   return value.empty() ? help : help + " [" + value + "]";
 }
 
+std::function<std::string(const std::string&)> Within(double low, double high) {
+  return [low, high](const std::string& text) {
+    double number = NAN;
+    const bool read = CLI::detail::lexical_cast(text, number);
+    return read && number >= low && number <= high ? std::string()
+                                                   : Format("%s is no number from %g to %g", text.c_str(), low, high);
+  };
+}
+
 }  // namespace
 
 void Options::Argument(const char* name, std::string& value, const std::string& help) {
@@ -65,15 +74,15 @@ void Options::ChoiceArgument(const char* name, std::string& value, const std::ve
 
 void Options::Number(const char* name, double& value, double low, double high, const std::string& help,
                      const char* type) {
-  const auto within = [low, high](const std::string& text) {
-    double number = NAN;
-    const bool read = CLI::detail::lexical_cast(text, number);
-    return read && number >= low && number <= high ? std::string()
-                                                   : Format("%s is no number from %g to %g", text.c_str(), low, high);
-  };
-  command_->add_option(name, value, WithDefault(help, value < low ? "" : Format("%g", value)))
-      ->check(within, "", "finite")
+  const std::string initial = value < low ? "" : Format("%g", value);
+  command_->add_option(name, value, WithDefault(help, initial))
+      ->check(Within(low, high), "", "finite")
       ->type_name(type);
+}
+
+void Options::Number(const char* name, std::optional<double>& value, double low, double high, const std::string& help,
+                     const char* type) {
+  command_->add_option(name, value, help)->check(Within(low, high), "", "finite")->type_name(type);
 }
 
 void Options::Whole(const char* name, int& value, int low, int high, const std::string& help, const char* type) {

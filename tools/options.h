@@ -43,8 +43,10 @@ class Options {
                       const std::string& help);
   /// A finite number from low to high.
   void Number(const char* name, double& value, double low, double high, const std::string& help, const char* type);
-  void Whole(const char* name, int& value, int low, int high, const std::string& help, const char* type);
   /// Help tells its default, which stands elsewhere.
+  void Number(const char* name, std::optional<double>& value, double low, double high, const std::string& help,
+              const char* type);
+  void Whole(const char* name, int& value, int low, int high, const std::string& help, const char* type);
   void Whole(const char* name, std::optional<int>& value, int low, int high, const std::string& help, const char* type);
   void Seed(const char* name, std::uint64_t& value, const std::string& help);
 

@@ -118,6 +118,40 @@ TEST_F(Simulator, TiltedChartsAreSeenInPerspective) {
               Truth()["legs_ratio"], 1e-9);
 }
 
+TEST_F(Simulator, BentPhotosAreSeenWhereTheTruthSays) {
+  const json record = Record("circles " + Simulate("--scene target --fill 0.9 --distortion -6 --shutter 40 --turn 8"));
+  for (std::size_t i = 0; i < 3; ++i) {
+    const json mark = Truth()["marks"][i];
+    const json seen = Measured(record, "circle_check_marks")[i];
+    EXPECT_LT(cv::norm(cv::Point2d(mark["x"], mark["y"]) - cv::Point2d(seen[0], seen[1])), 1.5);
+  }
+  const json bent = Truth()["marks"];
+  Simulate("--scene target --fill 0.9 --turn 8");
+  // The corner mark lies at (x, y) from the middle: 6 % nearer at the photo's corner, by the square of the distance.
+  const cv::Point2d off(Truth()["marks"][0]["x"].get<double>() - 599.5, Truth()["marks"][0]["y"].get<double>() - 449.5);
+  const double nearer = 1 - 0.06 * off.dot(off) / (599.5 * 599.5 + 449.5 * 449.5);
+  EXPECT_NEAR(599.5 + off.x * nearer + 40 * off.y * nearer / 899, bent[0]["x"], 1e-6);
+  EXPECT_NEAR(449.5 + off.y * nearer, bent[0]["y"], 1e-6);
+
+  const cv::Mat dimmed = Levels("--scene dust --specks 0 --falloff 30 --falloff-direction 90");
+  EXPECT_NEAR(0.7, dimmed.at<cv::Vec3f>(899, 3)[1] / dimmed.at<cv::Vec3f>(0, 900)[1], 1e-3);
+}
+
+TEST_F(Simulator, APhoneDoesAllOfIt) {
+  const json record = Record("capture " + Simulate("--pipeline phone --gain 0.8 --falloff 0 --noise 0.5", "p.jpg"));
+  const json truth = Truth("p");
+  EXPECT_EQ("srgb", truth["parameters"]["transfer"]);
+  EXPECT_EQ(0, truth["parameters"]["falloff_percent"]) << "what is given goes before the pipeline";
+  for (const char* edge : {"vertical", "horizontal"}) {
+    EXPECT_GT(truth["mtf50"][edge]["system"]["light"]["mtf50_nyquist"], truth["mtf50"][edge]["mtf50_nyquist"]);
+  }
+  for (int i = 0; i < 3; ++i) {
+    const json seen = Measured(record, std::string("camera_capture_lab_") + "lab"[i]);
+    ASSERT_EQ(4U, seen.size());
+    for (const json& patch : seen) EXPECT_NEAR(truth["patches"][patch[0].get<int>()]["lab"][i], patch[1], 1);
+  }
+}
+
 TEST_F(Simulator, WidePhotosShowNoSeams) {
   const std::string chart = "--marks coarse --blur 0.3 --turn 9 --size ";
   // The same chart in the middle of more paper, wider than a drawing can be.
@@ -139,6 +173,14 @@ TEST_F(Simulator, FilesAreOfTheirFormats) {
       << "chroma of half the size moves edges of colours only";
   EXPECT_LT(write("poor.jpg", "--quality 10").size(), write("good.jpg", "--quality 90").size());
   EXPECT_GT(cv::norm(picture("photo.png"), picture("poor.jpg")), cv::norm(picture("photo.png"), picture("good.jpg")));
+  const std::string cast = "--scene pair --mosaic bayer --noise 8 --quality 90 ";
+  write("all.png", cast);
+  std::vector<double> lost;
+  for (const char* chroma : {"444", "422", "420"}) {
+    write("chroma.jpg", cast + "--chroma " + chroma);
+    lost.push_back(cv::norm(picture("all.png"), picture("chroma.jpg")));
+  }
+  EXPECT_TRUE(lost[0] < lost[1] && lost[1] < lost[2]) << lost[0] << " " << lost[1] << " " << lost[2];
   const std::string seven = write("a.png", "--noise 2 --seed 7");
   EXPECT_EQ(seven, write("a.png", "--noise 2 --seed 7"));
   EXPECT_NE(seven, write("a.png", "--noise 2 --seed 8"));

@@ -72,9 +72,10 @@ std::string ScaleFact(double mm_per_unit) {
 const Kind kKinds[] = {
     {"sfr", SfrChart, SfrChartBounds,
      [](const SheetOptions& o, double mm_per_unit) {
-       return std::vector<std::string>{ScaleFact(mm_per_unit),
-                                       Format("contrast %g : 1, edges %g degrees, marks %s", o.style.contrast,
-                                              o.style.edge_angle_deg, o.marks.c_str())};
+       return std::vector<std::string>{
+           ScaleFact(mm_per_unit),
+           Format("contrast %.3g : 1 in light (%g : 1 in sRGB levels), edges %g degrees, marks %s",
+                  LightContrast(o.style.contrast), o.style.contrast, o.style.edge_angle_deg, o.marks.c_str())};
      }},
     {"target", [](const SfrChartStyle&) { return AimingTarget(); }, SfrChartBounds,
      [](const SheetOptions&, double mm_per_unit) { return std::vector<std::string>{ScaleFact(mm_per_unit)}; }},

@@ -22,6 +22,8 @@ void AddMark(Scene& scene, cv::Point2d centre, double module) {
 
 }  // namespace
 
+double LightContrast(double contrast) { return 255 / LightOf(255 / contrast); }
+
 Scene SfrChart(const SfrChartStyle& style) {
   Scene scene;
   for (const auto& [x, y] : kMarkCentres) {

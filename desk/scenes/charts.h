@@ -13,6 +13,9 @@ struct SfrChartStyle {
   double contrast = 5;  // stored level of the paper over that of the dark side of the edges
 };
 
+/// What a contrast of stored levels is of light.
+double LightContrast(double contrast);
+
 /// The sharpness chart, in chart units (chart/chart_layout.h).
 Scene SfrChart(const SfrChartStyle& style);
 

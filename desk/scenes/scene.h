@@ -3,6 +3,7 @@
 
 #include <cairo.h>
 
+#include <functional>
 #include <opencv2/core.hpp>
 #include <vector>
 
@@ -23,8 +24,18 @@ struct Scene {
   cv::Vec3d paper = {255, 255, 255};
 };
 
+/// Light of a stored level and the level of light, both 0 to 255: sRGB's transfer function.
+double LightOf(double level);
+double LevelOf(double light);
+
+/// The scene with light in place of stored levels.
+Scene InLight(const Scene& scene);
+
 /// Fills the shapes, each corner mapped by a projective transform to the target's coordinates.
 void Fill(cairo_t* cr, const Scene& scene, const cv::Matx33d& to_target);
+
+/// The same by any map; edges are bent between points that lie at most `step` apart on the target.
+void Fill(cairo_t* cr, const Scene& scene, const std::function<cv::Point2d(cv::Point2d)>& to_target, double step);
 
 cv::Point2d Map(const cv::Matx33d& transform, cv::Point2d point);
 

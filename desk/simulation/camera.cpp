@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <cmath>
+#include <functional>
 #include <memory>
 #include <opencv2/imgproc.hpp>
 #include <vector>
 
 #include "desk/drawing/cairo_check.h"
+#include "desk/simulation/development.h"
 #include "desk/simulation/method_law.h"
 
 namespace qv {
@@ -17,6 +19,7 @@ constexpr int kTileRows = 128;          // of the photo, drawn and blurred at a 
 constexpr int kTileColumns = 1024;      // a drawing is at most 32767 wide
 constexpr double kReach = 5;            // sigmas to which a Gaussian is carried
 constexpr double kSmallestSigma = 1.2;  // in subpixels: a sampled Gaussian narrower than this is not the continuous one
+constexpr double kStep = 8;             // pixels between the points of a bent edge
 constexpr double kDistance = 2.5;       // of the camera from the scene's plane, in sides of the scene
 
 // Subpixels a side, so that every blur is well sampled and the drawing's own smoothing does not show.
@@ -26,24 +29,55 @@ int Subpixels(const CameraModel& camera) {
   return std::clamp(static_cast<int>(std::ceil(kSmallestSigma / camera.blur_px)), 2, 8);
 }
 
-// A tile of the photo at `subpixels` a pixel, CV_32FC3 in BGR; each value a mean over its subpixel.
-cv::Mat DrawTile(const Scene& scene, const cv::Matx33d& tile_from_scene, cv::Size size) {
+// Maps the scene to a tile; null where a matrix does.
+using Bend = std::function<cv::Point2d(cv::Point2d)>;
+
+struct Tile {
+  cv::Matx33d from_scene;
+  Bend bent;
+  double step;  // of bent edges
+  cv::Size size;
+};
+
+// The scene at the tile's subpixels, CV_32FC3 in BGR, whole levels where no shapes meet; each value a mean over its
+// subpixel.
+cv::Mat DrawWhole(const Scene& scene, const Tile& tile) {
   const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface(
-      cairo_image_surface_create(CAIRO_FORMAT_RGB24, size.width, size.height), cairo_surface_destroy);
+      cairo_image_surface_create(CAIRO_FORMAT_RGB24, tile.size.width, tile.size.height), cairo_surface_destroy);
   const std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr(cairo_create(surface.get()), cairo_destroy);
   cairo_set_antialias(cr.get(), CAIRO_ANTIALIAS_BEST);
   cairo_set_source_rgb(cr.get(), scene.paper[0] / 255, scene.paper[1] / 255, scene.paper[2] / 255);
   cairo_paint(cr.get());
-  Fill(cr.get(), scene, tile_from_scene);
+  if (tile.bent) {
+    Fill(cr.get(), scene, tile.bent, tile.step);
+  } else {
+    Fill(cr.get(), scene, tile.from_scene);
+  }
   CheckDrawn(cr.get(), "the scene");
   cairo_surface_flush(surface.get());
 
-  const cv::Mat drawn(size, CV_8UC4, cairo_image_surface_get_data(surface.get()),
+  const cv::Mat drawn(tile.size, CV_8UC4, cairo_image_surface_get_data(surface.get()),
                       static_cast<std::size_t>(cairo_image_surface_get_stride(surface.get())));
   cv::Mat levels;
   cv::cvtColor(drawn, levels, cv::COLOR_BGRA2BGR);
   levels.convertTo(levels, CV_32F);
   return levels;
+}
+
+// Whole levels are too coarse for light: its darkest tenth holds a third of the stored levels. What is left of each
+// colour beyond its whole level is drawn too, 255 times as strong.
+cv::Mat DrawInLight(const Scene& scene, const Tile& tile) {
+  Scene whole = InLight(scene);
+  Scene rest = whole;
+  const auto split = [](cv::Vec3d& colour, cv::Vec3d& left) {
+    for (int i = 0; i < 3; ++i) {
+      left[i] = 255 * (colour[i] - std::floor(colour[i]));
+      colour[i] = std::floor(colour[i]);
+    }
+  };
+  split(whole.paper, rest.paper);
+  for (std::size_t i = 0; i < whole.shapes.size(); ++i) split(whole.shapes[i].colour, rest.shapes[i].colour);
+  return DrawWhole(whole, tile) + DrawWhole(rest, tile) / 255;
 }
 
 constexpr int kKernelSamples = 8;  // a subpixel
@@ -106,6 +140,25 @@ void Blur(cv::Mat& tile, const CameraModel& camera, int subpixels) {
   if (cv::norm(camera.smear_px) > 0) filter(PathKernel(camera.smear_px * subpixels));
 }
 
+// The light and the sensor's gains on a part of the photo.
+void Shade(const CameraModel& camera, cv::Mat part, cv::Point at) {
+  const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
+  const cv::Vec3d gains = camera.Gains();
+  const cv::Vec3f bgr(static_cast<float>(gains[2]), static_cast<float>(gains[1]), static_cast<float>(gains[0]));
+  const double angle = camera.falloff_direction_deg * CV_PI / 180;
+  const cv::Point2d line(std::cos(angle), std::sin(angle));
+  const double end = std::fabs(line.x) * middle.x + std::fabs(line.y) * middle.y;
+  for (int i = 0; i < part.rows; ++i) {
+    auto* pixel = part.ptr<cv::Vec3f>(i);
+    for (int j = 0; j < part.cols; ++j) {
+      const cv::Point2d off = cv::Point2d(at.x + j, at.y + i) - middle;
+      double shade = 1 - camera.shading_percent / 100 * off.dot(off) / middle.dot(middle);
+      if (camera.falloff_percent > 0) shade *= 1 - camera.falloff_percent / 100 * (off.dot(line) / end + 1) / 2;
+      pixel[j] = pixel[j].mul(bgr) * static_cast<float>(shade);
+    }
+  }
+}
+
 }  // namespace
 
 cv::Vec3d CameraModel::Gains() const { return cast * (gain * std::exp2(exposure_ev)); }
@@ -143,35 +196,38 @@ cv::Matx33d PhotoFromScene(const CameraModel& camera, const cv::Rect2d& bounds) 
          upright;
 }
 
+cv::Point2d OnSensor(const CameraModel& camera, cv::Point2d ideal) {
+  const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
+  const cv::Point2d off = ideal - middle;
+  cv::Point2d seen = middle + off * (1 + camera.distortion_percent / 100 * off.dot(off) / middle.dot(middle));
+  seen.x += camera.shutter_px * (seen.y - middle.y) / (2 * middle.y);  // the middle row is read in time
+  return seen;
+}
+
 cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d& photo_from_scene) {
   const int s = Subpixels(camera);
   // Whole pixels, so that the tile's own pixels stay on the subpixel grid.
   const int halo =
       static_cast<int>(std::ceil(kReach * camera.blur_px + camera.defocus_px + cv::norm(camera.smear_px) / 2)) + 2;
-  const cv::Point2d middle((camera.size.width - 1) / 2.0, (camera.size.height - 1) / 2.0);
-  const cv::Vec3d gains = camera.Gains();
-  const cv::Vec3f bgr(static_cast<float>(gains[2]), static_cast<float>(gains[1]), static_cast<float>(gains[0]));
-
   cv::Mat levels(camera.size, CV_32FC3);
   const cv::Rect whole({0, 0}, camera.size);
   for (int top = 0; top < whole.height; top += kTileRows) {
     for (int left = 0; left < whole.width; left += kTileColumns) {
       const cv::Rect tile = cv::Rect(left, top, kTileColumns, kTileRows) & whole;
       const cv::Matx33d tile_from_photo(s, 0, s * (halo - left + 0.5), 0, s, s * (halo - top + 0.5), 0, 0, 1);
-      cv::Mat drawn = DrawTile(scene, tile_from_photo * photo_from_scene,
-                               {(tile.width + 2 * halo) * s, (tile.height + 2 * halo) * s});
+      Tile drawing = {tile_from_photo * photo_from_scene,
+                      nullptr,
+                      kStep * s,
+                      {(tile.width + 2 * halo) * s, (tile.height + 2 * halo) * s}};
+      if (camera.bends()) {
+        drawing.bent = [&](cv::Point2d p) { return Map(tile_from_photo, OnSensor(camera, Map(photo_from_scene, p))); };
+      }
+      cv::Mat drawn = camera.srgb ? DrawInLight(scene, drawing) : DrawWhole(scene, drawing);
       Blur(drawn, camera, s);
       cv::Mat part = levels(tile);
       cv::resize(drawn(cv::Rect(halo * s, halo * s, tile.width * s, tile.height * s)), part, part.size(), 0, 0,
                  cv::INTER_AREA);
-      for (int i = 0; i < part.rows; ++i) {
-        auto* pixel = part.ptr<cv::Vec3f>(i);
-        for (int j = 0; j < part.cols; ++j) {
-          const cv::Point2d off = cv::Point2d(left + j, top + i) - middle;
-          const double shade = 1 - camera.shading_percent / 100 * off.dot(off) / middle.dot(middle);
-          pixel[j] = pixel[j].mul(bgr) * static_cast<float>(shade);
-        }
-      }
+      Shade(camera, part, {left, top});
     }
   }
   return levels;
@@ -195,6 +251,15 @@ void AddNoise(const CameraModel& camera, cv::Mat& levels, cv::RNG& random) {
 cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits) {
   cv::RNG random(camera.seed);
   cv::Mat photo(levels.size(), bits == 16 ? CV_16UC3 : CV_8UC3);
+  if (Develops(camera)) {
+    cv::Mat noisy = levels.clone();
+    for (int first = 0; first < levels.rows; first += kTileRows) {
+      cv::Mat band = noisy.rowRange(first, std::min(first + kTileRows, levels.rows));
+      AddNoise(camera, band, random);
+    }
+    Develop(camera, noisy).convertTo(photo, photo.depth(), bits == 16 ? 257 : 1);
+    return photo;
+  }
   for (int first = 0; first < levels.rows; first += kTileRows) {
     const int last = std::min(first + kTileRows, levels.rows);
     cv::Mat band = levels.rowRange(first, last).clone();

@@ -9,8 +9,7 @@
 
 namespace qv {
 
-// A camera of known faults. All of them act on the stored levels, with no tone curve, so that what a measure should
-// read is known.
+// A camera of known faults. Unless light is asked for, all of them act on the stored levels, with no tone curve.
 
 struct CameraModel {
   cv::Size size = {4000, 3000};
@@ -29,21 +28,41 @@ struct CameraModel {
   double full_well = 0;        // electrons at level 255, for shot noise; 0 for none
   std::uint64_t seed = 1;
 
+  // Where the scene is seen, and in what light.
+  double distortion_percent = 0;      // how much further out the photo's corners are seen
+  double shutter_px = 0;              // rolling shutter: how far the scene moves to the right while the photo is read
+  double falloff_percent = 0;         // how much darker the far end is of a line through the photo
+  double falloff_direction_deg = 30;  // of that line, from the right, clockwise as seen
+
+  // What the phone makes of it (desk/simulation/development.h).
+  cv::Vec3d saturation;  // levels over 255 at which the sensor's red, green, blue are full; 0: never
+  bool mosaic = false;   // one colour a pixel (Bayer), the others from its neighbours
+  double shoulder = 0;   // light over 255 from which the tone curve bends, to reach white never; 0: it is cut at white
+  bool srgb = false;     // the scene's stored levels stand for light, and light is stored as sRGB
+  double denoise = 0;    // edge-keeping smoothing: levels that count as noise
+  double sharpen = 0;    // unsharp mask: share of what the blur took that is added
+  double sharpen_radius_px = 1;
+
   /// Levels of the photo over those of the scene, red, green, blue.
   cv::Vec3d Gains() const;
+
+  bool bends() const { return distortion_percent != 0 || shutter_px != 0; }
 };
+
+/// Where the lens and the shutter put what an ideal camera sees at this place of the photo.
+cv::Point2d OnSensor(const CameraModel& camera, cv::Point2d ideal);
 
 /// Scene coordinates to photo coordinates; the photo's first pixel is centred at (0, 0).
 cv::Matx33d PhotoFromScene(const CameraModel& camera, const cv::Rect2d& bounds);
 
-/// What falls on the sensor, CV_32FC3 (BGR) in levels of 255: each pixel the mean over its square of the blurred scene,
-/// shaded.
+/// What falls on the sensor, CV_32FC3 (BGR) in levels of 255 (of light, where it is stored as sRGB): each pixel the
+/// mean over its square of the blurred scene, shaded.
 cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d& photo_from_scene);
 
 /// Adds the camera's shot and read noise to levels of 255.
 void AddNoise(const CameraModel& camera, cv::Mat& levels, cv::RNG& random);
 
-/// The photo that the sensor makes of it, noise added, rounded: CV_8UC3, or CV_16UC3 with levels times 257.
+/// The photo that the sensor makes of it, noise added, developed, rounded: CV_8UC3, or CV_16UC3 with levels times 257.
 cv::Mat Sense(const CameraModel& camera, const cv::Mat& levels, int bits);
 
 /// Response of lens and pixel to a frequency (cycles/pixel) along a direction in the photo.

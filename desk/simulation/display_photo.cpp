@@ -1,10 +1,11 @@
-#include "desk/simulation/display_photo.h"
+#include "desk/simulation/scene_photos.h"
 
 #include <algorithm>
 #include <cmath>
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/simulation/truth.h"
 
 namespace qv {
 
@@ -17,7 +18,9 @@ std::vector<cv::Point2d> PlaceDefects(const DisplayStyle& style, int count, std:
   cv::RNG random(seed + 12345);
   std::vector<cv::Point2d> places;
   for (int tries = 0; static_cast<int>(places.size()) < count && tries < 1000 * count; ++tries) {
-    const cv::Point2d at(random.uniform(rim, screen.width - rim), random.uniform(rim, screen.height - rim));
+    const double x = random.uniform(rim, screen.width - rim);
+    const double y = random.uniform(rim, screen.height - rim);
+    const cv::Point2d at(x, y);
     const double in_bar = std::fmod(at.x, screen.width / 4);
     const bool free = std::none_of(places.begin(), places.end(), [&](cv::Point2d other) {
       return cv::norm(other - at) < 6 * style.defect_side + 40;
@@ -54,17 +57,16 @@ Simulation DisplayPhoto(const SimulationOptions& options) {
   s.levels = {Expose(options.camera, Display(style), map)};
   if (options.dim_corner > 0) DimCorner(s.levels[0], map, screen, options.dim_corner);
 
-  const auto json = [](cv::Point2d p) { return Json{{"x", p.x}, {"y", p.y}}; };
   const cv::Point2d across(screen.width, 0);
   s.truth["pattern"] = style.pattern;
   s.truth["ratio"] = style.ratio;
   s.truth["corners"] = Json::array();  // clockwise, from the screen's own first corner
   for (const cv::Point2d corner : {screen.tl(), screen.tl() + across, screen.br(), screen.br() - across}) {
-    s.truth["corners"].push_back(json(Map(map, corner)));
+    s.truth["corners"].push_back(ToJson(Seen(options.camera, map, corner)));
   }
   s.truth["defects"] = Json::array();
   for (const cv::Point2d at : style.defects) {
-    Json defect = json(Map(map, at));
+    Json defect = ToJson(Seen(options.camera, map, at));
     defect["across"] = at.x / screen.width;
     defect["down"] = at.y / screen.height;
     s.truth["defects"].push_back(defect);

@@ -1,5 +1,8 @@
 #include "desk/simulation/photo_file.h"
 
+#include <turbojpeg.h>
+
+#include <memory>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 #include <vector>
@@ -29,6 +32,19 @@ std::string Nv21(const cv::Mat& photo) {
   return frame;
 }
 
+// OpenCV's encoder stores chroma for 2 x 2 pixels only.
+std::string Jpeg(const cv::Mat& photo, const PhotoFile& file) {
+  const std::unique_ptr<void, int (*)(tjhandle)> encoder(tjInitCompress(), tjDestroy);
+  unsigned char* content = nullptr;
+  unsigned long size = 0;  // NOLINT(google-runtime-int): the library's
+  const int sampling = file.chroma == "444" ? TJSAMP_444 : TJSAMP_422;
+  const int failed = tjCompress2(encoder.get(), photo.data, photo.cols, static_cast<int>(photo.step), photo.rows,
+                                 TJPF_BGR, &content, &size, sampling, file.jpeg_quality, 0);
+  const std::unique_ptr<unsigned char, void (*)(unsigned char*)> owner(content, tjFree);
+  if (failed != 0) throw Failure(kInternalFault, file.path + ": " + tjGetErrorStr2(encoder.get()));
+  return {reinterpret_cast<const char*>(content), size};
+}
+
 }  // namespace
 
 std::string EncodePhoto(const cv::Mat& photo, const PhotoFile& file) {
@@ -42,6 +58,11 @@ std::string EncodePhoto(const cv::Mat& photo, const PhotoFile& file) {
     throw Failure(kWrongUsage, file.path + ": 16 bits a channel need a .png or .tif file");
   }
   if (extension == ".nv21") return Nv21(photo);
+  if (file.chroma != "420") {
+    if (extension != ".jpg" && extension != ".jpeg")
+      throw Failure(kWrongUsage, file.path + ": only a .jpg has --chroma");
+    return Jpeg(photo, file);
+  }
   std::vector<uchar> content;
   try {
     // Fast compression: noise does not compress anyway. A float TIFF would be written as LogLuv unless told not to.

@@ -10,6 +10,7 @@ struct PhotoFile {
   std::string path;  // "-" is standard output
   int bits = 8;
   int jpeg_quality = 95;
+  std::string chroma = "420";  // of a JPEG: "420", "422" or "444"
 };
 
 /// The photo as the content of such a file; floats as .exr, .tif or .pfm, a preview frame as .nv21. Throws Failure

@@ -22,6 +22,7 @@ struct SimulationOptions {
   int specks = 5;        // dust
   double speck_px = 10;  // diameter
   double speck_darkness = 0.6;
+  double speck_blur_px = 0;        // Gaussian, sigma, beside the lens's own
   cv::Point2d motion_px = {4, 0};  // preview, pair: the scene's way between the two photos
   double second_turn_deg = 0;      // pair: of the scene in the second photo, counter-clockwise about its middle
   double second_scale = 1;         // pair
