@@ -17,27 +17,9 @@
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"
+#include "sharpness/sfr_steps.h"
 
 namespace {
-
-// Both derivative kernels of a region, freed also when a step throws.
-struct Kernels {
-  Kernels(QVTester& tester, cv::Mat& region) {
-    float* two_taps = nullptr;
-    float* three_taps = nullptr;
-    tester.CalculateFilterValue(&region, &two_taps, &three_taps);
-    fil1.reset(two_taps);
-    fil2.reset(three_taps);
-  }
-  std::unique_ptr<float[]> fil1, fil2;
-};
-
-struct EdgeLine {
-  float slope;   // columns per row
-  float offset;  // column in row 0
-};
-
-constexpr float kBeyondAnyArray = 1e9f;  // such values, and NaN, are never converted to an integer
 
 constexpr float kNoFractions = 1 << 23;  // floats from here on are whole
 
@@ -167,45 +149,6 @@ cv::Mat CentredLineSpread(QVTester& tester, const cv::Mat& esf, float* fil) {
   return lsf.mul(tester.GetAHammingWindow(npix, static_cast<float>(npix + 1) * 0.5f));
 }
 
-// response[k] = |Re(DFT(lsf))[k]| / |Re(DFT(lsf))[0]|, k = 0 .. npix/2; frequencies 2k / npix of Nyquist.
-void AppendResponse(const cv::Mat& lsf, std::vector<float>& freq, std::vector<float>& sfr) {
-  const int npix = lsf.rows;
-  std::array<cv::Mat, 2> planes = {lsf, cv::Mat::zeros(lsf.size(), CV_32F)};
-  cv::Mat spectrum;
-  cv::merge(planes.data(), planes.size(), spectrum);
-  cv::dft(spectrum, spectrum);
-  cv::split(spectrum, planes.data());
-  const float dc = std::fabs(planes[0].at<float>(0));
-  for (int k = 0; k <= npix / 2; ++k) {
-    freq.push_back(static_cast<float>(2 * k) / static_cast<float>(npix));
-    sfr.push_back(std::fabs(planes[0].at<float>(k)) / dc);
-  }
-}
-
-// Straight line through the samples nearest (a) and second nearest (b) to 0.5. A sample as far as a but nearer than b
-// becomes b; equal distances change nothing else.
-float InterpolateMTF50(const float* freq, const float* sfr, int count) {
-  struct Sample {
-    float frequency, response, distance;
-  };
-  Sample a = {0, 0, 1.0f};
-  Sample b = a;
-  for (int k = 0; k < count; ++k) {
-    const Sample sample = {freq[k], sfr[k], std::fabs(sfr[k] - 0.5f)};
-    if (!(sample.distance < b.distance)) continue;
-    if (sample.distance < a.distance) {
-      b = a;
-      a = sample;
-    } else {
-      b = sample;
-    }
-  }
-  const Sample& high = b.frequency > a.frequency ? b : a;
-  const Sample& low = b.frequency > a.frequency ? a : b;
-  const float t = std::fabs(high.response - 0.5f) / std::fabs(high.response - low.response);
-  return low.frequency * t + high.frequency * (1 - t);
-}
-
 }  // namespace
 
 bool QVTester::CalculateSFR(cv::Mat roi, std::vector<float>& freq, std::vector<float>& sfr, float& mtf50) {
@@ -314,58 +257,77 @@ bool QVTester::FindEdge(cv::Mat loc, int nlin, float* slope, float* offset) {
   return true;
 }
 
-// Pixel (row m, column n) falls into bin ceil((n - m slope) fac) - offset of an array with room for the slant. Only the
-// npix fac bins in its middle are read, so only those and their two neighbours are kept.
-cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
-  const int nlin = bb.rows;
-  const int npix = bb.cols;
-  const int nn = npix * fac;
-  const auto scale = static_cast<float>(fac);
-  const float inverse = 1 / slope;  // infinite for an upright edge; the quotients below are then 0
-  const float slant = scale * (0 - static_cast<float>(nlin - 1) / inverse);
-  // No edge, or one along the rows: no pixel has a bin, and every bin is 0 / 0.
-  if (!(std::fabs(slant) < kBeyondAnyArray)) return {nn, 1, CV_32F, cv::Scalar(std::nanf(""))};
+namespace {
 
-  const int offset = std::min(static_cast<int>(slant), 0);
-  const int del = std::abs(static_cast<int>(slant));
-  const int first = (del + 1) / 2 - 1;               // bin of the first element kept
-  cv::Mat kept = cv::Mat::zeros(2, nn + 2, CV_32F);  // counts, sums
-  auto* counts = kept.ptr<float>(0);
-  auto* sums = kept.ptr<float>(1);
-  const auto add = [&](int m, int n) {
+// Where pixels fall: (row m, column n) into bin ceil((n - m slope) fac) - offset of an array with room for the slant.
+// Only the npix fac bins in its middle are read, so only those and their two neighbours are kept.
+struct Bins {
+  Bins(const cv::Mat& region, float slope, int fac)
+      : nn(region.cols * fac),
+        scale(static_cast<float>(fac)),
+        inverse(1 / slope),
+        slant(scale * (0 - static_cast<float>(region.rows - 1) / inverse)) {
+    if (!exist()) return;
+    offset = std::min(static_cast<int>(slant), 0);
+    first = (std::abs(static_cast<int>(slant)) + 1) / 2 - 1;
+    kept = cv::Mat::zeros(2, nn + 2, CV_32F);
+  }
+
+  // Without an edge, or with one along the rows, no pixel has a bin.
+  bool exist() const { return std::fabs(slant) < kBeyondAnyArray; }
+  // Whether bins are exact in single precision.
+  bool in_pixels() const { return scale == 1 && std::fabs(slant) < 1e6f; }
+
+  void Add(int m, int n, float value) {
     const float place = (static_cast<float>(n) - static_cast<float>(m) / inverse) * scale;
     const double bin = std::ceil(place) - static_cast<float>(offset);
     if (!(bin >= first && bin < first + nn + 2.0)) return;
     const int k = static_cast<int>(bin) - first;
-    counts[k] += 1;
-    sums[k] += bb.at<float>(m, n);
-  };
-  if (HoldsWholeLevels(bb)) {
-    const bool in_pixels = fac == 1 && std::fabs(slant) < 1e6f;  // so that bins are exact in single precision
-    for (int m = 0; m < nlin; ++m) {
-      const float shift = static_cast<float>(m) / inverse;
-      if (!in_pixels || !KeepsStep(shift, npix)) {
-        for (int n = 0; n < npix; ++n) add(m, n);
-        continue;
-      }
-      const int k = static_cast<int>(std::ceil(-shift)) - offset - first;  // of column 0
-      const auto* row = bb.ptr<float>(m);
-      for (int n = std::max(-k, 0); n < std::min(nn + 2 - k, npix); ++n) {
-        counts[k + n] += 1;
-        sums[k + n] += row[n];
-      }
-    }
-  } else {
-    for (int n = 0; n < npix; ++n) {
-      for (int m = 0; m < nlin; ++m) add(m, n);
+    counts()[k] += 1;
+    sums()[k] += value;
+  }
+
+  // A row of which each pixel falls one bin further than the one before.
+  void AddRow(int m, const float* row, int npix) {
+    const int k = static_cast<int>(std::ceil(-(static_cast<float>(m) / inverse))) - offset - first;  // of column 0
+    float* const count = counts();
+    float* const sum = sums();
+    for (int n = std::max(-k, 0); n < std::min(nn + 2 - k, npix); ++n) {
+      count[k + n] += 1;
+      sum[k + n] += row[n];
     }
   }
 
-  // An empty bin takes a count from its neighbours, but no sum: its value is 0. Bin 0 has but one neighbour.
-  for (int k = 1; k <= nn; ++k) {
-    if (counts[k] == 0) counts[k] = first + k == 0 ? counts[k + 1] : (counts[k - 1] + counts[k + 1]) * 0.5f;
+  float* counts() { return kept.ptr<float>(0); }
+  float* sums() { return kept.ptr<float>(1); }
+
+  int nn;
+  float scale;
+  float inverse;  // infinite for an upright edge; quotients by it are then 0
+  float slant;
+  int offset = 0;
+  int first = 0;  // bin of the first element kept
+  cv::Mat kept;   // counts, sums
+};
+
+}  // namespace
+
+cv::Mat QVTester::ProjectData(cv::Mat bb, float slope, float /*loc*/, int fac) {
+  Bins bins(bb, slope, fac);
+  if (!bins.exist()) return {bins.nn, 1, CV_32F, cv::Scalar(std::nanf(""))};  // every bin is 0 / 0
+  if (HoldsWholeLevels(bb)) {
+    for (int m = 0; m < bb.rows; ++m) {
+      const auto* row = bb.ptr<float>(m);
+      if (bins.in_pixels() && KeepsStep(static_cast<float>(m) / bins.inverse, bb.cols)) {
+        bins.AddRow(m, row, bb.cols);
+      } else {
+        for (int n = 0; n < bb.cols; ++n) bins.Add(m, n, row[n]);
+      }
+    }
+  } else {
+    for (int n = 0; n < bb.cols; ++n) {
+      for (int m = 0; m < bb.rows; ++m) bins.Add(m, n, bb.at<float>(m, n));
+    }
   }
-  cv::Mat esf(nn, 1, CV_32F);
-  for (int i = 0; i < nn; ++i) esf.at<float>(i) = sums[i + 1] / counts[i + 1];
-  return esf;
+  return BinMeans(bins.counts(), bins.sums(), bins.nn, bins.first);
 }

@@ -1,5 +1,6 @@
 #include <gmock/gmock.h>
 
+#include <array>
 #include <cmath>
 #include <cstdlib>
 #include <map>
@@ -73,6 +74,16 @@ TEST(Colour, TemperaturesAreThePublishedOnes) {  // CIE 15's A, D50, D65, D75 an
   EXPECT_EQ(5550.0f, Temperature({0.333083928f, 0.464719504f, 0.202196568f})) << "in double it is not 5550";
   // x = 0.331 in single precision belongs to the cool side: sums that are exact, so that x is the quotient itself.
   EXPECT_NEAR(Temperature(0.331f, 0.34f), Temperature(0.33f, 0.34f), 60);
+}
+
+// Worked out once from the fits as they are published, each step in its own width; a last digit would show.
+TEST(Colour, TemperaturesAreExactToTheLastBit) {
+  const std::pair<std::array<float, 3>, float> lights[] = {
+      {{0.24f, 0.25f, 0.51f}, 0x1.477f24p+15f}, {{0.25f, 0.28f, 0.47f}, 0x1.ea551ap+13f},
+      {{0.3f, 0.32f, 0.38f}, 0x1.cb634p+12f},   {{0.33f, 0.34f, 0.33f}, 0x1.5f54b8p+12f},
+      {{0.35f, 0.36f, 0.29f}, 0x1.304d06p+12f}, {{0.45f, 0.41f, 0.14f}, 0x1.62ff64p+11f},
+      {{0.5f, 0.25f, 0.25f}, 0x1.1d59cep+10f},  {{0.6f, 0.35f, 0.05f}, 0x1.348f6cp+10f}};
+  for (const auto& [xyz, kelvin] : lights) EXPECT_EQ(kelvin, Temperature(xyz));
 }
 
 // Bit for bit; which NaN comes of two is the compiler's choice.

@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <opencv2/imgproc.hpp>
 
@@ -140,6 +141,31 @@ TEST(SfrSteps, PolynomialsAreFittedLowestPowerFirst) {
         "&&(dst.cols==1)&&(dst.rows==(order+1))&&(order>=1)",
         e.err);
   }
+}
+
+TEST(SfrSteps, TheResponseOfAPointIsTheCosineOfItsPlace) {  // the imaginary part is dropped
+  for (const int npix : {16, 17}) {
+    cv::Mat point = cv::Mat::zeros(npix, 1, CV_32F);
+    point.at<float>(3) = 2;
+    std::vector<float> freq;
+    std::vector<float> sfr;
+    AppendResponse(point, freq, sfr);
+    ASSERT_EQ(9u, sfr.size());
+    for (std::size_t k = 0; k < sfr.size(); ++k) {
+      EXPECT_EQ(static_cast<float>(2 * k) / static_cast<float>(npix), freq[k]);
+      EXPECT_NEAR(std::fabs(std::cos(2 * CV_PI * static_cast<double>(3 * k) / npix)), sfr[k], 1e-6);
+    }
+  }
+}
+
+TEST(SfrSteps, Mtf50LiesOnTheLineThroughTheTwoNearest) {
+  const float freq[] = {0, 0.25f, 0.5f, 0.75f, 1};
+  const auto of = [&](std::array<float, 5> sfr) { return InterpolateMTF50(freq, sfr.data(), 5); };
+  EXPECT_FLOAT_EQ(0.5f + 0.25f * 2 / 3, of({1, 0.75f, 0.625f, 0.4375f, 0}));
+  EXPECT_FLOAT_EQ(0.375f, of({1, 0.75f, 0.25f, 0, 0}));
+  EXPECT_FLOAT_EQ(0.625f, of({1, 0.75f, 0.625f, 0.375f, 0.625f})) << "of equal distances the first two";
+  EXPECT_FLOAT_EQ(0.25f, of({1, 0.75f, 1, 0, 0.625f})) << "they need not be neighbours";
+  EXPECT_FLOAT_EQ(0.5f, of({1, 1, 1, 0.875f, 0.75f})) << "with all above, distances count without their sign";
 }
 
 void ExpectPlainOutcome(const cv::Mat& region, int round) {

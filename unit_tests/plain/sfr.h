@@ -2,22 +2,19 @@
 #define QVTESTER_UNIT_TESTS_PLAIN_SFR_H_
 
 #include <algorithm>
-#include <array>
 #include <cmath>
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
-#include <memory>
 #include <opencv2/imgproc.hpp>
 #include <vector>
 
 #include "qvtester/tester.h"
+#include "sharpness/sfr_steps.h"
 
 // The SFR of a region by OpenCV's calls, step by step, each on fresh matrices: what sharpness/QVTester_MTF.cpp must
-// equal to the last bit. Steps that the library takes just so are the tester's.
+// equal to the last bit. Steps that the library takes just so are the tester's, or those of sharpness/sfr_steps.h.
 namespace plain {
-
-inline constexpr float kBeyondAnyArray = 1e9f;  // such values, and NaN, are never converted to an integer
 
 // w[i] = 0.54 + 0.46 cos(pi (i - mid) / wid): double inside, stored as float.
 // Pi is cut to 3.141592, and i starts at 0, so the peak leans half a sample to the right. Both are meant.
@@ -61,30 +58,8 @@ inline cv::Mat ProjectData(cv::Mat bb, float slope, int fac) {
     }
   }
 
-  // An empty bin takes a count from its neighbours, but no sum: its value is 0. Bin 0 has but one neighbour.
-  for (int k = 1; k <= nn; ++k) {
-    if (counts[k] == 0) counts[k] = first + k == 0 ? counts[k + 1] : (counts[k - 1] + counts[k + 1]) * 0.5f;
-  }
-  cv::Mat esf(nn, 1, CV_32F);
-  for (int i = 0; i < nn; ++i) esf.at<float>(i) = sums[i + 1] / counts[i + 1];
-  return esf;
+  return BinMeans(counts, sums, nn, first);
 }
-
-struct Kernels {
-  Kernels(QVTester& tester, cv::Mat& region) {
-    float* two_taps = nullptr;
-    float* three_taps = nullptr;
-    tester.CalculateFilterValue(&region, &two_taps, &three_taps);
-    fil1.reset(two_taps);
-    fil2.reset(three_taps);
-  }
-  std::unique_ptr<float[]> fil1, fil2;
-};
-
-struct EdgeLine {
-  float slope;   // columns per row
-  float offset;  // column in row 0
-};
 
 inline float EdgeInRow(QVTester& tester, const cv::Mat& derivative, int row, const cv::Mat& window) {
   cv::Mat profile;
@@ -125,45 +100,6 @@ inline cv::Mat CentredLineSpread(QVTester& tester, const cv::Mat& esf, float* fi
   // Without a finite centre there is nothing to move to: all moves out of view, and the response is 0 / 0.
   lsf = tester.GetShiftedArray(lsf, std::fabs(mid) < kBeyondAnyArray ? static_cast<int>(mid) : 2 * npix);
   return lsf.mul(GetAHammingWindow(npix, static_cast<float>(npix + 1) * 0.5f));
-}
-
-// response[k] = |Re(DFT(lsf))[k]| / |Re(DFT(lsf))[0]|, k = 0 .. npix/2; frequencies 2k / npix of Nyquist.
-inline void AppendResponse(const cv::Mat& lsf, std::vector<float>& freq, std::vector<float>& sfr) {
-  const int npix = lsf.rows;
-  std::array<cv::Mat, 2> planes = {lsf, cv::Mat::zeros(lsf.size(), CV_32F)};
-  cv::Mat spectrum;
-  cv::merge(planes.data(), planes.size(), spectrum);
-  cv::dft(spectrum, spectrum);
-  cv::split(spectrum, planes.data());
-  const float dc = std::fabs(planes[0].at<float>(0));
-  for (int k = 0; k <= npix / 2; ++k) {
-    freq.push_back(static_cast<float>(2 * k) / static_cast<float>(npix));
-    sfr.push_back(std::fabs(planes[0].at<float>(k)) / dc);
-  }
-}
-
-// Straight line through the samples nearest (a) and second nearest (b) to 0.5. A sample as far as a but nearer than b
-// becomes b; equal distances change nothing else.
-inline float InterpolateMTF50(const float* freq, const float* sfr, int count) {
-  struct Sample {
-    float frequency, response, distance;
-  };
-  Sample a = {0, 0, 1.0f};
-  Sample b = a;
-  for (int k = 0; k < count; ++k) {
-    const Sample sample = {freq[k], sfr[k], std::fabs(sfr[k] - 0.5f)};
-    if (!(sample.distance < b.distance)) continue;
-    if (sample.distance < a.distance) {
-      b = a;
-      a = sample;
-    } else {
-      b = sample;
-    }
-  }
-  const Sample& high = b.frequency > a.frequency ? b : a;
-  const Sample& low = b.frequency > a.frequency ? a : b;
-  const float t = std::fabs(high.response - 0.5f) / std::fabs(high.response - low.response);
-  return low.frequency * t + high.frequency * (1 - t);
 }
 
 inline bool CalculateSFR(QVTester& tester, cv::Mat roi, std::vector<float>& freq, std::vector<float>& sfr,
