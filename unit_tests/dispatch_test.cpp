@@ -65,6 +65,12 @@ TEST_F(Dispatch, RecordsOwnTheirArrays) {  // the address sanitizer sees what is
   EXPECT_EQ(1, ReleaseTestResult(Index(4)));
   EXPECT_EQ(nullptr, record.image_);
   EXPECT_EQ(0, record.error_point_count_);
+  for (int test = 0; test < 13; ++test) theTester->SetResultRawData(&Results().phase1_[test], 1, 1, new float[1]{});
+  for (int test = 0; test < 13; ++test) {
+    EXPECT_NE(nullptr, Results().phase1_[test].raw_data_) << test;
+    ReleaseTestResult(Index(test));
+    EXPECT_EQ(nullptr, Results().phase1_[test].raw_data_) << test;
+  }
   theTester->SetResultRawData(&record, 1, 1, new float[1]{});  // left for Initialize
   EXPECT_EQ(1, InitTestModule());
   for (int test = -1; test <= 30; ++test) EXPECT_EQ(test >= 0 && test < 30 ? 1 : -97, ReleaseTestResult(Index(test)));
