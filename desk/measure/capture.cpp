@@ -140,14 +140,15 @@ class Capture : public Measurement {
     }
     auto finding = std::make_unique<CaptureFinding>();
     const FoundChart& found = tester.kept_->chart;
-    const std::size_t searched = found.of_standard ? 1 : 0;
+    // The test ends at the standard photo, before it looks at the other, when it can't be measured.
+    const bool missed_standard = record.inputs.size() > 1 && !StandardOf(tester).is_extracted;
+    const std::size_t searched = missed_standard ? 1 : 0;
     record.refused = searched;
     finding->photo = SlotPhoto(tester, spec_.inputs[searched].slot);
     const int code = record.phase.code;
     if (code == QV_SUCCESS || code == QV_ERROR_PATTERN_NOT_FOUND || code == QV_ERROR_NO_PATCHES) {
-      finding->view =
-          DescribeChart(record, found, record.inputs[searched].path, finding->photo,
-                        found.of_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
+      finding->view = DescribeChart(record, found, record.inputs[searched].path, finding->photo,
+                                    missed_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
     }
     if (code == QV_SUCCESS) TakePatches(*finding, tester);
     return finding;
@@ -170,10 +171,14 @@ class Capture : public Measurement {
     return figures;
   }
 
+  const QVTester::ColorStandard& StandardOf(const QVTester& tester) const {
+    return front_ ? tester.kept_->standard_front : tester.kept_->standard_main;
+  }
+
   void TakePatches(CaptureFinding& finding, const QVTester& tester) const {
     const FoundChart& found = tester.kept_->chart;
     finding.measured = found.patches;
-    finding.standard = (front_ ? tester.kept_->standard_front : tester.kept_->standard_main).patches;
+    finding.standard = StandardOf(tester).patches;
     const PatchGrid grid = PlacePatches(found.corner, found.second, found.third);
     for (std::size_t i = 0; i < found.patches.size(); ++i) {
       finding.outlines.push_back(OnPhoto(

@@ -1,0 +1,167 @@
+// Measurements in process: requests, inputs, findings.
+
+#include "desk/measure/measure.h"
+
+#include <gmock/gmock.h>
+
+#include <opencv2/imgcodecs.hpp>
+
+#include "chart/chart_layout.h"
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/measure/measurement.h"
+#include "desk/measure/sharpness.h"
+#include "desk/simulation/simulation.h"
+#include "qvtester/host_properties.h"
+#include "unit_tests/drawing.h"
+
+namespace qv {
+namespace {
+
+using ::testing::AllOf;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+Record MeasureAnew(const Request& request) {
+  QVTester tester;
+  return Measure(tester, request);
+}
+
+cv::Mat DustPhoto(double gain) {
+  SimulationOptions options;
+  options.scene = "dust";
+  options.camera.size = {400, 300};
+  options.camera.gain = gain;
+  return Sense(options.camera, Simulate(options).levels[0], 8);
+}
+
+std::string Refusal(const Request& request) {
+  try {
+    Resolved(request);
+  } catch (const Failure& e) {
+    EXPECT_EQ(kWrongUsage, e.kind);
+    return e.what();
+  }
+  return "";
+}
+
+TEST(Measure, APictureAndItsFileGiveTheSameRecord) {
+  const cv::Mat photo = DrawChart();
+  const TemporaryFolder folder;
+  const Request by_path = {"camera_autofocus", {folder.Write("photo.png", photo)}};
+  Json of_file = MeasureAnew(by_path).ToJson();
+  Json of_picture = MeasureAnew({"camera_autofocus", {photo}}).ToJson();
+  EXPECT_EQ(of_file["phases"][0]["measurements"], of_picture["phases"][0]["measurements"]);
+  EXPECT_EQ(of_file["inputs"][0]["pixels_hash"], of_picture["inputs"][0]["pixels_hash"]);
+  EXPECT_EQ(nullptr, of_picture["inputs"][0]["sha256"]);
+  EXPECT_EQ(nullptr, of_picture["request"]["inputs"][0]) << "can't be measured again";
+
+  const Record again = MeasureAnew(RequestFromJson(of_file["request"]));
+  EXPECT_EQ(of_file["phases"][0]["measurements"], again.ToJson()["phases"][0]["measurements"]);
+}
+
+TEST(Measure, PropertiesAreSetByIndexOrNameAndStoredOnce) {
+  const cv::Mat photo = DrawChart();
+  for (const Json& properties : {Json{{"93", 110}}, Json{{"prop_binary_thr_working_", 110}}}) {
+    const Record record = MeasureAnew({"mtf_check", {photo}, Json::object(), properties});
+    EXPECT_EQ(110, record.phase.Find("threshold")->value());
+    EXPECT_EQ(110, record.request.parameters["threshold"]);
+    EXPECT_TRUE(record.request.properties.empty());
+  }
+  Input standard(photo);
+  const Record miss = MeasureAnew({"camera_capture", {photo, standard}, Json::object(), {{"86", 254}}});
+  EXPECT_EQ(QV_ERROR_PATTERN_NOT_FOUND, miss.phase.code);
+  EXPECT_THAT(miss.MissSentence(), HasSubstr("tried: property 86"));
+}
+
+TEST(Measure, RequestsThatCantBeRunAreRefusedInASentence) {
+  const std::vector<Input> photo = {Input("photo.png")};
+  for (const auto& [request, complaint] : {
+           std::pair<Request, const char*>{{"camera_autofokus", photo}, "no such measurement"},
+           {{"camera_autofocus", {}}, "0 inputs given; it takes photo"},
+           {{"camera_autofocus", photo, {{"treshold", 1}}}, "has no parameter treshold"},
+           {{"camera_autofocus", photo, {{"threshold", 256}}}, "threshold: 256 is no whole number from 0 to 255"},
+           {{"camera_autofocus", photo, {{"threshold", 1.5}}}, "threshold: 1.5 is no whole number"},
+           {{"camera_autofocus", photo, {{"threshold", 1}}, {{"93", 2}}},
+            "threshold and property 93 are one, and differ"},
+           {{"circle_check", photo, {{"camera", 1}}}, "camera: 1 is none of 0, 2"},
+           {{"circle_check", photo, {{"raw", "640x481"}}}, "an NV21 frame has an even width and height"},
+           {{"hdr_dots", photo, {{"channel", "cyan"}}}, "none of red, green, blue"},
+           {{"lens_dust", photo, {{"reference", {1, 2}}}}, "neither a dust record nor 256 whole numbers"},
+           {{"mtf_check", photo, Json::object(), {{"3", 1}}}, "3: no such property"},
+           {{"mtf_check", photo, Json::object(), {{"86", "x"}}}, "property 86: \"x\" is not a whole number"},
+           {{"mtf_check", photo, Json::object(), {{"64", {1, 2}}}}, "property 64: [1,2] is not 5 numbers"},
+           {{"mtf_check", photo, Json::object(), {{"86", 1}, {"prop_param_86_", 2}}}, "given twice"},
+       }) {
+    EXPECT_THAT(Refusal(request), HasSubstr(complaint));
+  }
+  EXPECT_EQ("", Refusal({"camera_capture", photo, {{"standard", "golden.png"}}}));
+}
+
+TEST(Measure, TheRefusedInputIsNamed) {
+  Input photo(DrawChart());
+  Input gray(cv::Mat(90, 90, CV_8UC1, cv::Scalar(90)));
+  photo.name = "photo.png";
+  gray.name = "gray.png";
+  EXPECT_THAT(MeasureAnew({"camera_capture", {photo, gray}}).MissSentence(),
+              AllOf(HasSubstr("gray.png: "), HasSubstr("code -95"), Not(HasSubstr("photo.png"))));
+  EXPECT_THAT(MeasureAnew({"camera_capture", {gray, photo}}).MissSentence(),
+              AllOf(HasSubstr("gray.png: "), Not(HasSubstr("photo.png"))));
+}
+
+TEST(Measure, OnlyARequestToPublishReachesTheStore) {
+  const TemporaryFolder folder;
+  const std::string store = folder.Path("store");
+  const std::string place = store + "/t82.vi7_mung_loc";
+  Request request = {"lens_dust", {DustPhoto(0.92)}, {{"step", 7}}};
+  SetHostPropertyStore(store.c_str());
+  MeasureAnew(request);
+  EXPECT_EQ(nullptr, std::fopen(place.c_str(), "r"));
+  request.publish = true;
+  SetHostPropertyStore(store.c_str());
+  const Record record = MeasureAnew(request);
+  SetHostPropertyStore(nullptr);
+  std::string places;
+  const Reading& blobs = *record.phase.Find("blobs");
+  for (std::size_t i = 0; i < blobs.values.size(); ++i) {
+    places += Format("[%.0f,%.0f]", blobs.axis[i], blobs.values[i]);
+  }
+  EXPECT_FALSE(places.empty());
+  EXPECT_EQ(places, ReadFile(place));
+}
+
+TEST(Measure, APhotoTooDarkForDustIsDrawnWithoutBlobs) {
+  const Record dark = MeasureAnew({"lens_dust", {DustPhoto(0.3)}});
+  EXPECT_FALSE(dark.measured());
+  EXPECT_THAT(dark.MissSentence(), HasSubstr("too dark to judge"));
+  EXPECT_TRUE(dark.finding->Draw(dark).has_value());
+}
+
+// The regions are outlined where the chart has them, at any turn.
+TEST(Measure, OutlinesLieOnTheChart) {
+  ::ChartView view;
+  view.size = {1400, 1400};
+  for (const double turn : {0.0, 30.0, -100.0}) {
+    view.turn_deg = turn;
+    const Record record = MeasureAnew({"camera_autofocus", {DrawChart(view)}});
+    const auto& finding = dynamic_cast<const SharpnessFinding&>(*record.finding);
+    const std::vector<cv::Point2d> marks = MarkCentres(view);
+    const cv::Point2d right = (marks[1] - marks[0]) / kChartSide;
+    const cv::Point2d down = (marks[2] - marks[0]) / kChartSide;
+    ASSERT_EQ(2u, finding.regions.size());
+    const ChartRegion regions[] = {kVerticalRegion, kHorizontalRegion};
+    for (int i : {0, 1}) {
+      const ChartRegion& r = regions[i];
+      const cv::Point corners[] = {
+          {r.x, r.y}, {r.x + r.width, r.y}, {r.x + r.width, r.y + r.height}, {r.x, r.y + r.height}};
+      for (int k = 0; k < 4; ++k) {
+        const cv::Point2d expected = marks[0] + corners[k].x * right + corners[k].y * down;
+        EXPECT_LT(cv::norm(expected - finding.regions[i].outline[k]), 8) << turn << ", " << k;  // a degree over 470 px
+      }
+    }
+    EXPECT_TRUE(finding.Draw(record).has_value());
+  }
+}
+
+}  // namespace
+}  // namespace qv
