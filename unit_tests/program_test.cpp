@@ -181,7 +181,7 @@ TEST_F(Program, ACutPhotoIsMeasuredWithAWarningAndVerboseShowsTheLog) {
   cv::imencode(".jpg", DrawChart(), jpeg, {cv::IMWRITE_JPEG_QUALITY, 95});
   folder_.Write("cut.jpg", std::string(jpeg.begin(), jpeg.end() - 400));
   Record("autofocus cut.jpg");
-  EXPECT_THAT(err_, AllOf(HasSubstr("warning: "), HasSubstr("Premature end"), HasSubstr("is the file cut?")));
+  EXPECT_THAT(err_, AllOf(HasSubstr("warning: "), HasSubstr("remature end"), HasSubstr("is the file cut?")));
   const ProgramRun verbose = Run("autofocus cut.jpg --verbose --quiet");
   EXPECT_THAT(verbose.out, IsEmpty());
   EXPECT_THAT(verbose.err, AllOf(HasSubstr("[GetSFRFromImage] prop_binary_thr_working_: 125\n"), Not(HasSubstr("\r"))));
