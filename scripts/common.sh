@@ -17,7 +17,11 @@ as_root() {
   fi
 }
 
-installed() { dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null | grep -qx installed; }
+# Also true when another package provides it, as a Node.js from elsewhere provides npm.
+installed() {
+  dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null | grep -qx installed ||
+    dpkg-query -W -f '${db:Status-Status}, ${Provides},\n' | grep -q "^installed,.* $1[ ,]"
+}
 
 # install_packages KIND...: installs what packages.txt marks with one of the kinds and this machine lacks.
 install_packages() {

@@ -42,6 +42,12 @@ const std::vector<Command> kCommands = {
     {"chart", "Draw the test chart", DeclareChart},
     {"simulate", "Take a photo of the chart with a camera of known faults", DeclareSimulate},
     {"verify", "Measure golden photos again and tell which number moved", DeclareVerify},
+    {"show", "List a store's runs with their verdicts, or a unit's figures", DeclareShow},
+    {"judge", "Judge a store's runs by new limits, without measuring", DeclareJudge},
+    {"study", "Statistics of a store's figures: capability, gauge study, proposed limits", DeclareStudy},
+    {"report", "Make a page of a store's runs, or of a record", DeclareReport},
+    {"export", "Write a store's runs as an archive or a table", DeclareExport},
+    {"import", "Take archives or records into a store", DeclareImport},
     {"explain", "Say what a number means, how true it is and what moves it", DeclareExplain},
     {"list", "List the library's tests, slots, properties or codes", DeclareList},
 };

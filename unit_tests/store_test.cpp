@@ -16,35 +16,13 @@
 #include "desk/base/failure.h"
 #include "desk/base/files.h"
 #include "desk/results/schema.h"
+#include "unit_tests/results.h"
 
 namespace qv {
 namespace {
 
 using ::testing::HasSubstr;
 using ::testing::ThrowsMessage;
-
-// A run as the program records it, with one figure of this value.
-StoredRun RunOf(const std::string& unit, const Json& value, const char* non_finite = nullptr) {
-  Json figure = {{"name", "flash_mean"},     {"outcome", "PASS"},
-                 {"measured_value", value},  {"units", {{"name", "grey level"}, {"suffix", "level"}}},
-                 {"method", "mean"},         {"docstring", "Mean."},
-                 {"limits", {{"min", 0.1}}}, {"uncertainty", {{"standard", 0.25}}}};
-  if (non_finite != nullptr) figure["non_finite"] = non_finite;
-  StoredRun run;
-  run.record = {{"schema", "qvtester-record-1"},
-                {"dut_id", unit},
-                {"station_id", "s"},
-                {"outcome", "PASS"},
-                {"start_time_millis", 1795236459000},
-                {"end_time_millis", 1795236459038},
-                {"marginal", false},
-                {"metadata", {{"library_version", "1"}, {"limits", {{"name", "l"}, {"revision", "2"}}}}},
-                {"request", {{"measurement", "flash"}, {"inputs", {"a.jpg"}}}},
-                {"inputs", {{{"slot", 1}, {"path", "a.jpg"}, {"sha256", "00ff"}}}}};
-  run.record["phases"] =
-      Json::array({{{"name", "flash"}, {"result_code", 1}, {"measurements", {{"flash_mean", figure}}}}});
-  return run;
-}
 
 // A store of its own: a file, or a schema of the server that the test was started with.
 class Store : public ::testing::Test {

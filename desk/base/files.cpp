@@ -179,17 +179,26 @@ std::string ReadWholeFile(const std::string& path, FailureKind kind, std::size_t
 }
 
 void WriteWholeFile(const std::string& path, const std::string& content) {
+  WriteWholeFile(path, [&](const Sink& sink) { sink(content); });
+}
+
+void WriteWholeFile(const std::string& path, const std::function<void(const Sink&)>& produce) {
+  const auto write_to = [&](int file) {
+    produce([&](const std::string& part) {
+      if (!WriteAll(file, part)) RefuseToWrite(path);
+    });
+  };
   if (IsPlainStream(path)) {
     const Descriptor file(open(path.c_str(), O_WRONLY | O_CLOEXEC));
-    if (file.number() < 0 || !WriteAll(file.number(), content)) RefuseToWrite(path);
+    if (file.number() < 0) RefuseToWrite(path);
+    write_to(file.number());
     return;
   }
   const fs::path target = Followed(path);
   FileAside aside(target);
-  if (aside.file() < 0 || fchmod(aside.file(), RightsFor(target)) != 0 || !WriteAll(aside.file(), content) ||
-      fsync(aside.file()) != 0 || !aside.Become(target)) {
-    RefuseToWrite(path);
-  }
+  if (aside.file() < 0 || fchmod(aside.file(), RightsFor(target)) != 0) RefuseToWrite(path);
+  write_to(aside.file());
+  if (fsync(aside.file()) != 0 || !aside.Become(target)) RefuseToWrite(path);
 }
 
 void CheckOutputs(const std::vector<NamedFile>& inputs, const std::vector<NamedFile>& outputs) {

@@ -1,6 +1,7 @@
 #ifndef QVTESTER_DESK_BASE_FILES_H_
 #define QVTESTER_DESK_BASE_FILES_H_
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -23,6 +24,10 @@ std::string ReadWholeFile(const std::string& path, FailureKind kind, std::size_t
 /// it is. Throws Failure: wrong usage when the place can't be written, an internal fault when the disk filled up
 /// meanwhile.
 void WriteWholeFile(const std::string& path, const std::string& content);
+
+/// The same for what is too long to be held at once: `produce` hands its parts to the sink, in order.
+using Sink = std::function<void(const std::string& part)>;
+void WriteWholeFile(const std::string& path, const std::function<void(const Sink&)>& produce);
 
 /// A file that is read or to be written, and what it is for: "the photo", "the record".
 struct NamedFile {

@@ -76,6 +76,8 @@ class Store {
   /// In the order of runs; within a run by quantity.
   void EachFigure(const Selection& selection, const std::function<void(const FigureRow&)>& visit);
   std::vector<Quantity> Quantities();
+  /// Names of the free columns, in their order.
+  std::vector<std::string> ColumnNames();
   /// One column of every run that has it, in the order of runs: a text of the run's own ("unit", "operator") or a free
   /// one. Throws Failure (wrong usage) when no run has it.
   void EachValue(const std::string& column, const std::function<void(std::int64_t run, const std::string&)>& visit);

@@ -365,6 +365,18 @@ std::vector<Quantity> Store::Quantities() {
   return quantities;
 }
 
+std::vector<std::string> Store::ColumnNames() {
+  std::vector<std::string> names;
+  database_->Read([&] {
+    std::string name;
+    Where all(database_->session(), {});
+    Query(database_->session()).Into(name).Run("SELECT DISTINCT name FROM run_column ORDER BY name", all, [&] {
+      names.push_back(name);
+    });
+  });
+  return names;
+}
+
 void Store::EachValue(const std::string& column,
                       const std::function<void(std::int64_t run, const std::string&)>& visit) {
   database_->Read([&] {

@@ -1,0 +1,271 @@
+#include "desk/results/judge.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <unordered_map>
+
+namespace qv {
+
+namespace {
+
+// From best to worst; a unit is what its worst step is.
+constexpr const char* kOutcomes[] = {"MEASURED", "PASS", "FAIL", "ABORTED", "ERROR"};
+
+std::size_t Rank(const std::string& outcome) {
+  return static_cast<std::size_t>(std::find(std::begin(kOutcomes), std::end(kOutcomes), outcome) -
+                                  std::begin(kOutcomes));
+}
+
+// Names of the doubts that made a run an ERROR; one that nobody can accept is "".
+std::set<std::string> DoubtsOf(const Json& record) {
+  std::set<std::string> doubts;
+  const auto details = record.find("outcome_details");
+  if (details == record.end() || !details->is_array()) return doubts;
+  for (const Json& detail : *details) {
+    const std::string weight = TextAt(detail, "weight");
+    if (weight == "warning" || weight == "miss") continue;
+    doubts.insert(weight == "doubt" ? TextAt(detail, "name") : "");
+  }
+  return doubts;
+}
+
+// What a run's figures come to under one set of limits.
+class Judge {
+ public:
+  Judge(const ArchiveLimits& limits, const std::vector<Quantity>& quantities) : limits_(limits) {
+    for (const Quantity& quantity : quantities) {
+      const auto found = limits.by_name.find(quantity.name);
+      if (found == limits.by_name.end()) continue;
+      const auto at = static_cast<std::size_t>(quantity.id);
+      if (bounds_.size() <= at) bounds_.resize(at + 1, nullptr);
+      bounds_[at] = &found->second;
+    }
+  }
+
+  /// "" for a figure without a limit.
+  const char* Of(const FigureRow& figure) const {
+    const auto at = static_cast<std::size_t>(figure.quantity);
+    const Bounds* const bounds = at < bounds_.size() ? bounds_[at] : nullptr;
+    if (bounds == nullptr) return figure.measured ? "MEASURED" : "UNSET";
+    return figure.measured ? VerdictOf(figure.value, *bounds) : "UNSET";
+  }
+  bool Limits(std::int64_t quantity) const {
+    const auto at = static_cast<std::size_t>(quantity);
+    return at < bounds_.size() && bounds_[at] != nullptr;
+  }
+  /// Figures of this measurement that must be measured.
+  const std::vector<std::string>& Asked(const std::string& measurement) {
+    const auto [asked, made] = asked_.try_emplace(measurement);
+    if (!made) return asked->second;
+    for (const auto& [name, bounds] : limits_.by_name) {
+      if (name.rfind(measurement + "_", 0) == 0) asked->second.push_back(name);
+    }
+    return asked->second;
+  }
+  bool Accepts(const std::set<std::string>& doubts) const {
+    return std::includes(limits_.accepted_doubts.begin(), limits_.accepted_doubts.end(), doubts.begin(), doubts.end());
+  }
+
+ private:
+  const ArchiveLimits& limits_;
+  std::vector<const Bounds*> bounds_;  // by quantity
+  std::unordered_map<std::string, std::vector<std::string>> asked_;
+};
+
+struct RunFigures {
+  const RunRow* row;
+  std::vector<FigureRow> figures;
+};
+
+// A run's verdict, figure by figure, and of those that a limit asks for in vain.
+struct RunVerdict {
+  std::string outcome;
+  std::vector<const char*> figures;
+  std::vector<std::string> missing;
+};
+
+RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::string>& names,
+                   const std::set<std::string>* doubts) {
+  RunVerdict verdict;
+  int passed = 0;
+  bool failed = false;
+  bool unset = false;
+  for (const FigureRow& figure : run.figures) {
+    const char* const outcome = judge.Of(figure);
+    verdict.figures.push_back(outcome);
+    if (!judge.Limits(figure.quantity)) continue;
+    passed += *outcome == 'P' ? 1 : 0;
+    failed = failed || *outcome == 'F';
+    unset = unset || *outcome == 'U';
+  }
+  const std::vector<std::string>& asked = judge.Asked(run.row->measurement);
+  for (const std::string& name : asked) {
+    const bool there = std::any_of(run.figures.begin(), run.figures.end(), [&](const FigureRow& figure) {
+      return names[static_cast<std::size_t>(figure.quantity)] == name;
+    });
+    if (!there) verdict.missing.push_back(name);
+  }
+  const bool doubted = doubts != nullptr && !judge.Accepts(*doubts);
+  const bool measured = run.row->result_code == 1;
+  verdict.outcome = run.row->outcome == "ABORTED"                               ? "ABORTED"
+                    : !measured || doubted || unset || !verdict.missing.empty() ? "ERROR"
+                    : failed                                                    ? "FAIL"
+                    : passed > 0                                                ? "PASS"
+                                                                                : "MEASURED";
+  return verdict;
+}
+
+}  // namespace
+
+const char* VerdictOf(double value, const Bounds& bounds) {
+  const bool within =
+      std::isfinite(value) && !(bounds.min && value < *bounds.min) && !(bounds.max && value > *bounds.max);
+  return within ? "PASS" : "FAIL";
+}
+
+std::int64_t Tally::of(const std::string& outcome) const {
+  const auto found = by_outcome.find(outcome);
+  return found == by_outcome.end() ? 0 : found->second;
+}
+
+std::int64_t Tally::total() const {
+  std::int64_t sum = 0;
+  for (const auto& [outcome, count] : by_outcome) sum += count;
+  return sum;
+}
+
+double Tally::yield() const {
+  const std::int64_t judged = of("PASS") + of("FAIL") + of("ERROR") + of("UNSET");
+  return judged == 0 ? std::numeric_limits<double>::quiet_NaN()
+                     : static_cast<double>(of("PASS")) / static_cast<double>(judged);
+}
+
+void UnitVerdicts::Add(const RunRow& row, const std::string& outcome) {
+  Latest& latest = units_[row.unit][row.plan + '\n' + row.step + '\n' + row.measurement];
+  if (!latest.outcome.empty() && row.start_millis < latest.start) return;
+  latest = {row.start_millis, outcome};
+}
+
+Tally UnitVerdicts::tally() const {
+  Tally tally;
+  for (const auto& [unit, steps] : units_) {
+    std::size_t worst = 0;
+    for (const auto& [step, latest] : steps) worst = std::max(worst, Rank(latest.outcome));
+    tally.Add(worst < std::size(kOutcomes) ? kOutcomes[worst] : "ERROR");
+  }
+  return tally;
+}
+
+namespace {
+
+// Holds what grows while runs are judged.
+class Session {
+ public:
+  Session(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against)
+      : quantities_(store.Quantities()), now_(now, quantities_) {
+    if (against != nullptr) before_.emplace(*against, quantities_);
+    for (const Quantity& quantity : quantities_) {
+      names_.resize(std::max(names_.size(), static_cast<std::size_t>(quantity.id) + 1));
+      units_.resize(names_.size());
+      names_[static_cast<std::size_t>(quantity.id)] = quantity.name;
+      units_[static_cast<std::size_t>(quantity.id)] = quantity.unit;
+    }
+    Selection doubtful = selection;
+    doubtful.push_back({"outcome", "=", "ERROR"});
+    store.EachRun(doubtful, false, [&](const RunRow& row, StoredRun&& run) {
+      if (std::set<std::string> doubts = DoubtsOf(run.record); !doubts.empty()) doubts_[row.id] = std::move(doubts);
+    });
+    for (const auto& [name, bounds] : now.by_name) {
+      if (std::find(names_.begin(), names_.end(), name) == names_.end()) result.idle_limits.push_back(name);
+    }
+  }
+
+  void Take(const RunFigures& run) {
+    const RunRow& row = *run.row;
+    const auto doubts = doubts_.find(row.id);
+    const std::set<std::string>* const doubted = doubts == doubts_.end() ? nullptr : &doubts->second;
+    const RunVerdict after = Verdict(now_, run, names_, doubted);
+    const RunVerdict before = before_ ? Verdict(*before_, run, names_, doubted) : RunVerdict{row.outcome, {}, {}};
+    for (std::size_t i = 0; i < run.figures.size(); ++i) {
+      const FigureRow& figure = run.figures[i];
+      const auto quantity = static_cast<std::size_t>(figure.quantity);
+      if (!now_.Limits(figure.quantity) && !(before_ && before_->Limits(figure.quantity)) &&
+          figure.outcome == "MEASURED") {
+        continue;
+      }
+      const std::string was = before_ ? before.figures[i] : figure.outcome;
+      Count(row, quantity, names_[quantity], was, after.figures[i]);
+      Changed(row, names_[quantity], figure.measured ? figure.value : kNone, was, after.figures[i]);
+    }
+    for (const std::string& name : after.missing) {
+      const bool was_missing = std::find(before.missing.begin(), before.missing.end(), name) != before.missing.end();
+      Changed(row, name, kNone, was_missing ? "UNSET" : "MEASURED", "UNSET");
+    }
+    Changed(row, "", kNone, before.outcome, after.outcome);
+    result.runs_before.Add(before.outcome);
+    result.runs_after.Add(after.outcome);
+    units_before_.Add(row, before.outcome);
+    units_after_.Add(row, after.outcome);
+  }
+
+  Judgement Finish() {
+    result.units_before = units_before_.tally();
+    result.units_after = units_after_.tally();
+    for (auto& [key, figure] : figures_) result.figures.push_back(std::move(figure));
+    return std::move(result);
+  }
+
+  Judgement result;
+
+ private:
+  static constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+
+  void Count(const RunRow& row, std::size_t quantity, const std::string& name, const std::string& was,
+             const std::string& is) {
+    JudgedFigure& figure = figures_[{row.step, quantity}];
+    if (figure.name.empty()) figure = {row.step, name, units_[quantity], {}, {}};
+    figure.before.Add(was);
+    figure.after.Add(is);
+  }
+  void Changed(const RunRow& row, const std::string& figure, double value, const std::string& was,
+               const std::string& is) {
+    if (was != is) result.changes.push_back({row.unit, row.step, row.measurement, figure, value, was, is});
+  }
+
+  std::vector<Quantity> quantities_;
+  Judge now_;
+  std::optional<Judge> before_;
+  std::vector<std::string> names_, units_;  // by quantity
+  std::unordered_map<std::int64_t, std::set<std::string>> doubts_;
+  std::map<std::pair<std::string, std::size_t>, JudgedFigure> figures_;
+  UnitVerdicts units_before_, units_after_;
+};
+
+}  // namespace
+
+Judgement JudgeAgain(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against) {
+  Session session(store, selection, now, against);
+  if (session.result.idle_limits.size() == now.by_name.size()) {
+    throw Failure(kWrongUsage, store.name() + ": no run measures anything that these limits hold for");
+  }
+  std::vector<RunRow> rows;
+  store.EachRow(selection, [&](const RunRow& row) { rows.push_back(row); });
+  std::size_t next = 0;
+  RunFigures run = {nullptr, {}};
+  const auto take_before = [&](std::int64_t id) {
+    for (; next < rows.size() && rows[next].id < id; ++next) {
+      run.row = &rows[next];
+      session.Take(run);
+      run.figures.clear();
+    }
+  };
+  store.EachFigure(selection, [&](const FigureRow& figure) {
+    take_before(figure.run);
+    run.figures.push_back(figure);
+  });
+  take_before(std::numeric_limits<std::int64_t>::max());
+  return session.Finish();
+}
+
+}  // namespace qv

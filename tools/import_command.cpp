@@ -1,0 +1,56 @@
+#include <algorithm>
+#include <fstream>
+#include <iostream>
+#include <memory>
+
+#include "desk/base/files.h"
+#include "desk/base/text.h"
+#include "desk/results/archive.h"
+#include "tools/commands.h"
+#include "tools/program.h"
+
+namespace qv {
+
+namespace {
+
+struct ImportOptions {
+  std::vector<std::string> files;
+  std::string store;
+};
+
+Imported ImportFile(const std::string& path, Store& store) {
+  if (path == "-") return ImportLines(std::cin, "standard input", store);
+  if (LowerExtension(path) == ".json") {  // a record as a command wrote it
+    return {1, store.Put(ParseRun(ReadWholeFile(path, kWrongUsage), Printable(path)))};
+  }
+  std::ifstream lines(path);
+  if (!lines) throw Failure(kWrongUsage, Printable(path) + ": can't be read");
+  return ImportLines(lines, Printable(path), store);
+}
+
+int Import(const ImportOptions& options) {
+  for (const std::string& path : options.files) {
+    if (path != "-") CheckOutputs({{"the archive", path}}, {{"the store", options.store}});
+  }
+  Store store(options.store, Store::Use::kWrite);
+  Imported all;
+  for (const std::string& path : options.files) {
+    const Imported one = ImportFile(path, store);
+    all.read += one.read;
+    all.added += one.added;
+  }
+  std::cout << Count(all.read, "run") << " read, " << all.added << " new\n";
+  return kExitWithinLimits;
+}
+
+}  // namespace
+
+CommandBody DeclareImport(Options& command) {
+  auto options = std::make_shared<ImportOptions>();
+  command.Arguments("ARCHIVE", options->files, "Archives (.jsonl) or records (.json); - is standard input", "FILE",
+                    true);
+  command.Text("-o,--output", options->store, "The store: a file, or postgresql://user@host/database", "STORE", true);
+  return [options] { return Import(*options); };
+}
+
+}  // namespace qv

@@ -1,0 +1,79 @@
+#include "tools/store_options.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include "desk/base/text.h"
+#include "desk/measure/limits.h"
+
+namespace qv {
+
+namespace {
+
+// Characters, not bytes.
+std::size_t WidthOf(const std::string& text) {
+  return static_cast<std::size_t>(std::count_if(text.begin(), text.end(), [](char c) { return (c & 0xC0) != 0x80; }));
+}
+
+}  // namespace
+
+void StoreOptions::DeclareOn(Options& command) {
+  command.Argument("STORE", store, "A results file, or postgresql://user@host/database");
+  command.Texts("--where", where, "Only runs for which this holds (= != < <= > >=); may be given again", "NAME=VALUE");
+}
+
+Selection StoreOptions::selection() const {
+  Selection selection;
+  for (const std::string& word : where) selection.push_back(ParseCondition(word));
+  return selection;
+}
+
+ArchiveLimits ReadArchiveLimits(const std::string& path) {
+  ArchiveLimits limits;
+  for (const auto& [name, limit] : ReadLimits(path).by_name) {
+    limits.by_name[name] = {limit.min, limit.max, limit.marginal_min, limit.marginal_max};
+  }
+  return limits;
+}
+
+std::string BoundsText(const Bounds& bounds) {
+  if (bounds.min && bounds.max) return Format("%.6g to %.6g", *bounds.min, *bounds.max);
+  if (bounds.min) return Format("at least %.6g", *bounds.min);
+  return bounds.max ? Format("at most %.6g", *bounds.max) : "";
+}
+
+std::string ValueText(double value, const std::optional<double>& uncertainty, const std::string& unit) {
+  std::string text = std::isnan(value) ? "not a number" : Format("%.6g", value);
+  if (uncertainty) text += Format(" ± %.2g", 2 * *uncertainty);
+  return unit.empty() || unit == "1" ? text : text + " " + unit;
+}
+
+std::string TallyText(const Tally& tally, const std::string& what) {
+  std::string text = Count(static_cast<std::size_t>(tally.total()), what);
+  const char* separator = ": ";
+  for (const auto& [outcome, count] : tally.by_outcome) {
+    text += separator + std::to_string(count) + " " + outcome;
+    separator = ", ";
+  }
+  return std::isnan(tally.yield()) ? text : text + Format("; yield %.1f %%", 100 * tally.yield());
+}
+
+std::string Table(const std::vector<std::vector<std::string>>& lines, const std::vector<bool>& right) {
+  std::vector<std::size_t> widths(right.size(), 0);
+  for (const auto& line : lines) {
+    for (std::size_t i = 0; i < line.size(); ++i) widths[i] = std::max(widths[i], WidthOf(line[i]));
+  }
+  std::string text;
+  for (const auto& line : lines) {
+    std::string row;
+    for (std::size_t i = 0; i < line.size(); ++i) {
+      const std::string fill(widths[i] - WidthOf(line[i]), ' ');
+      row += (i == 0 ? "" : "  ") + (right[i] ? fill + line[i] : line[i] + fill);
+    }
+    row.erase(row.find_last_not_of(' ') + 1);
+    text += row + "\n";
+  }
+  return text;
+}
+
+}  // namespace qv
