@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <array>
-#include <atomic>
 #include <cmath>
 #include <cstdio>
 #include <cstring>
@@ -16,9 +15,9 @@
 #include <opencv2/imgproc.hpp>
 #include <opencv2/objdetect.hpp>
 #include <string>
-#include <thread>
 #include <vector>
 
+#include "benchmarks/trials.h"
 #include "chart/chart_layout.h"
 #include "desk/base/files.h"
 #include "desk/drawing/plot.h"
@@ -33,37 +32,6 @@ namespace {
 using namespace qv;
 
 constexpr int kThreshold = 125;
-
-// Runs trials on all cores; each writes only its own results.
-void ForEachTrial(int trials, const std::function<void(int)>& run) {
-  std::atomic<int> next = 0;
-  std::vector<std::thread> threads;
-  for (unsigned i = 0; i < std::max(1U, std::thread::hardware_concurrency()); ++i) {
-    threads.emplace_back([&] {
-      for (int trial = next++; trial < trials; trial = next++) run(trial);
-    });
-  }
-  for (std::thread& thread : threads) thread.join();
-}
-
-double Quantile(std::vector<double> values, double share) {
-  values.erase(std::remove_if(values.begin(), values.end(), [](double value) { return std::isnan(value); }),
-               values.end());
-  if (values.empty()) return NAN;
-  std::sort(values.begin(), values.end());
-  return values[static_cast<std::size_t>(std::lround(share * static_cast<double>(values.size() - 1)))];
-}
-
-double Mean(const std::vector<double>& values) {
-  double sum = 0;
-  for (const double value : values) sum += value;
-  return sum / static_cast<double>(values.size());
-}
-
-double ShareBelow(const std::vector<double>& values, double limit) {
-  return 100.0 * static_cast<double>(std::count_if(values.begin(), values.end(), [=](double v) { return v < limit; })) /
-         static_cast<double>(values.size());
-}
 
 SimulationOptions ChartOptions(cv::Size size, double blur_px) {
   SimulationOptions options;
@@ -330,53 +298,6 @@ void PrintDust() {
   }
 }
 
-void PrintRegistration() {
-  constexpr int kPairs = 50;
-  std::vector<double> errors(kPairs, 1e9);
-  ForEachTrial(kPairs, [&](int trial) {
-    cv::RNG random(trial + 1);
-    SimulationOptions options;
-    options.scene = "pair";
-    options.camera.size = {640, 480};
-    options.camera.blur_px = 0.8;
-    options.camera.noise_percent = 3;
-    options.camera.gain = 0.75;
-    options.camera.seed = trial + 1;
-    options.motion_px = {random.uniform(-40.0, 40.0), random.uniform(-40.0, 40.0)};
-    options.second_turn_deg = random.uniform(-10.0, 10.0);
-    options.second_scale = random.uniform(0.9, 1.1);
-    options.second_gain = random.uniform(0.7, 1.3);
-    const Simulation simulation = Simulate(options);
-    const cv::Mat first = Sense(options.camera, simulation.levels[0], 8);
-    CameraModel other = options.camera;
-    other.seed += 1000;
-    const cv::Mat second = Sense(other, simulation.levels[1], 8);
-    QVTester tester;
-    cv::Mat unwarped;
-    if (tester.GetUnwarpedImage(first, second, unwarped) != QV_SUCCESS) return;
-    const cv::Matx23d found(tester.kept_->unwarp.matrix);
-    double sum = 0;
-    for (int y = 0; y <= 480; y += 60) {
-      for (int x = 0; x <= 640; x += 80) {
-        const cv::Vec3d at(x, y, 1);
-        const Json& m = simulation.truth.at("matrix");
-        const cv::Vec2d is = found * at;
-        sum += std::hypot(is[0] - (m[0].get<double>() * x + m[1].get<double>() * y + m[2].get<double>()),
-                          is[1] - (m[3].get<double>() * x + m[4].get<double>() * y + m[5].get<double>()));
-      }
-    }
-    errors[trial] = sum / 81;
-  });
-  std::printf(
-      "\nRegistration, %d pairs of 640 x 480: shift to 40 px, turn to 10 degrees, scale 0.9 to 1.1, gain 0.7 to 1.3, "
-      "noise 3 %%\n\n",
-      kPairs);
-  std::printf(
-      "| median grid error px | under 1 px | under 3 px | under 10 px |\n|---|---|---|---|\n| %.2f | %.0f %% | %.0f %% "
-      "| %.0f %% |\n",
-      Quantile(errors, 0.5), ShareBelow(errors, 1), ShareBelow(errors, 3), ShareBelow(errors, 10));
-}
-
 void PrintDots() {
   constexpr int kPictures = 10;
   std::printf(
@@ -596,6 +517,8 @@ constexpr Section kSections[] = {
     {"dust", PrintDust},
     {"registration", PrintRegistration},
     {"dots", PrintDots},
+    {"lights", PrintLights},
+    {"prints", PrintPrints},
     {"detection", PrintDetection},
 };
 

@@ -12,6 +12,7 @@
 
 #include "qvtester/api.h"
 #include "qvtester/host_properties.h"
+#include "qvtester/tester.h"
 #include "unit_tests/drawing.h"
 #include "unit_tests/film_file.h"
 
@@ -52,7 +53,8 @@ const std::vector<std::string>& Files() {
 
 template <typename T>
 void ReadAll(const T* array, int count) {
-  for (int i = 0; i < count; ++i) static_cast<void>(*static_cast<const volatile T*>(array + i));
+  const auto* const bytes = reinterpret_cast<const volatile char*>(array);
+  for (std::size_t i = 0; i < count * sizeof(T); ++i) static_cast<void>(bytes[i]);
 }
 
 void ReadResults() {
@@ -78,6 +80,13 @@ void ReadResults() {
       ReadAll(array, film->frame_count_);
     ReadAll(film->angle_, film->frame_count_);
   }
+  for (const QVLightResult* lights : {&results->led_, &results->touch_led_}) {
+    ReadAll(lights->regions_, lights->region_count_);
+    ReadAll(lights->error_areas_, lights->error_count_);
+    ReadAll(lights->error_pixels_, lights->error_count_);
+  }
+  ReadAll(results->print_error_areas_, results->print_error_count_);
+  ReadAll(results->print_error_pixels_, results->print_error_count_);
   for (const int* histogram : {results->dust_hist_main_, results->dust_hist_front_})
     if (histogram != nullptr) ReadAll(histogram, 256);
 }
@@ -97,10 +106,33 @@ int Property(Bytes& bytes) {
     int out[288];
     return GetProperty(static_cast<QV_PROPERTY_INDEX>(index), out);
   }
-  if (index >= 76 && index <= 79) return 1;  // lists and their lengths hold pointers, which a fuzzer can't make up
+  if (index == 76 || index == 78) return 1;  // Regions sets them: here no one knows how much they would read
   int* const value = shared[index == 88];
   bytes.ConsumeData(value, 36);
   return SetProperty(static_cast<QV_PROPERTY_INDEX>(index), value);
+}
+
+// As many records as are counted; the count may be set to anything afterwards.
+int Regions(Bytes& bytes) {
+  const bool second = bytes.ConsumeBool();
+  std::vector<QVRegionRecord> records(4);
+  for (QVRegionRecord& record : records) {
+    const bool wild = bytes.ConsumeIntegralInRange(0, 9) == 0;
+    for (int& field : record.fields) {
+      field = wild ? bytes.ConsumeIntegral<int>() : bytes.ConsumeIntegralInRange(0, 40);
+    }
+  }
+  int count = bytes.ConsumeIntegralInRange(0, 4);
+  SetProperty(second ? QV_PROPERTY_REGION_COUNT_1 : QV_PROPERTY_REGION_COUNT_0, &count);
+  return SetProperty(second ? QV_PROPERTY_REGION_LIST_1 : QV_PROPERTY_REGION_LIST_0, records.data());
+}
+
+int List(Bytes& bytes, QV_RESOURCE_INDEX slot) {
+  std::vector<std::string> files;
+  for (int i = bytes.ConsumeIntegralInRange(0, 3); i > 0; --i) {
+    files.push_back(Files()[bytes.ConsumeIntegralInRange<std::size_t>(0, Files().size() - 1)]);
+  }
+  return SetResourceWithList(bytes.ConsumeBool() ? QV_RESOURCE_IMAGE_LIST : slot, files);
 }
 
 int Call(Bytes& bytes) {
@@ -111,7 +143,7 @@ int Call(Bytes& bytes) {
   const auto area = static_cast<std::size_t>(std::max(width, 0) * std::max(height, 0));
   float vertical = 0;
   float horizontal = 0;
-  switch (bytes.ConsumeIntegralInRange(0, 16)) {
+  switch (bytes.ConsumeIntegralInRange(0, 18)) {
     case 0: return InitTestModule();
     case 1: return FinalizeTestModule() == 0 ? InitTestModule() : -1000;
     case 2: return SetLDRResource(slot, width, height, Buffer<unsigned short>(bytes, 3 * area + 1).data());
@@ -131,6 +163,8 @@ int Call(Bytes& bytes) {
       std::string file = Files()[bytes.ConsumeIntegralInRange<std::size_t>(0, Files().size() - 1)];
       return SetResource(slot, file.data());
     }
+    case 16: return Regions(bytes);
+    case 17: return List(bytes, slot);
     default: return RunTest(test, bytes.ConsumeBool());
   }
 }

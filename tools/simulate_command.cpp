@@ -4,6 +4,7 @@
 #include <iostream>
 #include <memory>
 #include <optional>
+#include <set>
 #include <sstream>
 
 #include "desk/base/failure.h"
@@ -26,18 +27,39 @@ struct SimulateOptions : SimulationOptions {
   FilmStyle film;
   std::string lost;
   bool quiet = false;
-  std::string size, cast = "1,1,1", smear = "0,0", motion = "4,0", tint = "1,1,1", saturation = "auto";
+  std::string size, cast = "1,1,1", smear = "0,0", motion = "4,0", tint = "1,1,1", saturation = "auto",
+                    light = "255,214,170";
   std::string pipeline = "none", transfer = "auto", mosaic = "auto";
   std::array<std::optional<double>, std::size(kCameraNumbers)> numbers;  // as given
 
   bool is_film() const { return std::find(FilmScenes().begin(), FilmScenes().end(), scene) != FilmScenes().end(); }
 };
 
-// "photo.png" and "photo.second.png"
-std::string NumberedPath(const std::string& path, std::size_t number) {
+// "photo.png", then "photo.second.png", or the name that the scene gives: "photo.samples/00.png".
+std::string NumberedPath(const std::string& path, const Simulation& simulation, std::size_t number) {
   if (number == 0) return path;
-  std::filesystem::path second(path);
-  return second.replace_extension(".second" + second.extension().string());
+  const std::string name = simulation.names.empty() ? "second" : simulation.names.at(number - 1);
+  std::filesystem::path other(path);
+  return other.replace_extension("." + name + other.extension().string());
+}
+
+// Those of a scene's further photos. One that holds other files is refused: it would be read as a whole.
+void MakeFolders(const std::string& path, const Simulation& simulation) {
+  std::set<std::filesystem::path> files;
+  for (std::size_t i = 0; i < simulation.names.size(); ++i) files.insert(NumberedPath(path, simulation, i + 1));
+  for (const std::filesystem::path& file : files) {
+    const std::filesystem::path folder = file.parent_path();
+    if (folder.empty()) continue;
+    std::error_code failed;
+    std::filesystem::create_directories(folder, failed);
+    if (failed) throw Failure(kWrongUsage, folder.string() + ": can't be made: " + failed.message());
+    for (const auto& entry : std::filesystem::directory_iterator(folder)) {
+      if (files.count(entry.path()) == 0) {
+        throw Failure(kWrongUsage, folder.string() + ": holds " + entry.path().filename().string() +
+                                       ", which is not of this run; name another photo");
+      }
+    }
+  }
 }
 
 // The camera's numbers are made of their table; those of --pipeline phone say so.
@@ -80,11 +102,14 @@ void DeclareChart(Options& command, SimulateOptions& o) {
                  "chart: stored level of the paper over that of the edges' dark side", "RATIO");
   command.Choice("--marks", o.marks, {"auto", "fine", "medium", "coarse"},
                  "chart: size of the finder marks; auto suits the photo's size", "SIZE");
-  command.Text("--motion", o.motion, "preview, pair: way of the scene to the second photo, p.second.png beside p.png",
+  command.Text("--motion", o.motion,
+               "preview, pair: way of the scene to the second photo, p.second.png beside p.png; print: way from the "
+               "good ones to the photo",
                "DX,DY");
-  command.Number("--second-turn", o.second_turn_deg, -180, 180, "pair: turn of the second photo, counter-clockwise",
-                 "DEG");
-  command.Number("--second-scale", o.second_scale, 0.2, 2, "pair: size of the scene in the second photo", "FACTOR");
+  command.Number("--second-turn", o.second_turn_deg, -180, 180,
+                 "pair, print: turn of the second photo, counter-clockwise", "DEG");
+  command.Number("--second-scale", o.second_scale, 0.2, 2, "pair, print: size of the scene in the second photo",
+                 "FACTOR");
   command.Number("--second-gain", o.second_gain, 0, 4, "pair: levels of the second photo over the first's", "FACTOR");
 }
 
@@ -107,6 +132,20 @@ void DeclareDisplay(Options& command, SimulateOptions& o) {
                  "SHARE");
   command.Whole("--defects", o.defects, 0, 1000, "display: black points, or white ones in black", "N");
   command.Number("--defect-size", o.display.defect_side, 0.5, 100, "display: their side, of a width of 1600", "UNITS");
+}
+
+void DeclareLightsAndPrint(Options& command, SimulateOptions& o) {
+  command.Text("--light", o.light, "lights: red, green and blue of each, as stored levels", "R,G,B");
+  command.Whole("--spots", o.spots, 0, 1000, "lights: number of dark squares", "N");
+  command.Number("--spot-size", o.spot_px, 1, 500, "lights: side of a dark square", "PX");
+  command.Number("--spot-darkness", o.lights.spot_darkness, 0, 1, "lights: share of the light that they lack", "SHARE");
+  command.Whole("--samples", o.samples, 0, 100, "print: photos of good prints, into p.samples beside p.png", "N");
+  command.Whole("--missing", o.missing, 0, 100, "print: places where ink is missing", "N");
+  command.Whole("--extra", o.extra, 0, 100, "print: places where there is ink too much", "N");
+  command.Number("--print-defect-size", o.print_defect_px, 1, 200, "print: side of such a place", "PX");
+  command.Number("--print-defect-contrast", o.print.defect_contrast, 0, 1,
+                 "print: share of the way from what should be there to its opposite", "SHARE");
+  command.Seed("--print-seed", o.print.seed, "print: seed of the signs");
 }
 
 void DeclareFile(Options& command, SimulateOptions& o) {
@@ -164,6 +203,7 @@ void Complete(SimulateOptions& o) {
   camera.smear_px = ParsePair("--smear", o.smear, 100);
   o.motion_px = ParsePair("--motion", o.motion, 30000);
   o.display.tint = ParseTriple("--tint", o.tint, 4);
+  o.lights.colour = ParseTriple("--light", o.light, 255);
 }
 
 // The film, and its truth beside it.
@@ -194,12 +234,13 @@ int Run(SimulateOptions& o) {
     simulation.truth["parameters"]["jpeg_chroma"] = o.file.chroma;
   }
   if (o.file.path == "-" && simulation.levels.size() > 1) {
-    throw Failure(kWrongUsage, "-o -: this scene makes two photos; name a file");
+    throw Failure(kWrongUsage, "-o -: this scene makes several photos; name a file");
   }
+  MakeFolders(o.file.path, simulation);
   CameraModel sensor = o.camera;
   for (std::size_t i = 0; i < simulation.levels.size(); ++i) {
     const cv::Mat photo = simulation.is_hdr ? simulation.levels[i] : Sense(sensor, simulation.levels[i], o.file.bits);
-    const std::string path = NumberedPath(o.file.path, i);
+    const std::string path = NumberedPath(o.file.path, simulation, i);
     WriteOutput(path, EncodePhoto(photo, o.file));
     if (!o.quiet && path != "-") std::cout << Format("%s  %d x %d\n", path.c_str(), photo.cols, photo.rows);
     sensor.seed += 0x9E3779B97F4A7C15;  // the next photo has noise of its own
@@ -222,17 +263,19 @@ CommandBody DeclareSimulate(Options& command) {
                "PHOTO", true);
   std::vector<std::string> scenes = SceneNames();
   scenes.insert(scenes.end(), FilmScenes().begin(), FilmScenes().end());
-  command.Choice("--scene", o->scene, scenes,
-                 "What stands before the camera: the sharpness chart, the three marks of an "
-                 "aiming target, two preview frames of a moving chart, a plain target seen through dust, two photos of "
-                 "a textured scene, a lit panel with dots in high dynamic range, a phone's display; films of a lens "
-                 "that finds its focus, of a flash, of a turning chart",
-                 "SCENE");
+  command.Choice(
+      "--scene", o->scene, scenes,
+      "What stands before the camera: the sharpness chart, the three marks of an "
+      "aiming target, two preview frames of a moving chart, a plain target seen through dust, two photos of "
+      "a textured scene, a lit panel with dots in high dynamic range, a phone's display, a panel of lights, "
+      "a print with photos of good ones; films of a lens that finds its focus, of a flash, of a turning chart",
+      "SCENE");
   DeclareCamera(command, *o);
   DeclareDevelopment(command, *o);
   DeclareChart(command, *o);
   DeclareSpots(command, *o);
   DeclareDisplay(command, *o);
+  DeclareLightsAndPrint(command, *o);
   DeclareFilm(command, o->film, o->lost);
   DeclareFile(command, *o);
   return [o] { return Run(*o); };

@@ -8,12 +8,6 @@ namespace {
 
 constexpr double kPatchFrame = 10;  // chart units
 
-FilledShape Square(cv::Point2d centre, double half, cv::Vec3d colour) {
-  return {{centre + cv::Point2d(-half, -half), centre + cv::Point2d(half, -half), centre + cv::Point2d(half, half),
-           centre + cv::Point2d(-half, half)},
-          colour};
-}
-
 void AddMark(Scene& scene, cv::Point2d centre, double module) {
   scene.shapes.push_back(Square(centre, 3.5 * module, Grey(0)));
   scene.shapes.push_back(Square(centre, 2.5 * module, scene.paper));

@@ -36,6 +36,12 @@ Scene InLight(const Scene& scene) {
   return lit;
 }
 
+FilledShape Square(cv::Point2d centre, double half, const cv::Vec3d& colour) {
+  return {{centre + cv::Point2d(-half, -half), centre + cv::Point2d(half, -half), centre + cv::Point2d(half, half),
+           centre + cv::Point2d(-half, half)},
+          colour};
+}
+
 cv::Point2d Map(const cv::Matx33d& transform, cv::Point2d point) {
   const cv::Vec3d p = transform * cv::Vec3d(point.x, point.y, 1);
   return {p[0] / p[2], p[1] / p[2]};

@@ -19,6 +19,9 @@ struct FilledShape {
 /// A grey of this stored level.
 inline cv::Vec3d Grey(double level) { return {level, level, level}; }
 
+/// A square of twice this side, upright.
+FilledShape Square(cv::Point2d centre, double half, const cv::Vec3d& colour);
+
 struct Scene {
   std::vector<FilledShape> shapes;  // later ones cover earlier ones
   cv::Vec3d paper = {255, 255, 255};

@@ -14,6 +14,11 @@ Simulation DustPhoto(const SimulationOptions& options);      // a plain target t
 Simulation PhotoPair(const SimulationOptions& options);      // a textured scene from two places
 Simulation HdrCapture(const SimulationOptions& options);     // a lit panel with dots
 Simulation DisplayPhoto(const SimulationOptions& options);   // the screen's corners, what it shows, its defects
+// A panel of lights: a region within each, its colour, where its dark spots are.
+Simulation LightsPhoto(const SimulationOptions& options);
+// A print with defects, then good ones: the map from the first good one's photo to the photo, the defects in the
+// former.
+Simulation PrintPhoto(const SimulationOptions& options);
 
 }  // namespace qv
 

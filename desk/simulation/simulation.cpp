@@ -13,9 +13,9 @@ struct SceneRow {
   Simulation (*simulate)(const SimulationOptions& options);
 };
 
-constexpr SceneRow kScenes[] = {{"chart", ChartPhoto},    {"target", TargetPhoto}, {"preview", PreviewFrames},
-                                {"dust", DustPhoto},      {"pair", PhotoPair},     {"hdr", HdrCapture},
-                                {"display", DisplayPhoto}};
+constexpr SceneRow kScenes[] = {{"chart", ChartPhoto},     {"target", TargetPhoto}, {"preview", PreviewFrames},
+                                {"dust", DustPhoto},       {"pair", PhotoPair},     {"hdr", HdrCapture},
+                                {"display", DisplayPhoto}, {"lights", LightsPhoto}, {"print", PrintPhoto}};
 
 }  // namespace
 

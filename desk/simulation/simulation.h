@@ -8,6 +8,8 @@
 #include "desk/base/json.h"
 #include "desk/scenes/charts.h"
 #include "desk/scenes/display.h"
+#include "desk/scenes/lights.h"
+#include "desk/scenes/print.h"
 #include "desk/simulation/camera.h"
 
 namespace qv {
@@ -33,12 +35,21 @@ struct SimulationOptions {
   DisplayStyle display;
   int defects = 0;        // display: points at random places
   double dim_corner = 0;  // display: share of the light that its first corner lacks
+  LightsStyle lights;
+  int spots = 0;  // lights: dark squares at random places
+  double spot_px = 4;
+  PrintStyle print;  // its photo is moved, turned and scaled as the pair's second one
+  int samples = 8;   // print: photos of good ones
+  int missing = 0;   // print: defects at random places
+  int extra = 0;
+  double print_defect_px = 8;  // side
 };
 
 struct Simulation {             // NOLINT(bugprone-exception-escape): moving Json does not throw
   std::vector<cv::Mat> levels;  // CV_32FC3 in BGR, what falls on the sensor; a photo each
   bool is_hdr = false;          // the levels are the picture: noise is in them, and they are written as floats
   Json truth;
+  std::vector<std::string> names = {};  // of the photos after the first, beside it: "second", "samples/00"
 };
 
 /// Names of the scenes, for help and checks.

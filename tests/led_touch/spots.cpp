@@ -1,5 +1,6 @@
 #include "tests/led_touch/spots.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <new>
 #include <opencv2/imgproc.hpp>
@@ -10,6 +11,7 @@
 namespace {
 
 constexpr int kMostSpots = 20'000;
+constexpr int kFarthest = 1'000'000;  // beyond any picture: sums of coordinates never wrap
 
 struct Free {
   void operator()(void* array) const { std::free(array); }
@@ -57,8 +59,9 @@ void Merge(QVTester& tester, cv::Size size, std::vector<Spot>& spots) {
   int* count_array = counts.release();
   cv::Point* first_array = first.release();
   cv::Point* last_array = last.release();
-  const int merged = tester.ErrorAreaClustering(tester.prop_param_59_, size.width, size.height, &indices, &count_array,
-                                                &first_array, &last_array);
+  const int distance = std::clamp(tester.prop_param_59_, -kFarthest, kFarthest);
+  const int merged =
+      tester.ErrorAreaClustering(distance, size.width, size.height, &indices, &count_array, &first_array, &last_array);
   counts.reset(count_array);
   first.reset(first_array);
   last.reset(last_array);

@@ -1,0 +1,36 @@
+#include "benchmarks/trials.h"
+
+#include <algorithm>
+#include <atomic>
+#include <cmath>
+#include <thread>
+
+void ForEachTrial(int trials, const std::function<void(int)>& run) {
+  std::atomic<int> next = 0;
+  std::vector<std::thread> threads;
+  for (unsigned i = 0; i < std::max(1U, std::thread::hardware_concurrency()); ++i) {
+    threads.emplace_back([&] {
+      for (int trial = next++; trial < trials; trial = next++) run(trial);
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+}
+
+double Quantile(std::vector<double> values, double share) {
+  values.erase(std::remove_if(values.begin(), values.end(), [](double value) { return std::isnan(value); }),
+               values.end());
+  if (values.empty()) return NAN;
+  std::sort(values.begin(), values.end());
+  return values[static_cast<std::size_t>(std::lround(share * static_cast<double>(values.size() - 1)))];
+}
+
+double Mean(const std::vector<double>& values) {
+  double sum = 0;
+  for (const double value : values) sum += value;
+  return sum / static_cast<double>(values.size());
+}
+
+double ShareBelow(const std::vector<double>& values, double limit) {
+  return 100.0 * static_cast<double>(std::count_if(values.begin(), values.end(), [=](double v) { return v < limit; })) /
+         static_cast<double>(values.size());
+}
