@@ -125,9 +125,8 @@ void Tell(const Record& record, const MeasureOptions& options, const CommandExtr
     std::cerr << record.MissSentence() << '\n';
     return;
   }
-  for (const Remark& remark : record.remarks) std::cerr << "warning: " << remark.sentence << '\n';
-  if (record.limits.given() && !record.limited()) {
-    std::cerr << "warning: " << options.limits << ": holds no limit for " << record.phase.name << '\n';
+  for (const Remark& remark : record.remarks) {
+    std::cerr << (remark.weight == Remark::kDoubt ? "doubt: " : "warning: ") << remark.sentence << '\n';
   }
   if (options.quiet) return;
   std::string text;
@@ -161,7 +160,8 @@ int StatusOf(const Record& record) {
   if (!record.measured()) {
     return record.phase.code == QV_ERROR_INTERNAL ? kExitInternalFault : kExitCouldNotMeasure;
   }
-  return record.outcome() == Outcome::kPass ? kExitWithinLimits : kExitLimitBroken;
+  if (record.outcome() == Outcome::kError) return kExitCouldNotMeasure;
+  return record.outcome() == Outcome::kFail ? kExitLimitBroken : kExitWithinLimits;
 }
 
 int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* extra) {

@@ -78,7 +78,9 @@ std::string CaptureFinding::Report(const Record& record) const {
   }
   for (const char* figure : {"delta_e_76_mean", "delta_e_76_max"}) {
     const Reading* m = phase.Find(figure);
-    if (m != nullptr) text += Format("%-16s %.2f%s\n", figure, m->value(), LimitText(*m).c_str());
+    if (m == nullptr) continue;
+    const std::string value = m->values.empty() ? "not measured" : Format("%.2f", m->value());
+    text += Format("%-16s %s%s\n", figure, value.c_str(), LimitText(*m).c_str());
   }
   return text;
 }

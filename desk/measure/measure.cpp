@@ -1,9 +1,11 @@
 #include "desk/measure/measure.h"
 
+#include <algorithm>
 #include <mutex>
 #include <optional>
 
 #include "desk/base/clock.h"
+#include "desk/base/failure.h"
 #include "desk/base/log_lines.h"
 #include "desk/measure/guarded.h"
 #include "desk/measure/load.h"
@@ -65,6 +67,16 @@ Json PropertiesOf(const Spec& spec, const Request& request) {
   return CheckedProperties(properties);
 }
 
+// Limits of other measurements alone would let this one pass unjudged.
+void RefuseForeignLimits(const Spec& spec, const Limits& limits) {
+  const bool own = std::any_of(limits.by_name.begin(), limits.by_name.end(),
+                               [&](const auto& limit) { return FindFigure(limit.first)->measurement == spec.name; });
+  if (limits.given() && !own) {
+    throw Failure(kWrongUsage, std::string("the limits hold none for ") + spec.name + "; they are of " +
+                                   FindFigure(limits.by_name.begin()->first)->measurement);
+  }
+}
+
 Record NewRecord(const Request& request, const Spec& spec, const Limits& limits) {
   Record record;
   record.start_millis = MillisSinceEpoch();
@@ -83,6 +95,7 @@ Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
   const Request resolved = Resolved(request);
   const Measurement& measurement = *FindMeasurement(resolved.measurement);
   const Spec& spec = measurement.spec();
+  RefuseForeignLimits(spec, limits);
   Record record = NewRecord(resolved, spec, limits);
   LogCollector log;
   std::optional<Unpublished> unpublished;

@@ -71,7 +71,7 @@ Json JsonOf(const Reading& m) {
 }
 
 Json JsonOf(const Remark& remark, int code) {
-  constexpr const char* kWeights[] = {"warning", "miss", "doubt", "no judgement"};
+  constexpr const char* kWeights[] = {"warning", "miss", "doubt", "accepted doubt", "no judgement"};
   Json json = {
       {"code", code}, {"description", remark.sentence}, {"name", remark.name}, {"weight", kWeights[remark.weight]}};
   if (!remark.figure.empty()) json["figure"] = remark.figure;
@@ -118,6 +118,7 @@ const char* Name(Outcome outcome) {
   switch (outcome) {
     case Outcome::kPass: return "PASS";
     case Outcome::kFail: return "FAIL";
+    case Outcome::kMeasured: return "MEASURED";
     case Outcome::kError: return "ERROR";
     default: return "UNSET";
   }
@@ -151,6 +152,10 @@ const Reading* Phase::Find(const std::string& figure) const {
 }
 
 void Record::Judge() {
+  for (Remark& remark : remarks) {
+    if (remark.weight == Remark::kDoubt && limits.accept_doubts.count(remark.name) != 0)
+      remark.weight = Remark::kAccepted;
+  }
   for (const auto& [name, limit] : limits.by_name) {  // what was asked of this test and not measured is shown as such
     const FigureInfo* const info = FindFigure(name);
     if (info->measurement != phase.name || phase.Find(info->figure->name) != nullptr) continue;
@@ -171,11 +176,16 @@ void Record::Judge() {
 
 bool Record::measured() const { return phase.code == QV_SUCCESS && !Holds(remarks, Remark::kNoJudgement); }
 
+bool Record::doubtful() const { return measured() && Holds(remarks, Remark::kDoubt); }
+
 Outcome Record::outcome() const {
-  if (!measured()) return Outcome::kError;
-  const bool failed = std::any_of(phase.readings.begin(), phase.readings.end(),
-                                  [](const Reading& m) { return m.outcome == Outcome::kFail; });
-  return failed || Holds(remarks, Remark::kDoubt) ? Outcome::kFail : Outcome::kPass;
+  const auto any = [&](Outcome outcome) {
+    return std::any_of(phase.readings.begin(), phase.readings.end(),
+                       [=](const Reading& m) { return m.outcome == outcome; });
+  };
+  if (!measured() || doubtful() || any(Outcome::kUnset)) return Outcome::kError;
+  if (any(Outcome::kFail)) return Outcome::kFail;
+  return limited() ? Outcome::kPass : Outcome::kMeasured;
 }
 
 bool Record::limited() const {

@@ -2,6 +2,7 @@
 #define QVTESTER_DESK_MEASURE_RECORD_H_
 
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <string>
@@ -22,7 +23,10 @@ class Finding;
 
 inline constexpr const char kRecordSchema[] = "qvtester-record-1";
 
-enum class Outcome { kPass, kFail, kError, kUnset };
+/// A figure: PASS or FAIL only against a limit, MEASURED without one, UNSET when a limit asks for it and it was not
+/// measured. A run: ERROR when it could not measure, lacks a figure that a limit asks for, or is in doubt; else FAIL
+/// with a broken limit; else PASS with at least one limit; else MEASURED.
+enum class Outcome { kPass, kFail, kMeasured, kError, kUnset };
 const char* Name(Outcome outcome);
 
 /// A figure's value.
@@ -32,10 +36,11 @@ struct Reading {
   std::vector<double> axis;    // of a list: frequencies in units of Nyquist, or columns
   std::optional<Uncertainty> uncertainty;
   Limit limit;
-  Outcome outcome = Outcome::kPass;
+  Outcome outcome = Outcome::kMeasured;
   bool marginal = false;
 
-  double value() const { return values.at(0); }
+  /// NaN where it was not measured.
+  double value() const { return values.empty() ? std::numeric_limits<double>::quiet_NaN() : values[0]; }
 };
 
 struct Attachment {
@@ -71,7 +76,8 @@ struct Remark {
   enum Weight {
     kWarning,      // worth knowing
     kMiss,         // why there is no result
-    kDoubt,        // measured, but not to be trusted: never a PASS
+    kDoubt,        // measured, but not to be trusted: an ERROR
+    kAccepted,     // a doubt that the limits file accepts
     kNoJudgement,  // the test ran, but its figures say nothing about the unit
   };
   Weight weight;
@@ -106,6 +112,8 @@ struct Record {
   Outcome outcome() const;
   /// Code 1, and nothing that forbids a judgement.
   bool measured() const;
+  /// Measured, but not to be trusted.
+  bool doubtful() const;
   bool marginal() const;
   bool limited() const;  // some figure of this test has a limit
   /// Why it could not be measured: where, why, which code, what to do about it.

@@ -60,8 +60,8 @@ struct EdgeSpreads {
   std::array<EdgeSpread, kBands> bands;
 };
 
-/// Up to `reach` pixels to each side, of all rows and of each of the bands; a band's may end after two fifths of that. A
-/// spread has no levels when too many of its bins see no pixel.
+/// Up to `reach` pixels to each side, of all rows and of each of the bands; a band's may end after two fifths of that.
+/// A spread has no levels when too many of its bins see no pixel.
 EdgeSpreads ProjectEdge(const SlantedEdge& edge, double reach);
 
 }  // namespace qv
