@@ -11,8 +11,7 @@ std::string Base64(const std::string& bytes);
 std::string FromBase64(const std::string& text);
 
 /// zlib's format in Base64, so that it is plain text in every database.
-enum class Effort { kFast, kSmall };
-std::string Pack(const std::string& text, Effort effort = Effort::kFast);
+std::string Pack(const std::string& text);
 /// Throws Failure (internal fault) where it was not packed, or is over 256 MB.
 std::string Unpack(const std::string& packed);
 
