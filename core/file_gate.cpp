@@ -7,7 +7,6 @@
 #include <algorithm>
 #include <array>
 #include <cstddef>
-#include <cstdio>
 #include <cstring>
 #include <string_view>
 
@@ -151,12 +150,11 @@ Size SizeOfPam(const Header& h) {
 }
 
 Size SizeOfHdr(const Header& h) {
-  const std::string text(h.Text(0, kTextHeader));
+  const std::string_view text = h.Text(0, kTextHeader);
   Size size;
-  for (std::size_t at = text.find("-Y "); at != std::string::npos; at = text.find("-Y ", at + 1)) {
-    unsigned rows = 0;
-    unsigned columns = 0;
-    if (std::sscanf(text.c_str() + at, "-Y %9u +X %9u", &rows, &columns) == 2) size.Widen(columns, rows);
+  for (std::size_t at = text.find("-Y "); at != std::string_view::npos; at = text.find("-Y ", at + 1)) {
+    const auto words = Words(text.substr(at, 64), 4);
+    if (words.size() == 4 && words[2] == "+X") size.Widen(Count(words[3]), Count(words[1]));
   }
   return size;
 }

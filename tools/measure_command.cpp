@@ -23,8 +23,7 @@ namespace qv {
 struct MeasureOptions {
   std::vector<std::string> inputs;                          // by their place in the row; empty: left out
   std::map<std::string, std::optional<std::string>> words;  // parameters by name
-  std::map<std::string, bool> flags;                        // and those that are one
-  std::vector<std::string> set, repeats;
+  std::vector<std::string> set;
   std::string json, annotate, limits, dut, station;
   bool flag = false, fake = false, publish = false, verbose = false, quiet = false;
 };
@@ -74,7 +73,7 @@ void DeclareOutputs(Options& command, const MeasuringCommand& row, MeasureOption
   command.Flag("--quiet", options.quiet, "Print nothing but what was asked for and errors");
 }
 
-Request RequestOf(const Spec& spec, const MeasureOptions& options, const CommandExtra* extra) {
+Request RequestOf(const Spec& spec, const MeasureOptions& options) {
   Request request;
   request.measurement = spec.name;
   for (const std::string& input : options.inputs) {
@@ -85,18 +84,12 @@ Request RequestOf(const Spec& spec, const MeasureOptions& options, const Command
     }
   }
   for (const Parameter& parameter : spec.parameters) {
-    if (parameter.type == Parameter::kFlag) {
-      if (options.flags.at(parameter.name)) request.parameters[parameter.name] = true;
-      continue;
-    }
     const std::optional<std::string>& word = options.words.at(parameter.name);
     if (word) request.parameters[parameter.name] = Parsed(parameter, *word);
   }
-  for (const std::string& photo : options.repeats) request.repeats.emplace_back(photo);
   for (const std::string& words : options.set) AddProperty(request.properties, words);
   request.fake = options.fake;
   request.publish = options.publish;
-  if (extra != nullptr) extra->Complete(request);
   return Resolved(request);
 }
 
@@ -106,7 +99,6 @@ void CheckFiles(const Spec& spec, const MeasureOptions& options, const CommandEx
   for (std::size_t i = 0; i < options.inputs.size(); ++i) {
     inputs.push_back({std::string("the ") + spec.inputs[i].name, options.inputs[i]});
   }
-  for (const std::string& photo : options.repeats) inputs.push_back({"a repeated photo", photo});
   inputs.push_back({"the limits", options.limits});
   std::vector<NamedFile> outputs = {{"the record", options.json}, {"the picture", options.annotate}};
   if (extra != nullptr) {
@@ -133,16 +125,14 @@ void Tell(const Record& record, const MeasureOptions& options, const CommandExtr
     std::cerr << record.MissSentence() << '\n';
     return;
   }
-  for (const Remark& remark : record.remarks) std::cerr << "warning: " << remark.sentence << '\n';
-  if (record.limits.given() && !record.limited()) {
-    std::cerr << "warning: " << options.limits << ": holds no limit for " << record.phase.name << '\n';
+  for (const Remark& remark : record.remarks) {
+    std::cerr << (remark.weight == Remark::kDoubt ? "doubt: " : "warning: ") << remark.sentence << '\n';
   }
   if (options.quiet) return;
   std::string text;
   for (const RecordedInput& input : record.inputs) {
     text += Format("%s  %d x %d\n", input.path.c_str(), input.width, input.height);
   }
-  if (!options.repeats.empty()) text += Format("medians of %zu photos\n", options.repeats.size() + 1);
   text += record.finding->Report(record);
   if (extra != nullptr) text += extra->Report(record);
   bool taken = options.json == "-" || options.annotate == "-";
@@ -170,7 +160,8 @@ int StatusOf(const Record& record) {
   if (!record.measured()) {
     return record.phase.code == QV_ERROR_INTERNAL ? kExitInternalFault : kExitCouldNotMeasure;
   }
-  return record.outcome() == Outcome::kPass ? kExitWithinLimits : kExitLimitBroken;
+  if (record.outcome() == Outcome::kError) return kExitCouldNotMeasure;
+  return record.outcome() == Outcome::kFail ? kExitLimitBroken : kExitWithinLimits;
 }
 
 int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* extra) {
@@ -179,7 +170,7 @@ int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* 
   const Limits limits = options.limits.empty() ? Limits() : ReadLimits(options.limits);
   if (options.verbose) ShowLogLines();
   QVTester tester;
-  Record record = Measure(tester, RequestOf(spec, options, extra), limits);
+  Record record = Measure(tester, RequestOf(spec, options), limits);
   record.dut_id = options.dut;
   record.station_id = options.station;
   record.command = CommandLine();
@@ -201,16 +192,10 @@ CommandBody MeasuringCommand::operator()(Options& command) const {
   DeclareInputs(command, spec, *options);
   if (flag != nullptr) command.Flag(flag, options->flag, flag_help);
   for (const Parameter& parameter : spec.parameters) {
-    if (parameter.type == Parameter::kFlag) {
-      command.Flag(OptionOf(parameter.name).c_str(), options->flags[parameter.name], parameter.help);
-      continue;
-    }
     command.Text(OptionOf(parameter.name).c_str(), options->words[parameter.name], HelpOf(parameter), parameter.value);
   }
   command.Texts("--set", options->set, "Set a property of the tester by its index or name; may be repeated",
                 "PROPERTY=VALUE");
-  command.List("--repeat", options->repeats, "Further photos of the same unit: medians and their spread are told",
-                "PHOTO");
   if (spec.test) command.Flag("--fake", options->fake, "Run the test in its fake mode");
   if (spec.publishes) {
     command.Flag("--publish", options->publish, "Write the findings to the system properties that other programs read");

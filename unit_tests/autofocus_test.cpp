@@ -141,13 +141,15 @@ TEST(ChartMtf, ARegionOutsideTheUprightPictureIsTheSameError) {
   for (const cv::Mat& marks : {// A chart turned by 45 degrees at the upper right: the vertical region is out of view.
                                DrawMarks({1000, 1000}, 6, {{279, 679}, {19, 939}, {539, 939}}),
                                // With corner and second mark in one column the scale is 0, and both regions are empty.
-                               DrawMarks({400, 400}, 5, {{20, 20}, {20, 60}, {340, 20}})}) {
+                               DrawMarks({400, 400}, 5, {{20, 20}, {20, 60}, {340, 20}}),
+                               DrawMarks({330, 330}, 3, {{187, 28}, {33, 135}, {24, 181}})}) {
     cv::Mat photo;
     cv::cvtColor(marks, photo, cv::COLOR_GRAY2BGR);
     std::vector<float> list;
     float mtf50 = 0;
     EXPECT_THROW(plain::GetSFRFromImage(tester, photo, list, list, list, mtf50, mtf50), cv::Exception);
     EXPECT_THROW(tester.GetSFRFromImage(photo, list, list, list, mtf50, mtf50), cv::Exception);
+    EXPECT_EQ(3u, tester.kept_->chart.marks.size());
     EXPECT_THROW(tester.GetMTFFromImage(photo, mtf50, mtf50), cv::Exception);
   }
 }

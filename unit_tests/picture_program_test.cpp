@@ -99,7 +99,7 @@ TEST_F(PictureProgram, RegistrationsThatFailOrMayBeFalseSaySo) {
   EXPECT_EQ(-90, Record("register photo.png blank.png -o out.png", 3)["phases"][0]["result_code"]);
   EXPECT_THAT(err_, HasSubstr("too few features match"));
   EXPECT_FALSE(std::filesystem::exists(folder_.Path("out.png")));
-  EXPECT_EQ("FAIL", Record("register photo.png other.png -o out.png", 1)["outcome"]);
+  EXPECT_EQ("ERROR", Record("register photo.png other.png -o out.png", 3)["outcome"]);
   EXPECT_THAT(err_, HasSubstr("doubtful"));
   ExpectComplaint("register photo.png none.png -o out.png", 3, "none.png: no such file");
 }

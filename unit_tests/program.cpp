@@ -17,10 +17,10 @@ json Measured(const json& record, const std::string& name) {
   return record.at("phases").at(0).at("measurements").at(name).at("measured_value");
 }
 
-ProgramRun SimulatedPhotos::Run(const std::string& arguments) const {
+ProgramRun SimulatedPhotos::Run(const std::string& arguments, const std::string& before) const {
   const TemporaryFolder streams;
-  const std::string command = "cd '" + folder_.Path("") + "' && exec '" QVTESTER_PROGRAM "' </dev/null " + arguments +
-                              " >'" + streams.Path("out") + "' 2>'" + streams.Path("err") + "'";
+  const std::string command = "cd '" + folder_.Path("") + "' && " + before + "exec '" QVTESTER_PROGRAM "' </dev/null " +
+                              arguments + " >'" + streams.Path("out") + "' 2>'" + streams.Path("err") + "'";
   const int status = std::system(command.c_str());  // NOLINT(cert-env33-c): the tests' own words
   return {WIFEXITED(status) ? WEXITSTATUS(status) : 1000 + WTERMSIG(status), ReadFile(streams.Path("out")),
           ReadFile(streams.Path("err"))};

@@ -21,8 +21,8 @@ nlohmann::json Measured(const nlohmann::json& record, const std::string& name);
 /// Tests that run the program in a folder of their own, on photos of its own simulator.
 class SimulatedPhotos : public ::testing::Test {
  protected:
-  /// Runs `qvtester` in the folder with these arguments, as a shell reads them.
-  ProgramRun Run(const std::string& arguments) const;
+  /// Runs `qvtester` in the folder with these arguments, as a shell reads them, after what stands before.
+  ProgramRun Run(const std::string& arguments, const std::string& before = "") const;
   void ExpectComplaint(const std::string& arguments, int status, const std::string& complaint) const;
 
   /// Runs a measuring command; answers its record, held against docs/record.schema.json. What it says goes to err_.

@@ -25,10 +25,10 @@ TEST_F(Program, AutofocusReportsRecordsAndDraws) {
   const ProgramRun run = Run("autofocus photo.png --json record.json");
   EXPECT_THAT(run.err, IsEmpty());
   EXPECT_THAT(run.out,
-              AllOf(HasSubstr("MTF50      vertical"), HasSubstr("Nyquist"), HasSubstr("c/p"), HasSubstr("PASS")));
+              AllOf(HasSubstr("MTF50      vertical"), HasSubstr("Nyquist"), HasSubstr("c/p"), HasSubstr("MEASURED")));
 
   const json record = Record("autofocus photo.png --annotate seen.png --threshold 110 --dut SN0042");
-  EXPECT_EQ("PASS", record["outcome"]);
+  EXPECT_EQ("MEASURED", record["outcome"]) << "without a limit nothing passes";
   EXPECT_EQ("SN0042", record["dut_id"]);
   EXPECT_EQ(14, record["metadata"]["test_index"]);
   EXPECT_EQ(json({{"93", 110}}), record["metadata"]["properties"]) << "only what differs from its default";
@@ -49,7 +49,7 @@ TEST_F(Program, MarksAndTheStandardsFigureAreTheTrueOnesAtAnyTurn) {
     Simulate("--blur 0.8 --size 2000x1500 --turn " + turn);
     const json truth = Truth();
     for (const auto& [command, phase] : {std::pair("autofocus", "camera_autofocus"), {"mtf", "mtf_check"}}) {
-      const json record = Record(std::string(command) + " photo.png --transfer linear");
+      const json record = Record(std::string(command) + " photo.png");
       for (std::size_t i = 0; i < 3; ++i) {
         const json mark = truth["marks"][i];
         const json seen = Measured(record, std::string(phase) + "_marks")[i];
@@ -95,19 +95,33 @@ TEST_F(Program, LimitsDecideTheVerdict) {
   EXPECT_EQ("FAIL", Record(judge, 1)["outcome"]);
 
   for (const auto& [limits, complaint] :
-       {std::pair(R"({"camera_autofocus_mtf51": {"min": 0}})", "camera_autofocus_mtf51: no measurement"),
+       {std::pair(R"({"camera_autofocus_mtf51": {"min": 0}})",
+                  "camera_autofocus_mtf51: no measurement has a figure of this name; did you mean"),
         {R"({"camera_autofocus_mtf50_vertical": {"min": 0, "unit": "px"}})", R"(its unit is "Nyquist", not "px")"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": "0"}})", "not a number"},
-        {R"({"camera_autofocus_mtf50_vertical": {"minimum": 0}})", "neither a bound nor a unit"},
+        {R"({"camera_autofocus_mtf50_vertical": {"minimum": 0}})",
+         "\"minimum\" is not known here; did you mean \"min\"?"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": 2, "max": 1}})", "its min lies above its max"},
+        {R"({"camera_autofocus_mtf50_vertical": {"min": 2, "marginal_min": 1}})",
+         "its min lies above its marginal_min"},
         {R"({"camera_autofocus_mtf50_vertical": {}})", "it has no bound"},
+        {R"({"camera_flash_mean": {"min": 1}})", "the limits hold none for camera_autofocus; they are of camera_flash"},
+        {R"({})", "nothing would be judged"},
         {R"({"camera_autofocus_mtf50_vertical": 5})", "not an object"},
         {R"({"camera_flash_mean": {"min": 1}, "camera_flash_mean": {"min": 2}})", "stands there twice"},
-        {R"([])", "no object"},
+        {R"([])", "a list, not an object"},
         {R"([)", "line 1: this is no JSON"}}) {
     set(limits);
     ExpectComplaint(judge, 2, complaint);
   }
+  folder_.Write("limits.json", R"({"name": 5, "limits": {"camera_flash_mean": {"min": 1}}})");
+  ExpectComplaint(judge, 2, "limits.json: name: is 5, not a text");
+
+  // What a limit asks for and nobody measured is no PASS: without a standard there is no difference.
+  set(R"({"camera_capture_delta_e_76_max": {"max": 3}})");
+  record = Record("capture photo.png --limits limits.json", 3);
+  EXPECT_EQ("ERROR", record["outcome"]);
+  EXPECT_EQ("UNSET", record["phases"][0]["measurements"]["camera_capture_delta_e_76_max"]["outcome"]);
 }
 
 TEST_F(Program, MissesSayWhy) {
@@ -148,13 +162,19 @@ TEST_F(Program, AThresholdIsSuggestedOnceItHasWorked) {
 
 TEST_F(Program, DoubtfulFindsNeverPass) {
   for (const auto& [third, status, finding] :
-       {std::tuple(cv::Point(500, 50), 1, "the find is doubtful: the legs between the marks are as 1.667 to 1"),
-        {cv::Point(795, 120), 1, "at 84.6 degrees"},
+       {std::tuple(cv::Point(500, 50), 3, "the find is doubtful: the legs between the marks are as 1.667 to 1"),
+        {cv::Point(795, 120), 3, "at 84.6 degrees"},
         {cv::Point(740, 105), 0, ""}}) {  // as 1.08 to 1, at 85.4 degrees: within bounds
     folder_.Write("marks.png", DrawMarks({900, 900}, 8, {{50, 50}, {50, 800}, third}));
-    EXPECT_EQ(status == 0 ? "PASS" : "FAIL", Record("circles marks.png", status)["outcome"]);
+    EXPECT_EQ(status == 0 ? "MEASURED" : "ERROR", Record("circles marks.png", status)["outcome"]);
     EXPECT_THAT(err_, HasSubstr(finding));
   }
+  folder_.Write("marks.png", DrawMarks({900, 900}, 8, {{50, 50}, {50, 800}, {500, 50}}));
+  folder_.Write("limits.json",
+                R"({"accept_doubts": ["implausible_marks"], "limits": {"circle_check_marks_found": {"min": 3}}})");
+  const json accepted = Record("circles marks.png --limits limits.json");
+  EXPECT_EQ("PASS", accepted["outcome"]);
+  EXPECT_EQ("accepted doubt", accepted["outcome_details"][0]["weight"]);
 }
 
 TEST_F(Program, BadInputIsACodeAndASentence) {

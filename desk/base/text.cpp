@@ -91,13 +91,19 @@ std::string DidYouMean(const std::string& word, const std::vector<std::string>& 
   std::size_t fewest = std::max<std::size_t>(1, word.size() / 3) + 1;
   const std::string* nearest = nullptr;
   for (const std::string& name : known) {
-    const std::size_t edits = Edits(word, name);
+    const bool begins = std::min(word.size(), name.size()) >= 3 && (word.find(name) == 0 || name.find(word) == 0);
+    const std::size_t edits = begins ? 1 : Edits(word, name);
     if (edits < fewest) {
       fewest = edits;
       nearest = &name;
     }
   }
   return nearest == nullptr ? "" : "; did you mean \"" + *nearest + "\"?";
+}
+
+std::size_t TextWidth(const std::string& text) {
+  return static_cast<std::size_t>(
+      std::count_if(text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0U) != 0x80U; }));
 }
 
 std::string Count(std::size_t count, const std::string& one, const std::string& many) {

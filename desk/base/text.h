@@ -18,6 +18,9 @@ std::string Shortened(const std::string& text, std::size_t most);
 /// "; did you mean \"limits\"?" with the known name that is nearest by edits, or nothing when none is near.
 std::string DidYouMean(const std::string& word, const std::vector<std::string>& known);
 
+/// Characters of a UTF-8 text: how wide it stands in a table.
+std::size_t TextWidth(const std::string& text);
+
 /// "1 photo", "2 photos"; a plural of its own where an s does not make one.
 std::string Count(std::size_t count, const std::string& one, const std::string& many = "");
 

@@ -9,6 +9,7 @@
 #include "chart/upright.h"
 #include "desk/base/text.h"
 #include "desk/drawing/picture.h"
+#include "desk/measure/doubts.h"
 #include "desk/measure/histogram.h"
 
 namespace qv {
@@ -216,6 +217,13 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
                       "not as 1 to 1 at 90; is the chart seen straight on, and nothing else like a mark?",
                       photo_path.c_str(), view.legs_ratio, view.legs_angle_deg),
                "legs_ratio");
+  }
+  if (LooksMirrored(found)) {
+    record.Say(Remark::kDoubt, "mirrored",
+               photo_path +
+                   ": the chart is mirrored: its dark rectangle lies on the other side of its marks; regions and "
+                   "patches are not where they are looked for",
+               "marks");
   }
   if (view.candidates > static_cast<int>(kMarks)) {
     record.Say(Remark::kWarning, "more_candidates",

@@ -73,15 +73,35 @@ cv::Mat Redrawn(const cv::Mat& noiseless, const cv::Mat& noise, const EdgeCurve&
   return picture;
 }
 
-}  // namespace
+constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
 
-Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
+// Of the whole region, in its stored levels.
+SlantedEdge EdgeOf(const cv::Mat& region) {
   CV_Assert(region.type() == CV_8UC1);
-  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
   const double right = region.cols - 0.5;
   const double bottom = region.rows - 0.5;
-  const SlantedEdge edge = LocateEdge(region, {{{-0.5, -0.5}, {right, -0.5}, {right, bottom}, {-0.5, bottom}}},
-                                      {Transfer::Kind::kLinear, 1});
+  return LocateEdge(region, {{{-0.5, -0.5}, {right, -0.5}, {right, bottom}, {-0.5, bottom}}},
+                    {Transfer::Kind::kLinear, 1});
+}
+
+}  // namespace
+
+NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
+  SlantedEdge edge = EdgeOf(region);
+  if (edge.reason != nullptr) return {kNone, kNone};
+  const double fall = std::max(std::fabs(edge.left.by_distance), std::fabs(edge.right.by_distance));
+  const double uneven = fall * edge.light.cols / std::fabs(edge.right.level - edge.left.level);
+  for (Plateau* plateau : {&edge.left, &edge.right}) plateau->by_distance = plateau->by_row = 0;
+  cv::Mat plain;
+  Noiseless(edge).convertTo(plain, CV_32F, 255);
+  if (plain.empty()) return {kNone, uneven};
+  cv::Mat turned = plain;
+  if (edge.lying) cv::transpose(plain, turned);
+  return {read(turned), uneven};
+}
+
+Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
+  const SlantedEdge edge = EdgeOf(region);
   const cv::Mat noiseless = edge.reason == nullptr ? Noiseless(edge) : cv::Mat();
   if (noiseless.empty()) return {kNone, kNone, kNone, kResamplingMethod};
   const cv::Mat noise = edge.light - noiseless;

@@ -19,6 +19,15 @@ inline constexpr int kResamplings = 50;
 /// @return the uncertainty of `read(region)`; NaN where no edge is found.
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read);
 
+struct NoiselessReading {
+  double value;       // NaN where no edge is found
+  double unevenness;  // by how much the light's fall across the region changes its plateaus, share of the edge's step
+};
+
+/// The figure of the region as it would be without noise, and in even light: what `read` gives of the edge spread
+/// alone.
+NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read);
+
 }  // namespace qv
 
 #endif  // QVTESTER_DESK_MEASURE_EDGE_RESAMPLING_H_

@@ -1,84 +1,74 @@
 #include "desk/measure/limits.h"
 
-#include <stdexcept>
+#include <array>
+#include <utility>
 
 #include "desk/base/failure.h"
-#include "desk/base/json.h"
+#include "desk/base/text.h"
 #include "desk/measure/figures.h"
 
 namespace qv {
 
 namespace {
 
-Limit ReadLimit(const std::string& where, const std::string& name, const Json& json) {
-  const auto refuse = [&](const std::string& why) { throw Failure(kWrongUsage, where + why); };
-  const FigureInfo* info = FindFigure(name);
-  if (info == nullptr) refuse("no measurement has this name");
-  if (info->figure->axis != nullptr) refuse("a list has no limits");
-  if (!json.is_object()) refuse("it is " + json.dump() + ", not an object of bounds");
-  Limit limit;
-  for (const auto& [key, value] : json.items()) {
-    if (key == "unit") {
-      const char* const unit = info->figure->unit.suffix;
-      if (value != unit) refuse(std::string("its unit is \"") + unit + "\", not " + value.dump());
-      continue;
-    }
-    std::optional<double>* const bound = key == "min"            ? &limit.min
-                                         : key == "max"          ? &limit.max
-                                         : key == "marginal_min" ? &limit.marginal_min
-                                         : key == "marginal_max" ? &limit.marginal_max
-                                                                 : nullptr;
-    if (bound == nullptr) refuse("\"" + key + "\" is neither a bound nor a unit");
-    if (!value.is_number()) refuse(key + " is " + value.dump() + ", not a number");
-    *bound = value.get<double>();
-  }
-  if (!limit.given()) refuse("it has no bound");
-  if (limit.min && limit.max && *limit.min > *limit.max) refuse("its min lies above its max");
-  return limit;
+constexpr std::array<std::pair<const char*, std::optional<double> Limit::*>, 4> kBounds = {
+    {{"min", &Limit::min},
+     {"max", &Limit::max},
+     {"marginal_min", &Limit::marginal_min},
+     {"marginal_max", &Limit::marginal_max}}};
+
+const FigureInfo& FigureOf(const JsonView& limits, const std::string& name) {
+  if (const FigureInfo* const info = FindFigure(name)) return *info;
+  std::vector<std::string> known;
+  for (const FigureInfo& info : AllFigures()) known.push_back(info.name);
+  limits.Refuse(Printable(name) + ": no measurement has a figure of this name" + DidYouMean(name, known));
 }
 
-// "decision": {"rule": "guarded", "factor": 1.0}; simple where there is none.
-DecisionRule ReadRule(const std::string& where, const Json& json) {
-  DecisionRule rule;
-  if (!json.contains("decision")) return rule;
-  const auto refuse = [&](const std::string& why) { throw Failure(kWrongUsage, where + why); };
-  const Json& decision = json["decision"];
-  if (!decision.is_object() || !decision.contains("rule"))
-    refuse("it is " + decision.dump() + ", not an object with a rule");
-  for (const auto& [key, value] : decision.items()) {
-    if (key == "rule") {
-      const auto kind = value.is_string() ? ParseDecisionRule(value.get<std::string>()) : std::nullopt;
-      if (!kind) refuse(value.dump() + " is none of simple, guarded, guarded_rejection");
-      rule.kind = *kind;
-    } else if (key == "factor") {
-      rule.factor = value.is_number() ? value.get<double>() : -1;
-      if (!(rule.factor > 0 && rule.factor <= 10))
-        refuse("factor is " + value.dump() + ", no number above 0 and up to 10");
-    } else {
-      refuse("\"" + key + "\" is neither rule nor factor");
-    }
+// An outer bound that lies inside another leaves nothing to pass, or nothing between them to be marginal.
+void RefuseDisorder(const JsonView& view, const Limit& limit) {
+  const auto above = [](const std::optional<double>& low, const std::optional<double>& high) {
+    return low && high && *low > *high;
+  };
+  if (above(limit.min, limit.max)) view.Refuse("its min lies above its max");
+  if (above(limit.min, limit.marginal_min)) view.Refuse("its min lies above its marginal_min");
+  if (above(limit.marginal_max, limit.max)) view.Refuse("its marginal_max lies above its max");
+  if (above(limit.marginal_min, limit.marginal_max)) view.Refuse("its marginal_min lies above its marginal_max");
+}
+
+Limit ReadLimit(const FigureInfo& info, const JsonView& view) {
+  if (info.figure->axis != nullptr) view.Refuse("a list has no limits");
+  view.KnowOnly({"min", "max", "marginal_min", "marginal_max", "unit"});
+  if (view.Has("unit")) {
+    const std::string unit = info.figure->unit.suffix;
+    const std::string given = view.At("unit").Text();
+    if (given != unit) view.Refuse("its unit is \"" + unit + "\", not \"" + Printable(given) + "\"");
   }
-  return rule;
+  Limit limit;
+  for (const auto& [name, bound] : kBounds) {
+    if (view.Has(name)) limit.*bound = view.At(name).Number();
+  }
+  if (!limit.given()) view.Refuse("it has no bound");
+  RefuseDisorder(view, limit);
+  return limit;
 }
 
 }  // namespace
 
-Limits ReadLimits(const std::string& path) {
-  try {
-    const Json json = ReadJson(path);
-    if (!json.is_object() || !json.contains("limits") || !json["limits"].is_object()) {
-      throw std::runtime_error("it holds no object \"limits\"");
-    }
-    Limits limits = {json.value("name", ""), json.value("revision", ""), ReadRule(path + ": decision: ", json), {}};
-    for (const auto& [name, limit] : json["limits"].items()) {
-      limits.by_name[name] = ReadLimit(path + ": limit of " + name + ": ", name, limit);
-    }
-    return limits;
-  } catch (const Failure&) {
-    throw;
-  } catch (const std::exception& e) {
-    throw Failure(kWrongUsage, path + ": not a limits file (" + e.what() + ")");
+Limits ReadLimits(const std::string& path) { return LimitsFromJson(ReadJson(path), Printable(path)); }
+
+Limits LimitsFromJson(const Json& json, const std::string& where) {
+  const JsonView view(json, where);
+  view.KnowOnly({"name", "revision", "limits", "accept_doubts"});
+  Limits limits;
+  if (view.Has("name")) limits.name = view.At("name").Text();
+  if (view.Has("revision")) limits.revision = view.At("revision").Text();
+  if (view.Has("accept_doubts")) {
+    for (const JsonView& doubt : view.At("accept_doubts").Elements()) limits.accept_doubts.insert(doubt.Text());
   }
+  const JsonView all = view.At("limits");
+  for (const auto& [name, limit] : all.Members()) limits.by_name[name] = ReadLimit(FigureOf(all, name), limit);
+  if (limits.by_name.empty()) all.Refuse("is empty; nothing would be judged");
+  return limits;
 }
 
 }  // namespace qv

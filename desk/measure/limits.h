@@ -3,9 +3,10 @@
 
 #include <map>
 #include <optional>
+#include <set>
 #include <string>
 
-#include "desk/measure/decision.h"
+#include "desk/base/json.h"
 
 namespace qv {
 
@@ -17,14 +18,17 @@ struct Limit {
 
 struct Limits {
   std::string name, revision;
-  DecisionRule rule;
   std::map<std::string, Limit> by_name;
+  std::set<std::string> accept_doubts;  // names of doubts that this plant lives with
 
   bool given() const { return !by_name.empty(); }
 };
 
 /// Reads a limits file; throws Failure (wrong usage) that names the file and what is wrong with it.
 Limits ReadLimits(const std::string& path);
+
+/// The same from a document; `where` names it in sentences.
+Limits LimitsFromJson(const Json& json, const std::string& where);
 
 }  // namespace qv
 

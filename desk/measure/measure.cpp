@@ -1,15 +1,16 @@
 #include "desk/measure/measure.h"
 
+#include <algorithm>
 #include <mutex>
 #include <optional>
 
 #include "desk/base/clock.h"
+#include "desk/base/failure.h"
 #include "desk/base/log_lines.h"
 #include "desk/measure/guarded.h"
 #include "desk/measure/load.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
-#include "desk/measure/repeats.h"
 #include "qvtester/host_properties.h"
 
 namespace qv {
@@ -66,6 +67,16 @@ Json PropertiesOf(const Spec& spec, const Request& request) {
   return CheckedProperties(properties);
 }
 
+// Limits of other measurements alone would let this one pass unjudged.
+void RefuseForeignLimits(const Spec& spec, const Limits& limits) {
+  const bool own = std::any_of(limits.by_name.begin(), limits.by_name.end(),
+                               [&](const auto& limit) { return FindFigure(limit.first)->measurement == spec.name; });
+  if (limits.given() && !own) {
+    throw Failure(kWrongUsage, std::string("the limits hold none for ") + spec.name + "; they are of " +
+                                   FindFigure(limits.by_name.begin()->first)->measurement);
+  }
+}
+
 Record NewRecord(const Request& request, const Spec& spec, const Limits& limits) {
   Record record;
   record.start_millis = MillisSinceEpoch();
@@ -78,10 +89,13 @@ Record NewRecord(const Request& request, const Spec& spec, const Limits& limits)
   return record;
 }
 
-// Not judged yet.
-Record MeasureOnce(QVTester& tester, const Request& resolved, const Limits& limits) {
+}  // namespace
+
+Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
+  const Request resolved = Resolved(request);
   const Measurement& measurement = *FindMeasurement(resolved.measurement);
   const Spec& spec = measurement.spec();
+  RefuseForeignLimits(spec, limits);
   Record record = NewRecord(resolved, spec, limits);
   LogCollector log;
   std::optional<Unpublished> unpublished;
@@ -101,26 +115,9 @@ Record MeasureOnce(QVTester& tester, const Request& resolved, const Limits& limi
     SayCause(record, log.lines());
   }
   record.properties = PropertiesOffDefault(tester);
+  record.Judge();
   record.log_lines = std::move(log.lines());
   record.end_millis = MillisSinceEpoch();
-  return record;
-}
-
-}  // namespace
-
-Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
-  const Request resolved = Resolved(request);
-  Record record = MeasureOnce(tester, resolved, limits);
-  std::vector<Record> others;
-  for (const Input& photo : resolved.repeats) {
-    Request again = resolved;
-    again.repeats.clear();
-    again.inputs.at(0) = photo;
-    QVTester fresh;
-    others.push_back(MeasureOnce(fresh, again, limits));
-  }
-  if (!others.empty()) JoinRepeats(record, others);
-  record.Judge();
   return record;
 }
 

@@ -2,6 +2,7 @@
 #define QVTESTER_DESK_MEASURE_RECORD_H_
 
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <string>
@@ -9,7 +10,6 @@
 
 #include "desk/base/json.h"
 #include "desk/base/log_lines.h"
-#include "desk/measure/decision.h"
 #include "desk/measure/figures.h"
 #include "desk/measure/limits.h"
 #include "desk/measure/request.h"
@@ -23,28 +23,24 @@ class Finding;
 
 inline constexpr const char kRecordSchema[] = "qvtester-record-1";
 
-enum class Outcome { kPass, kFail, kError, kUnset };
+/// A figure: PASS or FAIL only against a limit, MEASURED without one, UNSET when a limit asks for it and it was not
+/// measured. A run: ERROR when it could not measure, lacks a figure that a limit asks for, or is in doubt; else FAIL
+/// with a broken limit; else PASS with at least one limit; else MEASURED.
+enum class Outcome { kPass, kFail, kMeasured, kError, kUnset };
 const char* Name(Outcome outcome);
 
 /// A figure's value.
 struct Reading {
   const FigureInfo* info = nullptr;
-  std::vector<double> values;              // one, or those of a list
-  std::vector<double> axis;                // of a list: frequencies in units of Nyquist, or columns
-  std::vector<double> repeats;             // of several photos of one unit: what a single value is the median of
-  std::vector<Uncertainty> uncertainties;  // one, or one for each value; none where nothing is known
-  std::optional<Decision> decision;        // how the verdict came about, where a limit is set
+  std::vector<double> values;  // one, or those of a list
+  std::vector<double> axis;    // of a list: frequencies in units of Nyquist, or columns
+  std::optional<Uncertainty> uncertainty;
   Limit limit;
-  Outcome outcome = Outcome::kPass;
+  Outcome outcome = Outcome::kMeasured;
   bool marginal = false;
 
-  double value() const { return values.at(0); }
-  /// Of a single value; zero where nothing is known.
-  Uncertainty uncertainty() const { return uncertainties.size() == 1 ? uncertainties[0] : Uncertainty(); }
-  /// Keeps them where they say something: all must be numbers.
-  void Trust(std::vector<Uncertainty> known);
-  /// Holds the value against its limit.
-  void Judge(const DecisionRule& rule);
+  /// NaN where it was not measured.
+  double value() const { return values.empty() ? std::numeric_limits<double>::quiet_NaN() : values[0]; }
 };
 
 struct Attachment {
@@ -62,7 +58,6 @@ struct Phase {
   Reading& Add(const std::string& figure, double value);
   Reading& Add(const std::string& figure, std::vector<double> axis, std::vector<double> values);
   const Reading* Find(const std::string& figure) const;
-  Reading* Find(const std::string& figure);
 
  private:
   Reading& New(const std::string& figure);
@@ -81,7 +76,8 @@ struct Remark {
   enum Weight {
     kWarning,      // worth knowing
     kMiss,         // why there is no result
-    kDoubt,        // measured, but not to be trusted: never a PASS
+    kDoubt,        // measured, but not to be trusted: an ERROR
+    kAccepted,     // a doubt that the limits file accepts
     kNoJudgement,  // the test ran, but its figures say nothing about the unit
   };
   Weight weight;
@@ -116,6 +112,8 @@ struct Record {
   Outcome outcome() const;
   /// Code 1, and nothing that forbids a judgement.
   bool measured() const;
+  /// Measured, but not to be trusted.
+  bool doubtful() const;
   bool marginal() const;
   bool limited() const;  // some figure of this test has a limit
   /// Why it could not be measured: where, why, which code, what to do about it.

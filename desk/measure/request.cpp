@@ -100,13 +100,11 @@ Json ToJson(const Request& request) {
       inputs.push_back(path);
     }
   }
-  Json json = {{"measurement", request.measurement},
-               {"inputs", inputs},
-               {"parameters", parameters},
-               {"properties", request.properties},
-               {"fake", request.fake}};
-  for (const Input& input : request.repeats) json["repeats"].push_back(input.is_path() ? Json(input.name) : Json());
-  return json;
+  return {{"measurement", request.measurement},
+          {"inputs", inputs},
+          {"parameters", parameters},
+          {"properties", request.properties},
+          {"fake", request.fake}};
 }
 
 Request RequestFromJson(const Json& json) {
@@ -119,11 +117,11 @@ Request RequestFromJson(const Json& json) {
     if (key == "measurement") {
       want(value.is_string(), "a name");
       request.measurement = value.get<std::string>();
-    } else if (key == "inputs" || key == "repeats") {
+    } else if (key == "inputs") {
       want(value.is_array(), "a list of paths");
       for (const Json& path : value) {
         want(path.is_string(), "a list of paths");
-        (key == "inputs" ? request.inputs : request.repeats).emplace_back(path.get<std::string>());
+        request.inputs.emplace_back(path.get<std::string>());
       }
     } else if (key == "parameters" || key == "properties") {
       want(value.is_object(), "an object");

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <sstream>
 #include <unordered_map>
 
 namespace qv {
@@ -15,19 +16,6 @@ constexpr const char* kOutcomes[] = {"MEASURED", "PASS", "FAIL", "ABORTED", "ERR
 std::size_t Rank(const std::string& outcome) {
   return static_cast<std::size_t>(std::find(std::begin(kOutcomes), std::end(kOutcomes), outcome) -
                                   std::begin(kOutcomes));
-}
-
-// Names of the doubts that made a run an ERROR; one that nobody can accept is "".
-std::set<std::string> DoubtsOf(const Json& record) {
-  std::set<std::string> doubts;
-  const auto details = record.find("outcome_details");
-  if (details == record.end() || !details->is_array()) return doubts;
-  for (const Json& detail : *details) {
-    const std::string weight = TextAt(detail, "weight");
-    if (weight == "warning" || weight == "miss") continue;
-    doubts.insert(weight == "doubt" ? TextAt(detail, "name") : "");
-  }
-  return doubts;
 }
 
 // What a run's figures come to under one set of limits.
@@ -63,8 +51,12 @@ class Judge {
     }
     return asked->second;
   }
-  bool Accepts(const std::set<std::string>& doubts) const {
-    return std::includes(limits_.accepted_doubts.begin(), limits_.accepted_doubts.end(), doubts.begin(), doubts.end());
+  bool Accepts(const std::string& doubts) const {
+    std::istringstream names(doubts);
+    for (std::string name; names >> name;) {
+      if (limits_.accepted_doubts.count(name) == 0) return false;
+    }
+    return true;
   }
 
  private:
@@ -85,8 +77,7 @@ struct RunVerdict {
   std::vector<std::string> missing;
 };
 
-RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::string>& names,
-                   const std::set<std::string>* doubts) {
+RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::string>& names) {
   RunVerdict verdict;
   int passed = 0;
   bool failed = false;
@@ -106,7 +97,7 @@ RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::s
     });
     if (!there) verdict.missing.push_back(name);
   }
-  const bool doubted = doubts != nullptr && !judge.Accepts(*doubts);
+  const bool doubted = !judge.Accepts(run.row->doubts);
   const bool measured = run.row->result_code == 1;
   verdict.outcome = run.row->outcome == "ABORTED"                               ? "ABORTED"
                     : !measured || doubted || unset || !verdict.missing.empty() ? "ERROR"
@@ -162,7 +153,7 @@ namespace {
 // Holds what grows while runs are judged.
 class Session {
  public:
-  Session(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against)
+  Session(Store& store, const ArchiveLimits& now, const ArchiveLimits* against)
       : quantities_(store.Quantities()), now_(now, quantities_) {
     if (against != nullptr) before_.emplace(*against, quantities_);
     for (const Quantity& quantity : quantities_) {
@@ -171,11 +162,6 @@ class Session {
       names_[static_cast<std::size_t>(quantity.id)] = quantity.name;
       units_[static_cast<std::size_t>(quantity.id)] = quantity.unit;
     }
-    Selection doubtful = selection;
-    doubtful.push_back({"outcome", "=", "ERROR"});
-    store.EachRun(doubtful, false, [&](const RunRow& row, StoredRun&& run) {
-      if (std::set<std::string> doubts = DoubtsOf(run.record); !doubts.empty()) doubts_[row.id] = std::move(doubts);
-    });
     for (const auto& [name, bounds] : now.by_name) {
       if (std::find(names_.begin(), names_.end(), name) == names_.end()) result.idle_limits.push_back(name);
     }
@@ -183,10 +169,8 @@ class Session {
 
   void Take(const RunFigures& run) {
     const RunRow& row = *run.row;
-    const auto doubts = doubts_.find(row.id);
-    const std::set<std::string>* const doubted = doubts == doubts_.end() ? nullptr : &doubts->second;
-    const RunVerdict after = Verdict(now_, run, names_, doubted);
-    const RunVerdict before = before_ ? Verdict(*before_, run, names_, doubted) : RunVerdict{row.outcome, {}, {}};
+    const RunVerdict after = Verdict(now_, run, names_);
+    const RunVerdict before = before_ ? Verdict(*before_, run, names_) : RunVerdict{row.outcome, {}, {}};
     for (std::size_t i = 0; i < run.figures.size(); ++i) {
       const FigureRow& figure = run.figures[i];
       const auto quantity = static_cast<std::size_t>(figure.quantity);
@@ -237,7 +221,6 @@ class Session {
   Judge now_;
   std::optional<Judge> before_;
   std::vector<std::string> names_, units_;  // by quantity
-  std::unordered_map<std::int64_t, std::set<std::string>> doubts_;
   std::map<std::pair<std::string, std::size_t>, JudgedFigure> figures_;
   UnitVerdicts units_before_, units_after_;
 };
@@ -245,7 +228,7 @@ class Session {
 }  // namespace
 
 Judgement JudgeAgain(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against) {
-  Session session(store, selection, now, against);
+  Session session(store, now, against);
   if (session.result.idle_limits.size() == now.by_name.size()) {
     throw Failure(kWrongUsage, store.name() + ": no run measures anything that these limits hold for");
   }

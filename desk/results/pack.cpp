@@ -37,10 +37,11 @@ std::string FromBase64(const std::string& text) {
   return bytes;
 }
 
-std::string Pack(const std::string& text) {
+std::string Pack(const std::string& text, Effort effort) {
   std::string packed(compressBound(text.size()), '\0');
   uLongf size = packed.size();
-  if (compress2(Bytes(packed), &size, Bytes(text), text.size(), Z_BEST_SPEED) != Z_OK) {
+  if (compress2(Bytes(packed), &size, Bytes(text), text.size(),
+                effort == Effort::kFast ? Z_BEST_SPEED : Z_DEFAULT_COMPRESSION) != Z_OK) {
     throw Failure(kInternalFault, "a record can't be compressed");
   }
   packed.resize(size);

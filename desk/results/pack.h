@@ -11,7 +11,8 @@ std::string Base64(const std::string& bytes);
 std::string FromBase64(const std::string& text);
 
 /// zlib's format in Base64, so that it is plain text in every database.
-std::string Pack(const std::string& text);
+enum class Effort { kFast, kSmall };
+std::string Pack(const std::string& text, Effort effort = Effort::kFast);
 /// Throws Failure (internal fault) where it was not packed, or is over 256 MB.
 std::string Unpack(const std::string& packed);
 

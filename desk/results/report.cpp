@@ -260,7 +260,7 @@ std::string Report::Html() const {
   const std::string page = ReportPage();
   const std::string mark = "<!--data-->";  // the page holds it once; what stands there is Base64, never HTML
   const std::size_t at = page.find(mark);
-  return page.substr(0, at) + Pack(Data().dump(-1, ' ', false, Json::error_handler_t::replace)) +
+  return page.substr(0, at) + Pack(Data().dump(-1, ' ', false, Json::error_handler_t::replace), Effort::kSmall) +
          page.substr(at + mark.size());
 }
 

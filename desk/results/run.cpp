@@ -52,6 +52,19 @@ std::string TextAt(const Json& object, const char* name) {
   return value.is_string() ? value.get<std::string>() : std::string();
 }
 
+std::set<std::string> DoubtsOf(const Json& record) {
+  std::set<std::string> doubts;
+  const Json& details = At(record, "outcome_details");
+  if (!details.is_array()) return doubts;
+  for (const Json& detail : details) {
+    const std::string weight = TextAt(detail, "weight");
+    const std::string name = TextAt(detail, "name");
+    const bool doubt = weight == "doubt" || weight == "accepted doubt";
+    if (doubt || weight == "no judgement") doubts.insert(doubt && !name.empty() ? name : "?");
+  }
+  return doubts;
+}
+
 std::string RunKey(const Json& record, const Filing& filing) {
   const Json& metadata = At(record, "metadata");
   nlohmann::json parts;  // sorted: the order of members is nobody's affair

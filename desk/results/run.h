@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <map>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -57,6 +58,10 @@ struct StoredFigure {
 
 /// The figures of a record, in its order; throws Failure (wrong usage) where the record is none.
 std::vector<StoredFigure> FiguresOf(const Json& record);
+
+/// Names of what there is to doubt, accepted or not, in order. "?" stands for what nobody can accept: a run that can't
+/// be judged, and a sentence without a name.
+std::set<std::string> DoubtsOf(const Json& record);
 
 /// Text of a record's member, or nothing.
 std::string TextAt(const Json& object, const char* name);

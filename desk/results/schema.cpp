@@ -9,7 +9,8 @@ const std::vector<std::string> kTables = {
         operator text NOT NULL, lot text NOT NULL, plan text NOT NULL, step text NOT NULL, measurement text
         NOT NULL, outcome text NOT NULL, marginal integer NOT NULL, result_code integer NOT NULL,
         start_millis bigint NOT NULL, end_millis bigint NOT NULL, library_version text NOT NULL, limits_name
-        text NOT NULL, limits_revision text NOT NULL, input_hash text NOT NULL, record text NOT NULL))",
+        text NOT NULL, limits_revision text NOT NULL, input_hash text NOT NULL, doubts text
+        NOT NULL, record text NOT NULL))",
     R"(CREATE TABLE run_column (run bigint NOT NULL REFERENCES run (id), name text NOT NULL, value text NOT
         NULL, PRIMARY KEY (run, name)))",
     R"(CREATE TABLE quantity (id {id}, name text NOT NULL, unit text NOT NULL, method text NOT NULL,

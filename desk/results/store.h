@@ -22,6 +22,7 @@ struct RunRow {
   int result_code = 0;
   std::int64_t start_millis = 0, end_millis = 0;
   std::string library_version, limits_name, limits_revision, input_hash;
+  std::string doubts;  // of DoubtsOf, with blanks between
 };
 
 /// What is measured, in which unit, how: figures are compared only within one of these.

@@ -37,6 +37,7 @@ constexpr RunColumn kRunColumns[] = {
     {"limits_name", "r.limits_name", Kind::kText},
     {"limits_revision", "r.limits_revision", Kind::kText},
     {"input_hash", "r.input_hash", Kind::kText},
+    {"doubts", "r.doubts", Kind::kText},
     {"key", "r.key", Kind::kText},
 };
 
@@ -158,7 +159,8 @@ class Query {
 
 constexpr char kRowColumns[] =
     "r.id, r.key, r.unit, r.station, r.operator, r.lot, r.plan, r.step, r.measurement, r.outcome, r.marginal,"
-    " r.result_code, r.start_millis, r.end_millis, r.library_version, r.limits_name, r.limits_revision, r.input_hash";
+    " r.result_code, r.start_millis, r.end_millis, r.library_version, r.limits_name, r.limits_revision, r.input_hash, "
+    "r.doubts";
 
 // Where a row's columns land.
 struct RowBuffer {
@@ -173,7 +175,8 @@ struct RowBuffer {
       query.Into(*text);
     }
     query.Into(marginal).Into(row.result_code).Into(start).Into(end);
-    for (std::string* text : {&row.library_version, &row.limits_name, &row.limits_revision, &row.input_hash}) {
+    for (std::string* text :
+         {&row.library_version, &row.limits_name, &row.limits_revision, &row.input_hash, &row.doubts}) {
       query.Into(*text);
     }
   }

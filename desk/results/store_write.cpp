@@ -63,9 +63,10 @@ RunRow RowOf(const StoredRun& run) {
   row.limits_name = TextAt(At(metadata, "limits"), "name");
   row.limits_revision = TextAt(At(metadata, "limits"), "revision");
   row.input_hash = InputHash(record);
+  for (const std::string& doubt : DoubtsOf(record)) row.doubts += (row.doubts.empty() ? "" : " ") + doubt;
   for (std::string* text :
        {&row.key, &row.unit, &row.station, &row.operator_name, &row.lot, &row.plan, &row.step, &row.measurement,
-        &row.outcome, &row.library_version, &row.limits_name, &row.limits_revision, &row.input_hash}) {
+        &row.outcome, &row.library_version, &row.limits_name, &row.limits_revision, &row.input_hash, &row.doubts}) {
     *text = Clean(*text);
   }
   return row;
@@ -101,17 +102,17 @@ QuantityKey KeyOf(const StoredFigure& figure) { return {figure.name, figure.unit
 }  // namespace
 
 Store::Database::Inserts::Inserts(soci::session& session)
-    : add_run(
-          (session.prepare << "INSERT INTO run (key, unit, station, operator, lot, plan, step, measurement, outcome,"
-                              " marginal, result_code, start_millis, end_millis, library_version, limits_name,"
-                              " limits_revision, input_hash, record) VALUES (:key, :unit, :station, :operator, :lot,"
-                              " :plan, :step, :measurement, :outcome, :marginal, :code, :start, :end, :version,"
-                              " :limits, :revision, :hash, :record) ON CONFLICT (key) DO NOTHING",
-           soci::use(run.key), soci::use(run.unit), soci::use(run.station), soci::use(run.operator_name),
-           soci::use(run.lot), soci::use(run.plan), soci::use(run.step), soci::use(run.measurement),
-           soci::use(run.outcome), soci::use(run_marginal), soci::use(run_code), soci::use(start), soci::use(end),
-           soci::use(run.library_version), soci::use(run.limits_name), soci::use(run.limits_revision),
-           soci::use(run.input_hash), soci::use(record))),
+    : add_run((session.prepare
+                   << "INSERT INTO run (key, unit, station, operator, lot, plan, step, measurement, outcome,"
+                      " marginal, result_code, start_millis, end_millis, library_version, limits_name,"
+                      " limits_revision, input_hash, doubts, record) VALUES (:key, :unit, :station, :operator, :lot,"
+                      " :plan, :step, :measurement, :outcome, :marginal, :code, :start, :end, :version,"
+                      " :limits, :revision, :hash, :doubts, :record) ON CONFLICT (key) DO NOTHING",
+               soci::use(run.key), soci::use(run.unit), soci::use(run.station), soci::use(run.operator_name),
+               soci::use(run.lot), soci::use(run.plan), soci::use(run.step), soci::use(run.measurement),
+               soci::use(run.outcome), soci::use(run_marginal), soci::use(run_code), soci::use(start), soci::use(end),
+               soci::use(run.library_version), soci::use(run.limits_name), soci::use(run.limits_revision),
+               soci::use(run.input_hash), soci::use(run.doubts), soci::use(record))),
       find_run((session.prepare << "SELECT id FROM run WHERE key = :key", soci::use(run.key), soci::into(id))),
       add_figure((session.prepare << "INSERT INTO figure (run, quantity, value, non_finite, uncertainty, outcome,"
                                      " marginal, min, max, marginal_min, marginal_max) VALUES (:run, :quantity, :value,"

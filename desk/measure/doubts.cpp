@@ -1,0 +1,116 @@
+#include "desk/measure/doubts.h"
+
+#include <algorithm>
+#include <cmath>
+#include <numeric>
+#include <opencv2/imgproc.hpp>
+#include <vector>
+
+#include "chart/chart_layout.h"
+
+namespace qv {
+
+namespace {
+
+constexpr int kLevels = 256;
+constexpr int kFewestPixels = 200;     // of a side, to say anything of it
+constexpr double kShareAtEnd = 0.01;   // of pixels at a level that ends the range
+constexpr double kShareInside = 0.05;  // at another: of noise about one level, the outermost holds far less
+constexpr double kLeastNoise = 1;      // levels
+
+struct Pixels {
+  std::vector<int> levels;
+  std::vector<int> steps;  // to the right neighbour, where that is one of them
+};
+
+// Of one channel inside the outline, and above, or below, the middle of its levels.
+Pixels SideOf(const cv::Mat& channel, const cv::Mat& inside, int middle, bool top) {
+  Pixels side;
+  for (int i = 0; i < channel.rows; ++i) {
+    const auto* level = channel.ptr<uchar>(i);
+    const auto* in = inside.ptr<uchar>(i);
+    const auto belongs = [&](int j) { return in[j] != 0 && (level[j] > middle) == top; };
+    for (int j = 0; j < channel.cols; ++j) {
+      if (!belongs(j)) continue;
+      side.levels.push_back(level[j]);
+      if (j + 1 < channel.cols && belongs(j + 1)) side.steps.push_back(std::abs(level[j + 1] - level[j]));
+    }
+  }
+  return side;
+}
+
+// Standard deviation from the mean step between neighbours: 2 sigma / sqrt(pi) for independent noise.
+double NoiseOf(const Pixels& side) {
+  if (side.steps.empty()) return 0;
+  const double sum = std::accumulate(side.steps.begin(), side.steps.end(), 0.0);
+  return sum / static_cast<double>(side.steps.size()) * std::sqrt(CV_PI) / 2;
+}
+
+std::optional<LevelPile> PileOf(const Pixels& side, bool top, int channel) {
+  if (side.levels.size() < kFewestPixels) return std::nullopt;
+  const auto [lowest, highest] = std::minmax_element(side.levels.begin(), side.levels.end());
+  const int level = top ? *highest : *lowest;
+  const double share = static_cast<double>(std::count(side.levels.begin(), side.levels.end(), level)) /
+                       static_cast<double>(side.levels.size());
+  const bool at_end = top ? level == kLevels - 1 : level == 0;
+  const bool piled = at_end ? share > kShareAtEnd : share > kShareInside && NoiseOf(side) >= kLeastNoise;
+  return piled ? std::optional<LevelPile>({level, top, channel, share}) : std::nullopt;
+}
+
+// Mean grey level about a place of the chart, in chart units.
+std::optional<double> LevelAt(const FoundChart& found, double x, double y) {
+  constexpr int kHalf = 3;  // pixels
+  const auto place = [](const QVFinderPattern& mark) { return cv::Point2d(mark.x, mark.y); };
+  const cv::Point2d corner = place(found.marks[0]);
+  const cv::Point2d at =
+      corner + (x * (place(found.marks[1]) - corner) + y * (place(found.marks[2]) - corner)) / kChartSide;
+  const cv::Rect about(cvRound(at.x) - kHalf, cvRound(at.y) - kHalf, 2 * kHalf + 1, 2 * kHalf + 1);
+  if ((about & cv::Rect({}, found.gray.size())) != about) return std::nullopt;
+  return cv::mean(found.gray(about))[0];
+}
+
+}  // namespace
+
+std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
+  std::vector<cv::Point> corners;
+  for (const cv::Point2d& corner : outline) corners.emplace_back(cvRound(corner.x), cvRound(corner.y));
+  const cv::Rect bounds = cv::boundingRect(corners) & cv::Rect({}, photo.size());
+  if (bounds.empty()) return std::nullopt;
+  for (cv::Point& corner : corners) corner -= bounds.tl();
+  cv::Mat inside(bounds.size(), CV_8UC1, cv::Scalar(0));
+  cv::fillConvexPoly(inside, corners, cv::Scalar(255));
+  std::vector<cv::Mat> channels;
+  cv::split(photo(bounds), channels);
+  std::optional<LevelPile> worst;
+  for (int channel = 0; channel < std::min<int>(3, static_cast<int>(channels.size())); ++channel) {
+    double lowest = 0;
+    double highest = 0;
+    cv::minMaxLoc(channels[channel], &lowest, &highest, nullptr, nullptr, inside);
+    const int middle = cvFloor((lowest + highest) / 2);
+    for (const bool top : {true, false}) {
+      const std::optional<LevelPile> pile = PileOf(SideOf(channels[channel], inside, middle, top), top, channel);
+      if (pile && (!worst || pile->share > worst->share)) worst = pile;
+    }
+  }
+  return worst;
+}
+
+bool LooksMirrored(const FoundChart& found) {
+  if (found.marks.size() != kMarks || found.gray.empty()) return false;
+  // Four places in the dark rectangle, and where a mirror would put them.
+  const std::array<cv::Point2d, 4> rectangle = EdgeTarget();
+  int dark_there = 0;
+  int dark_mirrored = 0;
+  const cv::Point2d middle = (rectangle[0] + rectangle[2]) / 2;
+  for (const cv::Point2d& corner : rectangle) {
+    const cv::Point2d at = (middle + corner) / 2;
+    const std::optional<double> there = LevelAt(found, at.x, at.y);
+    const std::optional<double> mirrored = LevelAt(found, at.y, at.x);
+    if (!there || !mirrored) return false;
+    dark_there += *there <= found.threshold ? 1 : 0;
+    dark_mirrored += *mirrored <= found.threshold ? 1 : 0;
+  }
+  return dark_mirrored >= 3 && dark_there <= 1;
+}
+
+}  // namespace qv

@@ -1,0 +1,33 @@
+#ifndef QVTESTER_DESK_MEASURE_DOUBTS_H_
+#define QVTESTER_DESK_MEASURE_DOUBTS_H_
+
+#include <array>
+#include <opencv2/core.hpp>
+#include <optional>
+
+#include "qvtester/tester.h"
+
+namespace qv {
+
+// Signs in a photo that a figure of it would be wrong.
+
+/// Levels that pile up where they end: light was cut off, by the sensor or by what came after it.
+struct LevelPile {
+  int level;
+  bool top;      // else at the dark end
+  int channel;   // blue, green, red
+  double share;  // of the region's light, or dark, pixels
+};
+
+/// The worst pile of a region that shows dark and light; outline: corners, column and row. A photo of less noise than a
+/// level tells nothing below the ends of its range: flat paper is no pile there.
+///
+/// @param photo  rows x cols, 8 bits, one, three or four channels.
+std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline);
+
+/// Whether the chart is seen in a mirror: its three marks look the same, its dark rectangle lies on the other side.
+bool LooksMirrored(const FoundChart& found);
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_DOUBTS_H_

@@ -1,0 +1,180 @@
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <map>
+#include <string>
+#include <thread>
+
+#include "desk/base/files.h"
+#include "desk/batch/batch.h"
+#include "unit_tests/drawing.h"
+
+namespace qv {
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+std::string Sentence(const std::function<void()>& call) {
+  try {
+    call();
+  } catch (const Failure& failure) {
+    return failure.what();
+  }
+  return "no failure";
+}
+
+TEST(Plans, WhatCantBeRunAsItStandsIsRefused) {
+  const TemporaryFolder folder;
+  const std::string limits = R"("limits": {"limits": {"camera_flash_mean": {"min": 1}}})";
+  const std::string step = R"({"measurement": "camera_autofocus", "inputs": ["{unit}.jpg"]})";
+  const std::pair<std::string, const char*> kRefused[] = {
+      {R"({"name": "", "steps": [)" + step + "]}", "name: is empty"},
+      {R"({"steps": [)" + step + "]}", "holds no \"name\""},
+      {R"({"name": "a", "steps": []})", "nothing would be measured"},
+      {R"({"name": "a", "stop": true, "steps": [)" + step + "]}", "\"stop\" is not known here"},
+      {R"({"name": "a", "steps": [)" + step + "," + step + "]}",
+       "steps[1]: the name \"camera_autofocus\" is given twice"},
+      {R"({"name": "a", "steps": [{"measurement": "autofocus", "inputs": []}]})", "steps[0]: autofocus: no such"},
+      {R"({"name": "a", "steps": [{"measurement": "camera_flash", "inputs": ["a", "b"]}]})", "2 inputs given"},
+      {R"({"name": "a", "steps": [{"measurement": "camera_flash", "inputs": ["a"], "parameters": {"x": 1}}]})",
+       "no parameter x"},
+      {R"({"name": "a", "steps": [{"measurement": "camera_flash", "inputs": ["a"], "properties": {"999": 1}}]})",
+       "999"},
+      {R"({"name": "a", )" + limits + R"(, "steps": [)" + step + "]}", "camera_flash_mean, which no step measures"},
+  };
+  for (const auto& [plan, complaint] : kRefused) {
+    const std::string path = folder.Write("plan.json", plan);
+    EXPECT_THAT(Sentence([&] { ReadPlan(path); }), AllOf(HasSubstr("plan.json"), HasSubstr(complaint))) << plan;
+  }
+  const Plan plan = ReadPlan(folder.Write("plan.json", R"({"name": "a", "steps": [)" + step + "]}"));
+  EXPECT_EQ(folder.Path("sn1.jpg"), RequestFor(plan, plan.steps[0], "sn1").inputs.at(0).name);
+  EXPECT_THAT(Sentence([&] { RequestFor(plan, plan.steps[0], "../sn1"); }),
+              HasSubstr("leads out of the plan's folder"));
+  EXPECT_EQ("no failure", Sentence([&] { ReadPlan(folder.Write("new.json", NewPlan())); }));
+}
+
+TEST(Manifests, RowsBecomeJobs) {
+  const std::vector<Job> jobs = JobsOfManifest(
+      "\xef\xbb\xbfpath,unit,lot,\"my, column\"\r\na.jpg,,L1,\"say \"\"hi\"\"\nthere\"\r\n\r\nb.jpg,SN2,,\r\n", "m",
+      "/lots");
+  ASSERT_EQ(2U, jobs.size());
+  EXPECT_EQ("a", jobs[0].unit);
+  EXPECT_THAT(jobs[0].inputs, ElementsAre("/lots/a.jpg"));
+  EXPECT_THAT(jobs[0].columns, ElementsAre(std::pair("my, column", "say \"hi\"\nthere")));
+  EXPECT_EQ("SN2", jobs[1].unit);
+  EXPECT_EQ(7U, std::stoul(JobsOfManifest(R"({"path": "a", "n": 7})", "m", "").at(0).columns.at("n")));
+  EXPECT_EQ("m: row 2: 1 values for 2 columns", Sentence([] { JobsOfManifest("path,unit\na,b\nc\n", "m", ""); }));
+  EXPECT_THAT(Sentence([] { JobsOfManifest("path\n\"a", "m", ""); }), HasSubstr("a quote stays open"));
+  EXPECT_THAT(Sentence([] { JobsOfManifest("{\"unit\": \"a\"}\n{\"unit\"", "m", ""); }), HasSubstr("m: row 2"));
+  for (const char* shard : {"0/2", "3/2", "1", "1/0", "-1/2", "1/2x"})
+    EXPECT_THROW(ParseShard(shard), Failure) << shard;
+}
+
+TEST(Manifests, ShardsShareOutEveryJobOnce) {
+  std::map<unsigned, int> taken;
+  for (int i = 0; i < 300; ++i) {
+    Job job;
+    job.unit = "SN" + std::to_string(i);
+    int times = 0;
+    for (unsigned k = 1; k <= 3; ++k) {
+      if (!FallsTo({k, 3}, job)) continue;
+      ++taken[k];
+      ++times;
+    }
+    EXPECT_EQ(1, times) << job.unit;
+  }
+  for (unsigned k = 1; k <= 3; ++k) EXPECT_GT(taken[k], 60);
+}
+
+// The processes that this one has started and that still live.
+std::vector<pid_t> Children() {
+  std::vector<pid_t> children;
+  std::ifstream file("/proc/self/task/" + std::to_string(getpid()) + "/children");
+  for (pid_t child = 0; file >> child;) children.push_back(child);
+  return children;
+}
+
+class Batches : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    std::filesystem::create_directory(folder_.Path("photos"));
+    for (int i = 0; i < 6; ++i) {
+      cv::Mat photo(40, 60, CV_8UC3, cv::Scalar(i, 100 + i, 200));
+      folder_.Write("photos/sn" + std::to_string(i) + ".png", photo);
+    }
+  }
+
+  BatchProgress Run(double timeout = 60) {
+    Store store(folder_.Path("results.db"), Store::Use::kWrite);
+    Request request;
+    request.measurement = "camera_flash";
+    BatchOptions options;
+    options.workers = 2;
+    options.timeout_seconds = timeout;
+    return RunBatch(PlanOf(request, {}), JobsOfPhotos(folder_.Path("photos")), nullptr, store, options,
+                    [](const BatchProgress&) {});
+  }
+
+  // Unit to what its only run says: the mean, or why there is none.
+  std::map<std::string, std::string> Stored() {
+    std::map<std::string, std::string> found;
+    Store(folder_.Path("results.db"), Store::Use::kRead).EachRun({}, false, [&](const RunRow& row, StoredRun&& run) {
+      const Json& measurements = run.record.at("phases").at(0).at("measurements");
+      const std::string text = measurements.contains("camera_flash_mean")
+                                   ? measurements.at("camera_flash_mean").at("measured_value").dump()
+                                   : run.record.at("outcome_details").dump();
+      EXPECT_TRUE(found.emplace(row.unit, text).second) << row.unit << " is stored twice";
+    });
+    return found;
+  }
+
+  TemporaryFolder folder_;
+};
+
+TEST_F(Batches, WhatIsStoredIsNotMeasuredAgain) {
+  folder_.Write("photos/broken.png", std::string("\x89PNG\r\n\x1a\n no picture"));
+  const BatchProgress first = Run();
+  EXPECT_EQ(7U, first.runs);
+  EXPECT_EQ(1U, first.outcomes.at("ERROR"));
+  const std::map<std::string, std::string> stored = Stored();
+  EXPECT_EQ("3.0", stored.at("sn3"));
+  EXPECT_THAT(stored.at("broken"), HasSubstr("broken.png"));
+  folder_.Write("photos/sn3.png", cv::Mat(40, 60, CV_8UC3, cv::Scalar(33, 0, 0)));  // another photo of the unit
+  const BatchProgress second = Run();
+  EXPECT_EQ(1U, second.runs);
+  EXPECT_EQ(6U, second.known);
+  EXPECT_EQ(1U, second.outcomes.at("ERROR")) << "a known run counts in the verdict";
+}
+
+// A pipe that is open for writing, but to which nobody writes, holds up whoever reads it.
+TEST_F(Batches, AWorkerThatHangsOrDiesCostsItsOwnUnit) {
+  const std::string pipe = folder_.Path("photos/hung.png");
+  ASSERT_EQ(0, mkfifo(pipe.c_str(), 0600));
+  const int held = open(pipe.c_str(), O_RDWR);
+  EXPECT_EQ(7U, Run(0.5).runs);
+  EXPECT_THAT(Stored().at("hung"), HasSubstr("took longer than 0.5 s"));
+
+  ASSERT_EQ(0, unlink(folder_.Path("results.db").c_str()));
+  std::thread killer([] {
+    // The others are done by then; the one that hangs dies.
+    std::this_thread::sleep_for(std::chrono::seconds(1));
+    for (const pid_t child : Children()) kill(child, SIGSEGV);
+  });
+  EXPECT_EQ(7U, Run().runs);
+  killer.join();
+  close(held);
+  EXPECT_THAT(Stored().at("hung"), AnyOf(HasSubstr("SIGSEGV"), HasSubstr("status")));
+  EXPECT_EQ("5.0", Stored().at("sn5"));
+}
+
+}  // namespace
+
+}  // namespace qv

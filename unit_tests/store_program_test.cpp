@@ -1,0 +1,90 @@
+// The commands on a store, as a user gives them.
+
+#include <gmock/gmock.h>
+
+#include "unit_tests/program.h"
+
+namespace {
+
+using nlohmann::json;
+using ::testing::HasSubstr;
+
+class StoreProgram : public SimulatedPhotos {
+ protected:
+  std::string Read(const std::string& name) const { return ReadFile(folder_.Path(name)); }
+  void Write(const std::string& name, const std::string& text) const { folder_.Write(name, text); }
+
+  // A store of one run of a flash photo, a record beside it.
+  void Measure() {
+    Simulate("--size 400x300");
+    Write("limits.json", R"({"name": "l", "revision": "1", "limits": {"camera_flash_mean": {"min": 1}}})");
+    Run("flash photo.png --dut 'SN<1>' --limits limits.json --json record.json --quiet");
+    ASSERT_THAT(Run("import record.json record.json -o store.db").out, HasSubstr("2 runs read, 1 new"));
+  }
+};
+
+TEST_F(StoreProgram, ShowsJudgesAndReportsWhatWasMeasured) {
+  Measure();
+  Write("dark.json", R"({"name": "l", "revision": "2", "limits": {"camera_flash_mean": {"max": 1}}})");
+  EXPECT_THAT(Run("show store.db").out, HasSubstr("1 run: 1 PASS; yield 100.0 %"));
+  EXPECT_THAT(Run("show store.db 'SN<1>'").out, HasSubstr("camera_flash_mean  PASS"));
+  EXPECT_EQ(0, Run("judge store.db --limits limits.json").status);
+  const ProgramRun judged = Run("judge store.db --limits dark.json");
+  EXPECT_EQ(1, judged.status);
+  EXPECT_THAT(judged.out, HasSubstr("2 verdicts changed"));
+  EXPECT_EQ(1, Run("judge store.db --limits dark.json --against limits.json").status);
+  EXPECT_THAT(Run("study store.db --where 'unit=SN<1>'").out, HasSubstr("camera_flash_mean [level]"));
+  EXPECT_EQ(0, Run("report store.db -o page.html --junit tests.xml --plot plot.svg").status);
+  EXPECT_THAT(Read("tests.xml"), HasSubstr("SN&lt;1&gt;"));
+  EXPECT_EQ(0, Run("report record.json -o one.html").status);
+  EXPECT_EQ(0, Run("export store.db -o all.jsonl").status);
+  EXPECT_THAT(Run("import all.jsonl -o store.db").out, HasSubstr("1 run read, 0 new"));
+  EXPECT_EQ(json::parse(Read("record.json")), json::parse(Read("all.jsonl"))["record"]);
+}
+
+TEST_F(StoreProgram, RefusesWrongUseInASentence) {
+  Measure();
+  Write("broken.jsonl", "{\"schema\": \"qvtester-run-1\"}\n");
+  const char* const kUses[][2] = {
+      {"show none.db", "none.db: no such store"},
+      {"show record.json", "can't be opened as a store"},
+      {"show store.db SN9", "holds no run of unit SN9"},
+      {"show store.db --where lto=3", "no run has a column or a figure named \"lto\""},
+      {"show store.db --where lot", "is no condition"},
+      {"show store.db --where time=today", "is no time"},
+      {"show store.db --where \"lot' OR 1=1 --=x\"", "no run has a column"},
+      {"judge store.db --limits none.json", "none.json: no such file"},
+      {"study store.db --parts unit", "--parts and --operators belong together"},
+      {"study store.db --parts unit --operators station", "at least 2 parts and 2 operators"},
+      {"study store.db --figure nothing", "no figure to study"},
+      {"study store.db --labels unit", "a label is"},
+      {"report store.db", "nothing to write"},
+      {"report store.db -o store.db", "store.db"},
+      {"report store.db --lot L9 -o page.html", "no run is chosen"},
+      {"export store.db -o all.txt", "name a .jsonl file"},
+      {"import broken.jsonl -o other.db", "broken.jsonl line 1"},
+      {"import none.jsonl -o other.db", "none.jsonl"},
+      {"import record.json -o none/there.db", "none/there.db"},
+  };
+  for (const auto& [use, complaint] : kUses) ExpectComplaint(use, 2, complaint);
+}
+
+TEST_F(StoreProgram, KeepsWhatWasStoredWhenTheDiskIsFull) {
+  Measure();
+  std::string lines;
+  for (int i = 0; i < 400; ++i) {
+    json record = json::parse(Read("record.json"));
+    record["dut_id"] = std::to_string(i);
+    lines += record.dump() + "\n";
+  }
+  Write("many.jsonl", lines);
+  // A file may not grow beyond this: what a full disk looks like to SQLite.
+  const ProgramRun filled = Run("import many.jsonl -o store.db", "ulimit -f 300; trap '' XFSZ; ");
+  EXPECT_EQ(4, filled.status) << filled.err;
+  EXPECT_THAT(filled.err, HasSubstr("what was stored before is whole"));
+  EXPECT_THAT(Run("show store.db 'SN<1>'").out, HasSubstr("PASS"));
+  EXPECT_THAT(Run("import many.jsonl -o store.db").out, HasSubstr("400 runs read"));
+  EXPECT_THAT(Run("show store.db").out, HasSubstr("401 runs"));
+}
+
+}  // namespace
