@@ -9,6 +9,22 @@
 
 namespace qv {
 
+// Each declares its options and hands back what runs once they are parsed.
+CommandBody DeclareBatch(Options& command);
+CommandBody DeclareChart(Options& command);
+CommandBody DeclareExplain(Options& command);
+CommandBody DeclareExport(Options& command);
+CommandBody DeclareImport(Options& command);
+CommandBody DeclareJudge(Options& command);
+CommandBody DeclareList(Options& command);
+CommandBody DeclarePlan(Options& command);
+CommandBody DeclareReport(Options& command);
+CommandBody DeclareRun(Options& command);
+CommandBody DeclareShow(Options& command);
+CommandBody DeclareSimulate(Options& command);
+CommandBody DeclareStudy(Options& command);
+CommandBody DeclareVerify(Options& command);
+
 namespace {
 
 MeasuringCommand Sharpness(const char* measurement) {

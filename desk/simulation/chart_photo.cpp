@@ -1,4 +1,4 @@
-#include "desk/simulation/scene_photos.h"
+#include "desk/simulation/simulation.h"
 
 #include "chart/chart_layout.h"
 #include "desk/scenes/charts.h"

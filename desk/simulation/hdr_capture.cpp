@@ -1,4 +1,4 @@
-#include "desk/simulation/scene_photos.h"
+#include "desk/simulation/simulation.h"
 
 #include <opencv2/imgproc.hpp>
 #include <vector>

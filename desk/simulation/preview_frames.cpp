@@ -1,10 +1,12 @@
-#include "desk/simulation/scene_photos.h"
+#include "desk/simulation/simulation.h"
 
 #include "chart/chart_layout.h"
 #include "desk/scenes/charts.h"
 #include "desk/simulation/truth.h"
 
 namespace qv {
+
+Simulation ChartPhoto(const SimulationOptions& options);
 
 Simulation PreviewFrames(const SimulationOptions& options) {
   Simulation s = ChartPhoto(options);

@@ -1,4 +1,4 @@
-#include "desk/simulation/scene_photos.h"
+#include "desk/simulation/simulation.h"
 
 #include <algorithm>
 #include <cmath>
