@@ -29,8 +29,9 @@ Selection StoreOptions::selection() const {
 }
 
 ArchiveLimits ReadArchiveLimits(const std::string& path) {
-  ArchiveLimits limits;
-  for (const auto& [name, limit] : ReadLimits(path).by_name) {
+  const Limits read = ReadLimits(path);
+  ArchiveLimits limits = {{}, read.accept_doubts};
+  for (const auto& [name, limit] : read.by_name) {
     limits.by_name[name] = {limit.min, limit.max, limit.marginal_min, limit.marginal_max};
   }
   return limits;

@@ -34,6 +34,11 @@ TEST_F(StoreProgram, ShowsJudgesAndReportsWhatWasMeasured) {
   EXPECT_THAT(judged.out, HasSubstr("2 verdicts changed"));
   EXPECT_EQ(1, Run("judge store.db --limits dark.json --against limits.json").status);
   EXPECT_THAT(Run("study store.db --where 'unit=SN<1>'").out, HasSubstr("camera_flash_mean [level]"));
+  // Another bound makes another run, though nobody raised the revision.
+  Write("limits.json", R"({"name": "l", "revision": "1", "limits": {"camera_flash_mean": {"min": 2}}})");
+  Run("flash photo.png --dut 'SN<1>' --limits limits.json --json again.json --quiet");
+  EXPECT_THAT(Run("import again.json -o copy.db").out, HasSubstr("1 new"));
+  EXPECT_THAT(Run("import record.json -o copy.db").out, HasSubstr("1 new"));
   EXPECT_EQ(0, Run("report store.db -o page.html --junit tests.xml --plot plot.svg").status);
   EXPECT_THAT(Read("tests.xml"), HasSubstr("SN&lt;1&gt;"));
   EXPECT_EQ(0, Run("report record.json -o one.html").status);

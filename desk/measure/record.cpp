@@ -4,6 +4,7 @@
 #include <cmath>
 #include <stdexcept>
 
+#include "desk/base/digest.h"
 #include "desk/base/json.h"
 #include "desk/base/text.h"
 #include "desk/measure/codes.h"
@@ -102,6 +103,16 @@ Json JsonOf(const Record& record, const Phase& phase) {
           {"end_time_millis", phase.end_millis},
           {"measurements", measurements},
           {"attachments", attachments}};
+}
+
+// What was judged by: a name and revision may stay when the bounds change, so their digest stands beside them.
+Json JsonOf(const Limits& limits) {
+  Json json = {{"name", limits.name}, {"revision", limits.revision}};
+  if (!limits.given() && limits.accept_doubts.empty()) return json;
+  Json content = {{"limits", Json::object()}, {"accept_doubts", limits.accept_doubts}};
+  for (const auto& [name, limit] : limits.by_name) content["limits"][name] = JsonOf(limit);
+  json["sha256"] = HexDigest(content.dump(), "SHA256");
+  return json;
 }
 
 bool Holds(const std::vector<Remark>& remarks, Remark::Weight weight) {
@@ -225,7 +236,7 @@ Json Record::ToJson() const {
                       {"test_index", test_index ? Json(*test_index) : Json()},
                       {"library_version", QVTESTER_VERSION},
                       {"command", command},
-                      {"limits", {{"name", limits.name}, {"revision", limits.revision}}},
+                      {"limits", JsonOf(limits)},
                       {"properties", properties}};
   json["request"] = qv::ToJson(request);
   json["phases"] = Json::array({JsonOf(*this, phase)});
