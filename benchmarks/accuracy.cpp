@@ -21,17 +21,14 @@
 #include "chart/chart_layout.h"
 #include "desk/base/files.h"
 #include "desk/drawing/plot.h"
-#include "desk/measure/chart_view.h"
+#include "desk/measure/measure.h"
 #include "desk/simulation/method_law.h"
 #include "desk/simulation/simulation.h"
-#include "qvtester/host_properties.h"
 #include "qvtester/tester.h"
 
 namespace {
 
 using namespace qv;
-
-constexpr int kThreshold = 125;
 
 SimulationOptions ChartOptions(cv::Size size, double blur_px) {
   SimulationOptions options;
@@ -41,23 +38,20 @@ SimulationOptions ChartOptions(cv::Size size, double blur_px) {
   return options;
 }
 
-struct Reading {
+struct Sharpness {
   bool found = false;
   double vertical = NAN, horizontal = NAN;
 };
 
-Reading MeasureSharpness(const cv::Mat& photo) {
+Record MeasureAnew(const Request& request) {
   QVTester tester;
-  std::vector<float> freq;
-  std::vector<float> vertical;
-  std::vector<float> horizontal;
-  float v = NAN;
-  float h = NAN;
-  Reading reading;
-  reading.found = tester.GetSFRFromImage(photo, freq, vertical, horizontal, v, h) == QV_SUCCESS;
-  reading.vertical = v;
-  reading.horizontal = h;
-  return reading;
+  return Measure(tester, request);
+}
+
+Sharpness MeasureSharpness(const cv::Mat& photo) {
+  const Record record = MeasureAnew({"camera_autofocus", {photo}});
+  if (record.phase.code != QV_SUCCESS) return {};
+  return {true, record.phase.Find("mtf50_vertical")->value(), record.phase.Find("mtf50_horizontal")->value()};
 }
 
 // How far outside of the law's bounds a reading lies, in percent; 0 inside, infinity where there is none.
@@ -76,7 +70,7 @@ void PrintMtf50() {
       "row\n\n");
   std::printf("| blur px | true | law from | to | measured from | to | mean error | furthest beyond the law |\n");
   std::printf("|---|---|---|---|---|---|---|---|\n");
-  std::vector<std::vector<Reading>> readings(blurs.size(), std::vector<Reading>(slopes.size()));
+  std::vector<std::vector<Sharpness>> readings(blurs.size(), std::vector<Sharpness>(slopes.size()));
   std::vector<std::vector<Json>> truths(blurs.size(), std::vector<Json>(slopes.size()));
   ForEachTrial(static_cast<int>(blurs.size() * slopes.size()), [&](int trial) {
     const std::size_t b = trial / slopes.size();
@@ -130,7 +124,7 @@ void PrintStraightening() {
     options.camera.fill = 0.65;  // room for every turn at one scale
     const double turn = options.camera.turn_deg * CV_PI / 180;
     options.camera.fill *= std::fabs(std::cos(turn)) + std::fabs(std::sin(turn));
-    const Reading reading = MeasureSharpness(Sense(options.camera, Simulate(options).levels[0], 8));
+    const Sharpness reading = MeasureSharpness(Sense(options.camera, Simulate(options).levels[0], 8));
     means[trial] = reading.found ? (reading.vertical + reading.horizontal) / 2 : NAN;
   });
   for (std::size_t t = 0; t < turns.size(); ++t) {
@@ -154,7 +148,7 @@ void PrintNoise() {
   for (const double blur : blurs) {
     SimulationOptions options = ChartOptions({2000, 1500}, blur);
     const Simulation simulation = Simulate(options);
-    const Reading clean = MeasureSharpness(Sense(options.camera, simulation.levels[0], 8));
+    const Sharpness clean = MeasureSharpness(Sense(options.camera, simulation.levels[0], 8));
     for (const double noise : noises) {
       std::vector<double> errors(2 * kSeeds);
       std::vector<double> departures(2 * kSeeds);
@@ -162,7 +156,7 @@ void PrintNoise() {
         CameraModel camera = options.camera;
         camera.noise_percent = noise;
         camera.seed = seed + 1;
-        const Reading reading = MeasureSharpness(Sense(camera, simulation.levels[0], 8));
+        const Sharpness reading = MeasureSharpness(Sense(camera, simulation.levels[0], 8));
         errors[2 * seed] = 100 * (reading.vertical / clean.vertical - 1);
         errors[2 * seed + 1] = 100 * (reading.horizontal / clean.horizontal - 1);
         departures[2 * seed] = Departure(reading.vertical, simulation.truth.at("mtf50").at("vertical"));
@@ -174,19 +168,22 @@ void PrintNoise() {
   }
 }
 
-std::vector<Mark> FindMarks(const cv::Mat& photo) {
-  QVTester tester;
-  const ChartView view = LookAtChart(tester.FindChart(photo, kThreshold));
-  return view.complete() ? view.marks : std::vector<Mark>();
+std::vector<cv::Point2d> FindMarks(const cv::Mat& photo) {
+  const Record record = MeasureAnew({"circle_check", {photo}});
+  std::vector<cv::Point2d> marks;
+  if (record.phase.code != QV_SUCCESS) return marks;
+  const Reading& found = *record.phase.Find("marks");
+  for (std::size_t i = 0; i < found.values.size(); ++i) marks.emplace_back(found.axis[i], found.values[i]);
+  return marks;
 }
 
-double LargestMarkError(const std::vector<Mark>& marks, const Json& truth) {
+double LargestMarkError(const std::vector<cv::Point2d>& marks, const Json& truth) {
   double largest = 0;
-  for (const Mark& mark : marks) {
+  for (const cv::Point2d& mark : marks) {
     double nearest = 1e9;
     for (const Json& centre : truth.at("marks")) {
-      nearest = std::min(nearest, std::hypot(centre.at("x").get<double>() - mark.centre.x,
-                                             centre.at("y").get<double>() - mark.centre.y));
+      nearest =
+          std::min(nearest, std::hypot(centre.at("x").get<double>() - mark.x, centre.at("y").get<double>() - mark.y));
     }
     largest = std::max(largest, nearest);
   }
@@ -209,7 +206,7 @@ void PrintMarks() {
       options.camera.noise_percent = 1;
       options.camera.seed = seed + 1;
       const Simulation simulation = Simulate(options);
-      const std::vector<Mark> marks = FindMarks(Sense(options.camera, simulation.levels[0], 8));
+      const std::vector<cv::Point2d> marks = FindMarks(Sense(options.camera, simulation.levels[0], 8));
       if (marks.size() != 3) return;
       errors[seed] = LargestMarkError(marks, simulation.truth);
       modules[seed] = errors[seed] / simulation.truth.at("module_px").get<double>();
@@ -231,23 +228,14 @@ void PrintPatches() {
       options.camera.noise_percent = noise;
       const Simulation simulation = Simulate(options);
       cv::Mat photo = Sense(options.camera, simulation.levels[0], 8);
-      QVTester tester;
-      tester.Initialize();
-      auto slot = std::make_unique<QVResource>();
-      slot->SetImage(photo);
-      tester.resources_[QV_RESOURCE_CHART_PHOTO] = std::move(slot);
-      slot = std::make_unique<QVResource>();
-      slot->SetImage(photo);
-      tester.resources_[QV_RESOURCE_CHART_STANDARD] = std::move(slot);
-      if (tester.TestCameraCapture(false) != QV_SUCCESS) continue;
-      QVResultData* results = nullptr;
-      tester.GetResult(&results);
+      const Record record = MeasureAnew({"camera_capture", {photo, photo}});
+      if (record.phase.code != QV_SUCCESS) continue;
       std::vector<double> differences;
-      for (int i = 0; i < results->capture_main_.capture_lab_count_; ++i) {
+      for (std::size_t i = 0; i < record.phase.Find("lab_l")->values.size(); ++i) {
         double square = 0;
         for (int k = 0; k < 3; ++k) {
           const double truth = simulation.truth.at("patches").at(i).at("lab").at(k);
-          square += std::pow(results->capture_main_.capture_lab_[3 * i + k] - truth, 2);
+          square += std::pow(record.phase.Find(std::string("lab_") + "lab"[k])->values[i] - truth, 2);
         }
         differences.push_back(std::sqrt(square));
       }
@@ -278,16 +266,16 @@ void PrintDust() {
         options.speck_px = diameter;
         options.speck_darkness = darkness;
         const Simulation simulation = Simulate(options);
-        cv::Mat gray;
-        cv::cvtColor(Sense(options.camera, simulation.levels[0], 8), gray, cv::COLOR_RGB2GRAY);
-        QVTester tester;
-        tester.detectBlob(gray);
+        const Record record = MeasureAnew({"lens_dust", {Sense(options.camera, simulation.levels[0], 8)}});
+        const Reading& blobs = *record.phase.Find("blobs");
         for (const Json& speck : simulation.truth.at("specks")) {
-          found[trial] += static_cast<int>(std::any_of(
-              tester.kept_->blobs.keypoints.begin(), tester.kept_->blobs.keypoints.end(),
-              [&](const cv::KeyPoint& blob) {
-                return std::hypot(blob.pt.x - speck.at("x").get<double>(), blob.pt.y - speck.at("y").get<double>()) < 2;
-              }));
+          for (std::size_t i = 0; i < blobs.values.size(); ++i) {
+            const double off =
+                std::hypot(blobs.axis[i] - speck.at("x").get<double>(), blobs.values[i] - speck.at("y").get<double>());
+            if (off >= 2) continue;
+            ++found[trial];
+            break;
+          }
         }
       });
       int sum = 0;
@@ -394,7 +382,7 @@ Detections Detect(const SimulationOptions& options) {
   Detections found;
   const Simulation simulation = Simulate(options);
   const double module_px = simulation.truth.at("module_px");
-  const std::vector<Mark> marks = FindMarks(Sense(camera, simulation.levels[0], 8));
+  const std::vector<cv::Point2d> marks = FindMarks(Sense(camera, simulation.levels[0], 8));
   found.chart = marks.size() == 3 && LargestMarkError(marks, simulation.truth) < 1.5 * module_px;
 
   const double module = simulation.truth.at("module_units");
@@ -540,8 +528,6 @@ int main(int argc, char** argv) {
     }
   }
   __android_log_set_minimum_priority(ANDROID_LOG_SILENT);
-  ScratchFolder scratch;
-  SetHostPropertyStore((scratch.path() + "/properties").c_str());
   cv::setNumThreads(1);  // the trials take the cores
   for (const Section& section : kSections) {
     if (wanted.empty() || std::find(wanted.begin(), wanted.end(), section.name) != wanted.end()) section.print();

@@ -4,6 +4,7 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/library_tables.h"
+#include "desk/measure/measurement.h"
 #include "tools/commands.h"
 #include "tools/program.h"
 
@@ -71,8 +72,26 @@ void ListCodes() {
   }
 }
 
-const std::map<std::string, void (*)()> kLists = {
-    {"tests", ListTests}, {"slots", ListSlots}, {"properties", ListProperties}, {"codes", ListCodes}};
+void ListMeasurements() {
+  for (const Measurement* measurement : Measurements()) {
+    const Spec& spec = measurement->spec();
+    std::cout << spec.name << "  (" << spec.test_name() << ")\n";
+    for (const InputSpec& input : spec.inputs) {
+      std::cout << Format("  %-9s  %-12s  %s\n", input.optional ? "parameter" : "input", input.name, input.help);
+    }
+    for (const Parameter& parameter : spec.parameters) {
+      const Json initial = InitialValue(parameter);
+      std::cout << Format("  parameter  %-12s  %s%s\n", parameter.name, parameter.help,
+                          initial.is_null() ? "" : (" [" + initial.dump() + "]").c_str());
+    }
+  }
+}
+
+const std::map<std::string, void (*)()> kLists = {{"tests", ListTests},
+                                                  {"slots", ListSlots},
+                                                  {"properties", ListProperties},
+                                                  {"codes", ListCodes},
+                                                  {"measurements", ListMeasurements}};
 
 }  // namespace
 
@@ -80,7 +99,7 @@ CommandBody DeclareList(Options& command) {
   auto what = std::make_shared<std::string>();
   std::vector<std::string> names;
   for (const auto& [name, print] : kLists) names.push_back(name);
-  command.ChoiceArgument("WHAT", *what, names, "tests, slots, properties or codes");
+  command.ChoiceArgument("WHAT", *what, names, "tests, slots, properties, codes or measurements");
   return [what] {
     kLists.at (*what)();
     return static_cast<int>(kExitWithinLimits);

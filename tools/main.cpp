@@ -68,7 +68,7 @@ const std::vector<Command> kCommands = {
     {"export", "Write a store's runs as an archive or a table", DeclareExport},
     {"import", "Take archives or records into a store", DeclareImport},
     {"explain", "Say what a number means, how true it is and what moves it", DeclareExplain},
-    {"list", "List the library's tests, slots, properties or codes", DeclareList},
+    {"list", "List the library's tests, slots, properties and codes, and what can be measured", DeclareList},
 };
 
 constexpr char kFooter[] =

@@ -235,6 +235,8 @@ TEST_F(Program, ListsShowEveryRow) {
   EXPECT_THAT(Run("list tests").out, HasSubstr("29  QV_TEST_TOUCH_PANEL_PRINT"));
   EXPECT_THAT(Run("list slots").out, HasSubstr("17  image                QV_TEST_CAMERA_AUTOFOCUS"));
   EXPECT_THAT(Run("list properties").out, HasSubstr("93  prop_binary_thr_working_       int        125"));
+  EXPECT_THAT(Run("list measurements").out,
+              AllOf(HasSubstr("camera_capture_front  (QV_TEST_CAMERA_CAPTURE_2)"), HasSubstr("light [125]")));
   EXPECT_THAT(Run("list codes").out, HasSubstr("-91  QV_ERROR_PATTERN_NOT_FOUND"));
 }
 
