@@ -114,9 +114,9 @@ std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
   DrawMarks(picture, view, place);
   if (record.phase.code != QV_SUCCESS) return picture;
   for (std::size_t i = 0; i < measured.size(); ++i) {
-    const auto column = static_cast<double>(i / kRows);
-    const auto row = static_cast<double>(i % kRows);
-    DrawPatch(picture, record, place, i, {width + 16 + column * kColumn, kHeadPx + row * kRow});
+    const std::size_t column = i / kRows;
+    const cv::Point2d at(static_cast<double>(column) * kColumn, static_cast<double>(i % kRows) * kRow);
+    DrawPatch(picture, record, place, i, cv::Point2d(width + 16, kHeadPx) + at);
   }
   picture.Text(standard.empty() ? "measured" : "measured, framed by the standard", {width + 16, 28}, 14, kInk);
   return picture;
