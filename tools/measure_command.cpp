@@ -16,6 +16,7 @@
 #include "desk/measure/measure.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
+#include "tools/film_progress.h"
 #include "tools/program.h"
 
 namespace qv {
@@ -170,7 +171,10 @@ int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* 
   const Limits limits = options.limits.empty() ? Limits() : ReadLimits(options.limits);
   if (options.verbose) ShowLogLines();
   QVTester tester;
-  Record record = Measure(tester, RequestOf(spec, options), limits);
+  Record record = [&] {
+    const FilmProgress progress(tester, options.quiet);
+    return Measure(tester, RequestOf(spec, options), limits);
+  }();
   record.dut_id = options.dut;
   record.station_id = options.station;
   record.command = CommandLine();

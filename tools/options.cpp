@@ -115,7 +115,14 @@ CommandBody Parse(const ProgramText& text, const std::vector<Command>& commands,
 
   CommandBody body;
   for (const Command& row : commands) {
-    CLI::App* const command = app.add_subcommand(row.name, row.purpose);
+    const std::string name = row.name;
+    const std::size_t space = name.find(' ');
+    CLI::App* const group = space == std::string::npos ? &app : app.get_subcommand(name.substr(0, space));
+    CLI::App* const command = group->add_subcommand(name.substr(space + 1), row.purpose);
+    if (!row.declare) {
+      command->require_subcommand(1);
+      continue;
+    }
     Options options(*command);
     command->callback([&body, chosen = row.declare(options)] { body = chosen; });
   }

@@ -55,9 +55,9 @@ class Options {
 };
 
 struct Command {
-  const char* name;
+  const char* name;  // "video record" stands below "video"
   const char* purpose;
-  /// Declares the options and hands back what runs once they are parsed.
+  /// Declares the options and hands back what runs once they are parsed; none for one that others stand below.
   std::function<CommandBody(Options&)> declare;
 };
 

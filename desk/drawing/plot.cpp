@@ -87,10 +87,18 @@ void Drawing::Curves() const {
   if (!second_line.empty()) picture.Line(second_line, kInk, 1);
   if (!plot.bars && !line.empty()) picture.Line(line, kCurve, 2);
   for (const Plot::Curve& curve : plot.more_curves) {
-    std::vector<cv::Point2d> points;
-    for (const cv::Point2d& point : curve.points) points.push_back(At(point));
-    picture.Line(points, curve.colour, 2.5);
-    for (const cv::Point2d& point : points) picture.Circle(point, 2.5, curve.colour, 2);
+    std::vector<cv::Point2d> piece;
+    for (std::size_t i = 0; i <= curve.points.size(); ++i) {
+      const bool goes_on = i < curve.points.size() && Finite(curve.points[i]);
+      if (goes_on) piece.push_back(At(curve.points[i]));
+      if (goes_on || piece.empty()) continue;
+      const bool alone = piece.size() == 1;
+      if (!alone) picture.Line(piece, curve.colour, 2.5);
+      for (const cv::Point2d& point : piece) {
+        if (curve.dots || alone) picture.Circle(point, alone && !curve.dots ? 0.75 : 2.5, curve.colour, 2);
+      }
+      piece.clear();
+    }
   }
 }
 

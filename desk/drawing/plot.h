@@ -18,8 +18,9 @@ struct Plot {
   std::vector<cv::Point2d> curve;
   std::vector<cv::Point2d> second_curve;
   struct Curve {
-    std::vector<cv::Point2d> points;
+    std::vector<cv::Point2d> points;  // one that is not finite breaks the curve
     Colour colour;
+    bool dots = true;
   };
   std::vector<Curve> more_curves;
   bool bars = false;  // the curve as bars

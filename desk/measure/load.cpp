@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
+#include <opencv2/videoio.hpp>
 
 #include "desk/base/digest.h"
 #include "desk/base/failure.h"
@@ -130,11 +131,25 @@ class Loader {
       return KindOfSlot(slot) == SlotKind::kHdr ? TakeFloats(tester_, slot, input.picture)
                                                 : TakePicture(tester_, slot, input.picture);
     }
+    if (KindOfSlot(slot) == SlotKind::kVideo) return TakeFilm(input, slot);
     std::string content = Content(input);
     record_.inputs.push_back({slot, input.name, HexDigest(content, "SHA256"), ""});
     if (content.empty()) throw Failure(kCouldNotMeasure, "the file is empty");
     if (!RawSize().empty()) return TakeFrame(tester_, slot, RawSize(), content);
     return TakeFile(input.name, slot, content);
+  }
+
+  // A film stays in its file: the test reads it there, frame by frame.
+  int TakeFilm(const Input& input, QV_RESOURCE_INDEX slot) {
+    if (!input.is_path()) throw Failure(kCouldNotMeasure, "a film is read from its file: give a path");
+    record_.inputs.push_back({slot, input.name, HexDigest(Content(input), "SHA256"), ""});
+    const KeptStderr kept;
+    std::string path = input.name;
+    const int code = Guarded("SetResource", [&] { return tester_.SetResource(slot, path.data()); });
+    const std::vector<std::string> chatter = kept.Lines();
+    if (code != QV_SUCCESS && !chatter.empty()) said_ = "the decoder says \"" + chatter.front() + "\"";
+    record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+    return code;
   }
 
   int TakeFile(const std::string& name, QV_RESOURCE_INDEX slot, const std::string& content) {
@@ -155,19 +170,29 @@ class Loader {
   bool TakeOver(const Input& input, int code, QV_RESOURCE_INDEX slot) {
     if (code == QV_ERROR_INVALID_ARGUMENT) {
       const bool frame = LowerExtension(input.name) == ".nv21";
+      const char* const wanted = KindOfSlot(slot) == SlotKind::kVideo ? "film" : "picture";
       return Refuse(input, code,
-                    "not a picture that can be decoded" + (said_.empty() ? "" : "; " + said_) +
+                    Format("not a %s that can be decoded", wanted) + (said_.empty() ? "" : "; " + said_) +
                         (frame ? "; a raw frame needs its size: --raw WxH, where the command takes it" : ""));
     }
     if (code != QV_SUCCESS) return Refuse(input, code, FindCode(code).meaning);
     if (!said_.empty()) {
       record_.Say(Remark::kWarning, "decoder_complaint", input.name + ": " + said_ + "; is the file cut?");
     }
+    if (KindOfSlot(slot) == SlotKind::kVideo) return NoteFrameSize(slot);
     const cv::Mat held = KindOfSlot(slot) == SlotKind::kHdr ? SlotFloats(tester_, slot) : SlotPhoto(tester_, slot);
     RecordedInput& entry = record_.inputs.back();
     entry.width = held.cols;
     entry.height = held.rows;
     entry.pixels_hash = PixelsHash(held);
+    return true;
+  }
+
+  bool NoteFrameSize(QV_RESOURCE_INDEX slot) {
+    cv::VideoCapture film;
+    tester_.resources_[slot]->GetVideo(&film);
+    record_.inputs.back().width = static_cast<int>(film.get(cv::CAP_PROP_FRAME_WIDTH));
+    record_.inputs.back().height = static_cast<int>(film.get(cv::CAP_PROP_FRAME_HEIGHT));
     return true;
   }
 

@@ -15,6 +15,10 @@ const Measurement& DotsMeasurement();
 const Measurement& RegistrationMeasurement();
 const Measurement& PreviewMeasurement(bool front);
 const Measurement& FlashMeasurement(bool vt);
+const Measurement& VideoPreviewMeasurement();
+const Measurement& VideoFocusMeasurement();
+const Measurement& VideoFlashMeasurement();
+const Measurement& VideoChartMeasurement(bool record);
 
 const std::vector<const Measurement*>& Measurements() {
   static const std::vector<const Measurement*> all = {
@@ -22,6 +26,11 @@ const std::vector<const Measurement*>& Measurements() {
       &CircleCheckMeasurement(),  &DustMeasurement(false),    &DustMeasurement(true),     &DotsMeasurement(),
       &RegistrationMeasurement(), &PreviewMeasurement(false), &PreviewMeasurement(true),  &FlashMeasurement(false),
       &FlashMeasurement(true),
+      &VideoPreviewMeasurement(),
+      &VideoFocusMeasurement(),
+      &VideoFlashMeasurement(),
+      &VideoChartMeasurement(true),
+      &VideoChartMeasurement(false),
   };
   return all;
 }

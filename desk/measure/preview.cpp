@@ -64,13 +64,13 @@ class PreviewFinding : public Finding {
 
 class Preview : public Measurement {
  public:
-  explicit Preview(bool front) : front_(front) {
-    spec_.name = front ? "camera_preview_front" : "camera_preview";
-    spec_.test = front ? QV_TEST_CAMERA_PREVIEW_2 : QV_TEST_CAMERA_PREVIEW;
-    spec_.inputs = {{"first", front ? QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME : QV_RESOURCE_PREVIEW_FIRST_FRAME,
-                     "First preview frame"},
-                    {"second", front ? QV_RESOURCE_FRONT_PREVIEW_SECOND_FRAME : QV_RESOURCE_PREVIEW_SECOND_FRAME,
-                     "Second preview frame, of the same size"}};
+  Preview(const char* name, QV_TEST_INDEX test, QV_RESOURCE_INDEX first_slot, QVPreviewResult QVResultData::*result)
+      : result_(result) {
+    spec_.name = name;
+    spec_.test = test;
+    spec_.inputs = {
+        {"first", first_slot, "First preview frame"},
+        {"second", static_cast<QV_RESOURCE_INDEX>(first_slot + 1), "Second preview frame, of the same size"}};
     spec_.parameters = {RawParameter()};
     spec_.figures = {{"difference_mean", kOne, Number::kReal, nullptr, kDifference,
                       "Mean difference of the two frames, 0 to 1: how much the preview moves."}};
@@ -81,7 +81,7 @@ class Preview : public Measurement {
   std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
     cv::Mat map;
     if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
-      const QVPreviewResult& result = front_ ? results->preview_front_ : results->preview_main_;
+      const QVPreviewResult& result = results->*result_;
       if (result.preview_diff_map_ != nullptr) {
         record.phase.Add("difference_mean", result.preview_diff_mean_);
         map = cv::Mat(result.preview_diff_rows_, result.preview_diff_cols_, CV_32F, result.preview_diff_map_).clone();
@@ -103,7 +103,7 @@ class Preview : public Measurement {
                       second.path.c_str(), first.width, first.height, second.width, second.height));
   }
 
-  bool front_;
+  QVPreviewResult QVResultData::*result_;
   Spec spec_;
 };
 
@@ -114,9 +114,17 @@ Parameter RawParameter() {
 }
 
 const Measurement& PreviewMeasurement(bool front) {
-  static const Preview main(false);
-  static const Preview second(true);
+  static const Preview main("camera_preview", QV_TEST_CAMERA_PREVIEW, QV_RESOURCE_PREVIEW_FIRST_FRAME,
+                            &QVResultData::preview_main_);
+  static const Preview second("camera_preview_front", QV_TEST_CAMERA_PREVIEW_2, QV_RESOURCE_FRONT_PREVIEW_FIRST_FRAME,
+                              &QVResultData::preview_front_);
   return front ? second : main;
+}
+
+const Measurement& VideoPreviewMeasurement() {
+  static const Preview video("video_preview", QV_TEST_VIDEO_PREVIEW, QV_RESOURCE_VIDEO_PREVIEW_FIRST_FRAME,
+                             &QVResultData::preview_video_);
+  return video;
 }
 
 }  // namespace qv

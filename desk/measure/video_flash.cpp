@@ -1,0 +1,115 @@
+// Test 24: brightness over a film, and the flash's pulse in it.
+
+#include <algorithm>
+#include <climits>
+#include <cmath>
+
+#include "desk/base/text.h"
+#include "desk/measure/film_course.h"
+#include "desk/measure/telling.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kMeans = {"mean over all pixels of the first channel of each frame",
+                           "Exact for the frames as decoded.",
+                           "Moved by exposure, flash and clipping; the first channel of a film's frames is blue."};
+constexpr Method kWidth = {
+    "width of the pulse about the peak at half height, straight lines between the frames",
+    "Within 3 % for pulses as long as six frames and more. Not a number when the peak is less than 5 levels above the "
+    "base.",
+    "Moved by an exposure control that answers the flash, by clipping, and by a film that cuts the pulse."};
+constexpr Colour kBlue = {0.1, 0.35, 0.75};
+
+class FlashFilmFinding : public FilmFinding {
+ public:
+  using FilmFinding::FilmFinding;
+
+  std::string Report(const Record& record) const override {
+    const Phase& phase = record.phase;
+    const Reading& peak = *phase.Find("peak");
+    const Reading& base = *phase.Find("base");
+    const Reading& width = *phase.Find("width");
+    std::string text = Format("frames  %.0f\n", phase.Find("frame_count")->value());
+    text += Format("peak    %.2f of 255%s, at %.1f ms\n", peak.value(), LimitText(peak).c_str(), PeakTime(record));
+    text += Format("base    %.2f of 255%s\n", base.value(), LimitText(base).c_str());
+    text += std::isfinite(width.value()) ? Format("pulse   %.1f ms at half height", width.value()) : "pulse   none";
+    return text + LimitText(width) + "\n";
+  }
+
+ protected:
+  std::vector<Plot> Plots(const Record& record) const override {
+    Plot plot = OverTime("Mean of the first channel of each frame; gaps are lost frames", "level", 255);
+    plot.more_curves.push_back(Course(record.phase.Find("mean")->values, kBlue));
+    const double peak = record.phase.Find("peak")->value();
+    const double base = record.phase.Find("base")->value();
+    const double width = record.phase.Find("width")->value();
+    plot.horizontal_lines = {base};
+    if (std::isfinite(width)) {
+      plot.horizontal_lines.push_back((peak + base) / 2);
+      plot.markers = {{{PeakTime(record), peak}, Format("%.1f, %.1f ms wide at half height", peak, width), kGood}};
+    }
+    return {plot};
+  }
+
+ private:
+  double PeakTime(const Record& record) const {
+    return time_[static_cast<std::size_t>(record.phase.Find("peak_frame")->value())];
+  }
+};
+
+class VideoFlash : public Measurement {
+ public:
+  const Spec& spec() const override {
+    constexpr auto kWhole = Number::kWhole;
+    constexpr auto kReal = Number::kReal;
+    static const Spec spec = {
+        "video_flash",
+        QV_TEST_VIDEO_FLASH,
+        nullptr,
+        {{"film", QV_RESOURCE_VIDEO, "Film of a plain target while the flash fires"}},
+        {{"frames",
+          Parameter::kWhole,
+          "N",
+          "Frames to read; 0 reads all",
+          nullptr,
+          0,
+          INT_MAX,
+          {},
+          QV_PROPERTY_VIDEO_FLASH_FRAME_COUNT}},
+        {{"frame_count", kOne, kWhole, nullptr, kStampMethod, "Frames that were read."},
+         {"peak", kGreyLevel, kReal, nullptr, kMeans, "Mean brightness of the brightest frame, 0 to 255."},
+         {"peak_frame", kOne, kWhole, nullptr, kMeans, "The brightest frame, counted from 0."},
+         {"base", kGreyLevel, kReal, nullptr, kMeans, "Brightness without the flash: the median of all frames."},
+         {"width", kMillisecond, kReal, nullptr, kWidth, "How long the flash lasts."},
+         {"mean", kGreyLevel, kReal, &kTimeAxis, kMeans, "Mean brightness over time."}},
+        false,
+        kFilmAdvice};
+    return spec;
+  }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    if (!RunFilmTest(tester, spec(), request, record)) return std::make_unique<NoFilm>();
+    const QVResultData& results = *tester.results_;
+    const int count = results.video_flash_frame_count_;
+    const std::vector<double> time = Widen(results.video_flash_time_, count);
+    Phase& phase = record.phase;
+    phase.Add("frame_count", count);
+    phase.Add("peak", results.video_flash_peak_);
+    phase.Add("peak_frame", results.video_flash_peak_frame_);
+    phase.Add("base", results.video_flash_base_);
+    phase.Add("width", results.video_flash_width_);
+    phase.Add("mean", time, Widen(results.video_flash_mean_, count));
+    return std::make_unique<FlashFilmFinding>(time);
+  }
+};
+
+}  // namespace
+
+const Measurement& VideoFlashMeasurement() {
+  static const VideoFlash flash;
+  return flash;
+}
+
+}  // namespace qv
