@@ -38,6 +38,23 @@ double Defocus(const FilmStyle& style, double ms) {
   return back < 1 ? style.overshoot_px * (1 - std::fabs(2 * back - 1)) : 0;
 }
 
+// A Gaussian of this sigma by its response, for sigmas too small to be sampled. Weights fall off with the square of the
+// distance, so that what the ends cut off is less than a thousandth.
+cv::Mat GaussKernel(double sigma_px) {
+  constexpr int kSteps = 512;  // over the frequencies to half a cycle a pixel
+  const int reach = std::max(16, static_cast<int>(std::ceil(5 * sigma_px)));
+  cv::Mat kernel(2 * reach + 1, 1, CV_32F);
+  for (int n = -reach; n <= reach; ++n) {
+    double sum = 0;
+    for (int i = 0; i < kSteps; ++i) {
+      const double f = (i + 0.5) / (2 * kSteps);
+      sum += std::exp(-2 * CV_PI * CV_PI * sigma_px * sigma_px * f * f) * std::cos(2 * CV_PI * f * n);
+    }
+    kernel.at<float>(n + reach) = static_cast<float>(sum / kSteps);
+  }
+  return kernel / cv::sum(kernel)[0];
+}
+
 // What the measure reads on average of both edges, in units of Nyquist.
 double ExpectedMtf50(CameraModel camera, double defocus_px, double edge_angle_deg) {
   camera.blur_px = std::hypot(camera.blur_px, defocus_px);
@@ -82,7 +99,8 @@ void FocusFilm(const SimulationOptions& options, const FilmStyle& style, Film& f
     const double sigma = Defocus(style, TimeMs(style, number));
     if (sigma < 0.05) return Shoot(camera, levels, number);  // adds nothing that could be seen
     cv::Mat blurred;
-    cv::GaussianBlur(levels, blurred, {}, sigma, sigma, cv::BORDER_REPLICATE);
+    const cv::Mat kernel = GaussKernel(sigma);
+    cv::sepFilter2D(levels, blurred, CV_32F, kernel, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
     return Shoot(camera, blurred, number);
   };
 }
