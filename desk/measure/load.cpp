@@ -42,13 +42,13 @@ std::string PixelsHash(const cv::Mat& pixels) {
                 static_cast<unsigned long long>(hash.low64));
 }
 
-// A float picture of three channels, red first.
+// A float picture of three channels, red first; by the library's rules for what reaches a decoder.
 cv::Mat ReadFloats(const std::string& path) {
+  std::vector<unsigned char> bytes;
+  std::string reason;
   cv::Mat picture;
-  try {
-    picture = cv::imread(path, cv::IMREAD_UNCHANGED);
-  } catch (const cv::Exception& e) {
-    if (e.code == cv::Error::StsNoMem) throw;
+  if (QVResource::ReadPicture(path.c_str(), bytes, reason)) {
+    picture = QVResource::DecodePicture(bytes, reason, cv::IMREAD_UNCHANGED);
   }
   if (picture.empty()) throw Failure(kCouldNotMeasure, "not a picture that can be decoded");
   if (picture.depth() != CV_32F) {
