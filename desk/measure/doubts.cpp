@@ -17,6 +17,10 @@ constexpr int kFewestPixels = 200;     // of a side, to say anything of it
 constexpr double kShareAtEnd = 0.01;   // of pixels at a level that ends the range
 constexpr double kShareInside = 0.05;  // at another: of noise about one level, the outermost holds far less
 constexpr double kLeastNoise = 1;      // levels
+// Where the cut takes a side's own noise away, that of the other side tells that there was some.
+constexpr double kNoiseElsewhere = 2;
+constexpr double kShareFlat = 0.9;
+constexpr int kTail = 3;  // levels from the pile to the far end of its side
 
 struct Pixels {
   std::vector<int> levels;
@@ -46,14 +50,19 @@ double NoiseOf(const Pixels& side) {
   return sum / static_cast<double>(side.steps.size()) * std::sqrt(CV_PI) / 2;
 }
 
-std::optional<LevelPile> PileOf(const Pixels& side, bool top, int channel) {
+std::optional<LevelPile> PileOf(Pixels side, double noise_elsewhere, bool top, int channel) {
   if (side.levels.size() < kFewestPixels) return std::nullopt;
   const auto [lowest, highest] = std::minmax_element(side.levels.begin(), side.levels.end());
   const int level = top ? *highest : *lowest;
   const double share = static_cast<double>(std::count(side.levels.begin(), side.levels.end(), level)) /
                        static_cast<double>(side.levels.size());
   const bool at_end = top ? level == kLevels - 1 : level == 0;
-  const bool piled = at_end ? share > kShareAtEnd : share > kShareInside && NoiseOf(side) >= kLeastNoise;
+  const auto far = side.levels.begin() + static_cast<std::ptrdiff_t>(side.levels.size() / 50);
+  std::nth_element(side.levels.begin(), far, side.levels.end(),
+                   [=](int a, int b) { return std::abs(a - level) > std::abs(b - level); });
+  const bool one_sided = std::abs(*far - level) >= kTail || share > kShareFlat;
+  const bool noisy = NoiseOf(side) >= kLeastNoise || (noise_elsewhere >= kNoiseElsewhere && one_sided);
+  const bool piled = at_end ? share > kShareAtEnd : share > kShareInside && noisy;
   return piled ? std::optional<LevelPile>({level, top, channel, share}) : std::nullopt;
 }
 
@@ -87,8 +96,10 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
     double highest = 0;
     cv::minMaxLoc(channels[channel], &lowest, &highest, nullptr, nullptr, inside);
     const int middle = cvFloor((lowest + highest) / 2);
+    const Pixels light = SideOf(channels[channel], inside, middle, true);
+    const Pixels dark = SideOf(channels[channel], inside, middle, false);
     for (const bool top : {true, false}) {
-      const std::optional<LevelPile> pile = PileOf(SideOf(channels[channel], inside, middle, top), top, channel);
+      const std::optional<LevelPile> pile = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
       if (pile && (!worst || pile->share > worst->share)) worst = pile;
     }
   }

@@ -70,6 +70,7 @@ std::vector<Figure> SharpnessFigures(const std::vector<Figure>& more) {
       {"mtf50_iso_horizontal", kNyquist, Number::kReal, nullptr, kIso,
        "MTF50 of the horizontal region after ISO 12233, from the photo as it was taken."},
   };
+  for (const Figure& figure : DoubtFigures()) figures.push_back(figure);
   for (const Figure& figure : more) figures.push_back(figure);
   for (const Figure& figure : ChartFigures()) figures.push_back(figure);
   return figures;
@@ -93,6 +94,7 @@ std::unique_ptr<Finding> LookAtSharpness(const QVTester& tester, Record& record)
                Format("%s: the %s region gives no MTF50; does it show an edge?", record.inputs[0].path.c_str(), region),
                figure);
   }
+  DoubtSharpness(record, *finding);
   return finding;
 }
 

@@ -43,6 +43,11 @@ std::vector<Parameter> SharpnessParameters();
 /// MTF50 by the test and by ISO 12233, then `more`, then what was seen of the chart.
 std::vector<Figure> SharpnessFigures(const std::vector<Figure>& more = {});
 
+/// What the test's own figures would be of good light and without noise.
+std::vector<Figure> DoubtFigures();
+/// Adds these figures, and a doubt for each of the test's own figures that something in the photo has made wrong.
+void DoubtSharpness(Record& record, const SharpnessFinding& finding);
+
 /// What follows the measure itself, whatever its code: the chart's figures, those by ISO 12233, and doubts.
 std::unique_ptr<Finding> LookAtSharpness(const QVTester& tester, Record& record);
 

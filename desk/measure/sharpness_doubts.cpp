@@ -1,0 +1,83 @@
+// What would make a sharpness figure wrong without a word.
+
+#include <cmath>
+
+#include "desk/base/text.h"
+#include "desk/measure/doubts.h"
+#include "desk/measure/edge_resampling.h"
+#include "desk/measure/sharpness.h"
+
+namespace qv {
+
+namespace {
+
+constexpr double kMostOff = 0.05;      // of the noiseless figure
+constexpr double kUnevenLight = 0.03;  // fall of the light across a region, share of the edge's step
+
+constexpr Method kNoiselessMethod = {"the test's own measure of the region's edge spread alone",
+                                     "Within 2 % of what a photo without noise gives, up to 2 % noise.",
+                                     "Moved by focus, motion, sharpening and denoising; not by noise, nor by light "
+                                     "that falls evenly across the region."};
+
+void DoubtLevels(Record& record, const cv::Mat& photo, const SharpnessRegion& region, const char* name) {
+  const std::optional<LevelPile> pile = FindLevelPile(photo, region.outline);
+  if (!pile) return;
+  constexpr const char* kChannels[] = {"blue", "green", "red"};
+  record.Say(
+      Remark::kDoubt, "clipped",
+      Format("%s: the %s region is clipped: %.0f %% of its %s side lies at level %d of %s, so the edge looks sharper "
+             "than it is; use %s",
+             record.inputs[0].path.c_str(), name, 100 * pile->share, pile->top ? "light" : "dark", pile->level,
+             photo.channels() == 1 ? "grey" : kChannels[pile->channel],
+             pile->top ? "less light or a shorter exposure" : "more light, or a camera setting that keeps its blacks"),
+      std::string("mtf50_") + name);
+}
+
+// The figure of the edge alone says what noise and uneven light have made of it.
+void DoubtReading(Record& record, const SharpnessRegion& region, const char* name) {
+  QVTester tester;
+  const auto read = [&](const cv::Mat& levels) {
+    float mtf50 = 0;
+    tester.CalculateMTF(levels, mtf50);
+    return static_cast<double>(mtf50);
+  };
+  const std::string figure = std::string("mtf50_") + name;
+  const double value = record.phase.Find(figure)->value();
+  const NoiselessReading noiseless = ReadNoiseless(region.pixels, read);
+  record.phase.Add(std::string("mtf50_noiseless_") + name, noiseless.value);
+  const char* const path = record.inputs[0].path.c_str();
+  if (value <= 0) {
+    record.Say(
+        Remark::kDoubt, "impossible_figure",
+        Format("%s: an MTF50 of %.4f of the %s region is none: the curve starts below one half", path, value, name),
+        figure);
+    return;
+  }
+  if (!std::isfinite(noiseless.value) || std::fabs(value / noiseless.value - 1) <= kMostOff) return;
+  const bool uneven = noiseless.unevenness > kUnevenLight;
+  record.Say(Remark::kDoubt, uneven ? "uneven_light" : "noise",
+             Format("%s: the %s region reads %.4f Nyquist, and its edge without noise and in even light %.4f: %s", path,
+                    name, value, noiseless.value,
+                    uneven ? "the light falls across it; light the chart evenly"
+                           : "noise moved the reading; take several photos, and the median"),
+             figure);
+}
+
+}  // namespace
+
+std::vector<Figure> DoubtFigures() {
+  return {{"mtf50_noiseless_vertical", kNyquist, Number::kReal, nullptr, kNoiselessMethod,
+           "What the test's own MTF50 of the vertical region would be without the photo's noise and in even light."},
+          {"mtf50_noiseless_horizontal", kNyquist, Number::kReal, nullptr, kNoiselessMethod,
+           "What the test's own MTF50 of the horizontal region would be without the photo's noise and in even light."}};
+}
+
+void DoubtSharpness(Record& record, const SharpnessFinding& finding) {
+  for (std::size_t i = 0; i < finding.regions.size(); ++i) {
+    if (!std::isfinite(record.phase.Find(std::string("mtf50_") + kRegionNames[i])->value())) continue;
+    DoubtLevels(record, finding.photo, finding.regions[i], kRegionNames[i]);
+    DoubtReading(record, finding.regions[i], kRegionNames[i]);
+  }
+}
+
+}  // namespace qv
