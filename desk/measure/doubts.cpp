@@ -14,7 +14,7 @@ namespace {
 
 constexpr int kLevels = 256;
 constexpr int kFewestPixels = 200;     // of a side, to say anything of it
-constexpr double kShareAtEnd = 0.01;   // of pixels at a level that ends the range
+constexpr double kShareAtEnd = 0.05;   // of pixels at a level that ends the range
 constexpr double kShareInside = 0.05;  // at another: of noise about one level, the outermost holds far less
 constexpr double kLeastNoise = 1;      // levels
 // Where the cut takes a side's own noise away, that of the other side tells that there was some.
@@ -43,11 +43,14 @@ Pixels SideOf(const cv::Mat& channel, const cv::Mat& inside, int middle, bool to
   return side;
 }
 
-// Standard deviation from the mean step between neighbours: 2 sigma / sqrt(pi) for independent noise.
+// Standard deviation of independent noise, from the mean of the smallest three quarters of the steps between
+// neighbours: those across the edge are none of it. Of |a - b| of two normal values that mean is 0.728 sigma.
 double NoiseOf(const Pixels& side) {
-  if (side.steps.empty()) return 0;
-  const double sum = std::accumulate(side.steps.begin(), side.steps.end(), 0.0);
-  return sum / static_cast<double>(side.steps.size()) * std::sqrt(CV_PI) / 2;
+  std::vector<int> steps = side.steps;
+  const auto end = steps.begin() + static_cast<std::ptrdiff_t>(steps.size() / 4 * 3);
+  if (end == steps.begin()) return 0;
+  std::nth_element(steps.begin(), end, steps.end());
+  return std::accumulate(steps.begin(), end, 0.0) / static_cast<double>(end - steps.begin()) / 0.728;
 }
 
 std::optional<LevelPile> PileOf(Pixels side, double noise_elsewhere, bool top, int channel) {

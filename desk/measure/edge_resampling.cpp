@@ -15,6 +15,7 @@ constexpr double kSmoothing = 0.6;  // half the width of the smoothing, in sigma
 constexpr double kSpreads =
     4;  // sigmas and kBeyond pixels to each side of the edge, where it differs from its plateaus
 constexpr double kBeyond = 2;
+constexpr double kMoved = 0.05;  // pixels
 
 // A parabola through 2 m + 1 neighbours, its value at the middle (Savitzky and Golay).
 std::vector<double> Smoothed(const std::vector<double>& levels, int m) {
@@ -28,11 +29,12 @@ std::vector<double> Smoothed(const std::vector<double>& levels, int m) {
   return smooth;
 }
 
-// The region without its noise: each pixel by its distance from the edge.
-cv::Mat Noiseless(const SlantedEdge& edge) {
-  const double reach = std::min(kSpreads * edge.sigma_px + kBeyond, edge.room);
-  const EdgeSpread spread = ProjectEdge(edge, reach).whole;
-  if (spread.levels.empty()) return {};
+EdgeSpread SpreadOf(const SlantedEdge& edge) {
+  return ProjectEdge(edge, std::min(kSpreads * edge.sigma_px + kBeyond, edge.room)).whole;
+}
+
+// The region without its noise: each pixel by its distance from the edge, which is moved across by so many pixels.
+cv::Mat Noiseless(const SlantedEdge& edge, const EdgeSpread& spread, double moved = 0) {
   const std::vector<double> share =
       Smoothed(spread.levels, std::max(1, cvRound(kSmoothing * edge.sigma_px * kBinsPerPixel)));
   const int last = static_cast<int>(share.size()) - 1;
@@ -42,7 +44,7 @@ cv::Mat Noiseless(const SlantedEdge& edge) {
     const double place = edge.curve.Column(row);
     const double t = row - edge.curve.middle_row;
     for (int i = 0; i < picture.cols; ++i) {
-      const double d = (i - place) * across;
+      const double d = (i - place - moved) * across;
       const double bin = d * kBinsPerPixel + spread.middle;
       const int below = std::clamp(cvFloor(bin), 0, last - 1);
       double risen = d > 0 ? 1 : 0;
@@ -88,22 +90,30 @@ SlantedEdge EdgeOf(const cv::Mat& region) {
 
 NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
   SlantedEdge edge = EdgeOf(region);
-  if (edge.reason != nullptr) return {kNone, kNone};
+  if (edge.reason != nullptr) return {kNone, kNone, kNone, kNone};
   const double fall = std::max(std::fabs(edge.left.by_distance), std::fabs(edge.right.by_distance));
   const double uneven = fall * edge.light.cols / std::fabs(edge.right.level - edge.left.level);
   for (Plateau* plateau : {&edge.left, &edge.right}) plateau->by_distance = plateau->by_row = 0;
-  cv::Mat plain;
-  Noiseless(edge).convertTo(plain, CV_32F, 255);
-  if (plain.empty()) return {kNone, uneven};
-  cv::Mat turned = plain;
-  if (edge.lying) cv::transpose(plain, turned);
-  return {read(turned), uneven};
+  const EdgeSpread spread = SpreadOf(edge);
+  const auto moved = [&](double by) {
+    cv::Mat plain;
+    Noiseless(edge, spread, by).convertTo(plain, CV_32F, 255);
+    cv::Mat turned = plain;
+    if (edge.lying) cv::transpose(plain, turned);
+    return read(turned);
+  };
+  if (spread.levels.empty()) return {kNone, kNone, kNone, uneven};
+  const double value = moved(0);
+  const auto [low, high] = std::minmax({value, moved(-kMoved), moved(kMoved)});
+  return {value, low, high, uneven};
 }
 
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
   const SlantedEdge edge = EdgeOf(region);
-  const cv::Mat noiseless = edge.reason == nullptr ? Noiseless(edge) : cv::Mat();
-  if (noiseless.empty()) return {kNone, kNone, kNone, kResamplingMethod};
+  if (edge.reason != nullptr) return {kNone, kNone, kNone, kResamplingMethod};
+  const EdgeSpread spread = SpreadOf(edge);
+  if (spread.levels.empty()) return {kNone, kNone, kNone, kResamplingMethod};
+  const cv::Mat noiseless = Noiseless(edge, spread);
   const cv::Mat noise = edge.light - noiseless;
   const auto as_found = [&](const cv::Mat& picture) {
     cv::Mat turned = picture;

@@ -20,7 +20,9 @@ inline constexpr int kResamplings = 50;
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read);
 
 struct NoiselessReading {
-  double value;       // NaN where no edge is found
+  double value;  // NaN where no edge is found
+  double low,
+      high;  // the same of edges moved by up to a twentieth of a pixel, about which a measure may be of two minds
   double unevenness;  // by how much the light's fall across the region changes its plateaus, share of the edge's step
 };
 

@@ -53,7 +53,8 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
         figure);
     return;
   }
-  if (!std::isfinite(noiseless.value) || std::fabs(value / noiseless.value - 1) <= kMostOff) return;
+  if (!std::isfinite(noiseless.low) || !std::isfinite(noiseless.high)) return;
+  if (value >= noiseless.low * (1 - kMostOff) && value <= noiseless.high * (1 + kMostOff)) return;
   const bool uneven = noiseless.unevenness > kUnevenLight;
   record.Say(Remark::kDoubt, uneven ? "uneven_light" : "noise",
              Format("%s: the %s region reads %.4f Nyquist, and its edge without noise and in even light %.4f: %s", path,
