@@ -15,7 +15,7 @@ namespace {
 
 constexpr Method kSettling = {
     "running median of five measured frames, within 10 % of the median of the last fifth",
-    "Within one frame's interval of the true moment.",
+    "Up to 1.2 frame intervals after the true moment in films with little noise; half of one on average.",
     "Moved by the frame rate, by noise, and by a film that ends before the lens has come to rest."};
 constexpr Colour kVertical = {0.1, 0.35, 0.75};
 constexpr Colour kHorizontal = {0.85, 0.45, 0.0};
