@@ -54,6 +54,7 @@ const std::vector<Command> kCommands = {
      MeasuringCommand{"camera_preview", "--front", "The front camera's preview (test 19)", "camera_preview_front"}},
     {"circles", "Look for the chart's three marks in a preview frame", MeasuringCommand{"circle_check"}},
     {"dots", "Find bright and dark dots in a high-dynamic-range picture of a lit panel", MeasuringCommand{"hdr_dots"}},
+    {"lcd", "Judge the pattern that a display shows", MeasuringCommand{"lcd"}},
     {"register", "Bring a picture into the frame of a reference", Registration()},
     {"video", "Measure films, or the video camera's preview (tests 22 to 26)", nullptr},
     {"video preview", "Measure how much two preview frames of the video camera differ (test 22)",

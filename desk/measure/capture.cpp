@@ -1,12 +1,15 @@
 // Tests 16 and 20: the colour patches of a chart photo, beside those of a standard photo.
 
 #include <algorithm>
+#include <map>
 #include <numeric>
 
 #include "chart/chart_layout.h"
 #include "desk/base/text.h"
 #include "desk/measure/chart_view.h"
+#include "desk/measure/cielab.h"
 #include "desk/measure/load.h"
+#include "desk/measure/patch_values.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
 
@@ -21,6 +24,15 @@ constexpr Method kLab = {"mean over the patch, sRGB to L*a*b* relative to an imp
 constexpr Method kDelta = {"CIE 1976 difference to the standard photo's patch",
                            "As good as the two L*a*b* readings: about 0.4 in the mean.",
                            "Moved by whatever makes the photo's light or colour unlike the standard's."};
+
+constexpr Method kLabD65 = {
+    "mean over the patch, sRGB (IEC 61966-2-1) to CIE 1976 L*a*b* relative to D65",
+    "Within 0.3 of the colour as photographed in the mean; patch means are cut to whole levels.",
+    "Moved by exposure, white balance, light and shading; by clipping."};
+constexpr Method kDelta2000 = {
+    "CIEDE2000 difference (CIE 142-2001) to the standard photo's patch, or to the given values",
+    "The formula gives the 34 published pairs to their last digit; as good as the readings.",
+    "Moved by whatever makes the photo's light or colour unlike the standard's."};
 
 using PatchColours = std::vector<cv::Point3i>;
 
@@ -42,6 +54,33 @@ void CollectPatches(Phase& phase, const QVCaptureResult& result) {
   phase.Add("delta_e_76_mean", std::accumulate(delta.begin(), delta.end(), 0.0) / compared);
   phase.Add("delta_e_76_max", *std::max_element(delta.begin(), delta.end()));
   phase.Add("patches", result.capture_lab_count_);
+}
+
+cv::Vec3d LabD65(const cv::Point3i& rgb) { return LabD65OfSrgb(cv::Vec3d(rgb.x, rgb.y, rgb.z)); }
+
+// By CIE, beside the test's own: all patches that were measured, and those that there is something to compare with.
+void CollectByCie(Phase& phase, const PatchColours& measured, const std::map<int, cv::Vec3d>& standard) {
+  std::vector<double> numbers;
+  std::array<std::vector<double>, 3> lab;
+  std::vector<double> compared;
+  std::vector<double> differences;
+  for (std::size_t i = 0; i < measured.size(); ++i) {
+    const cv::Vec3d value = LabD65(measured[i]);
+    numbers.push_back(static_cast<double>(i));
+    for (int k = 0; k < 3; ++k) lab[k].push_back(value[k]);
+    const auto other = standard.find(static_cast<int>(i));
+    if (other == standard.end()) continue;
+    compared.push_back(static_cast<double>(i));
+    differences.push_back(DeltaE2000(value, other->second));
+  }
+  phase.Add("lab_d65_l", numbers, lab[0]);
+  phase.Add("lab_d65_a", numbers, lab[1]);
+  phase.Add("lab_d65_b", numbers, lab[2]);
+  if (compared.empty()) return;
+  const double total = std::accumulate(differences.begin(), differences.end(), 0.0);
+  phase.Add("delta_e_2000_mean", total / static_cast<double>(differences.size()));
+  phase.Add("delta_e_2000_max", *std::max_element(differences.begin(), differences.end()));
+  phase.Add("delta_e_2000", compared, differences);
 }
 
 void Swatch(Picture& picture, const cv::Rect2d& area, const cv::Point3i& colour) {
@@ -76,11 +115,11 @@ std::string CaptureFinding::Report(const Record& record) const {
                    phase.Find("lab_a")->values[i], phase.Find("lab_b")->values[i]);
     text += delta != nullptr && i < delta->values.size() ? Format("       %6.2f\n", delta->values[i]) : "\n";
   }
-  for (const char* figure : {"delta_e_76_mean", "delta_e_76_max"}) {
+  for (const char* figure : {"delta_e_76_mean", "delta_e_76_max", "delta_e_2000_mean", "delta_e_2000_max"}) {
     const Reading* m = phase.Find(figure);
     if (m == nullptr) continue;
     const std::string value = m->values.empty() ? "not measured" : Format("%.2f", m->value());
-    text += Format("%-16s %s%s\n", figure, value.c_str(), LimitText(*m).c_str());
+    text += Format("%-17s %s%s\n", figure, value.c_str(), LimitText(*m).c_str());
   }
   return text;
 }
@@ -130,7 +169,11 @@ class Capture : public Measurement {
     spec_.inputs = {{"photo", front ? QV_RESOURCE_FRONT_CHART_PHOTO : QV_RESOURCE_CHART_PHOTO, "Photo of the chart"},
                     {"standard", front ? QV_RESOURCE_FRONT_CHART_STANDARD : QV_RESOURCE_CHART_STANDARD,
                      "Photo of the same chart by a good camera, to compare with", true}};
-    spec_.parameters = {ThresholdParameter()};
+    spec_.parameters = {
+        ThresholdParameter(),
+        {"reference", Parameter::kPatches, "FILE",
+         "Patch values to compare with, in place of a standard photo: an earlier capture record, or lines of "
+         "number, L*, a*, b* (D65)"}};
     spec_.figures = Figures();
   }
 
@@ -152,7 +195,9 @@ class Capture : public Measurement {
       finding->view = DescribeChart(record, found, record.inputs[searched].path, finding->photo,
                                     missed_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
     }
-    if (code == QV_SUCCESS) TakePatches(*finding, tester);
+    if (code != QV_SUCCESS) return finding;
+    TakePatches(*finding, tester);
+    CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));
     return finding;
   }
 
@@ -168,6 +213,12 @@ class Capture : public Measurement {
         {"delta_e_76", kOne, kReal, &kPatchAxis, kDelta, "Colour difference of each patch to the standard photo's."},
         {"delta_e_76_mean", kOne, kReal, nullptr, kDelta, "Mean colour difference over the patches."},
         {"delta_e_76_max", kOne, kReal, nullptr, kDelta, "Largest colour difference of a patch."},
+        {"lab_d65_l", kOne, kReal, &kPatchAxis, kLabD65, "L* of each patch, by CIE relative to D65."},
+        {"lab_d65_a", kOne, kReal, &kPatchAxis, kLabD65, "a* of each patch, by CIE relative to D65."},
+        {"lab_d65_b", kOne, kReal, &kPatchAxis, kLabD65, "b* of each patch, by CIE relative to D65."},
+        {"delta_e_2000", kOne, kReal, &kPatchAxis, kDelta2000, "CIEDE2000 difference of each patch to the standard's."},
+        {"delta_e_2000_mean", kOne, kReal, nullptr, kDelta2000, "Mean CIEDE2000 difference over the patches."},
+        {"delta_e_2000_max", kOne, kReal, nullptr, kDelta2000, "Largest CIEDE2000 difference of a patch."},
     };
     for (const Figure& figure : ChartFigures()) figures.push_back(figure);
     return figures;
@@ -175,6 +226,19 @@ class Capture : public Measurement {
 
   const QVTester::ColorStandard& StandardOf(const QVTester& tester) const {
     return front_ ? tester.kept_->standard_front : tester.kept_->standard_main;
+  }
+
+  // The values given, else those of the standard photo.
+  static std::map<int, cv::Vec3d> GivenOrStandard(const CaptureFinding& finding, const Request& request, Record& record) {
+    std::map<int, cv::Vec3d> standard;
+    for (std::size_t i = 0; i < finding.standard.size(); ++i)
+      standard[static_cast<int>(i)] = LabD65(finding.standard[i]);
+    if (!request.parameters.contains("reference")) return standard;
+    if (!standard.empty()) {
+      record.Say(Remark::kWarning, "two_standards",
+                 "delta_e_2000 compares with the values given, delta_e_76 with the standard photo", "delta_e_2000");
+    }
+    return PatchValues(request.parameters["reference"]);
   }
 
   void TakePatches(CaptureFinding& finding, const QVTester& tester) const {

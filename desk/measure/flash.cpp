@@ -1,6 +1,8 @@
 // Tests 15 and 18: mean brightness of a flash photo.
 
 #include <algorithm>
+#include <array>
+#include <opencv2/core.hpp>
 
 #include "desk/base/text.h"
 #include "desk/measure/load.h"
@@ -15,13 +17,37 @@ constexpr Method kMean = {
     "mean over all pixels of the first channel", "Exact for the photo as stored.",
     "Moved by exposure, flash, shading and clipping; the first channel of a photo read from a file is blue."};
 
+constexpr Method kChannels = {"mean and counts over all pixels of each channel", "Exact for the photo as stored.",
+                              "Moved by exposure, flash, shading and white balance."};
+constexpr std::array<const char*, 3> kChannelNames = {"blue", "green", "red"};  // in the order of a decoded photo
+
+// A clipped pixel has the channel at its largest level.
+void CollectChannels(Phase& phase, const cv::Mat& photo) {
+  const double full = photo.depth() == CV_16U ? 65535 : 255;
+  for (int i = 0; i < std::min(photo.channels(), 3); ++i) {
+    cv::Mat channel;
+    cv::extractChannel(photo, channel, i);
+    phase.Add(std::string("mean_") + kChannelNames[i], cv::mean(channel)[0] * 255 / full);
+    phase.Add(std::string("clipped_") + kChannelNames[i],
+              cv::countNonZero(channel >= full) / static_cast<double>(channel.total()));
+  }
+}
+
 class FlashFinding : public Finding {
  public:
   explicit FlashFinding(cv::Mat photo) : photo_(std::move(photo)) {}
 
   std::string Report(const Record& record) const override {
     const Reading& mean = *record.phase.Find("mean");
-    return Format("mean of the first channel  %.2f of 255%s\n", mean.value(), LimitText(mean).c_str());
+    std::string text = Format("mean of the first channel  %.2f of 255%s\n", mean.value(), LimitText(mean).c_str());
+    for (const char* channel : kChannelNames) {
+      const Reading* const level = record.phase.Find(std::string("mean_") + channel);
+      const Reading* const clipped = record.phase.Find(std::string("clipped_") + channel);
+      if (level == nullptr) continue;
+      text += Format("%-5s  mean %.2f%s, clipped %.2f %%%s\n", channel, level->value(), LimitText(*level).c_str(),
+                     100 * clipped->value(), LimitText(*clipped).c_str());
+    }
+    return text;
   }
 
   std::optional<Picture> Draw(const Record& record) const override {
@@ -46,7 +72,15 @@ class Flash : public Measurement {
     spec_.test = vt ? QV_TEST_CAMERA_FLASH_VT : QV_TEST_CAMERA_FLASH;
     spec_.inputs = {{"photo", vt ? QV_RESOURCE_VT_FLASH_PHOTO : QV_RESOURCE_FLASH_PHOTO, "Photo taken with the flash"}};
     spec_.figures = {
-        {"mean", kGreyLevel, Number::kReal, nullptr, kMean, "Mean brightness of the flash photo, 0 to 255."}};
+        {"mean", kGreyLevel, Number::kReal, nullptr, kMean, "Mean brightness of the flash photo, 0 to 255."},
+        {"mean_red", kGreyLevel, Number::kReal, nullptr, kChannels, "Mean of the red channel, 0 to 255."},
+        {"mean_green", kGreyLevel, Number::kReal, nullptr, kChannels, "Mean of the green channel, 0 to 255."},
+        {"mean_blue", kGreyLevel, Number::kReal, nullptr, kChannels, "Mean of the blue channel, 0 to 255."},
+        {"clipped_red", kOne, Number::kReal, nullptr, kChannels, "Share of pixels whose red is at its largest level."},
+        {"clipped_green", kOne, Number::kReal, nullptr, kChannels,
+         "Share of pixels whose green is at its largest level."},
+        {"clipped_blue", kOne, Number::kReal, nullptr, kChannels,
+         "Share of pixels whose blue is at its largest level."}};
   }
 
   const Spec& spec() const override { return spec_; }
@@ -55,6 +89,7 @@ class Flash : public Measurement {
     if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
       const bool vt = spec_.test == QV_TEST_CAMERA_FLASH_VT;
       record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_);
+      CollectChannels(record.phase, SlotPhoto(tester, spec_.inputs[0].slot));
     }
     return std::make_unique<FlashFinding>(SlotPhoto(tester, spec_.inputs[0].slot));
   }

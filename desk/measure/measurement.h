@@ -25,6 +25,7 @@ struct Parameter {
     kWord,       // one of `words`
     kSize,       // "4000x3000"
     kHistogram,  // 256 whole numbers, or a file that holds them: a dust record or a list
+    kPatches,    // [number, L*, a*, b*] of patches, or a file that holds them: a capture record or lines of numbers
   };
   const char* name;  // "pixel_pitch"; the option is --pixel-pitch
   Type type;
@@ -34,6 +35,7 @@ struct Parameter {
   double low = 0, high = 0;
   std::vector<std::string> words = {};             // the only ones; numbers too
   std::optional<QV_PROPERTY_INDEX> property = {};  // that it sets, whose default is its own
+  bool required = false;
 };
 
 /// The value as it is stored; throws Failure (wrong usage) for one that the parameter can't have.

@@ -12,6 +12,7 @@ const Measurement& CaptureMeasurement(bool front);
 const Measurement& CircleCheckMeasurement();
 const Measurement& DustMeasurement(bool front);
 const Measurement& DotsMeasurement();
+const Measurement& LcdMeasurement();
 const Measurement& RegistrationMeasurement();
 const Measurement& PreviewMeasurement(bool front);
 const Measurement& FlashMeasurement(bool vt);
@@ -26,6 +27,7 @@ const std::vector<const Measurement*>& Measurements() {
       &CircleCheckMeasurement(),  &DustMeasurement(false),    &DustMeasurement(true),     &DotsMeasurement(),
       &RegistrationMeasurement(), &PreviewMeasurement(false), &PreviewMeasurement(true),  &FlashMeasurement(false),
       &FlashMeasurement(true),
+      &LcdMeasurement(),
       &VideoPreviewMeasurement(),
       &VideoFocusMeasurement(),
       &VideoFlashMeasurement(),

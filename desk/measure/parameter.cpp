@@ -11,6 +11,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/histogram.h"
 #include "desk/measure/measurement.h"
+#include "desk/measure/patch_values.h"
 #include "desk/measure/properties.h"
 
 namespace qv {
@@ -80,6 +81,7 @@ Json Checked(const Parameter& parameter, const Json& value) {
     case Parameter::kReal: return CheckedNumber(parameter, value);
     case Parameter::kWord: return CheckedWord(parameter, value);
     case Parameter::kSize: return CheckedSize(parameter, value);
+    case Parameter::kPatches: return CheckedPatches(value);
     default: return CheckedHistogram(value);
   }
 }

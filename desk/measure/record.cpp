@@ -214,11 +214,13 @@ std::string Record::MissSentence() const {
   // The circle check answers a miss with 0.
   const ResultCode& row = FindCode(phase.code == QV_DONE ? QV_ERROR_PATTERN_NOT_FOUND : phase.code);
   if (text.empty()) text = row.meaning;
-  const std::string look_at = advice.empty() || row.code != QV_ERROR_INVALID_ARGUMENT ? row.look_at : advice;
+  const bool advised = !advice.empty() && (row.code == QV_ERROR_INVALID_ARGUMENT || !meaning.empty());
+  const std::string look_at = advised ? advice : row.look_at;
   if (row.code != phase.code) {
     return Format("%s (code %d: %s); %s", text.c_str(), phase.code, row.meaning, look_at.c_str());
   }
-  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name, row.meaning, look_at.c_str());
+  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name,
+                meaning.empty() ? row.meaning : meaning.c_str(), look_at.c_str());
 }
 
 Json Record::ToJson() const {

@@ -100,6 +100,7 @@ struct Record {
   std::vector<std::string> chatter;  // what decoders wrote on the side; not stored
   std::vector<Remark> remarks;
   std::optional<std::size_t> refused;      // the input that the library refused, where that is known
+  std::string meaning;                     // of a miss, where it is not the code's own
   std::string advice;                      // what to look at when an input is refused; empty: the code's own
   std::shared_ptr<const Finding> finding;  // none when an input could not be loaded
 

@@ -55,6 +55,7 @@ Json ValueOf(const Parameter& parameter, Request& request) {
   const std::string property = parameter.property ? std::to_string(*parameter.property) : "";
   const bool by_property = !property.empty() && request.properties.contains(property);
   const bool given = request.parameters.contains(parameter.name);
+  if (!given && !by_property && parameter.required) Refuse(std::string(parameter.name) + " is needed");
   if (!given && !by_property) return InitialValue(parameter);
   Json value = Checked(parameter, given ? request.parameters[parameter.name] : request.properties[property]);
   if (!by_property) return value;

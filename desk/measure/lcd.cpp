@@ -1,0 +1,211 @@
+// A display in a photo: what it shows, judged by the library's own rules.
+
+#include <algorithm>
+
+#include "desk/base/failure.h"
+#include "desk/base/text.h"
+#include "desk/measure/load.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+#include "qvtester/lcd.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kScreen = {
+    "lines fitted to the screen's edges, each a blurred step fitted to its profile",
+    "Corners lie within 0.03 px in the median, up to 30 degrees of pan and tilt (docs/accuracy.md).",
+    "Moved by lens distortion, by what covers an edge; rounded corners are taken for sharp ones."};
+constexpr Method kVerdict = {
+    "means of the colour channels, relative to one another and to the full range, and the ratio of the sides",
+    "Every one of 500 simulated photos told right (docs/accuracy.md).",
+    "Moved by exposure and white balance of the outer camera, by light that the glass mirrors."};
+constexpr Method kMeans = {"means of stored levels over the straightened screen", "Exact for the photo as stored.",
+                           "Moved by exposure, by light that the glass mirrors, by the lens's shading."};
+constexpr Method kDots = {
+    "relative difference to the mean of a square window, by channel; dots that lie close are one area",
+    "Points of 4 px and more that differ by half are found; none within 2 % of the rim.",
+    "Moved by noise, focus and moire between the camera's pixels and the display's."};
+
+constexpr Unit kPointAxis = {"point", "C62", "1"};
+// A slot for a photo that no numbered test reads: what holds the display's photo meanwhile.
+constexpr auto kSlot = static_cast<QV_RESOURCE_INDEX>(33);
+
+const std::vector<std::string> kPatternNames = {"control", "green", "black", "white", "result"};
+
+std::vector<double> Numbers(std::size_t count) {
+  std::vector<double> numbers(count);
+  for (std::size_t i = 0; i < count; ++i) numbers[i] = static_cast<double>(i);
+  return numbers;
+}
+
+class LcdFinding : public Finding {
+ public:
+  std::string Report(const Record& record) const override;
+  std::optional<Picture> Draw(const Record& record) const override;
+
+  cv::Mat photo, screen;
+  std::vector<cv::Point2f> corners;
+  QVLcdResult result;
+};
+
+std::string LcdFinding::Report(const Record& record) const {
+  const Phase& phase = record.phase;
+  std::string text = Format("verdict    %d: %s%s\n", result.verdict_, result.reason_.c_str(),
+                            LimitText(*phase.Find("verdict")).c_str());
+  text +=
+      Format("means      red %.1f, green %.1f, blue %.1f of 255\n", result.sums_[0], result.sums_[1], result.sums_[2]);
+  text += Format("sides      %.3f to 1%s\n", result.ratio_, LimitText(*phase.Find("ratio")).c_str());
+  text += Format("uniformity %.3f%s\n", result.uniformity_, LimitText(*phase.Find("uniformity")).c_str());
+  text += Format("dots       %d%s\n", result.error_count_, LimitText(*phase.Find("dot_count")).c_str());
+  for (const QVRECT& r : result.error_areas_) {
+    text += Format("           column %d to %d, row %d to %d of the screen\n", r.left, r.right, r.top, r.bottom);
+  }
+  return text;
+}
+
+// The photo with the screen outlined; beside it the screen, straightened, with its dots.
+std::optional<Picture> LcdFinding::Draw(const Record& record) const {
+  constexpr double kScreenPx = 560;
+  if (record.phase.code != QV_SUCCESS && record.phase.code != QV_ERROR_PATTERN_NOT_FOUND) return std::nullopt;
+  const double scale = FitScale(photo, 900);
+  const double width = photo.cols * scale;
+  Picture picture(cvRound(width + (screen.empty() ? 0 : kScreenPx + 20)),
+                  cvRound(std::max(photo.rows * scale, 420.0) + kHeadPx));
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
+  if (screen.empty()) {
+    picture.Text("no screen found", {12, 28}, 18, kPoor);
+    return picture;
+  }
+  picture.Text(Format("%s, verdict %d: %s", record.request.parameters.at("pattern").get<std::string>().c_str(),
+                      result.verdict_, result.reason_.c_str()),
+               {12, 28}, 16, result.verdict_ == 1 ? kInk : kPoor);
+  std::vector<cv::Point2d> outline;
+  for (const cv::Point2f& corner : corners) outline.push_back(place(corner));
+  picture.Line(outline, kGood, 2, true);
+  for (std::size_t i = 0; i < outline.size(); ++i) {
+    picture.Text(std::to_string(i), outline[i] + cv::Point2d(6, -6), 15, kGood, Align::kLeft, true);
+  }
+  const PhotoPlace at = picture.PlacePhoto(screen, {width + 20, kHeadPx}, FitScale(screen, kScreenPx));
+  for (int i = 0; i < 9; ++i) {
+    const cv::Point2d point((2 * (i % 3) + 1) * screen.cols / 6.0, (2 * (i / 3) + 1) * screen.rows / 6.0);
+    picture.Text(Format("%.0f", result.levels_[i]), at(point), 14, kGood, Align::kCentre, true);
+  }
+  for (const QVRECT& r : result.error_areas_) {
+    const cv::Point2d middle((r.left + r.right) / 2.0, (r.top + r.bottom) / 2.0);
+    const double radius = std::hypot(r.right - r.left + 1, r.bottom - r.top + 1) / 2 * at.scale;
+    picture.Circle(at(middle), std::max(8.0, radius + 4), kPoor, 2);
+  }
+  return picture;
+}
+
+void Collect(Phase& phase, const LcdFinding& found) {
+  const QVLcdResult& r = found.result;
+  Reading& verdict = phase.Add("verdict", r.verdict_);
+  verdict.limit.min = 1;  // the library's own judgement is one, without a limits file too
+  verdict.outcome = r.verdict_ == 1 ? Outcome::kPass : Outcome::kFail;
+  const char* const channels[] = {"red", "green", "blue"};
+  for (int i = 0; i < 3; ++i) {
+    phase.Add(std::string("mean_") + channels[i], r.sums_[i]);
+    phase.Add(std::string("share_") + channels[i], r.shares_[i]);
+  }
+  phase.Add("ratio", r.ratio_);
+  phase.Add("levels", Numbers(9), {std::begin(r.levels_), std::end(r.levels_)});
+  phase.Add("uniformity", r.uniformity_);
+  phase.Add("dot_count", r.error_count_);
+  std::vector<double> columns;
+  std::vector<double> rows;
+  for (const QVRECT& area : r.error_areas_) {
+    columns.push_back((area.left + area.right) / 2.0);
+    rows.push_back((area.top + area.bottom) / 2.0);
+  }
+  phase.Add("dots", columns, rows);
+  columns.clear();
+  rows.clear();
+  for (const cv::Point2f& corner : found.corners) {
+    columns.push_back(corner.x);
+    rows.push_back(corner.y);
+  }
+  phase.Add("corners", columns, rows);
+}
+
+class Lcd : public Measurement {
+ public:
+  Lcd() {
+    const QVTester_LCD defaults;
+    spec_.name = "lcd";
+    spec_.routine = "QVTester_LCD::JudgePattern";
+    spec_.inputs = {{"photo", kSlot, "Photo of the display"}};
+    Parameter pattern = {"pattern", Parameter::kWord, "P", "What the display was told to show"};
+    pattern.words = kPatternNames;
+    pattern.required = true;
+    spec_.parameters = {pattern,
+                        {"ratio", Parameter::kReal, "R", "Ratio of the display's sides, either way round",
+                         defaults.expected_ratio_, 0.1, 10},
+                        {"dot_threshold", Parameter::kReal, "SHARE", "How far a dot departs from what is about it",
+                         defaults.dot_threshold_, 0.001, 10}};
+    spec_.figures = Figures();
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    auto finding = std::make_unique<LcdFinding>();
+    finding->photo = SlotPhoto(tester, kSlot);
+    QVTester_LCD lcd;
+    lcd.expected_ratio_ = request.parameters.at("ratio");
+    lcd.dot_threshold_ = request.parameters.at("dot_threshold");
+    const auto pattern = std::find(kPatternNames.begin(), kPatternNames.end(), request.parameters.at("pattern"));
+    const auto index = static_cast<QV_LCD_PATTERN>(pattern - kPatternNames.begin());
+    if (!RunRoutine(record.phase, spec_.routine,
+                    [&] { return lcd.JudgePattern(finding->photo, index, &finding->result); })) {
+      if (record.phase.code != QV_ERROR_PATTERN_NOT_FOUND) return finding;
+      record.Say(Remark::kMiss, "no_screen", record.inputs[0].path + ": no screen is seen");
+      record.meaning = "the pattern was not found";
+      record.advice =
+          "are all four of its sides in view, brighter than what lies around it, or darker if it is to be black?";
+      return finding;
+    }
+    finding->corners = lcd.corners_;
+    lcd.keep_corners_ = true;
+    lcd.Straighten(finding->photo, lcd.screen_size_, finding->screen);
+    Collect(record.phase, *finding);
+    if (finding->result.verdict_ != 1) record.Say(Remark::kWarning, "verdict", finding->result.reason_, "verdict");
+    return finding;
+  }
+
+ private:
+  static std::vector<Figure> Figures() {
+    constexpr auto kWhole = Number::kWhole;
+    constexpr auto kReal = Number::kReal;
+    return {
+        {"verdict", kOne, kWhole, nullptr, kVerdict, "1 when the display shows the pattern, else 0."},
+        {"mean_red", kGreyLevel, kReal, nullptr, kMeans, "Mean of the red channel over the screen, 0 to 255."},
+        {"mean_green", kGreyLevel, kReal, nullptr, kMeans, "Mean of the green channel over the screen, 0 to 255."},
+        {"mean_blue", kGreyLevel, kReal, nullptr, kMeans, "Mean of the blue channel over the screen, 0 to 255."},
+        {"share_red", kOne, kReal, nullptr, kMeans, "Share of red in the three means."},
+        {"share_green", kOne, kReal, nullptr, kMeans, "Share of green in the three means."},
+        {"share_blue", kOne, kReal, nullptr, kMeans, "Share of blue in the three means."},
+        {"ratio", kOne, kReal, nullptr, kScreen, "Width to height of the screen as seen, foreshortened as it is."},
+        {"levels", kGreyLevel, kReal, &kPointAxis, kMeans,
+         "Mean grey at 3 x 3 points of the screen, row by row from the upper left."},
+        {"uniformity", kOne, kReal, nullptr, kMeans, "Smallest over largest of the nine levels."},
+        {"dot_count", kOne, kWhole, nullptr, kDots, "Dots on the screen; none are looked for in a result field."},
+        {"dots", kPixel, kReal, &kColumnAxis, kDots, "Middles of the dots, column and row of the straightened screen."},
+        {"corners", kPixel, kReal, &kColumnAxis, kScreen,
+         "The screen's corners in the photo, column and row, clockwise from the upper left."},
+    };
+  }
+
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& LcdMeasurement() {
+  static const Lcd lcd;
+  return lcd;
+}
+
+}  // namespace qv
