@@ -43,7 +43,7 @@ class FlashFinding : public Finding {
     for (const char* channel : kChannelNames) {
       const Reading* const level = record.phase.Find(std::string("mean_") + channel);
       const Reading* const clipped = record.phase.Find(std::string("clipped_") + channel);
-      if (level == nullptr) continue;
+      if (level == nullptr || level->values.empty()) continue;
       text += Format("%-5s  mean %.2f%s, clipped %.2f %%%s\n", channel, level->value(), LimitText(*level).c_str(),
                      100 * clipped->value(), LimitText(*clipped).c_str());
     }

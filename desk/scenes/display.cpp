@@ -33,7 +33,7 @@ Scene Display(const DisplayStyle& style) {
   scene.paper = cv::Vec3d::all(style.surround);
   if (style.bezel > 0) {
     const cv::Point2d rim(style.bezel, style.bezel);
-    scene.shapes.push_back(Box({screen.tl() - rim, screen.br() + rim}, {8, 8, 8}));
+    scene.shapes.push_back(Box({screen.tl() - rim, screen.br() + rim}, cv::Vec3d::all(style.bezel_level)));
   }
   const auto show = [&](cv::Vec3d colour) { return colour.mul(style.tint); };
   const cv::Vec3d black = cv::Vec3d::all(style.black);

@@ -17,9 +17,10 @@ inline const std::vector<std::string> kDisplayPatterns = {"control", "green", "b
 
 struct DisplayStyle {
   std::string pattern = "white";
-  double ratio = 16.0 / 9.0;         // width to height
-  double surround = 40;              // level of what lies around the phone
-  double bezel = 0;                  // width of the dark rim about the screen, screen units
+  double ratio = 16.0 / 9.0;  // width to height
+  double surround = 40;       // level of what lies around the phone
+  double bezel = 0;           // width of the dark rim about the screen, screen units
+  double bezel_level = 8;
   double black = 6;                  // level of a screen that shows nothing
   cv::Vec3d tint = {1, 1, 1};        // factors on what the screen shows: a wrong colour
   std::vector<cv::Point2d> defects;  // points that are black, or white in black

@@ -372,10 +372,12 @@ std::optional<Screen> HoldAgainst(const Levels& levels, const Candidate& candida
 
 // ---- 3. The screen among the candidates -----------------------------------------------------------------------------
 
-bool LiesIn(const Quad& inner, const Quad& outer) {
+// At least so far from every side.
+bool LiesIn(const Quad& inner, const Quad& outer, double margin) {
   const Sides sides = SidesOf(outer);
   return std::all_of(inner.begin(), inner.end(), [&](cv::Point2d p) {
-    return std::all_of(sides.begin(), sides.end(), [&](const Line& side) { return side.n().dot(p - side.p) < 1; });
+    return std::all_of(sides.begin(), sides.end(),
+                       [&](const Line& side) { return side.n().dot(p - side.p) < -margin; });
   });
 }
 
@@ -383,7 +385,17 @@ const Screen* Largest(const std::vector<Screen>& screens, const Screen* within, 
   const Screen* largest = nullptr;
   for (const Screen& screen : screens) {
     if (&screen == within || (dark && screen.dark != *dark)) continue;
-    if (within != nullptr && !LiesIn(screen.corners, within->corners)) continue;
+    if (within != nullptr && !LiesIn(screen.corners, within->corners, -1)) continue;
+    if (largest == nullptr || Area(screen.corners) > Area(largest->corners)) largest = &screen;
+  }
+  return largest;
+}
+
+// Of the bright ones that lie well within a bright one.
+const Screen* LargestInside(const std::vector<Screen>& screens, const Screen& outer) {
+  const Screen* largest = nullptr;
+  for (const Screen& screen : screens) {
+    if (screen.dark || !LiesIn(screen.corners, outer.corners, 0.01 * std::sqrt(Area(outer.corners)))) continue;
     if (largest == nullptr || Area(screen.corners) > Area(largest->corners)) largest = &screen;
   }
   return largest;
@@ -399,6 +411,11 @@ const Screen* Choose(const std::vector<Screen>& screens, bool dark_first) {
   if (phone != nullptr) {
     const Screen* lit = Largest(screens, phone, false);
     if (lit != nullptr && Area(lit->corners) > kScreenOfPhone * Area(phone->corners)) chosen = lit;
+  }
+  // A light frame about a lighter screen.
+  if (!chosen->dark) {
+    const Screen* inner = LargestInside(screens, *chosen);
+    if (inner != nullptr && Area(inner->corners) > kScreenOfPhone * Area(chosen->corners)) chosen = inner;
   }
   // Of nearly the same outlines, from other levels, the one that is best supported.
   const Screen* best = chosen;
@@ -416,12 +433,16 @@ struct Sample {
   double place, level;  // pixels outward from the line; 0 to 255
 };
 
+struct Profile {
+  std::vector<Sample> samples;
+  double noise = 0;  // standard deviation of a pixel, levels
+};
+
 // Mean level by distance from the line, in quarters of a pixel, from the photo's pixels along a piece of the side.
-std::vector<Sample> EdgeProfile(const Levels& levels, cv::Point2d from, cv::Point2d to, const Line& line,
-                                double reach) {
+Profile EdgeProfile(const Levels& levels, cv::Point2d from, cv::Point2d to, const Line& line, double reach) {
   constexpr int kPerPixel = 4;
   const int bins = 2 * static_cast<int>(reach * kPerPixel) + 1;
-  std::vector<cv::Vec3d> sums(bins);  // count, place, level
+  std::vector<cv::Vec4d> sums(bins);  // count, place, level, its square
   const bool lying = std::abs(line.d.x) > std::abs(line.d.y);
   const auto major = [lying](cv::Point2d p) { return lying ? p.x : p.y; };
   const double a = major(from);
@@ -434,12 +455,24 @@ std::vector<Sample> EdgeProfile(const Levels& levels, cv::Point2d from, cv::Poin
       const cv::Point p = lying ? cv::Point(i, j) : cv::Point(j, i);
       const double place = line.n().dot(cv::Point2d(p) - line.p);
       const int bin = cvRound(place * kPerPixel) + bins / 2;
-      if (bin >= 0 && bin < bins && levels.Holds(p)) sums[bin] += cv::Vec3d(1, place, levels.At(p.x, p.y));
+      if (bin < 0 || bin >= bins || !levels.Holds(p)) continue;
+      const double level = levels.At(p.x, p.y);
+      sums[bin] += cv::Vec4d(1, place, level, level * level);
     }
   }
-  std::vector<Sample> profile;
-  for (const cv::Vec3d& sum : sums) {
-    if (sum[0] > 0) profile.push_back({sum[1] / sum[0], sum[2] / sum[0]});
+  Profile profile;
+  std::vector<double> variances;  // at the ends, away from the edge
+  for (const cv::Vec4d& sum : sums) {
+    if (sum[0] == 0) continue;
+    const Sample sample = {sum[1] / sum[0], sum[2] / sum[0]};
+    profile.samples.push_back(sample);
+    if (std::abs(sample.place) > reach / 2) variances.push_back(sum[3] / sum[0] - sample.level * sample.level);
+  }
+  // The upper quartile: where levels are clipped, noise hardly shows.
+  const auto upper = variances.begin() + static_cast<std::ptrdiff_t>(variances.size() * 3 / 4);
+  if (upper != variances.end()) {
+    std::nth_element(variances.begin(), upper, variances.end());
+    profile.noise = std::sqrt(std::max(*upper, 0.0));
   }
   return profile;
 }
@@ -457,14 +490,23 @@ double LightOfSrgb(double v) { return v <= 0.04045 ? v / 12.92 : std::pow((v + 0
 // more there is inside.
 using Edge = cv::Vec4d;
 
-double StoredLevel(const Edge& edge, Transfer stored, double place) {
-  const double light = edge[2] + edge[3] * 0.5 * std::erfc((place - edge[0]) / (std::sqrt(2.0) * std::exp(edge[1])));
-  return 255 * std::clamp(stored(std::max(light, 0.0)), 0.0, 1.0);
+// Mean of a level with noise, none of which goes below 0.
+double ClippedMean(double level, double noise) {
+  if (level > 4 * noise) return level;
+  const double x = level / noise;
+  return level * 0.5 * std::erfc(-x / std::sqrt(2.0)) + noise * std::exp(-x * x / 2) / std::sqrt(2 * CV_PI);
 }
 
-double SquaredError(const std::vector<Sample>& profile, const Edge& edge, Transfer stored) {
+double StoredLevel(const Edge& edge, Transfer stored, double noise, double place) {
+  const double light = edge[2] + edge[3] * 0.5 * std::erfc((place - edge[0]) / (std::sqrt(2.0) * std::exp(edge[1])));
+  return ClippedMean(255 * std::clamp(stored(std::max(light, 0.0)), 0.0, 1.0), noise);
+}
+
+double SquaredError(const Profile& profile, const Edge& edge, Transfer stored) {
   double sum = 0;
-  for (const Sample& s : profile) sum += std::pow(s.level - StoredLevel(edge, stored, s.place), 2);
+  for (const Sample& s : profile.samples) {
+    sum += std::pow(s.level - StoredLevel(edge, stored, profile.noise, s.place), 2);
+  }
   return sum;
 }
 
@@ -473,21 +515,22 @@ struct EdgeFit {
 };
 
 // By Levenberg and Marquardt's method.
-EdgeFit FitEdge(const std::vector<Sample>& profile, Transfer stored) {
+EdgeFit FitEdge(const Profile& profile, Transfer stored) {
   const auto light = [stored](double level) { return stored == AsLight ? level / 255 : LightOfSrgb(level / 255); };
-  Edge edge(0, 0, light(profile.back().level), light(profile.front().level) - light(profile.back().level));
+  const double outside = light(profile.samples.back().level);
+  Edge edge(0, 0, outside, light(profile.samples.front().level) - outside);
   double error = SquaredError(profile, edge, stored);
   double damping = 1e-3;
   for (int round = 0; round < 30 && damping < 1e6; ++round) {
     cv::Matx44d curvature = cv::Matx44d::zeros();
     Edge slope;
-    for (const Sample& s : profile) {
-      const double level = StoredLevel(edge, stored, s.place);
+    for (const Sample& s : profile.samples) {
+      const double level = StoredLevel(edge, stored, profile.noise, s.place);
       Edge change;
       for (int k = 0; k < 4; ++k) {
         Edge moved = edge;
         moved[k] += 1e-5;
-        change[k] = (StoredLevel(moved, stored, s.place) - level) / 1e-5;
+        change[k] = (StoredLevel(moved, stored, profile.noise, s.place) - level) / 1e-5;
       }
       curvature += change * change.t();
       slope += change * (s.level - level);
@@ -510,18 +553,17 @@ EdgeFit FitEdge(const std::vector<Sample>& profile, Transfer stored) {
 // A side in pieces, so that its direction comes out as well as its place.
 struct PiecewiseFit {
   std::vector<cv::Point2d> points;
-  double error = 0;
+  std::vector<double> errors;  // of all pieces
 };
 
-PiecewiseFit FitPieces(const std::vector<std::vector<Sample>>& pieces, const Line& line, double length,
-                       Transfer stored) {
+PiecewiseFit FitPieces(const std::vector<Profile>& pieces, const Line& line, double length, Transfer stored) {
   PiecewiseFit fit;
   const double used = (1 - 2 * kSkipped) * length;
   for (std::size_t i = 0; i < pieces.size(); ++i) {
     const EdgeFit edge = FitEdge(pieces[i], stored);
     const double along = kSkipped * length + used * (static_cast<double>(i) + 0.5) / static_cast<double>(pieces.size());
     if (std::abs(edge.place) < 3) fit.points.push_back(line.p + line.d * along + line.n() * edge.place);
-    fit.error += edge.error;
+    fit.errors.push_back(edge.error);
   }
   return fit;
 }
@@ -571,12 +613,13 @@ void CutAtNextEdge(std::vector<Sample>& profile) {
 
 // Of the profiles of one piece by channel, the one with the highest step: the brightest channel at each place would
 // bend the profile where noise decides which that is.
-std::vector<Sample> BestProfile(const std::vector<Levels>& channels, cv::Point2d from, cv::Point2d to, const Line& line,
-                                double reach) {
-  std::vector<Sample> best;
+Profile BestProfile(const std::vector<Levels>& channels, cv::Point2d from, cv::Point2d to, const Line& line,
+                    double reach) {
+  Profile best;
   double highest = -1;
   for (const Levels& channel : channels) {
-    std::vector<Sample> profile = EdgeProfile(channel, from, to, line, reach);
+    Profile found = EdgeProfile(channel, from, to, line, reach);
+    const std::vector<Sample>& profile = found.samples;
     if (profile.size() < 5) return {};
     const std::size_t few = profile.size() / 4 + 1;
     double step = 0;
@@ -584,9 +627,9 @@ std::vector<Sample> BestProfile(const std::vector<Levels>& channels, cv::Point2d
     step = std::abs(step) / static_cast<double>(few);
     if (step <= highest) continue;
     highest = step;
-    best.swap(profile);
+    std::swap(best, found);
   }
-  CutAtNextEdge(best);
+  CutAtNextEdge(best.samples);
   return best;
 }
 
@@ -600,17 +643,23 @@ Quad Refine(const std::vector<Levels>& channels, const Screen& screen) {
     const cv::Point2d from = screen.corners[i];
     const cv::Point2d way = screen.corners[(i + 1) % 4] - from;
     const int count = static_cast<int>(std::clamp(cv::norm(way) / 24, 2.0, 10.0));
-    std::vector<std::vector<Sample>> pieces;
+    std::vector<Profile> pieces;
     for (int k = 0; k < count; ++k) {
       const auto at = [&](int end) { return from + way * (kSkipped + (1 - 2 * kSkipped) * end / count); };
       pieces.push_back(BestProfile(channels, at(k), at(k + 1), sides[i], reach));
-      if (pieces.back().empty()) return screen.corners;
+      if (pieces.back().samples.empty()) return screen.corners;
     }
     fits[0][i] = FitPieces(pieces, sides[i], cv::norm(way), AsLight);
     fits[1][i] = FitPieces(pieces, sides[i], cv::norm(way), AsSrgb);
   }
-  const auto error = [](const auto& of) { return of[0].error + of[1].error + of[2].error + of[3].error; };
-  const auto& best = error(fits[1]) < error(fits[0]) ? fits[1] : fits[0];
+  double vote =
+      0;  // for sRGB; a piece that neither fits, at the end of a bar or under a reflection, has no more than one
+  for (int i = 0; i < 4; ++i) {
+    for (std::size_t k = 0; k < fits[0][i].errors.size(); ++k) {
+      vote += std::clamp(std::log((fits[0][i].errors[k] + 1e-9) / (fits[1][i].errors[k] + 1e-9)), -1.0, 1.0);
+    }
+  }
+  const auto& best = fits[vote > 0 ? 1 : 0];
   Sides fitted;
   for (int i = 0; i < 4; ++i) fitted[i] = Through(best[i].points, sides[i]);
   return CornersOf(fitted).value_or(screen.corners);

@@ -1,0 +1,213 @@
+// How true what is read of a display's photo is: corners, and patterns told from one another, on simulated photos.
+//   display_accuracy [--check] [--quick]     --check: exit status 1 where a promise is broken
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <map>
+#include <mutex>
+#include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
+#include <string>
+#include <vector>
+
+#include "desk/simulation/simulation.h"
+#include "qvtester/lcd.h"
+
+namespace qv {
+namespace {
+
+constexpr double kPromisedMedianPx = 0.5;
+
+// How the photo is made of the light on the sensor. The simulated scene's levels stand for light where it is encoded.
+struct Setting {
+  const char* name;
+  cv::Size size;
+  double blur_px, noise_percent;
+  bool srgb = false;  // the light is blurred, then encoded by sRGB's transfer
+  double exposure_ev = 0;
+  int jpeg = 0;
+};
+const Setting kSettings[] = {
+    {"800 x 600", {800, 600}, 0.8, 1},
+    {"800 x 600, sharp", {800, 600}, 0.4, 1},
+    {"800 x 600, soft, noise 2 %", {800, 600}, 1.5, 2},
+    {"800 x 600, noise 5 %", {800, 600}, 0.8, 5},
+    {"800 x 600, sRGB", {800, 600}, 0.8, 1, true},
+    {"800 x 600, sRGB, soft, noise 2 %", {800, 600}, 1.5, 2, true},
+    {"800 x 600, half a stop too bright", {800, 600}, 0.8, 1, false, 0.5},
+    {"800 x 600, sRGB, JPEG 75", {800, 600}, 0.8, 1, true, 0, 75},
+    {"200 x 150", {200, 150}, 0.8, 1},
+    {"2000 x 1500, sRGB", {2000, 1500}, 1.2, 1, true},
+};
+
+float Decoded(float level) {
+  const float v = std::clamp(level / 255, 0.0f, 1.0f);
+  return 255 * (v <= 0.04045f ? v / 12.92f : std::pow((v + 0.055f) / 1.055f, 2.4f));
+}
+
+float Encoded(float level) {
+  const float v = std::clamp(level / 255, 0.0f, 1.0f);
+  return 255 * (v <= 0.0031308f ? 12.92f * v : 1.055f * std::pow(v, 1 / 2.4f) - 0.055f);
+}
+
+struct Display {
+  cv::Mat photo;
+  std::vector<cv::Point2d> corners;
+};
+
+// Any turn, up to 30 degrees of pan and of tilt, fill, surround, bezel and shading: all of one seed.
+SimulationOptions Draw(int seed, const std::string& pattern, const Setting& setting) {
+  cv::RNG random(seed + 1);
+  SimulationOptions o;
+  o.scene = "display";
+  o.display.pattern = pattern;
+  o.display.surround = random.uniform(20.0, 70.0);
+  const double bezel = random.uniform(-60.0, 120.0);
+  o.display.bezel =
+      pattern == "black" ? 0 : std::max(bezel, 0.0);  // a black screen ends where its surround is brighter
+  o.display.black = random.uniform(2.0, 8.0);
+  o.camera.size = setting.size;
+  o.camera.fill = random.uniform(0.4, 0.93);
+  o.camera.turn_deg = seed % 2 == 0 ? random.uniform(-180.0, 180.0) : random.uniform(-5.0, 5.0);
+  o.camera.pan_deg = random.uniform(-30.0, 30.0);
+  o.camera.tilt_deg = random.uniform(-30.0, 30.0);
+  o.camera.shading_percent = random.uniform(0.0, 40.0);
+  o.camera.blur_px = setting.blur_px;
+  o.camera.noise_percent = setting.noise_percent;
+  o.camera.exposure_ev = setting.exposure_ev;
+  o.camera.seed = static_cast<std::uint64_t>(seed) + 1;
+  return o;
+}
+
+Display Photograph(SimulationOptions o, const Setting& setting) {
+  if (setting.srgb) {  // the drawn levels are what is to be stored: the light of the surround and of black behind them
+    o.display.surround = Decoded(static_cast<float>(o.display.surround));
+    o.display.black = Decoded(static_cast<float>(o.display.black));
+    o.display.bezel_level = Decoded(static_cast<float>(o.display.bezel_level));
+  }
+  const Simulation simulation = Simulate(o);
+  cv::Mat levels = simulation.levels[0];
+  if (setting.srgb) {
+    for (auto pixel = levels.begin<cv::Vec3f>(); pixel != levels.end<cv::Vec3f>(); ++pixel) {
+      for (int k = 0; k < 3; ++k) (*pixel)[k] = Encoded((*pixel)[k]);
+    }
+  }
+  Display display;
+  display.photo = Sense(o.camera, levels, 8);
+  if (setting.jpeg > 0) {
+    std::vector<std::uint8_t> file;
+    cv::imencode(".jpg", display.photo, file, {cv::IMWRITE_JPEG_QUALITY, setting.jpeg});
+    display.photo = cv::imdecode(file, cv::IMREAD_COLOR);
+  }
+  for (const Json& corner : simulation.truth["corners"]) display.corners.emplace_back(corner["x"], corner["y"]);
+  return display;
+}
+
+template <typename Trial>
+void ForEach(int count, Trial&& trial) {
+  cv::parallel_for_(cv::Range(0, count), [&](const cv::Range& range) {
+    for (int i = range.start; i < range.end; ++i) trial(i);
+  });
+}
+
+// Answers whether the promise is kept.
+bool PrintCorners(const Setting& setting, int photos) {
+  std::mutex mutex;
+  std::vector<double> errors;
+  int missed = 0;
+  ForEach(photos, [&](int i) {
+    const Display display = Photograph(Draw(i, kDisplayPatterns[i % kDisplayPatterns.size()], setting), setting);
+    QVTester_LCD lcd;
+    const int code = lcd.FindScreen(display.photo);
+    const std::lock_guard<std::mutex> lock(mutex);
+    if (code != QV_SUCCESS) ++missed;
+    for (const cv::Point2d& corner : display.corners) {
+      double nearest = INFINITY;
+      for (const cv::Point2f& found : lcd.corners_) nearest = std::min(nearest, cv::norm(cv::Point2d(found) - corner));
+      if (code == QV_SUCCESS) errors.push_back(nearest);
+    }
+  });
+  std::sort(errors.begin(), errors.end());
+  const auto quantile = [&](double share) {
+    return errors.empty() ? NAN : errors[static_cast<std::size_t>(share * static_cast<double>(errors.size() - 1))];
+  };
+  std::printf("| %s | %d | %d | %.3f | %.3f | %.3f | %.2f |\n", setting.name, photos, missed, quantile(0.5),
+              quantile(0.9), quantile(0.99), quantile(1));
+  std::fflush(stdout);
+  return missed * 100 <= photos && quantile(0.5) < kPromisedMedianPx;
+}
+
+constexpr std::array<const char*, 5> kAsked = {"control", "green", "black", "white", "result"};
+
+// What each row's display should be judged: 1, 0, or either where green is asked for and a tick stands on it.
+char Expected(const std::string& shown, int asked) {
+  if (shown == "tick" && asked == QV_LCD_GREEN) return '*';
+  if (shown == "tick") return asked == QV_LCD_RESULT ? '1' : '0';
+  return shown == kAsked[asked] ? '1' : '0';
+}
+
+bool PrintPatterns(int photos) {
+  const Setting setting = {"", {800, 600}, 1, 1.5};
+  std::map<std::string, std::array<int, 5>> ones;
+  std::map<std::string, int> counts;
+  std::mutex mutex;
+  int wrong = 0;
+  ForEach(photos, [&](int i) {
+    const std::string shown = kDisplayPatterns[i % kDisplayPatterns.size()];
+    SimulationOptions view = Draw(i + 1000, shown, setting);
+    view.camera.turn_deg = std::remainder(view.camera.turn_deg, 20);  // the order of the bars is judged as seen
+    cv::RNG random(i + 7);
+    view.camera.exposure_ev = random.uniform(-0.5, 0.3);
+    view.camera.cast = {random.uniform(0.94, 1.06), 1, random.uniform(0.94, 1.06)};
+    view.dim_corner = random.uniform(0.0, 0.3);
+    view.defects = random.uniform(0, 6);
+    const Display display = Photograph(view, setting);
+    for (int asked = 0; asked < 5; ++asked) {
+      QVTester_LCD lcd;
+      QVLcdResult result;
+      const bool judged = lcd.JudgePattern(display.photo, static_cast<QV_LCD_PATTERN>(asked), &result) == QV_SUCCESS;
+      const std::lock_guard<std::mutex> lock(mutex);
+      if (judged) ones[shown][asked] += result.verdict_;
+      const char expected = Expected(shown, asked);
+      if (!judged || (expected != '*' && result.verdict_ != expected - '0')) {
+        ++wrong;
+        std::fprintf(stderr, "photo %d, %s asked for %s: %s\n", i, shown.c_str(), kAsked[asked],
+                     result.reason_.c_str());
+      }
+    }
+    const std::lock_guard<std::mutex> lock(mutex);
+    ++counts[shown];
+  });
+  std::printf("\nVerdicts of 1, by what is shown and what is asked for: %d photos, %d of %d judgements wrong\n\n",
+              photos, wrong, 5 * photos);
+  std::printf("| shown | photos | control | green | black | white | result |\n|---|---|---|---|---|---|---|\n");
+  for (const std::string& shown : kDisplayPatterns) {
+    std::printf("| %s | %d |", shown.c_str(), counts[shown]);
+    for (int asked = 0; asked < 5; ++asked) std::printf(" %d |", ones[shown][asked]);
+    std::printf("\n");
+  }
+  return wrong * 200 <= photos;
+}
+
+bool Run(bool quick) {
+  std::printf("Corners of the screen, any turn, pan and tilt up to 30 degrees: distance from the truth, px\n\n");
+  std::printf("| photo | photos | not found | median | 90 %% | 99 %% | largest |\n|---|---|---|---|---|---|---|\n");
+  bool kept = true;
+  for (const Setting& setting : kSettings) {
+    if (!quick || setting.size.width < 2000) kept = PrintCorners(setting, quick ? 24 : 200) && kept;
+  }
+  return PrintPatterns(quick ? 60 : 500) && kept;
+}
+
+}  // namespace
+}  // namespace qv
+
+int main(int count, char** words) {
+  const auto given = [&](const char* word) {
+    return std::find(words, words + count, std::string(word)) != words + count;
+  };
+  const bool kept = qv::Run(given("--quick"));
+  return given("--check") && !kept ? 1 : 0;
+}
