@@ -85,6 +85,8 @@ TEST(Measure, RequestsThatCantBeRunAreRefusedInASentence) {
            {{"camera_autofocus", photo, {{"threshold", 1}}, {{"93", 2}}},
             "threshold and property 93 are one, and differ"},
            {{"circle_check", photo, {{"camera", 1}}}, "camera: 1 is none of 0, 2"},
+           {{"lcd", photo}, "pattern is needed"},
+           {{"camera_capture", photo, {{"reference", {{9, 95, 0}}}}}, "neither a capture record nor numbers"},
            {{"circle_check", photo, {{"raw", "640x481"}}}, "an NV21 frame has an even width and height"},
            {{"hdr_dots", photo, {{"channel", "cyan"}}}, "none of red, green, blue"},
            {{"lens_dust", photo, {{"reference", {1, 2}}}}, "neither a dust record nor 256 whole numbers"},
@@ -128,6 +130,74 @@ TEST(Measure, OnlyARequestToPublishReachesTheStore) {
   }
   EXPECT_FALSE(places.empty());
   EXPECT_EQ(places, ReadFile(place));
+}
+
+cv::Mat DisplayPhoto(const std::string& pattern) {
+  SimulationOptions options;
+  options.scene = "display";
+  options.display.pattern = pattern;
+  options.camera.size = {320, 240};
+  return Sense(options.camera, Simulate(options).levels[0], 8);
+}
+
+TEST(Measure, ADisplayThatShowsSomethingElseFailsWithoutLimitsToo) {
+  const Record right = MeasureAnew({"lcd", {DisplayPhoto("tick")}, {{"pattern", "result"}}});
+  EXPECT_EQ(Outcome::kPass, right.outcome());
+  EXPECT_EQ(1, right.phase.Find("verdict")->value());
+  EXPECT_EQ(4U, right.phase.Find("corners")->values.size());
+  const Record wrong = MeasureAnew({"lcd", {DisplayPhoto("cross")}, {{"pattern", "result"}}});
+  EXPECT_EQ(Outcome::kFail, wrong.outcome());
+  EXPECT_THAT(wrong.remarks.at(0).sentence, HasSubstr("red cross field"));
+  const Record none = MeasureAnew({"lcd", {cv::Mat(90, 90, CV_8UC3, cv::Scalar::all(60))}, {{"pattern", "black"}}});
+  EXPECT_EQ(QV_ERROR_PATTERN_NOT_FOUND, none.phase.code);
+  EXPECT_THAT(none.MissSentence(), AllOf(HasSubstr("no screen is seen"), Not(HasSubstr("chart"))));
+}
+
+TEST(Measure, PatchValuesStandInForAStandardPhoto) {
+  const TemporaryFolder folder;
+  const cv::Mat photo = DrawChart();
+  const Record first = MeasureAnew({"camera_capture", {photo}});
+  EXPECT_EQ(nullptr, first.phase.Find("delta_e_2000"));
+  const std::string earlier = folder.Write("earlier.json", first.ToText());
+  const Record same = MeasureAnew({"camera_capture", {photo}, {{"reference", earlier}}});
+  EXPECT_EQ(0, same.phase.Find("delta_e_2000_max")->value());
+  const std::vector<double>& lightness = same.phase.Find("lab_d65_l")->values;
+  const std::string values =
+      folder.Write("values.txt", Format("# number, L*, a*, b*\n9, %.9f, 0, 0\n", lightness.at(9) - 1));
+  const Record one = MeasureAnew({"camera_capture", {photo}, {{"reference", values}}});
+  EXPECT_EQ(std::vector<double>{9}, one.phase.Find("delta_e_2000")->axis);
+  // A step of 1 in L* alone is 1 / (1 + 0.015 d^2 / sqrt(20 + d^2)), d from 50 to the mean of both.
+  const double d = lightness.at(9) - 0.5 - 50;
+  EXPECT_NEAR(1 / (1 + 0.015 * d * d / std::sqrt(20 + d * d)), one.phase.Find("delta_e_2000_max")->value(), 1e-6);
+}
+
+TEST(Measure, EveryChannelOfAFlashPhotoIsCounted) {
+  cv::Mat photo(10, 20, CV_8UC3, cv::Scalar(10, 20, 30));
+  photo(cv::Rect(0, 0, 5, 10)) = cv::Scalar(10, 255, 30);
+  const Record record = MeasureAnew({"camera_flash", {photo}});
+  for (const auto& [figure, value] : {std::pair<const char*, double>{"mean_blue", 10},
+                                      {"mean_green", 78.75},
+                                      {"mean_red", 30},
+                                      {"clipped_blue", 0},
+                                      {"clipped_green", 0.25},
+                                      {"mean", 10}}) {
+    EXPECT_DOUBLE_EQ(value, record.phase.Find(figure)->value()) << figure;
+  }
+}
+
+TEST(Measure, SoftAndLargeSpotsStandBesideTheTestsOwnBlobs) {
+  SimulationOptions options;
+  options.scene = "dust";
+  options.camera.size = {900, 700};
+  options.camera.noise_percent = 1;
+  options.camera.blur_px = 4;
+  options.specks = 3;
+  options.speck_px = 50;
+  options.speck_darkness = 0.05;
+  const Record record = MeasureAnew({"lens_dust", {Sense(options.camera, Simulate(options).levels[0], 8)}});
+  EXPECT_EQ(0, record.phase.Find("blob_count")->value());
+  EXPECT_EQ(3, record.phase.Find("spot_count")->value());
+  EXPECT_NEAR(50 * 50 * CV_PI / 4, record.phase.Find("spot_largest_area")->value(), 200);
 }
 
 TEST(Measure, APhotoTooDarkForDustIsDrawnWithoutBlobs) {
