@@ -27,7 +27,7 @@ TEST_F(StoreProgram, ShowsJudgesAndReportsWhatWasMeasured) {
   Measure();
   Write("dark.json", R"({"name": "l", "revision": "2", "limits": {"camera_flash_mean": {"max": 1}}})");
   EXPECT_THAT(Run("show store.db").out, HasSubstr("1 run: 1 PASS; yield 100.0 %"));
-  EXPECT_THAT(Run("show store.db 'SN<1>'").out, HasSubstr("camera_flash_mean  PASS"));
+  EXPECT_THAT(Run("show store.db 'SN<1>'").out, HasSubstr("camera_flash_mean           PASS"));
   EXPECT_EQ(0, Run("judge store.db --limits limits.json").status);
   const ProgramRun judged = Run("judge store.db --limits dark.json");
   EXPECT_EQ(1, judged.status);
