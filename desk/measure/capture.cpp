@@ -229,7 +229,8 @@ class Capture : public Measurement {
   }
 
   // The values given, else those of the standard photo.
-  static std::map<int, cv::Vec3d> GivenOrStandard(const CaptureFinding& finding, const Request& request, Record& record) {
+  static std::map<int, cv::Vec3d> GivenOrStandard(const CaptureFinding& finding, const Request& request,
+                                                  Record& record) {
     std::map<int, cv::Vec3d> standard;
     for (std::size_t i = 0; i < finding.standard.size(); ++i)
       standard[static_cast<int>(i)] = LabD65(finding.standard[i]);
