@@ -89,7 +89,8 @@ TEST_P(SheetFiles, ShowWhatTheTableSays) {
 
   // Marks: the search gives whole pixels, their darkness the rest.
   std::vector<cv::Point2d> marks;
-  for (const json& mark : Measured(Record("autofocus sheet.png"), "camera_autofocus_marks")) {
+  // Drawn, not photographed: its white paper ends at level 255, which is a doubt.
+  for (const json& mark : Measured(Record("autofocus sheet.png", 3), "camera_autofocus_marks")) {
     const int half = static_cast<int>(4.5 * kMarkSizes[0].module * sheet.px_per_unit);
     const cv::Rect window(mark[0].get<int>() - half, mark[1].get<int>() - half, 2 * half, 2 * half);
     const cv::Moments dark = cv::moments(255 - grey(window));
