@@ -41,6 +41,12 @@ MeasuringCommand Registration() {
   return command;
 }
 
+MeasuringCommand TouchPrint() {
+  MeasuringCommand command = {"touch_panel_print"};
+  command.extra = MakeProductOutput;
+  return command;
+}
+
 const std::vector<Command> kCommands = {
     {"autofocus", "Measure the sharpness of a chart photo (test 14)", Sharpness("camera_autofocus")},
     {"mtf", "Measure the two MTF50 values of a chart photo, outside the numbered tests", Sharpness("mtf_check")},
@@ -55,6 +61,10 @@ const std::vector<Command> kCommands = {
     {"circles", "Look for the chart's three marks in a preview frame", MeasuringCommand{"circle_check"}},
     {"dots", "Find bright and dark dots in a high-dynamic-range picture of a lit panel", MeasuringCommand{"hdr_dots"}},
     {"lcd", "Judge the pattern that a display shows", MeasuringCommand{"lcd"}},
+    {"led", "Measure light, colour and dark spots of an indicator light (test 27)", MeasuringCommand{"led_light"}},
+    {"touch-led", "Measure light, colour and dark spots of a touch panel's lights (test 28)",
+     MeasuringCommand{"touch_panel_led"}},
+    {"touch-print", "Hold a touch panel's print against photos of good ones (test 29)", TouchPrint()},
     {"register", "Bring a picture into the frame of a reference", Registration()},
     {"video", "Measure films, or the video camera's preview (tests 22 to 26)", nullptr},
     {"video preview", "Measure how much two preview frames of the video camera differ (test 22)",

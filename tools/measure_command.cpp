@@ -57,6 +57,8 @@ void DeclareInputs(Options& command, const Spec& spec, MeasureOptions& options) 
     const InputSpec& input = spec.inputs[i];
     if (input.optional) {
       command.Text(OptionOf(input.name).c_str(), options.inputs[i], input.help, "FILE");
+    } else if (input.list) {
+      command.Text(OptionOf(input.name).c_str(), options.inputs[i], input.help, "DIR", true);
     } else {
       command.Argument(Capitals(input.name).c_str(), options.inputs[i],
                        i == 0 ? std::string(input.help) + "; - is standard input" : input.help);
@@ -99,6 +101,11 @@ void CheckFiles(const Spec& spec, const MeasureOptions& options, const CommandEx
   std::vector<NamedFile> inputs;
   for (std::size_t i = 0; i < options.inputs.size(); ++i) {
     inputs.push_back({std::string("the ") + spec.inputs[i].name, options.inputs[i]});
+    std::error_code ignored;
+    if (!spec.inputs[i].list || !std::filesystem::is_directory(options.inputs[i], ignored)) continue;
+    for (const auto& entry : std::filesystem::directory_iterator(options.inputs[i], ignored)) {
+      inputs.push_back({std::string("one of the ") + spec.inputs[i].name, entry.path().string()});
+    }
   }
   inputs.push_back({"the limits", options.limits});
   std::vector<NamedFile> outputs = {{"the record", options.json}, {"the picture", options.annotate}};

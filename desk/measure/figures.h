@@ -21,6 +21,7 @@ inline constexpr Unit kNyquist = {"fraction of Nyquist", nullptr, "Nyquist", 1e-
 inline constexpr Unit kPixel = {"pixel", "E37", "px", 0.01};
 inline constexpr Unit kDegree = {"degree [unit of angle]", "DD", "deg", 0.001};
 inline constexpr Unit kOne = {"one", "C62", "1", 1e-3};
+inline constexpr Unit kKelvin = {"kelvin", "KEL", "K", 0.1};
 inline constexpr Unit kGreyLevel = {"grey level", nullptr, "level", 1e-3};
 
 // What the values of a list stand over.
@@ -28,6 +29,7 @@ inline constexpr Unit kFrequencyAxis = {"frequency", nullptr, "Nyquist"};
 inline constexpr Unit kColumnAxis = {"column", "E37", "px"};
 inline constexpr Unit kPatchAxis = {"patch", "C62", "1"};
 inline constexpr Unit kAreaAxis = {"area", "C62", "1"};
+inline constexpr Unit kRegionAxis = {"region", "C62", "1"};
 inline constexpr Unit kMatrixAxis = {"element", "C62", "1"};
 inline constexpr Unit kLevelAxis = {"grey level", nullptr, "level"};
 

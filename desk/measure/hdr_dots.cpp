@@ -8,6 +8,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/measure/areas.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -28,10 +29,9 @@ constexpr int kMostSpots = 20'000;  // merging is quadratic; so many are noise, 
 
 struct Dots {
   cv::Mat mask;  // CV_8UC1, 1 at a dot
-  std::vector<cv::Rect> areas;
-  std::vector<int> pixels;  // dots in each area
-  int spots = 0;            // connected dots, before they are merged
-  int non_finite = 0;       // pixels
+  Areas areas;
+  int spots = 0;       // connected dots, before they are merged
+  int non_finite = 0;  // pixels
 };
 
 // What malloc gave and the clustering exchanges.
@@ -63,8 +63,8 @@ void MergeSpots(QVTester& tester, Dots& dots, const cv::Mat& stats, int distance
   const int areas = tester.ErrorAreaClustering(distance, dots.mask.cols, dots.mask.rows, &indices, &counts.data,
                                                &top_left.data, &bottom_right.data);
   for (int i = 0; i < areas; ++i) {
-    dots.areas.emplace_back(top_left.data[i], bottom_right.data[i] + cv::Point(1, 1));
-    dots.pixels.push_back(counts.data[i]);
+    dots.areas.rectangles.emplace_back(top_left.data[i], bottom_right.data[i] + cv::Point(1, 1));
+    dots.areas.pixels.push_back(counts.data[i]);
   }
 }
 
@@ -97,21 +97,7 @@ Dots FindDots(QVTester& tester, cv::Mat& picture, const Json& parameters) {
 void Collect(Phase& phase, const Dots& dots) {
   phase.Add("dot_count", cv::countNonZero(dots.mask));
   if (dots.spots > kMostSpots) return;
-  phase.Add("area_count", static_cast<double>(dots.areas.size()));
-  std::vector<double> columns, rows, numbers, pixels, widths, heights;  // NOLINT(readability-isolate-declaration)
-  for (std::size_t i = 0; i < dots.areas.size(); ++i) {
-    const cv::Rect& area = dots.areas[i];
-    columns.push_back(area.x + (area.width - 1) / 2.0);
-    rows.push_back(area.y + (area.height - 1) / 2.0);
-    numbers.push_back(static_cast<double>(i));
-    pixels.push_back(dots.pixels[i]);
-    widths.push_back(area.width);
-    heights.push_back(area.height);
-  }
-  phase.Add("areas", columns, rows);
-  phase.Add("area_pixels", numbers, pixels);
-  phase.Add("area_width", numbers, widths);
-  phase.Add("area_height", numbers, heights);
+  AddAreas(phase, dots.areas);
 }
 
 void Look(Record& record, const Dots& dots) {
@@ -155,18 +141,11 @@ cv::Mat Seen(const cv::Mat& picture, const cv::Mat& mask) {
 class DotsFinding : public Finding {
  public:
   std::string Report(const Record& record) const override {
-    constexpr std::size_t kShown = 20;
     const Reading& count = *record.phase.Find("dot_count");
     const Reading& areas = *record.phase.Find("area_count");
-    std::string text = Format("dots       %.0f%s\nareas      %.0f%s\n", count.value(), LimitText(count).c_str(),
-                              areas.value(), LimitText(areas).c_str());
-    for (std::size_t i = 0; i < std::min(dots.areas.size(), kShown); ++i) {
-      const cv::Rect& area = dots.areas[i];
-      text += Format("           column %d, row %d, %d x %d, %d dots\n", area.x, area.y, area.width, area.height,
-                     dots.pixels[i]);
-    }
-    if (dots.areas.size() > kShown) text += Format("           and %zu more\n", dots.areas.size() - kShown);
-    return text;
+    return Format("dots       %.0f%s\nareas      %.0f%s\n", count.value(), LimitText(count).c_str(), areas.value(),
+                  LimitText(areas).c_str()) +
+           AreaLines(dots.areas, "dots");
   }
 
   // Every dot as a ring of its own would hide small areas: dots are coloured pixels, areas frames with their numbers.
@@ -177,27 +156,16 @@ class DotsFinding : public Finding {
     const int longer = std::max(seen.cols, seen.rows);
     const double scale = longer < kSide / 2 ? std::floor(kSide / longer) : std::min(1.0, kSide / longer);
     Picture picture(std::max(640, cvRound(seen.cols * scale)), cvRound(seen.rows * scale + kHeadPx));
-    picture.Text(Format("HDR dots: %d dots in %zu areas, %s", cv::countNonZero(dots.mask), dots.areas.size(),
+    picture.Text(Format("HDR dots: %d dots in %zu areas, %s", cv::countNonZero(dots.mask), dots.areas.rectangles.size(),
                         Name(record.outcome())),
                  {12, 28}, 18, kInk);
     const PhotoPlace place = picture.PlacePhoto(seen, {0, kHeadPx}, scale);
-    for (std::size_t i = 0; i < dots.areas.size(); ++i) DrawArea(picture, place, dots.areas[i], i);
+    DrawAreas(picture, place, dots.areas);
     return picture;
   }
 
   cv::Mat searched;  // CV_32FC3, the channel that was searched first
   Dots dots;
-
- private:
-  static void DrawArea(Picture& picture, const PhotoPlace& place, const cv::Rect& area, std::size_t number) {
-    constexpr double kFrame = 6;  // picture pixels around an area
-    const cv::Point2d from = place(cv::Point2d(area.tl()) - cv::Point2d(0.5, 0.5)) - cv::Point2d(kFrame, kFrame);
-    const cv::Point2d to = place(cv::Point2d(area.br()) - cv::Point2d(0.5, 0.5)) + cv::Point2d(kFrame, kFrame);
-    picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, kDoubtful, 2, true);
-    const bool at_right = to.x + 30 > picture.width();
-    picture.Text(std::to_string(number), {at_right ? from.x - 4 : to.x + 4, std::max(from.y + 10, kHeadPx + 12)}, 13,
-                 kDoubtful, at_right ? Align::kRight : Align::kLeft, true);
-  }
 };
 
 class HdrDots : public Measurement {
@@ -236,16 +204,10 @@ class HdrDots : public Measurement {
 
  private:
   static std::vector<Figure> Figures() {
-    constexpr auto kWhole = Number::kWhole;
-    constexpr auto kReal = Number::kReal;
-    return {
-        {"dot_count", kOne, kWhole, nullptr, kDots, "Pixels that depart from their local mean."},
-        {"area_count", kOne, kWhole, nullptr, kAreas, "Areas that the dots make."},
-        {"areas", kPixel, kReal, &kColumnAxis, kAreas, "Middle of each area's rectangle, column and row."},
-        {"area_pixels", kPixel, kWhole, &kAreaAxis, kAreas, "Dots in each area."},
-        {"area_width", kPixel, kWhole, &kAreaAxis, kAreas, "Columns of each area's rectangle."},
-        {"area_height", kPixel, kWhole, &kAreaAxis, kAreas, "Rows of each area's rectangle."},
-    };
+    std::vector<Figure> figures = {
+        {"dot_count", kOne, Number::kWhole, nullptr, kDots, "Pixels that depart from their local mean."}};
+    for (const Figure& figure : AreaFigures(kAreas)) figures.push_back(figure);
+    return figures;
   }
 
   Spec spec_;

@@ -104,6 +104,43 @@ class Loader {
   Loader(QVTester& tester, const Spec& spec, const Request& request, Record& record, LogCollector& log)
       : tester_(tester), spec_(spec), request_(request), record_(record), log_(log) {}
 
+  // A list as a whole: the inputs from the i-th on.
+  bool LoadList(std::size_t i) {
+    const QV_RESOURCE_INDEX slot = spec_.inputs[i].slot;
+    std::vector<std::unique_ptr<MemoryFile>> files;
+    std::vector<std::string> paths;
+    for (std::size_t k = i; k < request_.inputs.size(); ++k) {
+      const Input& input = request_.inputs[k];
+      try {
+        if (!input.picture.empty()) throw Failure(kCouldNotMeasure, "a list is read from files: give a path");
+        const std::string content = Content(input);
+        record_.inputs.push_back({slot, input.name, HexDigest(content, "SHA256"), ""});
+        if (content.empty()) throw Failure(kCouldNotMeasure, "the file is empty");
+        files.push_back(std::make_unique<MemoryFile>(content));
+        paths.push_back(files.back()->path());
+      } catch (const Failure& e) {
+        return Refuse(input, QV_ERROR_INVALID_ARGUMENT, e.what());
+      }
+    }
+    const KeptStderr kept;
+    const std::size_t first_line = log_.lines().size();
+    const int code = Guarded("SetResource", [&] { return tester_.SetResource(slot, paths); });
+    for (std::size_t k = 0; k < paths.size(); ++k) {
+      NameInput(log_.lines(), first_line, paths[k] + ":", request_.inputs[i + k].name + ":");
+    }
+    const std::vector<std::string> chatter = kept.Lines();
+    record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+    if (code != QV_SUCCESS) return RefuseList(i, code, first_line);
+    for (std::size_t k = 0; k < paths.size(); ++k) {
+      const cv::Mat& held = tester_.kept_->image_list.gray[k];
+      RecordedInput& entry = record_.inputs[i + k];
+      entry.width = held.cols;
+      entry.height = held.rows;
+      entry.pixels_hash = PixelsHash(held);
+    }
+    return true;
+  }
+
   bool Load(std::size_t i) {
     const Input& input = request_.inputs[i];
     try {
@@ -121,6 +158,16 @@ class Loader {
   bool Refuse(const Input& input, int code, const std::string& why) {
     record_.phase.code = code;
     record_.remarks = {{Remark::kMiss, "refused_input", input.name + ": " + why}};
+    return false;
+  }
+
+  // The library's line names the file.
+  bool RefuseList(std::size_t i, int code, std::size_t first_line) {
+    if (log_.lines().size() == first_line) return Refuse(request_.inputs[i], code, FindCode(code).meaning);
+    const std::string& line = log_.lines().back().text;
+    const std::size_t end = line.find("] ");
+    record_.phase.code = code;
+    record_.remarks = {{Remark::kMiss, "refused_input", end == std::string::npos ? line : line.substr(end + 2)}};
     return false;
   }
 
@@ -209,6 +256,7 @@ class Loader {
 bool LoadInputs(QVTester& tester, const Spec& spec, const Request& request, Record& record, LogCollector& log) {
   Loader loader(tester, spec, request, record, log);
   for (std::size_t i = 0; i < request.inputs.size(); ++i) {
+    if (spec.inputs[i].list) return loader.LoadList(i);
     if (!loader.Load(i)) return false;
   }
   return true;

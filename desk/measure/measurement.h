@@ -24,6 +24,7 @@ struct Parameter {
     kReal,
     kWord,       // one of `words`
     kSize,       // "4000x3000"
+    kRegions,    // rectangles with labels, or a file that holds them
     kHistogram,  // 256 whole numbers, or a file that holds them: a dust record or a list
     kPatches,    // [number, L*, a*, b*] of patches, or a file that holds them: a capture record or lines of numbers
   };
@@ -52,6 +53,7 @@ struct InputSpec {
   QV_RESOURCE_INDEX slot;
   const char* help;
   bool optional = false;  // given among the parameters, by its name
+  bool list = false;      // the last: one file or more, or a folder that holds them
 };
 
 /// A measurement's row.

@@ -20,19 +20,19 @@ const Measurement& VideoPreviewMeasurement();
 const Measurement& VideoFocusMeasurement();
 const Measurement& VideoFlashMeasurement();
 const Measurement& VideoChartMeasurement(bool record);
+const Measurement& LightsMeasurement(bool touch_panel);
+const Measurement& PrintMeasurement();
 
 const std::vector<const Measurement*>& Measurements() {
   static const std::vector<const Measurement*> all = {
-      &AutofocusMeasurement(),    &MtfCheckMeasurement(),     &CaptureMeasurement(false), &CaptureMeasurement(true),
-      &CircleCheckMeasurement(),  &DustMeasurement(false),    &DustMeasurement(true),     &DotsMeasurement(),
-      &RegistrationMeasurement(), &PreviewMeasurement(false), &PreviewMeasurement(true),  &FlashMeasurement(false),
-      &FlashMeasurement(true),
-      &LcdMeasurement(),
-      &VideoPreviewMeasurement(),
-      &VideoFocusMeasurement(),
-      &VideoFlashMeasurement(),
-      &VideoChartMeasurement(true),
-      &VideoChartMeasurement(false),
+      &AutofocusMeasurement(),       &MtfCheckMeasurement(),    &CaptureMeasurement(false),
+      &CaptureMeasurement(true),     &CircleCheckMeasurement(), &DustMeasurement(false),
+      &DustMeasurement(true),        &DotsMeasurement(),        &RegistrationMeasurement(),
+      &PreviewMeasurement(false),    &PreviewMeasurement(true), &FlashMeasurement(false),
+      &FlashMeasurement(true),       &LcdMeasurement(),         &VideoPreviewMeasurement(),
+      &VideoFocusMeasurement(),      &VideoFlashMeasurement(),  &VideoChartMeasurement(true),
+      &VideoChartMeasurement(false), &LightsMeasurement(false), &LightsMeasurement(true),
+      &PrintMeasurement(),
   };
   return all;
 }

@@ -13,6 +13,7 @@
 #include "desk/measure/measurement.h"
 #include "desk/measure/patch_values.h"
 #include "desk/measure/properties.h"
+#include "desk/measure/regions.h"
 
 namespace qv {
 
@@ -82,6 +83,7 @@ Json Checked(const Parameter& parameter, const Json& value) {
     case Parameter::kWord: return CheckedWord(parameter, value);
     case Parameter::kSize: return CheckedSize(parameter, value);
     case Parameter::kPatches: return CheckedPatches(value);
+    case Parameter::kRegions: return CheckedRegions(value);
     default: return CheckedHistogram(value);
   }
 }

@@ -1,8 +1,10 @@
 #include "desk/measure/request.h"
 
 #include <algorithm>
+#include <filesystem>
 
 #include "desk/base/failure.h"
+#include "desk/base/text.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
 
@@ -38,11 +40,42 @@ void TakeOptionalInputs(const Spec& spec, Request& request) {
   }
 }
 
+// The files of a folder in the order of their names; hidden ones are left out.
+std::vector<Input> FilesOf(const std::string& folder) {
+  constexpr std::size_t kMost = 1000;
+  std::vector<std::string> names;
+  std::error_code failed;
+  for (std::filesystem::directory_iterator i(folder, failed), end; !failed && i != end; i.increment(failed)) {
+    if (i->path().filename().string().front() != '.') names.push_back(i->path().string());
+  }
+  if (failed) Refuse(folder + ": " + failed.message());
+  if (names.empty() || names.size() > kMost)
+    Refuse(Format("%s: holds %zu files, of 1 to %zu that are needed", folder.c_str(), names.size(), kMost));
+  std::sort(names.begin(), names.end());
+  return {names.begin(), names.end()};
+}
+
+void ExpandFolders(const Spec& spec, Request& request) {
+  if (spec.inputs.empty() || !spec.inputs.back().list) return;
+  std::vector<Input> inputs;
+  for (const Input& input : request.inputs) {
+    const bool listed = inputs.size() + 1 >= spec.inputs.size();
+    if (listed && input.is_path() && std::filesystem::is_directory(input.name)) {
+      const std::vector<Input> files = FilesOf(input.name);
+      inputs.insert(inputs.end(), files.begin(), files.end());
+    } else {
+      inputs.push_back(input);
+    }
+  }
+  request.inputs = std::move(inputs);
+}
+
 void CheckInputs(const Spec& spec, const Request& request) {
   const auto least = static_cast<std::size_t>(
       std::count_if(spec.inputs.begin(), spec.inputs.end(), [](const InputSpec& input) { return !input.optional; }));
   const std::size_t given = request.inputs.size();
-  if (given >= least && given <= spec.inputs.size()) return;
+  const bool any = !spec.inputs.empty() && spec.inputs.back().list;
+  if (given >= least && (any || given <= spec.inputs.size())) return;
   std::string names;
   for (const InputSpec& input : spec.inputs) {
     names += (names.empty() ? "" : ", ") + std::string(input.name) + (input.optional ? " (may be left out)" : "");
@@ -73,6 +106,7 @@ Request Resolved(const Request& request) {
   const Spec& spec = SpecOf(request);
   if (!full.parameters.is_object()) Refuse("parameters: an object of values by name is needed");
   TakeOptionalInputs(spec, full);
+  ExpandFolders(spec, full);
   CheckInputs(spec, full);
   for (const auto& [name, value] : full.parameters.items()) {
     if (FindParameter(spec, name) == nullptr) Refuse(std::string(spec.name) + " has no parameter " + name);

@@ -1,0 +1,36 @@
+#ifndef QVTESTER_DESK_MEASURE_AREAS_H_
+#define QVTESTER_DESK_MEASURE_AREAS_H_
+
+#include <opencv2/core.hpp>
+#include <string>
+#include <vector>
+
+#include "desk/drawing/picture.h"
+#include "desk/measure/measurement.h"
+#include "desk/measure/record.h"
+
+namespace qv {
+
+// Error areas, as several measurements find them: rectangles, and how many pixels of each are wrong.
+
+struct Areas {
+  std::vector<cv::Rect> rectangles;
+  std::vector<int> pixels;
+};
+
+/// Of the result block's arrays.
+Areas AreasOf(int count, const QVRECT* areas, const int* pixels);
+
+/// area_count, and of each area the middle and the figures of its size.
+std::vector<Figure> AreaFigures(const Method& method);
+void AddAreas(Phase& phase, const Areas& areas);
+
+/// A line for each of the first twenty.
+std::string AreaLines(const Areas& areas, const char* unit);
+
+/// Frames with numbers; a frame keeps off what is wrong.
+void DrawAreas(Picture& picture, const PhotoPlace& place, const Areas& areas);
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_AREAS_H_

@@ -1,0 +1,357 @@
+// Tests 27 and 28: light, colour and dots of lit regions.
+
+#include <algorithm>
+#include <cmath>
+
+#include "desk/base/text.h"
+#include "desk/measure/areas.h"
+#include "desk/measure/load.h"
+#include "desk/measure/regions.h"
+#include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
+
+namespace qv {
+
+namespace {
+
+constexpr Method kLight = {"means over the region's pixels, linear light by the transfer function of IEC 61966-2-1",
+                           "Exact for the photo as stored; x and y within 0.001 of simulated black bodies.",
+                           "Moved by exposure, clipping, white balance and the camera's own colour matrix: comparable "
+                           "between photos of one camera at one setting."};
+constexpr Method kTemperature = {
+    "correlated colour temperature by a fit to the Planckian locus on either side of 5550 K",
+    "The fit alone is off by up to 25 K from 2,700 to 10,000 K on the locus.",
+    "Moved as x and y are, and more the further the light lies from the locus; 0 where the fit has no answer."};
+constexpr Method kEvenness = {"smallest over largest mean of 8 x 8 equal blocks", "Exact for the photo as stored.",
+                              "Moved by a lens's own fall-off, by spots, and by a region that reaches over the rim."};
+constexpr Method kDots = {
+    "relative difference of grey to the mean of a square window, areas merged within the distance",
+    "Of squares 40 % darker all of 2 px and more are found at 1 % noise, and none where there is none; of 25 % all "
+    "from "
+    "3 px, of 15 % all from 5 px.",
+    "Moved by noise, by the window's size and by what else lies in it."};
+
+constexpr double kClipped = 0.01;  // share of a region's pixels, above which its colour is another one
+constexpr double kDark = 5;        // mean grey, below which a colour is one of noise
+constexpr std::size_t kMostSpots = 20'000;
+
+struct LightTest {
+  const char* name;
+  QV_TEST_INDEX test;
+  InputSpec input;
+  QVRegionList QVTester::*list;
+  int QVTester::*count;
+  QVLightResult QVResultData::*result;
+};
+
+const LightTest kLightTests[] = {{"led_light",
+                                  QV_TEST_LED_LIGHT,
+                                  {"photo", QV_RESOURCE_LED_PHOTO, "Photo of the indicator light"},
+                                  &QVTester::prop_region_list_0_,
+                                  &QVTester::prop_region_count_0_,
+                                  &QVResultData::led_},
+                                 {"touch_panel_led",
+                                  QV_TEST_TOUCH_PANEL_LED,
+                                  {"photo", QV_RESOURCE_TOUCH_PANEL_LED_PHOTO, "Photo of the touch panel's lights"},
+                                  &QVTester::prop_region_list_1_,
+                                  &QVTester::prop_region_count_1_,
+                                  &QVResultData::touch_led_}};
+
+using Regions = std::vector<QVLightRegion>;
+
+struct LightFigure {
+  Figure figure;
+  double (*of)(const QVLightRegion& region);
+  bool least, most;  // has figures of its own, for limits
+};
+
+const std::vector<LightFigure>& LightFigures() {
+  constexpr auto kWhole = Number::kWhole;
+  constexpr auto kReal = Number::kReal;
+  using R = const QVLightRegion&;
+  static const std::vector<LightFigure> figures = {
+      {{"label", kOne, kWhole, &kRegionAxis, kLight, "Label of each region."},
+       [](R r) -> double { return r.label_; },
+       false,
+       false},
+      {{"mean_grey", kGreyLevel, kReal, &kRegionAxis, kLight, "Mean grey level of each region, 0 to 255."},
+       [](R r) -> double { return r.mean_grey_; },
+       true,
+       true},
+      {{"linear_red", kOne, kReal, &kRegionAxis, kLight, "Mean red light of each region, 0 to 1."},
+       [](R r) -> double { return r.linear_rgb_[0]; },
+       false,
+       false},
+      {{"linear_green", kOne, kReal, &kRegionAxis, kLight, "Mean green light of each region, 0 to 1."},
+       [](R r) -> double { return r.linear_rgb_[1]; },
+       false,
+       false},
+      {{"linear_blue", kOne, kReal, &kRegionAxis, kLight, "Mean blue light of each region, 0 to 1."},
+       [](R r) -> double { return r.linear_rgb_[2]; },
+       false,
+       false},
+      {{"luminance", kOne, kReal, &kRegionAxis, kLight, "CIE Y of each region; white of level 255 is 1."},
+       [](R r) -> double { return r.xyz_[1]; },
+       true,
+       true},
+      {{"chromaticity_x", kOne, kReal, &kRegionAxis, kLight, "CIE x of each region; none where there is no light."},
+       [](R r) -> double { return r.chromaticity_[0]; },
+       true,
+       true},
+      {{"chromaticity_y", kOne, kReal, &kRegionAxis, kLight, "CIE y of each region; none where there is no light."},
+       [](R r) -> double { return r.chromaticity_[1]; },
+       true,
+       true},
+      {{"cct", kKelvin, kReal, &kRegionAxis, kTemperature,
+        "Correlated colour temperature of each region; 0 where there "
+        "is none."},
+       [](R r) -> double { return r.cct_; },
+       true,
+       true},
+      {{"clipped_share", kOne, kReal, &kRegionAxis, kLight, "Share of each region's pixels with a channel at 255."},
+       [](R r) -> double { return r.clipped_share_; },
+       false,
+       true},
+      {{"uniformity", kOne, kReal, &kRegionAxis, kEvenness, "Darkest over lightest block of each region; 1 is even."},
+       [](R r) -> double { return r.uniformity_; },
+       true,
+       false},
+  };
+  return figures;
+}
+
+// The least and the largest of all regions, which limits may be set on.
+struct Extreme {
+  std::string name, docstring;
+  const LightFigure* figure;
+  bool most;
+};
+
+const std::vector<Extreme>& Extremes() {
+  static const std::vector<Extreme> extremes = [] {
+    std::vector<Extreme> all;
+    for (const LightFigure& row : LightFigures()) {
+      const std::string name = row.figure.name;
+      if (row.least) all.push_back({name + "_min", "Smallest " + name + " of all regions.", &row, false});
+      if (row.most) all.push_back({name + "_max", "Largest " + name + " of all regions.", &row, true});
+    }
+    return all;
+  }();
+  return extremes;
+}
+
+// NaN where a region has none: what is missing is no extreme, and breaks a limit.
+double ExtremeOf(const Extreme& extreme, const Regions& regions) {
+  double value = NAN;
+  for (const QVLightRegion& region : regions) {
+    const double one = extreme.figure->of(region);
+    if (std::isnan(one)) return one;
+    if (std::isnan(value) || (extreme.most ? one > value : one < value)) value = one;
+  }
+  return value;
+}
+
+void Collect(Phase& phase, const Regions& regions, const Areas& areas) {
+  phase.Add("region_count", static_cast<double>(regions.size()));
+  std::vector<double> numbers(regions.size());
+  for (std::size_t i = 0; i < regions.size(); ++i) numbers[i] = static_cast<double>(i);
+  for (const LightFigure& row : LightFigures()) {
+    std::vector<double> values;
+    for (const QVLightRegion& region : regions) values.push_back(row.of(region));
+    phase.Add(row.figure.name, numbers, values);
+  }
+  for (const Extreme& extreme : Extremes()) phase.Add(extreme.name, ExtremeOf(extreme, regions));
+  AddAreas(phase, areas);
+}
+
+void Look(Record& record, const Regions& regions, const Areas& areas) {
+  const char* const path = record.inputs[0].path.c_str();
+  const int window = 2 * record.request.parameters.at("radius").get<int>() + 1;
+  for (const QVLightRegion& region : regions) {
+    const std::string which = regions.size() == 1 ? path : Format("%s: region with label %d", path, region.label_);
+    if (region.clipped_share_ > kClipped) {
+      record.Say(Remark::kDoubt, "clipped",
+                 Format("%s: doubtful: %.0f %% of its pixels are clipped, and its colour is another one; expose less",
+                        which.c_str(), 100 * region.clipped_share_),
+                 "clipped_share_max");
+    }
+    if (region.mean_grey_ < kDark) {
+      record.Say(Remark::kWarning, "dark_region",
+                 Format("%s: mean grey %.1f: is it lit? Its colour is one of noise", which.c_str(), region.mean_grey_),
+                 "mean_grey_min");
+    }
+    if (region.width_ < window || region.height_ < window) {
+      record.Say(Remark::kDoubt, "region_smaller_than_window",
+                 Format("%s: doubtful: smaller than the dots' window, %d x %d pixels: no dots were looked for; use a "
+                        "smaller --radius",
+                        which.c_str(), window, window),
+                 "area_count");
+    }
+  }
+  if (areas.rectangles.size() > kMostSpots) {
+    record.Say(Remark::kDoubt, "too_many_dots",
+               Format("%s: doubtful: %zu separate dots are noise, not defects; use a higher --threshold", path,
+                      areas.rectangles.size()),
+               "area_count");
+  }
+}
+
+class LightFinding : public Finding {
+ public:
+  explicit LightFinding(cv::Mat photo) : photo_(std::move(photo)) {}
+
+  std::string Report(const Record& record) const override {
+    std::string text = "region  label   grey      Y        x       y      CCT   clipped  uniformity\n";
+    for (std::size_t i = 0; i < regions.size(); ++i) {
+      const QVLightRegion& r = regions[i];
+      text += Format("%6zu %6d %6.1f %7.4f  %7.4f %7.4f %6.0f K %7.1f %% %8.3f\n", i, r.label_, r.mean_grey_, r.xyz_[1],
+                     r.chromaticity_[0], r.chromaticity_[1], r.cct_, 100 * r.clipped_share_, r.uniformity_);
+    }
+    const Reading& count = *record.phase.Find("area_count");
+    text += Format("areas of dots  %.0f%s\n", count.value(), LimitText(count).c_str()) + AreaLines(areas, "pixels");
+    for (const Extreme& extreme : Extremes()) {
+      const Reading& reading = *record.phase.Find(extreme.name);
+      if (!reading.limit.given()) continue;
+      text += Format("%s  %.4g%s\n", extreme.name.c_str(), reading.value(), LimitText(reading).c_str());
+    }
+    return text;
+  }
+
+  std::optional<Picture> Draw(const Record& record) const override {
+    constexpr double kSide = 1280;
+    if (record.phase.code != QV_SUCCESS) return std::nullopt;
+    const double scale = FitScale(photo_, kSide);
+    Picture picture(std::max(640, cvRound(photo_.cols * scale)), cvRound(photo_.rows * scale + kHeadPx));
+    picture.Text(Format("Lights: %zu regions, %zu areas of dots, %s", regions.size(), areas.rectangles.size(),
+                        Name(record.outcome())),
+                 {12, 28}, 18, kInk);
+    const PhotoPlace place = picture.PlacePhoto(photo_, {0, kHeadPx}, scale);
+    for (const QVLightRegion& r : regions) {
+      const cv::Point2d from = place(cv::Point2d(r.left_, r.top_) - cv::Point2d(0.5, 0.5));
+      const cv::Point2d to = from + cv::Point2d(r.width_, r.height_) * scale;
+      const Colour colour = r.clipped_share_ > kClipped ? kPoor : r.mean_grey_ < kDark ? kDoubtful : kGood;
+      picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, colour, 2, true);
+      picture.Text(Format("%d: x %.3f y %.3f, %.0f K", r.label_, r.chromaticity_[0], r.chromaticity_[1], r.cct_),
+                   {from.x + 4, to.y - 6}, 13, colour, Align::kLeft, true);
+    }
+    DrawAreas(picture, place, areas);
+    return picture;
+  }
+
+  const cv::Mat& photo() const { return photo_; }
+
+  Regions regions;
+  Areas areas;
+
+ private:
+  cv::Mat photo_;
+};
+
+class Lights : public Measurement {
+ public:
+  explicit Lights(const LightTest& test) : test_(test) {
+    spec_.name = test.name;
+    spec_.test = test.test;
+    spec_.inputs = {test.input};
+    spec_.parameters = {{"regions", Parameter::kRegions, "REGIONS",
+                         "Where the lights are: left,top,width,height,label;... in pixels, or a JSON file of them; "
+                         "without it the whole "
+                         "photo is one region"},
+                        {"threshold",
+                         Parameter::kReal,
+                         "SHARE",
+                         "Departure from the local mean that makes a dot, a share",
+                         nullptr,
+                         0,
+                         1e9,
+                         {},
+                         QV_PROPERTY_DOT_THRESHOLD},
+                        {"radius",
+                         Parameter::kWhole,
+                         "PX",
+                         "Half the side of the window of the local mean",
+                         nullptr,
+                         0,
+                         10'000,
+                         {},
+                         QV_PROPERTY_DOT_RADIUS},
+                        {"distance",
+                         Parameter::kWhole,
+                         "PX",
+                         "Areas closer than this are merged",
+                         nullptr,
+                         0,
+                         100'000,
+                         {},
+                         QV_PROPERTY_AREA_DISTANCE},
+                        {"least_pixels",
+                         Parameter::kWhole,
+                         "N",
+                         "Smaller areas are dropped",
+                         nullptr,
+                         0,
+                         1'000'000'000,
+                         {},
+                         QV_PROPERTY_AREA_LEAST_PIXELS}};
+    spec_.figures = {{"region_count", kOne, Number::kWhole, nullptr, kLight, "Regions that were measured."}};
+    for (const LightFigure& row : LightFigures()) spec_.figures.push_back(row.figure);
+    for (const Extreme& extreme : Extremes()) {
+      Figure figure = extreme.figure->figure;
+      figure.name = extreme.name.c_str();
+      figure.docstring = extreme.docstring.c_str();
+      figure.axis = nullptr;
+      spec_.figures.push_back(figure);
+    }
+    for (const Figure& figure : AreaFigures(kDots)) spec_.figures.push_back(figure);
+    spec_.advice = "is it a photo of the lit panel, of 8 bits a channel, with all regions inside?";
+  }
+
+  const Spec& spec() const override { return spec_; }
+
+  std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
+    auto finding = std::make_unique<LightFinding>(SlotPhoto(tester, test_.input.slot));
+    if (!Fit(request, finding->photo().size(), record)) return finding;
+    const SetRegions regions(tester, request.parameters.value("regions", Json()), test_.list, test_.count);
+    const QVResultData* const results = RunNumberedTest(tester, spec_, request, record.phase);
+    if (results == nullptr) return finding;
+    const QVLightResult& found = results->*test_.result;
+    finding->regions.assign(found.regions_, found.regions_ + found.region_count_);
+    finding->areas = AreasOf(found.error_count_, found.error_areas_, found.error_pixels_);
+    Collect(record.phase, finding->regions, finding->areas);
+    Look(record, finding->regions, finding->areas);
+    return finding;
+  }
+
+ private:
+  // Said before the test refuses them, in plain words.
+  static bool Fit(const Request& request, cv::Size photo, Record& record) {
+    for (const Json& r : request.parameters.value("regions", Json::array())) {
+      const std::int64_t left = r[0];
+      const std::int64_t top = r[1];
+      if (left >= 0 && top >= 0 && left + r[2].get<std::int64_t>() <= photo.width &&
+          top + r[3].get<std::int64_t>() <= photo.height) {
+        continue;
+      }
+      record.phase.code = QV_ERROR_UNUSABLE_INPUT;
+      record.Say(Remark::kMiss, "region_outside",
+                 Format("%s: region with label %d (left %d, top %d, %d x %d) does not lie inside the photo of %d x %d",
+                        record.inputs[0].path.c_str(), r[4].get<int>(), r[0].get<int>(), r[1].get<int>(),
+                        r[2].get<int>(), r[3].get<int>(), photo.width, photo.height));
+      return false;
+    }
+    return true;
+  }
+
+  const LightTest& test_;
+  Spec spec_;
+};
+
+}  // namespace
+
+const Measurement& LightsMeasurement(bool touch_panel) {
+  static const Lights led(kLightTests[0]);
+  static const Lights panel(kLightTests[1]);
+  return touch_panel ? panel : led;
+}
+
+}  // namespace qv

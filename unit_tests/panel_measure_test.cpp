@@ -1,0 +1,144 @@
+// Lights, prints and registrations measured in process, on simulated photos whose truth is known.
+
+#include <gmock/gmock.h>
+
+#include <filesystem>
+#include <opencv2/imgcodecs.hpp>
+
+#include "desk/base/failure.h"
+#include "desk/measure/measure.h"
+#include "desk/simulation/simulation.h"
+#include "unit_tests/drawing.h"
+
+namespace qv {
+namespace {
+
+using ::testing::HasSubstr;
+
+Record MeasureAnew(const Request& request) {
+  QVTester tester;
+  return Measure(tester, request);
+}
+
+bool Says(const Record& record, const std::string& name) {
+  for (const Remark& remark : record.remarks) {
+    if (remark.name == name) return true;
+  }
+  return false;
+}
+
+class PanelPhotos : public ::testing::Test {
+ protected:
+  // The photos as files: p.png, then those beside it.
+  std::vector<std::string> Write(const SimulationOptions& options, const Simulation& simulation) const {
+    std::vector<std::string> paths;
+    CameraModel sensor = options.camera;
+    std::filesystem::create_directories(folder_.Path("samples"));
+    for (const cv::Mat& levels : simulation.levels) {
+      const std::string name = paths.empty() ? "p.png" : "samples/" + std::to_string(paths.size()) + ".png";
+      paths.push_back(folder_.Write(name, Sense(sensor, levels, 8)));
+      sensor.seed += 1000;
+    }
+    return paths;
+  }
+
+  TemporaryFolder folder_;
+};
+
+TEST_F(PanelPhotos, LightsAreMeasuredRegionByRegion) {
+  SimulationOptions options;
+  options.scene = "lights";
+  options.camera.size = {450, 300};
+  options.camera.gain = 1;
+  options.lights.colour = {200, 150, 100};
+  options.spots = 3;
+  options.spot_px = 6;
+  const Simulation simulation = Simulate(options);
+  const cv::Mat photo = Sense(options.camera, simulation.levels[0], 8);
+  const std::string truth = folder_.Write("truth.json", simulation.truth.dump());
+  const Record record = MeasureAnew({"led_light", {photo}, {{"regions", truth}}});
+  ASSERT_EQ(1, record.phase.code);
+  for (const char* axis : {"x", "y"}) {
+    const Reading& reading = *record.phase.Find(std::string("chromaticity_") + axis);
+    ASSERT_EQ(6U, reading.values.size());
+    for (const double value : reading.values) EXPECT_NEAR(simulation.truth["chromaticity"][axis], value, 3e-3);
+    EXPECT_GE(record.phase.Find(std::string("chromaticity_") + axis + "_max")->value(), reading.values[3]);
+  }
+  EXPECT_EQ(3, record.phase.Find("area_count")->value());
+  const Reading& areas = *record.phase.Find("areas");
+  EXPECT_NEAR(simulation.truth["spots"].size(), areas.values.size(), 0);
+  EXPECT_EQ(Json({199, 0, 9, 9, 0}),
+            MeasureAnew({"touch_panel_led", {photo}, {{"regions", "199,0,9,9"}}}).request.parameters["regions"][0]);
+
+  const Record outside = MeasureAnew({"led_light", {photo}, {{"regions", "0,0,9,9;440,290,20,9,5"}}});
+  EXPECT_EQ(-95, outside.phase.code);
+  EXPECT_THAT(outside.MissSentence(), HasSubstr("region with label 5"));
+  EXPECT_TRUE(Says(MeasureAnew({"led_light", {photo}, {{"regions", "5,5,9,9"}}}), "region_smaller_than_window"));
+  EXPECT_TRUE(Says(MeasureAnew({"led_light", {cv::Mat(99, 99, CV_8UC3, cv::Scalar(0, 0, 255))}}), "clipped"));
+  for (const Json& regions : {Json("1,2,3"), Json("1,2,0,4"), Json::array(), Json({{1, 2, 3, "4"}}), Json("no.json")}) {
+    EXPECT_THROW(MeasureAnew({"led_light", {photo}, {{"regions", regions}}}), Failure) << regions;
+  }
+}
+
+TEST_F(PanelPhotos, PrintsAreHeldAgainstTheFilesOfAFolder) {
+  SimulationOptions options;
+  options.scene = "print";
+  options.camera.size = {560, 420};
+  options.camera.fill = 0.85;
+  options.camera.noise_percent = 2;
+  options.camera.blur_px = 0.7;
+  options.motion_px = {7, -4};
+  options.second_turn_deg = 2;
+  options.missing = options.extra = 1;
+  options.print_defect_px = 9;
+  options.samples = 3;
+  const Simulation simulation = Simulate(options);
+  const std::vector<std::string> paths = Write(options, simulation);
+  const Request request = {"touch_panel_print", {paths[0], folder_.Path("samples")}};
+  const Record record = MeasureAnew(request);
+  ASSERT_EQ(1, record.phase.code) << record.MissSentence();
+  EXPECT_EQ(4U, record.inputs.size());
+  EXPECT_EQ(4U, record.ToJson()["request"]["inputs"].size()) << "the files, not the folder";
+  EXPECT_TRUE(record.remarks.empty());
+  const Reading& areas = *record.phase.Find("areas");
+  ASSERT_EQ(2U, areas.values.size());
+  for (const Json& defect : simulation.truth["defects"]) {
+    double nearest = 1e9;
+    for (std::size_t i = 0; i < 2; ++i) {
+      nearest = std::min(
+          nearest, std::hypot(areas.axis[i] - defect["x"].get<double>(), areas.values[i] - defect["y"].get<double>()));
+    }
+    EXPECT_LT(nearest, 1.5) << defect;
+  }
+
+  const cv::Mat cut = cv::imread(paths[0])(cv::Rect(0, 0, 480, 420));
+  EXPECT_TRUE(Says(MeasureAnew({"touch_panel_print", {folder_.Write("cut.png", cut), paths[1]}}), "print_cut_off"));
+  folder_.Write("samples/4.png", std::string("words"));
+  const Record refused = MeasureAnew(request);
+  EXPECT_EQ(-97, refused.phase.code);
+  EXPECT_THAT(refused.MissSentence(), HasSubstr("samples/4.png"));
+  folder_.Write("samples/4.png", cv::Mat(99, 99, CV_8UC1, cv::Scalar(7)));
+  EXPECT_EQ(-90, MeasureAnew(request).phase.code);
+  EXPECT_THROW(MeasureAnew({"touch_panel_print", {paths[0]}}), Failure);
+}
+
+TEST_F(PanelPhotos, BothMapsOfARegistrationStandSideBySide) {
+  SimulationOptions options;
+  options.scene = "pair";
+  options.camera.size = {400, 300};
+  options.camera.gain = 0.75;
+  options.second_turn_deg = 5;
+  const Simulation simulation = Simulate(options);
+  const std::vector<cv::Mat> photos = {Sense(options.camera, simulation.levels[0], 8),
+                                       Sense(options.camera, simulation.levels[1], 8)};
+  const Record record = MeasureAnew({"registration", {photos[0], photos[1]}, {{"map", "robust"}}});
+  ASSERT_EQ(1, record.phase.code);
+  const std::vector<double>& map = record.phase.Find("robust_matrix")->values;
+  for (std::size_t i = 0; i < 6; ++i) EXPECT_NEAR(simulation.truth["matrix"][i], map[i], i % 3 == 2 ? 0.2 : 1e-3) << i;
+  EXPECT_GT(record.phase.Find("map_distance")->value(), 0);
+  const Record blank = MeasureAnew({"registration", {photos[0], DrawScene(9, {400, 300})}, {{"map", "robust"}}});
+  EXPECT_TRUE(Says(blank, "robust_map_doubtful"));
+}
+
+}  // namespace
+}  // namespace qv
