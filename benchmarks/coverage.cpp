@@ -17,6 +17,7 @@
 
 #include "desk/measure/edge_resampling.h"
 #include "desk/measure/iso_mtf.h"
+#include "desk/measure/patch_trust.h"
 #include "desk/measure/uncertainty.h"
 #include "desk/simulation/method_law.h"
 #include "qvtester/tester.h"
@@ -31,6 +32,10 @@ struct Condition {
   bool srgb = true;
   int jpeg = 0;
   int rows = 260, columns = 90;
+
+  constexpr bool blur_only() const {
+    return blur != 0.8 || contrast != 5 || turn_deg != 0 || !srgb || jpeg != 0 || rows != 260;
+  }
 };
 constexpr Condition kConditions[] = {
     {"as it comes"},
@@ -147,6 +152,56 @@ Trial TryOwn(const Condition& condition, cv::RNG& random) {
   return {ReadOwn(region) - truth, ResampleEdge(region, ReadOwn).expanded, truth};
 }
 
+// A patch of some colour, as the test measures it: the mean of its stored levels, cut. `part`: 0 to 2 of L*a*b*, 3 the
+// difference to a standard of a near colour.
+Trial TryPatch(const Condition& condition, int part, cv::RNG& random) {
+  constexpr int kSide = 60;
+  const auto photograph = [&](const cv::Vec3d& rgb) {
+    cv::Mat noise(kSide, kSide, CV_32FC3);
+    random.fill(noise, cv::RNG::NORMAL, cv::Scalar(rgb[0], rgb[1], rgb[2]),
+                cv::Scalar::all(condition.noise_percent * 2.55));
+    cv::Mat photo;
+    noise.convertTo(photo, CV_8U);
+    return photo;
+  };
+  const auto cut = [](const cv::Mat& photo) {
+    const cv::Scalar mean = cv::mean(photo);
+    return cv::Point3i(cvFloor(mean[0]), cvFloor(mean[1]), cvFloor(mean[2]));
+  };
+  cv::Vec3d truth;
+  cv::Vec3d standard;
+  for (int k = 0; k < 3; ++k) {
+    truth[k] = random.uniform(60.0, 200.0);
+    standard[k] = truth[k] + random.uniform(-15.0, 15.0);
+  }
+  const cv::Mat photo = photograph(truth);
+  const cv::Mat other = photograph(standard);
+  const cv::Point3i mean = cut(photo);
+  const double area = kSide * kSide;
+  const std::vector<cv::Vec3d> draws = DrawPatchColours(photo, area, mean, 1);
+  const auto levels = [](const cv::Point3i& p) { return cv::Vec3d(p.x, p.y, p.z); };
+  if (part < 3) {
+    const auto figure = [part](const cv::Vec3d& rgb) { return OwnLab(rgb)[part]; };
+    return {figure(levels(mean)) - figure(truth), TrustInColour(mean, draws, figure).expanded, 100};
+  }
+  const auto difference = [](const cv::Vec3d& a, const cv::Vec3d& b) { return cv::norm(OwnLab(a) - OwnLab(b)); };
+  const cv::Point3i of_standard = cut(other);
+  return {difference(levels(mean), levels(of_standard)) - difference(truth, standard),
+          TrustInPair(mean, draws, of_standard, DrawPatchColours(photo, area, of_standard, 2), difference).expanded,
+          100};
+}
+
+// A flash photo whose light falls off, and its mean without noise.
+Trial TryMean(const Condition& condition, cv::RNG& random) {
+  cv::Mat levels(120, 160, CV_32F);
+  for (int row = 0; row < levels.rows; ++row) {
+    for (int i = 0; i < levels.cols; ++i) levels.at<float>(row, i) = 150 - 0.3f * static_cast<float>(row + i);
+  }
+  const cv::Mat photo = Photograph(condition, levels, condition.noise_percent, random);
+  const double truth = cv::mean(levels)[0];
+  return {cv::mean(photo)[0] - truth, OfMeanLevel(photo).expanded, truth};
+}
+
 struct Row {
   const char* figure;
   std::function<Trial(const Condition&, cv::RNG&)> run;
@@ -155,11 +210,19 @@ const std::vector<Row>& Rows() {
   const auto iso = [](IsoFigure figure, double level) {
     return [=](const Condition& condition, cv::RNG& random) { return TryIso(condition, figure, level, random); };
   };
+  const auto patch = [](int part) {
+    return [=](const Condition& condition, cv::RNG& random) { return TryPatch(condition, part, random); };
+  };
   static const std::vector<Row> rows = {{"MTF50 ISO", iso(&IsoFigures::mtf50, 0.5)},
                                         {"MTF30 ISO", iso(&IsoFigures::mtf30, 0.3)},
                                         {"MTF10 ISO", iso(&IsoFigures::mtf10, 0.1)},
                                         {"edge width", iso(&IsoFigures::edge_width, 0)},
-                                        {"MTF50 of the test", TryOwn}};
+                                        {"MTF50 of the test", TryOwn},
+                                        {"L* of a patch", patch(0)},
+                                        {"a* of a patch", patch(1)},
+                                        {"b* of a patch", patch(2)},
+                                        {"difference of patches", patch(3)},
+                                        {"mean level", TryMean}};
   return rows;
 }
 
@@ -212,6 +275,10 @@ int main(int count, char** words) {
   bool kept = true;
   for (const auto& row : qv::Rows()) {
     for (const auto& condition : qv::kConditions) {
+      // Of what has no edge, only the noise varies.
+      const bool edge =
+          std::string(row.figure).find("patch") == std::string::npos && row.figure != std::string("mean level");
+      if (!edge && condition.blur_only()) continue;
       const std::string name = std::string(row.figure) + ", " + condition.name;
       const auto asked = [&](const char* word) { return word[0] == '-' || name.find(word) != std::string::npos; };
       if (std::all_of(words + 1, words + count, asked)) kept = qv::PrintRow(row, condition, trials) && kept;

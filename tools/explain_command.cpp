@@ -5,6 +5,7 @@
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
 #include "desk/measure/figures.h"
+#include "desk/measure/uncertainty.h"
 #include "tools/commands.h"
 #include "tools/program.h"
 
@@ -24,17 +25,33 @@ std::string Explain(const FigureInfo& info) {
                              : Format("may differ by %g from one machine to another\n", repeatability));
 }
 
+// How far figures may be trusted is told by method: many figures share one.
+void ExplainUncertainty() {
+  std::cout
+      << "A record's `uncertainty` holds a figure's standard uncertainty, and the expanded one within which the true "
+         "value\nlies 95 times in 100 (JCGM 100), by one of these methods:\n";
+  for (const UncertaintyMethod& method : UncertaintyMethods()) {
+    std::cout << '\n' << method.name << "\n  " << method.text << '\n';
+  }
+}
+
 }  // namespace
 
 CommandBody DeclareExplain(Options& command) {
   auto names = std::make_shared<std::vector<std::string>>();
-  command.Arguments("MEASUREMENT", *names, "Names as records give them, or parts of names; without any, all are listed",
+  command.Arguments("MEASUREMENT", *names,
+                    "Names as records give them, or parts of names; without any, all are listed; \"uncertainty\": how "
+                    "far they may be trusted",
                     "NAME", false);
   return [names] {
     if (names->empty()) {
       for (const FigureInfo& info : AllFigures()) std::cout << info.name << '\n';
     }
     for (const std::string& name : *names) {
+      if (name == "uncertainty") {
+        ExplainUncertainty();
+        continue;
+      }
       bool found = false;
       for (const FigureInfo& info : AllFigures()) {
         const bool exact = FindFigure(name) != nullptr;

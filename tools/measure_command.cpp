@@ -24,7 +24,8 @@ namespace qv {
 struct MeasureOptions {
   std::vector<std::string> inputs;                          // by their place in the row; empty: left out
   std::map<std::string, std::optional<std::string>> words;  // parameters by name
-  std::vector<std::string> set;
+  std::map<std::string, bool> flags;                        // and those that are one
+  std::vector<std::string> set, repeats;
   std::string json, annotate, limits, dut, station;
   bool flag = false, fake = false, publish = false, verbose = false, quiet = false;
 };
@@ -76,7 +77,7 @@ void DeclareOutputs(Options& command, const MeasuringCommand& row, MeasureOption
   command.Flag("--quiet", options.quiet, "Print nothing but what was asked for and errors");
 }
 
-Request RequestOf(const Spec& spec, const MeasureOptions& options) {
+Request RequestOf(const Spec& spec, const MeasureOptions& options, const CommandExtra* extra) {
   Request request;
   request.measurement = spec.name;
   for (const std::string& input : options.inputs) {
@@ -87,12 +88,18 @@ Request RequestOf(const Spec& spec, const MeasureOptions& options) {
     }
   }
   for (const Parameter& parameter : spec.parameters) {
+    if (parameter.type == Parameter::kFlag) {
+      if (options.flags.at(parameter.name)) request.parameters[parameter.name] = true;
+      continue;
+    }
     const std::optional<std::string>& word = options.words.at(parameter.name);
     if (word) request.parameters[parameter.name] = Parsed(parameter, *word);
   }
+  for (const std::string& photo : options.repeats) request.repeats.emplace_back(photo);
   for (const std::string& words : options.set) AddProperty(request.properties, words);
   request.fake = options.fake;
   request.publish = options.publish;
+  if (extra != nullptr) extra->Complete(request);
   return Resolved(request);
 }
 
@@ -107,6 +114,7 @@ void CheckFiles(const Spec& spec, const MeasureOptions& options, const CommandEx
       inputs.push_back({std::string("one of the ") + spec.inputs[i].name, entry.path().string()});
     }
   }
+  for (const std::string& photo : options.repeats) inputs.push_back({"a repeated photo", photo});
   inputs.push_back({"the limits", options.limits});
   std::vector<NamedFile> outputs = {{"the record", options.json}, {"the picture", options.annotate}};
   if (extra != nullptr) {
@@ -141,6 +149,7 @@ void Tell(const Record& record, const MeasureOptions& options, const CommandExtr
   for (const RecordedInput& input : record.inputs) {
     text += Format("%s  %d x %d\n", input.path.c_str(), input.width, input.height);
   }
+  if (!options.repeats.empty()) text += Format("medians of %zu photos\n", options.repeats.size() + 1);
   text += record.finding->Report(record);
   if (extra != nullptr) text += extra->Report(record);
   bool taken = options.json == "-" || options.annotate == "-";
@@ -180,7 +189,7 @@ int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* 
   QVTester tester;
   Record record = [&] {
     const FilmProgress progress(tester, options.quiet);
-    return Measure(tester, RequestOf(spec, options), limits);
+    return Measure(tester, RequestOf(spec, options, extra), limits);
   }();
   record.dut_id = options.dut;
   record.station_id = options.station;
@@ -203,10 +212,16 @@ CommandBody MeasuringCommand::operator()(Options& command) const {
   DeclareInputs(command, spec, *options);
   if (flag != nullptr) command.Flag(flag, options->flag, flag_help);
   for (const Parameter& parameter : spec.parameters) {
+    if (parameter.type == Parameter::kFlag) {
+      command.Flag(OptionOf(parameter.name).c_str(), options->flags[parameter.name], parameter.help);
+      continue;
+    }
     command.Text(OptionOf(parameter.name).c_str(), options->words[parameter.name], HelpOf(parameter), parameter.value);
   }
   command.Texts("--set", options->set, "Set a property of the tester by its index or name; may be repeated",
                 "PROPERTY=VALUE");
+  command.List("--repeat", options->repeats, "Further photos of the same unit: medians and their spread are told",
+                "PHOTO");
   if (spec.test) command.Flag("--fake", options->fake, "Run the test in its fake mode");
   if (spec.publishes) {
     command.Flag("--publish", options->publish, "Write the findings to the system properties that other programs read");

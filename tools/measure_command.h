@@ -24,6 +24,8 @@ class CommandExtra {
   virtual void Declare(Options& command) = 0;
   /// Before anything is measured: throws Failure (wrong usage) for what can be known then.
   virtual void Prepare() {}
+  /// What it knows of the photo goes into the request, where nothing was given.
+  virtual void Complete(Request& /*request*/) const {}
   virtual std::vector<NamedFile> Outputs() const { return {}; }
   /// Lines after the measurement's own report.
   virtual std::string Report(const Record& /*record*/) const { return ""; }

@@ -55,6 +55,11 @@ void Options::Texts(const char* name, std::vector<std::string>& values, const st
       ->type_name(type);
 }
 
+void Options::List(const char* name, std::vector<std::string>& values, const std::string& help, const char* type) {
+  constexpr int kMost = 1000;
+  command_->add_option(name, values, help)->expected(1, kMost)->type_name(type);
+}
+
 void Options::Choice(const char* name, std::string& value, const std::vector<std::string>& choices,
                      const std::string& help, const char* type) {
   command_->add_option(name, value, WithDefault(help, value))->check(CLI::IsMember(choices))->type_name(type);

@@ -35,6 +35,8 @@ class Options {
   void Text(const char* name, std::optional<std::string>& value, const std::string& help, const char* type);
   /// May be given again and again.
   void Texts(const char* name, std::vector<std::string>& values, const std::string& help, const char* type);
+  /// One or more words behind it.
+  void List(const char* name, std::vector<std::string>& values, const std::string& help, const char* type);
   void Choice(const char* name, std::string& value, const std::vector<std::string>& choices, const std::string& help,
               const char* type);
   void Choice(const char* name, int& value, const std::vector<int>& choices, const std::string& help, const char* type);

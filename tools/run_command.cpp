@@ -42,7 +42,9 @@ int RankOf(Outcome outcome) {
 std::string ValueText(const Reading& reading) {
   if (!std::isfinite(reading.value())) return "none";
   std::string text = Format("%.6g", reading.value());
-  if (reading.uncertainty) text = Format("%.4f \u00b1 %.2g", reading.value(), reading.uncertainty->expanded);
+  if (reading.uncertainties.size() == 1) {
+    text = Format("%.4f \u00b1 %.2g", reading.value(), reading.uncertainty().expanded);
+  }
   const std::string suffix = reading.info->figure->unit.suffix;
   return suffix == "1" ? text : text + " " + suffix;
 }

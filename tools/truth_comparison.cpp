@@ -61,6 +61,14 @@ class TruthComparison : public CommandExtra {
     if (!path_.empty()) truth_ = ReadJson(path_);
   }
 
+  // A simulated photo's levels stand for light as its truth says; before version 0.6 they were the light itself.
+  void Complete(Request& request) const override {
+    if (path_.empty() || request.parameters.contains("transfer")) return;
+    const auto place = Json::json_pointer("/parameters/transfer");
+    const bool srgb = truth_.contains(place) && truth_[place] == "srgb";
+    request.parameters["transfer"] = srgb ? "srgb" : "linear";
+  }
+
   std::string Report(const Record& record) const override {
     if (path_.empty()) return "";
     try {

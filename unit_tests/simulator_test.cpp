@@ -39,7 +39,7 @@ TEST_F(Simulator, LensFaultsHaveTheirAnalyticResponse) {
   const auto target = EdgeTarget(6);
   for (const auto& [fault, blur] : std::vector<std::pair<std::string, double (*)(double, cv::Point2d)>>{
            {"", none}, {"--blur 0.9", gaussian}, {"--defocus 2.3", disc}, {"--smear 3,1.5", motion}}) {
-    const json record = Record("autofocus " + Simulate("--edge-angle 6 " + fault));
+    const json record = Record("autofocus --transfer linear " + Simulate("--edge-angle 6 " + fault));
     for (const bool lying : {false, true}) {
       const std::string region = lying ? "vertical" : "horizontal";
       const cv::Point2d edge = target[lying ? 1 : 3] - target[0];

@@ -3,9 +3,11 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
+#include <tuple>
 
 #include "desk/measure/decision.h"
 #include "desk/measure/edge_resampling.h"
+#include "desk/measure/measure.h"
 #include "unit_tests/drawing.h"
 
 namespace qv {
@@ -102,6 +104,79 @@ TEST(Decision, ByTheRule) {
     EXPECT_NEAR(v.wrong, d.wrong_probability, 1e-4) << v.rule << v.reading;
   }
   EXPECT_FALSE(ParseDecisionRule("strict"));
+}
+
+class Trusted : public ::testing::Test {
+ protected:
+  static cv::Mat Photo(int seed) {
+    cv::Mat noise(1000, 1000, CV_16SC3);
+    cv::RNG(seed).fill(noise, cv::RNG::NORMAL, 0, 2.5);
+    cv::Mat photo;
+    cv::add(DrawChart(), noise, photo, cv::noArray(), CV_8U);
+    return photo;
+  }
+
+  static Record Run(const Json& parameters, const Limits& limits = {}, std::vector<Input> repeats = {}) {
+    QVTester tester;
+    Request request = {"camera_autofocus", {Photo(1)}};
+    request.parameters = parameters;
+    request.repeats = std::move(repeats);
+    return Measure(tester, request, limits);
+  }
+
+  static constexpr char kOwn[] = "mtf50_vertical";
+  static constexpr char kIso[] = "mtf50_iso_vertical";
+};
+
+TEST_F(Trusted, ARecordTellsHowFarItsFiguresMayBeTrusted) {
+  const Record plain = Run({{"transfer", "linear"}});
+  EXPECT_TRUE(plain.phase.Find(kOwn)->uncertainties.empty());  // costs 50 more readings
+  const Record asked = Run({{"transfer", "linear"}, {"uncertainty", true}});
+  for (const char* figure : {kOwn, kIso}) {
+    const double expanded = asked.phase.Find(figure)->uncertainty().expanded;
+    EXPECT_GT(expanded, 0) << figure;
+    // Two photos differ by sqrt(2) times what one is off by.
+    QVTester tester;
+    const Record other = Measure(tester, {"camera_autofocus", {Photo(2)}, {{"transfer", "linear"}}});
+    EXPECT_NEAR(asked.phase.Find(figure)->value(), other.phase.Find(figure)->value(), 2 * expanded) << figure;
+  }
+  EXPECT_LT(asked.phase.Find(kIso)->value(),
+            Run(Json::object()).phase.Find(kIso)->value());  // as sRGB the edge is steeper
+}
+
+TEST_F(Trusted, ALimitNearTheReadingFollowsTheRule) {
+  const Json linear = {{"transfer", "linear"}};
+  const Reading reading = *Run(linear).phase.Find(kIso);
+  const double half = reading.uncertainty().expanded / 2;
+  const std::string name = reading.info->name;
+  const auto judged = [&](const char* rule, double min, const char* figure) {
+    Limits limits;
+    limits.rule.kind = *ParseDecisionRule(rule);
+    limits.by_name[figure].min = min;
+    return Run(linear, limits);
+  };
+  for (const auto& [rule, off, outcome] : {std::tuple("simple", -half, Outcome::kPass),
+                                           {"guarded", -half, Outcome::kFail},
+                                           {"simple", half, Outcome::kFail},
+                                           {"guarded_rejection", half, Outcome::kPass}}) {
+    const Record record = judged(rule, reading.value() + off, name.c_str());
+    EXPECT_EQ(outcome, record.phase.Find(kIso)->outcome) << rule << off;
+    EXPECT_TRUE(record.marginal()) << rule << off;
+  }
+  EXPECT_FALSE(judged("simple", reading.value() - 3 * half, name.c_str()).marginal());
+  // Nothing is known of the test's own figure unless asked for, so no guard band can be had.
+  EXPECT_EQ(Outcome::kError, judged("guarded", 0.1, "camera_autofocus_mtf50_vertical").outcome());
+}
+
+TEST_F(Trusted, RepeatsGiveMediansAndTheirSpread) {
+  const Record record = Run({{"transfer", "linear"}}, {}, {Photo(2), Photo(3)});
+  const Reading& m = *record.phase.Find(kIso);
+  ASSERT_EQ(3U, m.repeats.size());
+  EXPECT_DOUBLE_EQ(Median(m.repeats), m.value());
+  EXPECT_STREQ(kRepeatMethod, m.uncertainty().method.c_str());
+  EXPECT_EQ(3U, record.inputs.size());
+  // A photo without a chart: the unit was not measured.
+  EXPECT_FALSE(Run(Json::object(), {}, {cv::Mat(300, 300, CV_8UC3, cv::Scalar::all(200))}).measured());
 }
 
 }  // namespace

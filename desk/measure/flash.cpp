@@ -39,7 +39,8 @@ class FlashFinding : public Finding {
 
   std::string Report(const Record& record) const override {
     const Reading& mean = *record.phase.Find("mean");
-    std::string text = Format("mean of the first channel  %.2f of 255%s\n", mean.value(), LimitText(mean).c_str());
+    std::string text =
+        Format("mean of the first channel  %s of 255%s\n", ValueText(mean, 2).c_str(), LimitText(mean).c_str());
     for (const char* channel : kChannelNames) {
       const Reading* const level = record.phase.Find(std::string("mean_") + channel);
       const Reading* const clipped = record.phase.Find(std::string("clipped_") + channel);
@@ -88,7 +89,9 @@ class Flash : public Measurement {
   std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
     if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
       const bool vt = spec_.test == QV_TEST_CAMERA_FLASH_VT;
-      record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_);
+      cv::Mat first;
+      cv::extractChannel(SlotPhoto(tester, spec_.inputs[0].slot), first, 0);
+      record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_).Trust({OfMeanLevel(first)});
       CollectChannels(record.phase, SlotPhoto(tester, spec_.inputs[0].slot));
     }
     return std::make_unique<FlashFinding>(SlotPhoto(tester, spec_.inputs[0].slot));

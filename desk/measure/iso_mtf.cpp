@@ -108,7 +108,15 @@ IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corn
 Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure) {
   std::vector<double> readings;
   for (const IsoFigures& band : iso.bands) readings.push_back(band.*figure);
-  return OfMean(readings, kOfTheMethod * iso.figures.*figure, kBandsMethod);
+  const double whole = iso.figures.*figure;
+  double of_method = kOfTheMethod * whole;
+  if (figure == &IsoFigures::peak || figure == &IsoFigures::overshoot) {
+    // Noise raises a highest value: that of a quarter twice as much as that of the whole.
+    double excess = -whole;
+    for (const double reading : readings) excess += reading / kBands;
+    of_method = std::hypot(of_method, excess);
+  }
+  return OfMean(readings, of_method, kBandsMethod);
 }
 
 }  // namespace qv

@@ -52,16 +52,31 @@ Limit ReadLimit(const FigureInfo& info, const JsonView& view) {
   return limit;
 }
 
+// {"rule": "guarded", "factor": 1.0}
+DecisionRule ReadRule(const JsonView& view) {
+  constexpr double kLargestFactor = 10;
+  view.KnowOnly({"rule", "factor"});
+  DecisionRule rule;
+  const std::string name = view.At("rule").Text();
+  const auto kind = ParseDecisionRule(name);
+  if (!kind) view.Refuse("its rule \"" + Printable(name) + "\" is none of simple, guarded, guarded_rejection");
+  rule.kind = *kind;
+  if (view.Has("factor")) rule.factor = view.At("factor").Number();
+  if (!(rule.factor > 0 && rule.factor <= kLargestFactor)) view.Refuse("its factor does not lie above 0 and up to 10");
+  return rule;
+}
+
 }  // namespace
 
 Limits ReadLimits(const std::string& path) { return LimitsFromJson(ReadJson(path), Printable(path)); }
 
 Limits LimitsFromJson(const Json& json, const std::string& where) {
   const JsonView view(json, where);
-  view.KnowOnly({"name", "revision", "limits", "accept_doubts"});
+  view.KnowOnly({"name", "revision", "limits", "accept_doubts", "decision"});
   Limits limits;
   if (view.Has("name")) limits.name = view.At("name").Text();
   if (view.Has("revision")) limits.revision = view.At("revision").Text();
+  if (view.Has("decision")) limits.rule = ReadRule(view.At("decision"));
   if (view.Has("accept_doubts")) {
     for (const JsonView& doubt : view.At("accept_doubts").Elements()) limits.accept_doubts.insert(doubt.Text());
   }

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "desk/base/json.h"
+#include "desk/measure/decision.h"
 
 namespace qv {
 
@@ -18,6 +19,7 @@ struct Limit {
 
 struct Limits {
   std::string name, revision;
+  DecisionRule rule;
   std::map<std::string, Limit> by_name;
   std::set<std::string> accept_doubts;  // names of doubts that this plant lives with
 

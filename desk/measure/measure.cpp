@@ -11,6 +11,7 @@
 #include "desk/measure/load.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
+#include "desk/measure/repeats.h"
 #include "qvtester/host_properties.h"
 
 namespace qv {
@@ -89,10 +90,8 @@ Record NewRecord(const Request& request, const Spec& spec, const Limits& limits)
   return record;
 }
 
-}  // namespace
-
-Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
-  const Request resolved = Resolved(request);
+// Not judged yet.
+Record MeasureOnce(QVTester& tester, const Request& resolved, const Limits& limits) {
   const Measurement& measurement = *FindMeasurement(resolved.measurement);
   const Spec& spec = measurement.spec();
   RefuseForeignLimits(spec, limits);
@@ -115,9 +114,26 @@ Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
     SayCause(record, log.lines());
   }
   record.properties = PropertiesOffDefault(tester);
-  record.Judge();
   record.log_lines = std::move(log.lines());
   record.end_millis = MillisSinceEpoch();
+  return record;
+}
+
+}  // namespace
+
+Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
+  const Request resolved = Resolved(request);
+  Record record = MeasureOnce(tester, resolved, limits);
+  std::vector<Record> others;
+  for (const Input& photo : resolved.repeats) {
+    Request again = resolved;
+    again.repeats.clear();
+    again.inputs.at(0) = photo;
+    QVTester fresh;
+    others.push_back(MeasureOnce(fresh, again, limits));
+  }
+  if (!others.empty()) JoinRepeats(record, others);
+  record.Judge();
   return record;
 }
 

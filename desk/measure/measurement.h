@@ -23,6 +23,8 @@ struct Parameter {
     kWhole,
     kReal,
     kWord,       // one of `words`
+    kFlag,       // true or false
+    kTransfer,   // "srgb", "linear", "gamma:G"
     kSize,       // "4000x3000"
     kRegions,    // rectangles with labels, or a file that holds them
     kHistogram,  // 256 whole numbers, or a file that holds them: a dust record or a list

@@ -14,6 +14,7 @@
 #include "desk/measure/patch_values.h"
 #include "desk/measure/properties.h"
 #include "desk/measure/regions.h"
+#include "desk/measure/transfer.h"
 
 namespace qv {
 
@@ -63,6 +64,17 @@ Json CheckedSize(const Parameter& parameter, const Json& value) {
   return value;
 }
 
+Json CheckedFlag(const Parameter& parameter, const Json& value) {
+  if (!value.is_boolean()) Refuse(parameter, value.dump(), "neither true nor false");
+  return value;
+}
+
+Json CheckedTransfer(const Parameter& parameter, const Json& value) {
+  const auto transfer = value.is_string() ? ParseTransfer(value.get<std::string>()) : std::nullopt;
+  if (!transfer) Refuse(parameter, value.dump(), "none of srgb, linear, gamma:G with G from 0.1 to 10");
+  return transfer->Text();
+}
+
 }  // namespace
 
 cv::Size SizeOf(const std::string& text) {
@@ -81,6 +93,8 @@ Json Checked(const Parameter& parameter, const Json& value) {
     case Parameter::kWhole:
     case Parameter::kReal: return CheckedNumber(parameter, value);
     case Parameter::kWord: return CheckedWord(parameter, value);
+    case Parameter::kFlag: return CheckedFlag(parameter, value);
+    case Parameter::kTransfer: return CheckedTransfer(parameter, value);
     case Parameter::kSize: return CheckedSize(parameter, value);
     case Parameter::kPatches: return CheckedPatches(value);
     case Parameter::kRegions: return CheckedRegions(value);

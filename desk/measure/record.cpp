@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <stdexcept>
+#include <utility>
 
 #include "desk/base/digest.h"
 #include "desk/base/json.h"
@@ -37,12 +38,34 @@ Json JsonOf(const Limit& limit) {
   return json;
 }
 
-Json JsonOf(const Uncertainty& u) {
-  return {
-      {"standard", u.standard}, {"expanded", u.expanded}, {"coverage_factor", u.coverage_factor}, {"method", u.method}};
+// Of one value, or lists that go with the values.
+Json JsonOf(const Reading& m, double Uncertainty::*part) {
+  if (m.info->figure->axis == nullptr) return m.uncertainties[0].*part;
+  Json list = Json::array();
+  for (const Uncertainty& u : m.uncertainties) list.push_back(u.*part);
+  return list;
 }
 
-Json JsonOf(const Reading& m) {
+Json JsonOfUncertainty(const Reading& m) {
+  return {{"standard", JsonOf(m, &Uncertainty::standard)},
+          {"expanded", JsonOf(m, &Uncertainty::expanded)},
+          {"coverage_factor", JsonOf(m, &Uncertainty::coverage_factor)},
+          {"method", m.uncertainties[0].method}};
+}
+
+Json JsonOfRepeats(const Reading& m) {
+  Json values = Json::array();
+  for (const double value : m.repeats) values.push_back(JsonOf(value, m.info->figure->number));
+  return {{"values", values}, {"spread", JsonOf(Spread(m.repeats), Number::kReal)}};
+}
+
+Json JsonOf(const Decision& decision, const DecisionRule& rule, bool known) {
+  return {{"rule", rule.Name()},
+          {"guard_band", decision.guard_band},
+          {"wrong_probability", known ? Json(decision.wrong_probability) : Json()}};
+}
+
+Json JsonOf(const Reading& m, const DecisionRule& rule) {
   Json json = {{"name", m.info->name}, {"outcome", Name(m.outcome)}};
   if (m.marginal) json["marginal"] = true;
   if (m.outcome == Outcome::kUnset) {
@@ -63,10 +86,12 @@ Json JsonOf(const Reading& m) {
   }
   const auto bad = std::find_if(m.values.begin(), m.values.end(), [](double v) { return !std::isfinite(v); });
   if (bad != m.values.end()) json["non_finite"] = NonFiniteName(*bad);
-  if (m.uncertainty) json["uncertainty"] = JsonOf(*m.uncertainty);
+  if (!m.repeats.empty()) json["repeats"] = JsonOfRepeats(m);
+  if (!m.uncertainties.empty()) json["uncertainty"] = JsonOfUncertainty(m);
   json["units"] = JsonOf(m.info->figure->unit);
   json["method"] = m.info->figure->method.name;
   if (const Json limits = JsonOf(m.limit); !limits.empty()) json["limits"] = limits;
+  if (m.decision) json["decision"] = JsonOf(*m.decision, rule, !m.uncertainties.empty());
   json["docstring"] = Explanation(*m.info->figure);
   return json;
 }
@@ -90,7 +115,7 @@ Json JsonOf(const RecordedInput& input) {
 
 Json JsonOf(const Record& record, const Phase& phase) {
   Json measurements = Json::object();
-  for (const Reading& m : phase.readings) measurements[m.info->name] = JsonOf(m);
+  for (const Reading& m : phase.readings) measurements[m.info->name] = JsonOf(m, record.limits.rule);
   Json attachments = Json::object();
   for (const Attachment& a : phase.attachments) {
     attachments[a.name] = {{"mimetype", a.mimetype}, {"sha1", a.sha1}, {"path", a.path}};
@@ -155,11 +180,30 @@ Reading& Phase::Add(const std::string& figure, std::vector<double> axis, std::ve
   return m;
 }
 
+Reading* Phase::Find(const std::string& figure) {
+  return const_cast<Reading*>(std::as_const(*this).Find(figure));  // NOLINT(cppcoreguidelines-pro-type-const-cast)
+}
+
 const Reading* Phase::Find(const std::string& figure) const {
   for (const Reading& m : readings) {
     if (m.info->name == name + "_" + figure) return &m;
   }
   return nullptr;
+}
+
+void Reading::Trust(std::vector<Uncertainty> known) {
+  const auto finite = [](const Uncertainty& u) { return std::isfinite(u.standard) && std::isfinite(u.expanded); };
+  if (known.size() == values.size() && std::all_of(known.begin(), known.end(), finite))
+    uncertainties = std::move(known);
+}
+
+void Reading::Judge(const DecisionRule& rule) {
+  const Uncertainty u = uncertainty();
+  decision = Decide(value(), u.standard, u.expanded, {limit.min, limit.max}, rule);
+  outcome = decision->pass ? Outcome::kPass : Outcome::kFail;
+  const bool bounded = limit.marginal_min || limit.marginal_max;
+  marginal =
+      bounded ? decision->pass && !Within(value(), limit.marginal_min, limit.marginal_max) : decision->near_limit;
 }
 
 void Record::Judge() {
@@ -180,8 +224,15 @@ void Record::Judge() {
     const auto limit = limits.by_name.find(m.info->name);
     if (limit == limits.by_name.end() || m.outcome == Outcome::kUnset) continue;
     m.limit = limit->second;
-    m.outcome = Within(m.value(), m.limit.min, m.limit.max) ? Outcome::kPass : Outcome::kFail;
-    m.marginal = m.outcome == Outcome::kPass && !Within(m.value(), m.limit.marginal_min, m.limit.marginal_max);
+    if (limits.rule.kind != DecisionRule::Kind::kSimple && m.uncertainties.empty() &&
+        m.info->figure->number == Number::kReal && std::isfinite(m.value())) {
+      Say(Remark::kNoJudgement, "no_uncertainty",
+          Format("%s: the limits ask for the rule \"%s\", and how far this figure may be trusted is not known%s",
+                 m.info->name.c_str(), limits.rule.Name(),
+                 request.parameters.contains("uncertainty") ? "; give --uncertainty" : ""),
+          m.info->figure->name);
+    }
+    m.Judge(limits.rule);
   }
 }
 

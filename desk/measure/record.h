@@ -10,6 +10,7 @@
 
 #include "desk/base/json.h"
 #include "desk/base/log_lines.h"
+#include "desk/measure/decision.h"
 #include "desk/measure/figures.h"
 #include "desk/measure/limits.h"
 #include "desk/measure/request.h"
@@ -32,15 +33,23 @@ const char* Name(Outcome outcome);
 /// A figure's value.
 struct Reading {
   const FigureInfo* info = nullptr;
-  std::vector<double> values;  // one, or those of a list
-  std::vector<double> axis;    // of a list: frequencies in units of Nyquist, or columns
-  std::optional<Uncertainty> uncertainty;
+  std::vector<double> values;              // one, or those of a list
+  std::vector<double> axis;                // of a list: frequencies in units of Nyquist, or columns
+  std::vector<double> repeats;             // of several photos of one unit: what a single value is the median of
+  std::vector<Uncertainty> uncertainties;  // one, or one for each value; none where nothing is known
+  std::optional<Decision> decision;        // how the verdict came about, where a limit is set
   Limit limit;
   Outcome outcome = Outcome::kMeasured;
   bool marginal = false;
 
   /// NaN where it was not measured.
   double value() const { return values.empty() ? std::numeric_limits<double>::quiet_NaN() : values[0]; }
+  /// Of a single value; zero where nothing is known.
+  Uncertainty uncertainty() const { return uncertainties.size() == 1 ? uncertainties[0] : Uncertainty(); }
+  /// Keeps them where they say something: all must be numbers.
+  void Trust(std::vector<Uncertainty> known);
+  /// Holds the value against its limit.
+  void Judge(const DecisionRule& rule);
 };
 
 struct Attachment {
@@ -58,6 +67,7 @@ struct Phase {
   Reading& Add(const std::string& figure, double value);
   Reading& Add(const std::string& figure, std::vector<double> axis, std::vector<double> values);
   const Reading* Find(const std::string& figure) const;
+  Reading* Find(const std::string& figure);
 
  private:
   Reading& New(const std::string& figure);

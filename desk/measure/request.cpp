@@ -135,11 +135,13 @@ Json ToJson(const Request& request) {
       inputs.push_back(path);
     }
   }
-  return {{"measurement", request.measurement},
-          {"inputs", inputs},
-          {"parameters", parameters},
-          {"properties", request.properties},
-          {"fake", request.fake}};
+  Json json = {{"measurement", request.measurement},
+               {"inputs", inputs},
+               {"parameters", parameters},
+               {"properties", request.properties},
+               {"fake", request.fake}};
+  for (const Input& input : request.repeats) json["repeats"].push_back(input.is_path() ? Json(input.name) : Json());
+  return json;
 }
 
 Request RequestFromJson(const Json& json) {
@@ -152,11 +154,11 @@ Request RequestFromJson(const Json& json) {
     if (key == "measurement") {
       want(value.is_string(), "a name");
       request.measurement = value.get<std::string>();
-    } else if (key == "inputs") {
+    } else if (key == "inputs" || key == "repeats") {
       want(value.is_array(), "a list of paths");
       for (const Json& path : value) {
         want(path.is_string(), "a list of paths");
-        request.inputs.emplace_back(path.get<std::string>());
+        (key == "inputs" ? request.inputs : request.repeats).emplace_back(path.get<std::string>());
       }
     } else if (key == "parameters" || key == "properties") {
       want(value.is_object(), "an object");

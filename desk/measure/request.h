@@ -35,6 +35,7 @@ struct Request {
   Json properties = Json::object();  // of the tester, by index ("86") or name
   bool fake = false;                 // the numbered tests' fake mode
   bool publish = false;              // lets the library write its system properties; no part of what is stored
+  std::vector<Input> repeats = {};   // further photos of the same unit, in place of the first input
 };
 
 /// Throws Failure (wrong usage), naming what is wrong, unless the request can be run: a known measurement, as many
@@ -42,8 +43,8 @@ struct Request {
 /// filled in, properties by index, files that parameters name read.
 Request Resolved(const Request& request);
 
-/// {"measurement", "inputs", "parameters", "properties", "fake"}. Inputs that are not files are null; those that may be
-/// left out stand among the parameters.
+/// {"measurement", "inputs", "repeats", "parameters", "properties", "fake"}, "repeats" only where there are any. Inputs
+/// that are not files are null; those that may be left out stand among the parameters.
 Json ToJson(const Request& request);
 
 /// The other way round; only "measurement" and "inputs" must be there. Throws Failure (wrong usage) for anything else.

@@ -19,8 +19,11 @@ double FitScale(const cv::Mat& photo, double side);
 /// Whether a picture of the photo tells something: it was measured, or marks were looked for and not found.
 bool ShowsPhoto(int code);
 
+/// "0.4390", and "0.4390 ± 0.0021" where it is known how far it may be trusted.
+std::string ValueText(const Reading& m, int decimals);
+
 /// "0.3124 Nyquist  0.1562 c/p  937 LW/PH", and lp/mm when the pixel pitch is known (not 0).
-std::string FrequencyText(double nyquist, int photo_height, double pixel_pitch_um);
+std::string FrequencyText(const Reading& m, int photo_height, double pixel_pitch_um);
 
 /// "  (at least 0.38, at most 0.6, FAIL)" for a figure with a limit, nothing for one without.
 std::string LimitText(const Reading& m);

@@ -58,10 +58,10 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "noise is the expanded uncertainty; jumps of the reading are in it. It tells how far the reading lies from the "
        "noiseless one, not how far that lies from the lens's own figure."},
       {kPixelMethod,
-       "The variance of the patch's pixels, from differences between neighbours, over their number, is carried through "
-       "the colour formulas to first order. Type B: patch means are cut to whole levels (1/12 level squared, and half "
-       "a "
-       "level low, which the standard photo shares)."},
+       "What the patch's colour may be is drawn 400 times (JCGM 101) and carried through the colour formulas: from the "
+       "variance of its pixels, by differences between neighbours, over their number, and from its mean, which is cut "
+       "to "
+       "a whole level (type B: up to one level low). The standard photo's noise is taken to be the same."},
       {kMeanMethod,
        "The variance of the pixels, from differences between neighbours, over their number. Type B: none; what light "
        "and exposure do from photo to photo is not in it (take several photos)."},
@@ -97,13 +97,19 @@ Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, co
   return {standard, factor * standard, factor, method};
 }
 
-Uncertainty OfMean(const std::vector<double>& readings, double type_b, const char* method) {
+double Spread(const std::vector<double>& readings) {
   const auto n = static_cast<double>(readings.size());
-  if (readings.size() < 2) return {kNone, kNone, kNone, method};
+  if (readings.size() < 2) return kNone;
   const double mean = std::accumulate(readings.begin(), readings.end(), 0.0) / n;
   double squares = 0;
   for (const double reading : readings) squares += (reading - mean) * (reading - mean);
-  return Combined(std::sqrt(squares / (n - 1) / n), n - 1, type_b, method);
+  return std::sqrt(squares / (n - 1));
+}
+
+Uncertainty OfMean(const std::vector<double>& readings, double type_b, const char* method) {
+  const auto n = static_cast<double>(readings.size());
+  if (readings.size() < 2) return {kNone, kNone, kNone, method};
+  return Combined(Spread(readings) / std::sqrt(n), n - 1, type_b, method);
 }
 
 Uncertainty OfMedian(const std::vector<double>& readings) {
@@ -141,12 +147,13 @@ Uncertainty FromErrors(std::vector<double> errors, const char* method) {
 }
 
 Uncertainty OfMeanLevel(const cv::Mat& picture) {
-  cv::Mat levels;
-  picture.convertTo(levels, CV_64F);
+  constexpr int kRows = 256;  // tell enough of the noise
   double squares = 0;
   double count = 0;
-  for (int row = 0; row < levels.rows; ++row) {
-    const auto* pixels = levels.ptr<double>(row);
+  for (int row = 0; row < picture.rows; row += std::max(1, picture.rows / kRows)) {
+    cv::Mat levels;
+    picture.row(row).convertTo(levels, CV_64F);
+    const auto* pixels = levels.ptr<double>();
     for (int i = 0; i + 2 < levels.cols; ++i) {
       const double difference = pixels[i] - 2 * pixels[i + 1] + pixels[i + 2];
       squares += difference * difference;
@@ -155,7 +162,7 @@ Uncertainty OfMeanLevel(const cv::Mat& picture) {
   }
   if (count == 0) return {kNone, kNone, kNone, kMeanMethod};
   const double noise = squares / (6 * count);
-  return Combined(std::sqrt(noise / static_cast<double>(levels.total())), count, 0, kMeanMethod);
+  return Combined(std::sqrt(noise / static_cast<double>(picture.total())), count, 0, kMeanMethod);
 }
 
 cv::Matx33d CovarianceOfMean(const cv::Mat& patch, double rounding) {

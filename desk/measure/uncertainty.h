@@ -45,6 +45,8 @@ Uncertainty OfMean(const std::vector<double>& readings, double type_b, const cha
 /// Of the median of repeated readings: the mean's, times sqrt(pi / 2) for three and more.
 Uncertainty OfMedian(const std::vector<double>& readings);
 double Median(std::vector<double> readings);
+/// Their standard deviation; NaN for a single one.
+double Spread(const std::vector<double>& readings);
 
 /// Of a reading of which simulated errors are known: the 95 % quantile of their sizes.
 Uncertainty FromErrors(std::vector<double> errors, const char* method);

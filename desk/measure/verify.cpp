@@ -66,8 +66,10 @@ Request StoredRequest(const Json& stored) {
   for (const auto& [name, value] : stored.at("parameters").items()) {
     if (value.is_null()) CannotRunAgain(name + " was no file, and is gone");
   }
-  for (const Json& input : stored.at("inputs")) {
-    if (input.is_null()) CannotRunAgain("made from standard input or a picture in memory, which is gone");
+  for (const char* const list : {"inputs", "repeats"}) {
+    for (const Json& input : stored.value(list, Json::array())) {
+      if (input.is_null()) CannotRunAgain("made from standard input or a picture in memory, which is gone");
+    }
   }
   return RequestFromJson(stored);
 }
@@ -130,6 +132,11 @@ Request RequestOfRecord(const Json& record, const std::string& folder) {
       std::string& name = request.inputs[i].name;
       if (loaded && record.at("inputs")[i].at("path") == "standard input") CannotRunAgain("made from standard input");
       name = Locate(name, folder, loaded ? HashOf(record, i) : "");
+    }
+    for (std::size_t i = 0; i < request.repeats.size(); ++i) {
+      const std::size_t place = request.inputs.size() + i;
+      request.repeats[i].name =
+          Locate(request.repeats[i].name, folder, place < record.at("inputs").size() ? HashOf(record, place) : "");
     }
     return request;
   } catch (const Json::exception& e) {

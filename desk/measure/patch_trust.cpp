@@ -1,0 +1,67 @@
+#include "desk/measure/patch_trust.h"
+
+#include "desk/measure/cielab.h"
+
+namespace qv {
+
+namespace {
+
+constexpr int kDraws = 400;
+
+cv::Vec3d Levels(const cv::Point3i& mean) { return {1.0 * mean.x, 1.0 * mean.y, 1.0 * mean.z}; }
+
+// L with L L^T = covariance, of what is positive definite but for rounding.
+cv::Matx33d Root(const cv::Matx33d& covariance) {
+  cv::Matx33d root = cv::Matx33d::zeros();
+  for (int row = 0; row < 3; ++row) {
+    for (int column = 0; column <= row; ++column) {
+      double rest = covariance(row, column);
+      for (int k = 0; k < column; ++k) rest -= root(row, k) * root(column, k);
+      if (row == column) {
+        root(row, row) = std::sqrt(std::max(rest, 0.0));
+      } else if (root(column, column) > 0) {
+        root(row, column) = rest / root(column, column);
+      }
+    }
+  }
+  return root;
+}
+
+}  // namespace
+
+std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean,
+                                        std::uint64_t seed) {
+  const double share = static_cast<double>(pixels.total()) / area;
+  const cv::Matx33d root = Root(CovarianceOfMean(pixels, 0) * share);
+  cv::RNG random(seed);
+  std::vector<cv::Vec3d> draws;
+  for (int i = 0; i < kDraws; ++i) {
+    cv::Vec3d noise;
+    cv::Vec3d cut;
+    for (int k = 0; k < 3; ++k) noise[k] = random.gaussian(1);
+    for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
+    draws.push_back(Levels(mean) + cut + root * noise);
+  }
+  return draws;
+}
+
+Uncertainty TrustInColour(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const ColourFigure& figure) {
+  const double reading = figure(Levels(mean));
+  std::vector<double> errors;
+  for (const cv::Vec3d& draw : draws) errors.push_back(figure(draw) - reading);
+  return FromErrors(std::move(errors), kPixelMethod);
+}
+
+Uncertainty TrustInPair(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const cv::Point3i& standard,
+                        const std::vector<cv::Vec3d>& standard_draws, const PairFigure& figure) {
+  const double reading = figure(Levels(mean), Levels(standard));
+  std::vector<double> errors;
+  for (std::size_t i = 0; i < std::min(draws.size(), standard_draws.size()); ++i) {
+    errors.push_back(figure(draws[i], standard_draws[i]) - reading);
+  }
+  return FromErrors(std::move(errors), kPixelMethod);
+}
+
+cv::Vec3d OwnLab(const cv::Vec3d& rgb) { return LabOfXyz(XyzOfLab(LabD65OfSrgb(rgb), kD65), kUnitWhite); }
+
+}  // namespace qv

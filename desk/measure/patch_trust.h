@@ -1,0 +1,32 @@
+#ifndef QVTESTER_DESK_MEASURE_PATCH_TRUST_H_
+#define QVTESTER_DESK_MEASURE_PATCH_TRUST_H_
+
+#include <functional>
+#include <opencv2/core.hpp>
+#include <vector>
+
+#include "desk/measure/uncertainty.h"
+
+namespace qv {
+
+/// What a patch's colour may be, given its mean cut to whole levels and its pixels' own noise: drawn many times (JCGM
+/// 101). Channels are in the order of `mean`.
+///
+/// @param pixels  CV_8UC3, channels in the order of `mean`, from within the patch.
+/// @param area    pixels that the mean was taken over.
+std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean,
+                                        std::uint64_t seed);
+
+/// Of a figure of one patch, and of a figure of a patch and its standard.
+using ColourFigure = std::function<double(const cv::Vec3d&)>;
+Uncertainty TrustInColour(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const ColourFigure& figure);
+using PairFigure = std::function<double(const cv::Vec3d&, const cv::Vec3d&)>;
+Uncertainty TrustInPair(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const cv::Point3i& standard,
+                        const std::vector<cv::Vec3d>& standard_draws, const PairFigure& figure);
+
+/// The tests' own L*a*b* of a colour, 0 to 255.
+cv::Vec3d OwnLab(const cv::Vec3d& rgb);
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_PATCH_TRUST_H_
