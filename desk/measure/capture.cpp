@@ -4,6 +4,7 @@
 #include <cmath>
 #include <map>
 #include <numeric>
+#include <opencv2/imgproc.hpp>
 
 #include "chart/chart_layout.h"
 #include "desk/base/text.h"
@@ -173,6 +174,54 @@ std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
   return picture;
 }
 
+// Patches are looked for on a square: seen obliquely they lie beside their places, and their neighbours get in.
+void DoubtView(Record& record, const ChartView& view) {
+  constexpr double kMostOblique = 0.015;
+  constexpr double kMostSkewDeg = 0.9;
+  if (std::fabs(view.legs_ratio - 1) <= kMostOblique && std::fabs(view.legs_angle_deg - 90) <= kMostSkewDeg) return;
+  record.Say(
+      Remark::kDoubt, "oblique",
+      Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; patches may lie beside "
+             "their places",
+             record.inputs[0].path.c_str(), view.legs_ratio, view.legs_angle_deg),
+      "legs_ratio");
+}
+
+// Deviation of a patch's worst channel, in grey levels.
+double UnevennessOf(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
+  std::vector<cv::Point> corners;
+  for (const cv::Point2d& corner : outline) corners.emplace_back(cvRound(corner.x), cvRound(corner.y));
+  const cv::Rect bounds = cv::boundingRect(corners) & cv::Rect({}, photo.size());
+  if (bounds.empty()) return 0;
+  for (cv::Point& corner : corners) corner -= bounds.tl();
+  cv::Mat inside(bounds.size(), CV_8UC1, cv::Scalar(0));
+  cv::fillConvexPoly(inside, corners, cv::Scalar(255));
+  cv::Scalar mean;
+  cv::Scalar deviation;
+  cv::meanStdDev(photo(bounds), mean, deviation, inside);
+  return std::max({deviation[0], deviation[1], deviation[2]});
+}
+
+// A patch that is not of one colour is read where it is not: noise makes all of them alike uneven.
+void DoubtEvenness(Record& record, const CaptureFinding& finding) {
+  constexpr double kOverOthers = 3;
+  constexpr double kLevels = 3;
+  std::vector<double> unevenness;
+  for (const auto& outline : finding.outlines) unevenness.push_back(UnevennessOf(finding.photo, outline));
+  if (unevenness.empty()) return;
+  std::vector<double> sorted = unevenness;
+  std::nth_element(sorted.begin(), sorted.begin() + static_cast<std::ptrdiff_t>(sorted.size() / 2), sorted.end());
+  const double usual = sorted[sorted.size() / 2];
+  const auto worst = std::max_element(unevenness.begin(), unevenness.end());
+  if (*worst <= kOverOthers * usual + kLevels) return;
+  record.Say(
+      Remark::kDoubt, "uneven_patches",
+      Format("%s: patch %td is not of one colour: its levels deviate by %.1f, those of others by %.1f; is the chart "
+             "seen straight on, and clean?",
+             record.inputs[0].path.c_str(), worst - unevenness.begin(), *worst, usual),
+      "lab_l");
+}
+
 class Capture : public Measurement {
  public:
   explicit Capture(bool front) : front_(front) {
@@ -208,7 +257,9 @@ class Capture : public Measurement {
                                     missed_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
     }
     if (code != QV_SUCCESS) return finding;
+    DoubtView(record, finding->view);
     TakePatches(*finding, tester);
+    DoubtEvenness(record, *finding);
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));
     AddTrust(record.phase, *finding);
     return finding;

@@ -26,9 +26,8 @@ constexpr Method kBlob = {
 
 constexpr Method kSpots = {
     "differences of Gaussians in a pyramid, after a smooth surface of the fourth degree is taken out",
-    "Dark spots of 3 to 300 px, sharp or soft, whose contrast times the root of their pixels is 9 times the noise: 98 "
-    "in "
-    "100 are found, with under 0.1 false ones a photo (docs/accuracy.md).",
+    "Dark spots of 3 to 300 px, sharp or soft, whose contrast times the root of their pixels is 9 times the noise: "
+    "nearly all are found, with under 0.1 false ones a photo (docs/accuracy.md).",
     "Moved by noise, by structure of the target, by light that falls off otherwise than smoothly."};
 
 constexpr double kDarkestToJudge = 126;  // the blob search sees nothing in photos whose mean is below
@@ -144,6 +143,10 @@ std::optional<Picture> DustFinding::Draw(const Record& record) const {
   return picture;
 }
 
+constexpr double kMostClipped = 0.01;      // of the photo's pixels
+constexpr double kDarkestOfTarget = 0.45;  // its darkest parts over its middle level
+constexpr double kLargestBlobPx = 16;
+
 class Dust : public Measurement {
  public:
   explicit Dust(bool front) : front_(front) {
@@ -189,6 +192,7 @@ class Dust : public Measurement {
     const int count = front_ ? results->dust_blob_count_front_ : results->dust_blob_count_main_;
     finding->blobs = CountedBlobs(tester, count);
     AddBlobs(record.phase, count, finding->blobs);
+    DoubtBlobCount(record, *finding);
     return finding;
   }
 
@@ -246,6 +250,41 @@ class Dust : public Measurement {
     if (!found.cut_short) return;
     record.Say(Remark::kDoubt, "too_many_spots",
                record.inputs[0].path + ": more spots than a plain target has dust; is the target plain?", "spot_count");
+  }
+
+  // What the count can't see: no plain target, light cut off, specks larger than the discs that it knows.
+  static void DoubtBlobCount(Record& record, const DustFinding& finding) {
+    const std::vector<double>& counts = record.phase.Find("histogram")->values;
+    const double pixels = std::accumulate(counts.begin(), counts.end(), 0.0);
+    const auto level_of = [&](double share) {  // below which this share of the pixels lies
+      double sum = 0;
+      int level = 0;
+      while (level + 1 < kGreyLevels && (sum += counts[level]) < share * pixels) ++level;
+      return level;
+    };
+    const char* const path = record.inputs[0].path.c_str();
+    if (counts.back() > kMostClipped * pixels) {
+      record.Say(Remark::kDoubt, "clipped",
+                 Format("%s: %.0f %% of the photo is clipped at level 255, where no speck shows; use less light", path,
+                        100 * counts.back() / pixels),
+                 "histogram");
+    }
+    if (finding.spots.cut_short || level_of(0.03) < kDarkestOfTarget * level_of(0.5)) {
+      record.Say(
+          Remark::kDoubt, "no_plain_target",
+          Format("%s: this is no plain, evenly lit target: 3 in 100 of its pixels lie below level %d, half below %d",
+                 path, level_of(0.03), level_of(0.5)),
+          "histogram");
+    }
+    const auto large = std::count_if(finding.spots.spots.begin(), finding.spots.spots.end(),
+                                     [](const Spot& spot) { return spot.diameter_px() > kLargestBlobPx; });
+    if (large > 0) {
+      record.Say(
+          Remark::kDoubt, "large_dark_areas",
+          Format("%s: %s larger than the discs of 4 to %.0f px that blobs are counted by: see the spots", path,
+                 Count(static_cast<std::size_t>(large), "dark area is", "dark areas are").c_str(), kLargestBlobPx),
+          "spot_largest_area");
+    }
   }
 
   static void AddBlobs(Phase& phase, int count, const std::vector<cv::KeyPoint>& blobs) {
