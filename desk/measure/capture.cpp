@@ -187,39 +187,39 @@ void DoubtView(Record& record, const ChartView& view) {
       "legs_ratio");
 }
 
-// Deviation of a patch's worst channel, in grey levels.
-double UnevennessOf(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
+// Mean colour inside an outline, shrunk to so much of its size about its middle.
+cv::Scalar MeanInside(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline, double size) {
+  const cv::Point2d middle = (outline[0] + outline[1] + outline[2] + outline[3]) / 4;
   std::vector<cv::Point> corners;
-  for (const cv::Point2d& corner : outline) corners.emplace_back(cvRound(corner.x), cvRound(corner.y));
+  for (const cv::Point2d& corner : outline) corners.emplace_back(middle + (corner - middle) * size);
   const cv::Rect bounds = cv::boundingRect(corners) & cv::Rect({}, photo.size());
-  if (bounds.empty()) return 0;
+  if (bounds.empty()) return {};
   for (cv::Point& corner : corners) corner -= bounds.tl();
   cv::Mat inside(bounds.size(), CV_8UC1, cv::Scalar(0));
   cv::fillConvexPoly(inside, corners, cv::Scalar(255));
-  cv::Scalar mean;
-  cv::Scalar deviation;
-  cv::meanStdDev(photo(bounds), mean, deviation, inside);
-  return std::max({deviation[0], deviation[1], deviation[2]});
+  return cv::mean(photo(bounds), inside);
 }
 
-// A patch that is not of one colour is read where it is not: noise makes all of them alike uneven.
+// A patch whose middle is of another colour than the whole has a neighbour in it.
 void DoubtEvenness(Record& record, const CaptureFinding& finding) {
-  constexpr double kOverOthers = 3;
-  constexpr double kLevels = 3;
-  std::vector<double> unevenness;
-  for (const auto& outline : finding.outlines) unevenness.push_back(UnevennessOf(finding.photo, outline));
-  if (unevenness.empty()) return;
-  std::vector<double> sorted = unevenness;
-  std::nth_element(sorted.begin(), sorted.begin() + static_cast<std::ptrdiff_t>(sorted.size() / 2), sorted.end());
-  const double usual = sorted[sorted.size() / 2];
-  const auto worst = std::max_element(unevenness.begin(), unevenness.end());
-  if (*worst <= kOverOthers * usual + kLevels) return;
-  record.Say(
-      Remark::kDoubt, "uneven_patches",
-      Format("%s: patch %td is not of one colour: its levels deviate by %.1f, those of others by %.1f; is the chart "
-             "seen straight on, and clean?",
-             record.inputs[0].path.c_str(), worst - unevenness.begin(), *worst, usual),
-      "lab_l");
+  constexpr double kInner = 0.5;
+  constexpr double kMostOff = 3;  // grey levels of a channel
+  double worst = 0;
+  std::size_t which = 0;
+  for (std::size_t i = 0; i < finding.outlines.size(); ++i) {
+    const cv::Scalar off =
+        MeanInside(finding.photo, finding.outlines[i], kInner) - MeanInside(finding.photo, finding.outlines[i], 1);
+    const double most = std::max({std::fabs(off[0]), std::fabs(off[1]), std::fabs(off[2])});
+    if (most <= worst) continue;
+    worst = most;
+    which = i;
+  }
+  if (worst <= kMostOff) return;
+  record.Say(Remark::kDoubt, "uneven_patches",
+             Format("%s: patch %zu is not of one colour: its middle is off its mean by %.1f levels; is the chart seen "
+                    "straight on, and clean?",
+                    record.inputs[0].path.c_str(), which, worst),
+             "lab_l");
 }
 
 class Capture : public Measurement {

@@ -59,24 +59,14 @@ constexpr IsoRow kIsoRows[] = {
 #undef QV_ISO_ROW
 constexpr std::array<const char*, 2> kIsoCurves = {"sfr_iso_vertical", "sfr_iso_horizontal"};
 
-constexpr int kTopLevel = 255;
-constexpr double kMostClipped = 0.01;  // of a region's pixels
-
 std::vector<SharpnessRegion> RegionsOf(const FoundChart& found) {
   return {{OnPhoto(found, found.vertical), found.vertical_pixels},
           {OnPhoto(found, found.horizontal), found.horizontal_pixels}};
 }
 
-void WarnOfIso(Record& record, const IsoMtf& iso, const SharpnessRegion& region, std::size_t i) {
+void WarnOfIso(Record& record, const IsoMtf& iso, std::size_t i) {
   const char* const path = record.inputs[0].path.c_str();
   const char* const name = kRegionNames[i];
-  if (cv::countNonZero(region.pixels == kTopLevel) > kMostClipped * static_cast<double>(region.pixels.total())) {
-    record.Say(Remark::kWarning, "clipped",
-               Format("%s: the paper of the %s region is clipped at level %d, so the edge looks sharper "
-                      "than it is; use less light or a shorter exposure",
-                      path, name, kTopLevel),
-               kIsoRows[0].names[i]);
-  }
   if (iso.figures.peak > kSharpenedPeak || iso.figures.overshoot > kSharpenedOvershoot) {
     record.Say(
         Remark::kWarning, "sharpened",
@@ -100,7 +90,7 @@ void AddIsoFigures(Record& record, const cv::Mat& gray, const SharpnessRegion& r
   std::vector<double> frequencies(iso.response.size());
   for (std::size_t k = 0; k < frequencies.size(); ++k) frequencies[k] = static_cast<double>(k) * kIsoStep;
   if (!frequencies.empty()) record.phase.Add(kIsoCurves[i], frequencies, iso.response);
-  WarnOfIso(record, iso, region, i);
+  WarnOfIso(record, iso, i);
 }
 
 // Of the test's own figure, by the region's own noise.
