@@ -203,7 +203,7 @@ cv::Scalar MeanInside(const cv::Mat& photo, const std::array<cv::Point2d, 4>& ou
 // A patch whose middle is of another colour than the whole has a neighbour in it.
 void DoubtEvenness(Record& record, const CaptureFinding& finding) {
   constexpr double kInner = 0.5;
-  constexpr double kMostOff = 3;  // grey levels of a channel
+  constexpr double kMostOff = 5;  // grey levels of a channel; some 1.5 in colour difference
   double worst = 0;
   std::size_t which = 0;
   for (std::size_t i = 0; i < finding.outlines.size(); ++i) {
