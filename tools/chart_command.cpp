@@ -1,6 +1,7 @@
 #include <iostream>
 #include <memory>
 
+#include "desk/base/text.h"
 #include "desk/scenes/chart_sheet.h"
 #include "desk/scenes/sheet_file.h"
 #include "tools/commands.h"
@@ -34,7 +35,7 @@ CommandBody DeclareChart(Options& command) {
     const ChartSheet sheet = LayOut(*o);
     WriteOutput(o->output, format.encode(sheet, o->dpi));
     if (o->output != "-") {
-      std::cout << o->output << '\n';
+      std::cout << Printable(o->output) << '\n';
       for (const std::string& fact : sheet.facts) std::cout << "  " << fact << '\n';
     }
     return static_cast<int>(kExitWithinLimits);

@@ -13,9 +13,9 @@ namespace qv {
 std::shared_ptr<CommandExtra> MakeTruthComparison();
 std::shared_ptr<CommandExtra> MakeProductOutput();
 
-/// Parses the words after the program's name and runs their command; answers the exit status. Throws what the command
-/// throws.
-int RunCommand(const std::vector<std::string>& words);
+/// Parses the words after the program's name and runs their command; answers the exit status. What ends it is said on
+/// standard error, in one line that a terminal may see.
+int RunProgram(const std::vector<std::string>& words);
 
 }  // namespace qv
 

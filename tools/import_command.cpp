@@ -24,7 +24,7 @@ Imported ImportFile(const std::string& path, Store& store) {
     return {1, store.Put(ParseRun(ReadWholeFile(path, kWrongUsage), Printable(path)))};
   }
   std::ifstream lines(path);
-  if (!lines) throw Failure(kWrongUsage, Printable(path) + ": can't be read");
+  if (!lines || lines.peek() == EOF) throw Failure(kWrongUsage, Printable(path) + ": can't be read, or holds no run");
   return ImportLines(lines, Printable(path), store);
 }
 

@@ -135,19 +135,19 @@ std::string Verdict(const Record& record) {
 
 void Tell(const Record& record, const MeasureOptions& options, const CommandExtra* extra) {
   if (options.verbose) {
-    for (const std::string& line : record.chatter) std::cerr << line << '\n';
+    for (const std::string& line : record.chatter) std::cerr << Printable(line) << '\n';
   }
   if (!record.measured()) {
-    std::cerr << record.MissSentence() << '\n';
+    std::cerr << Printable(record.MissSentence()) << '\n';
     return;
   }
   for (const Remark& remark : record.remarks) {
-    std::cerr << (remark.weight == Remark::kDoubt ? "doubt: " : "warning: ") << remark.sentence << '\n';
+    std::cerr << (remark.weight == Remark::kDoubt ? "doubt: " : "warning: ") << Printable(remark.sentence) << '\n';
   }
   if (options.quiet) return;
   std::string text;
   for (const RecordedInput& input : record.inputs) {
-    text += Format("%s  %d x %d\n", input.path.c_str(), input.width, input.height);
+    text += Format("%s  %d x %d\n", Printable(input.path).c_str(), input.width, input.height);
   }
   if (!options.repeats.empty()) text += Format("medians of %zu photos\n", options.repeats.size() + 1);
   text += record.finding->Report(record);

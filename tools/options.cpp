@@ -27,21 +27,70 @@ std::function<std::string(const std::string&)> Within(double low, double high) {
   };
 }
 
+bool NamesFile(const std::string& type) {
+  for (const char* one : {"FILE", "PNG", "OUT", "STORE", "DIR", "HTML", "XML", "SVG", "PHOTO"}) {
+    if (type == one) return true;
+  }
+  return false;
+}
+
+// A script's variable that is not set ends here, and not in an output that nobody gets.
+void RefuseEmptyName(CLI::Option& option, const std::string& type = "FILE") {
+  if (!NamesFile(type)) return;
+  option.check([](const std::string& name) { return std::string(name.empty() ? "an empty name" : ""); }, "");
+}
+
+std::vector<std::string> NamesKnown(const CLI::App& command, bool options) {
+  std::vector<std::string> known;
+  for (const CLI::App* one : command.get_subcommands([](const CLI::App*) { return true; })) {
+    if (!options) known.push_back(one->get_name());
+  }
+  for (const CLI::Option* option : command.get_options()) {
+    if (options && !option->get_lnames().empty()) known.push_back("--" + option->get_lnames()[0]);
+  }
+  return known;
+}
+
+// What is wrong with the words, in a sentence; of words that nobody knows the first.
+std::string Complaint(const CLI::App& app, const CLI::ParseError& e) {
+  const CLI::App* command = &app;
+  std::string name = app.get_name();
+  while (!command->get_subcommands().empty()) {
+    command = command->get_subcommands().back();
+    name += " " + command->get_name();
+  }
+  const std::string help = "; `" + name + " --help` shows what there is";
+  const bool group = command->get_require_subcommand_min() > 0;
+  const std::vector<std::string> unknown = command->remaining();
+  const bool of_words = e.get_exit_code() == static_cast<int>(CLI::ExitCodes::ExtrasError) ||
+                        e.get_exit_code() == static_cast<int>(CLI::ExitCodes::RequiredError);
+  if (!of_words || (unknown.empty() && !group)) return e.what() + help;
+  if (unknown.empty()) return "a command is needed" + help;
+  const auto dashed =
+      std::find_if(unknown.begin(), unknown.end(), [](const std::string& word) { return word.rfind('-', 0) == 0; });
+  const bool option = dashed != unknown.end();
+  const std::string& word = option ? *dashed : unknown.front();
+  const std::string nearest = option || group ? DidYouMean(word, NamesKnown(*command, option)) : "";
+  const char* const what = option ? ": no such option" : group ? ": no such command" : ": one word too many";
+  return (word.empty() ? "\"\"" : word) + what + (nearest.empty() ? help : nearest);
+}
+
 }  // namespace
 
 void Options::Argument(const char* name, std::string& value, const std::string& help) {
-  command_->add_option(name, value, help)->required();
+  RefuseEmptyName(*command_->add_option(name, value, help)->required());
 }
 
 void Options::Arguments(const char* name, std::vector<std::string>& values, const std::string& help, const char* type,
                         bool required) {
-  command_->add_option(name, values, help)->required(required)->type_name(type);
+  RefuseEmptyName(*command_->add_option(name, values, help)->required(required)->type_name(type), type);
 }
 
 void Options::Flag(const char* name, bool& value, const std::string& help) { command_->add_flag(name, value, help); }
 
 void Options::Text(const char* name, std::string& value, const std::string& help, const char* type, bool required) {
-  command_->add_option(name, value, WithDefault(help, value))->required(required)->type_name(type);
+  RefuseEmptyName(*command_->add_option(name, value, WithDefault(help, value))->required(required)->type_name(type),
+                  type);
 }
 
 void Options::Text(const char* name, std::optional<std::string>& value, const std::string& help, const char* type) {
@@ -135,8 +184,9 @@ CommandBody Parse(const ProgramText& text, const std::vector<Command>& commands,
     std::vector<std::string> backwards(words.rbegin(), words.rend());  // the parser takes them from the back
     app.parse(backwards);
   } catch (const CLI::ParseError& e) {
-    const int status = app.exit(e) == 0 ? kExitWithinLimits : kExitWrongUsage;
-    return [status] { return status; };
+    if (e.get_exit_code() != 0) throw Failure(kWrongUsage, Complaint(app, e));
+    app.exit(e);  // prints help or version
+    return [] { return static_cast<int>(kExitWithinLimits); };
   }
   return body;
 }

@@ -70,8 +70,8 @@ struct ProgramText {
   const char* footer;
 };
 
-/// What the words after the program's name ask for. Help, the version and a wrong usage are printed here; the body then
-/// only answers the status.
+/// What the words after the program's name ask for. Help and version are printed here; the body then only answers the
+/// status. Throws Failure (wrong usage) for words that don't fit.
 CommandBody Parse(const ProgramText& text, const std::vector<Command>& commands, const std::vector<std::string>& words);
 
 /// "4000x3000"; throws Failure (wrong usage) that names the option.

@@ -146,7 +146,8 @@ class PlanRun {
     run.filing = {wanted_.operator_name, wanted_.lot, plan_.name, step.name, {}};
     run.record = record.ToJson();
     if (record.outcome() == Outcome::kError) {
-      for (const Remark& remark : record.remarks) std::cerr << Printable(step.name) << ": " << remark.sentence << '\n';
+      for (const Remark& remark : record.remarks)
+        std::cerr << Printable(step.name) << ": " << Printable(remark.sentence) << '\n';
       ended_ = plan_.stop_on_error;
     }
     AddLines(step, record, lines_);

@@ -218,8 +218,8 @@ int WriteFilm(const SimulateOptions& o) {
   const std::string truth = std::filesystem::path(o.file.path).replace_extension(".truth.json");
   WriteOutput(truth, film.truth.dump(2) + "\n");
   if (!o.quiet) {
-    std::cout << Format("%s  %zu frames of %d x %d\n%s\n", o.file.path.c_str(), film.kept.size(), o.camera.size.width,
-                        o.camera.size.height, truth.c_str());
+    std::cout << Format("%s  %zu frames of %d x %d\n%s\n", Printable(o.file.path).c_str(), film.kept.size(),
+                        o.camera.size.width, o.camera.size.height, truth.c_str());
   }
   return kExitWithinLimits;
 }
@@ -242,13 +242,13 @@ int Run(SimulateOptions& o) {
     const cv::Mat photo = simulation.is_hdr ? simulation.levels[i] : Sense(sensor, simulation.levels[i], o.file.bits);
     const std::string path = NumberedPath(o.file.path, simulation, i);
     WriteOutput(path, EncodePhoto(photo, o.file));
-    if (!o.quiet && path != "-") std::cout << Format("%s  %d x %d\n", path.c_str(), photo.cols, photo.rows);
+    if (!o.quiet && path != "-") std::cout << Format("%s  %d x %d\n", Printable(path).c_str(), photo.cols, photo.rows);
     sensor.seed += 0x9E3779B97F4A7C15;  // the next photo has noise of its own
   }
   if (o.file.path == "-") return kExitWithinLimits;
   const std::string truth = std::filesystem::path(o.file.path).replace_extension(".truth.json");
   WriteOutput(truth, simulation.truth.dump(2) + "\n");
-  if (!o.quiet) std::cout << truth << '\n';
+  if (!o.quiet) std::cout << Printable(truth) << '\n';
   return kExitWithinLimits;
 }
 

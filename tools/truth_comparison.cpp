@@ -74,7 +74,7 @@ class TruthComparison : public CommandExtra {
     try {
       return Compare(record, truth_);
     } catch (const Json::exception& e) {
-      throw Failure(kWrongUsage, path_ + ": not the truth of a simulated chart photo (" + e.what() + ")");
+      throw Failure(kWrongUsage, Printable(path_) + ": not the truth of a simulated chart photo: " + SentenceOf(e));
     }
   }
 

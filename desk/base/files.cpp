@@ -78,7 +78,7 @@ bool WriteAll(int file, const std::string& content) {
 // Where a path leads: through links, also when the file itself does not exist yet.
 fs::path Followed(const std::string& path) {
   std::error_code error;
-  const fs::path followed = fs::weakly_canonical(path, error);
+  const fs::path followed = fs::weakly_canonical(fs::absolute(path), error);
   return error ? fs::path(path) : followed;
 }
 

@@ -84,6 +84,12 @@ Json ReadJson(const std::string& path, FailureKind kind) {
   return ParseJson(ReadWholeFile(path, kind, kMostBytes), Printable(path));
 }
 
+std::string SentenceOf(const Json::exception& e) {
+  const std::string text = e.what();
+  const std::size_t end = text.find("] ");
+  return Printable(end == std::string::npos ? text : text.substr(end + 2));
+}
+
 bool JsonView::Has(const char* name) const { return value_->is_object() && value_->contains(name); }
 
 JsonView JsonView::At(const std::string& name) const {

@@ -26,6 +26,9 @@ Json ParseJson(const std::string& text, const std::string& where);
 /// The same from a file; `kind` is that of the failure when the file itself can't be read (over 256 MB among others).
 Json ReadJson(const std::string& path, FailureKind kind = kWrongUsage);
 
+/// What the library says of an access, without its boilerplate in front.
+std::string SentenceOf(const Json::exception& e);
+
 /// A value of a document with the way that leads to it, read with checks: each refusal is a Failure (wrong usage) in a
 /// sentence such as `plan.json: steps[2].inputs: is 5, not a list`. Refers to the document, which must outlive it.
 class JsonView {

@@ -140,7 +140,7 @@ Request RequestOfRecord(const Json& record, const std::string& folder) {
     }
     return request;
   } catch (const Json::exception& e) {
-    throw Failure(kCouldNotMeasure, std::string("not a whole record (") + e.what() + ")");
+    throw Failure(kCouldNotMeasure, "not a whole record: " + SentenceOf(e));
   } catch (const Failure& e) {
     if (e.kind != kWrongUsage) throw;
     CannotRunAgain(e.what());
@@ -153,7 +153,7 @@ Verification Verify(const Json& record, const std::string& folder) {
   try {
     return Compare(record, again);
   } catch (const Json::exception& e) {
-    throw Failure(kCouldNotMeasure, std::string("not a whole record (") + e.what() + ")");
+    throw Failure(kCouldNotMeasure, "not a whole record: " + SentenceOf(e));
   }
 }
 
