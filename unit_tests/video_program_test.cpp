@@ -63,7 +63,7 @@ TEST_F(VideoProgram, WhatIsNoFilmIsToldInASentence) {
   Simulate("--size 64x64");
   ExpectComplaint("video flash photo.png", 3, "photo.png: not a film that can be decoded");
   ExpectComplaint("video flash none.mp4", 3, "none.mp4: no such file");
-  ExpectComplaint("video", 2, "subcommand");
+  ExpectComplaint("video", 2, "a command is needed");
   ExpectComplaint("simulate --scene film-flash -o film.avi", 2, "a film is written as .mp4, .mkv or .mov");
   ExpectComplaint("simulate --scene film-flash -o film.mp4 --lost 0", 2, "only frames between the first and the last");
   EXPECT_EQ(0, Measured(Record("video preview photo.png photo.png"), "video_preview_difference_mean"));

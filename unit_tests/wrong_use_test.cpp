@@ -10,8 +10,12 @@
 #include <iostream>
 #include <sstream>
 
-#include "tools/commands.h"
 #include "unit_tests/drawing.h"
+
+// The program lies above its tests; this is all that they call of it, since a process a row would take minutes.
+namespace qv {
+int RunProgram(const std::vector<std::string>& words);
+}
 
 namespace {
 
