@@ -221,7 +221,7 @@ CommandBody MeasuringCommand::operator()(Options& command) const {
   command.Texts("--set", options->set, "Set a property of the tester by its index or name; may be repeated",
                 "PROPERTY=VALUE");
   command.List("--repeat", options->repeats, "Further photos of the same unit: medians and their spread are told",
-                "PHOTO");
+               "PHOTO");
   if (spec.test) command.Flag("--fake", options->fake, "Run the test in its fake mode");
   if (spec.publishes) {
     command.Flag("--publish", options->publish, "Write the findings to the system properties that other programs read");

@@ -8,9 +8,9 @@
 
 namespace qv {
 
-/// Patches that their chart's maker, or an earlier record, gives: [[number, L*, a*, b*], ...] relative to D65. From such
-/// a list, or from a file: a capture record, such a list, or lines of the four numbers (# begins a comment). Throws
-/// Failure (wrong usage) for anything else, naming the file.
+/// Patches that their chart's maker, or an earlier record, gives: [[number, L*, a*, b*], ...] relative to D65. From
+/// such a list, or from a file: a capture record, such a list, or lines of the four numbers (# begins a comment).
+/// Throws Failure (wrong usage) for anything else, naming the file.
 Json CheckedPatches(const Json& value);
 
 /// By the patch's number.

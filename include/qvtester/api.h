@@ -40,8 +40,8 @@ QV_API int getWorkingBinaryThresh();
 QV_API int SetLDRResource(QV_RESOURCE_INDEX index, int width, int height, unsigned short* data);
 /// Copies an HDR buffer: height x width pixels of three floats, rows packed. Slots 0 to 13.
 QV_API int SetHDRResource(QV_RESOURCE_INDEX index, int width, int height, bool flag, float* data);
-/// Reads an image file (slots 14 to 33, as 8-bit colour) or opens a video file (34, 35). -97 for what is no regular file,
-/// no picture or film by its first bytes, or a picture of more than 200 megapixels (qvtester/resource.h).
+/// Reads an image file (slots 14 to 33, as 8-bit colour) or opens a video file (34, 35). -97 for what is no regular
+/// file, no picture or film by its first bytes, or a picture of more than 200 megapixels (qvtester/resource.h).
 QV_API int SetResource(QV_RESOURCE_INDEX index, char* path);
 /// Converts a preview frame, NV21 of height + height / 2 rows and width columns, to four 8-bit channels.
 /// -95 for a size that NV21 can't have.
