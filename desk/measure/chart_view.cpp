@@ -16,7 +16,7 @@ namespace qv {
 
 const Method kScanMethod = {
     "row scan for 1:1:3:1:1 with three cross-checks",
-    "Centres are good to 0.3 to 0.9 px, at most a fifth of a module on charts turned by about 30 degrees.",
+    "Centres are good to 0.3 to 0.9 px, at most 0.3 of a module on charts turned by about 30 degrees.",
     "Moved by threshold and light where they reach a mark's edges, and by modules under 3 px."};
 
 namespace {

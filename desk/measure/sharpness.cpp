@@ -14,8 +14,8 @@ namespace qv {
 const Method kSfrMethod = {
     "slanted edge, oversampling 1, real part",
     "Reads low by a known law, 40 % at a blur of 0.5 px to 4 % at 3 px, and lies within that law by 2 % without noise; "
-    "with 1 to 2 % noise single readings jump upwards by up to half in blurs under 1.2 px.",
-    "Moved by focus, motion, sharpening and denoising; by the turn of the chart, whose straightening costs up to 12 %; "
+    "with 1 to 2 % noise single readings jump, up or down, by up to half: those are doubted.",
+    "Moved by focus, motion, sharpening and denoising; by the turn of the chart, whose straightening costs up to 15 %; "
     "by the parity of the region's width, hence by the distance."};
 
 namespace {
