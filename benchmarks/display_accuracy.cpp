@@ -26,8 +26,8 @@ struct Setting {
   cv::Size size;
   double blur_px, noise_percent;
   bool srgb = false;  // the light is blurred, then encoded by sRGB's transfer
-  double exposure_ev = 0;
   int jpeg = 0;
+  double exposure_ev = 0;
 };
 const Setting kSettings[] = {
     {"800 x 600", {800, 600}, 0.8, 1},
@@ -36,8 +36,8 @@ const Setting kSettings[] = {
     {"800 x 600, noise 5 %", {800, 600}, 0.8, 5},
     {"800 x 600, sRGB", {800, 600}, 0.8, 1, true},
     {"800 x 600, sRGB, soft, noise 2 %", {800, 600}, 1.5, 2, true},
-    {"800 x 600, half a stop too bright", {800, 600}, 0.8, 1, false, 0.5},
-    {"800 x 600, sRGB, JPEG 75", {800, 600}, 0.8, 1, true, 0, 75},
+    {"800 x 600, half a stop too bright", {800, 600}, 0.8, 1, false, 0, 0.5},
+    {"800 x 600, sRGB, JPEG 75", {800, 600}, 0.8, 1, true, 75},
     {"200 x 150", {200, 150}, 0.8, 1},
     {"2000 x 1500, sRGB", {2000, 1500}, 1.2, 1, true},
 };
@@ -90,8 +90,8 @@ Display Photograph(SimulationOptions o, const Setting& setting) {
   const Simulation simulation = Simulate(o);
   cv::Mat levels = simulation.levels[0];
   if (setting.srgb) {
-    for (auto pixel = levels.begin<cv::Vec3f>(); pixel != levels.end<cv::Vec3f>(); ++pixel) {
-      for (int k = 0; k < 3; ++k) (*pixel)[k] = Encoded((*pixel)[k]);
+    for (cv::Vec3f& pixel : cv::Mat_<cv::Vec3f>(levels)) {
+      for (float& level : pixel.val) level = Encoded(level);
     }
   }
   Display display;
@@ -155,7 +155,7 @@ bool PrintPatterns(int photos) {
   std::mutex mutex;
   int wrong = 0;
   ForEach(photos, [&](int i) {
-    const std::string shown = kDisplayPatterns[i % kDisplayPatterns.size()];
+    const std::string& shown = kDisplayPatterns[i % kDisplayPatterns.size()];
     SimulationOptions view = Draw(i + 1000, shown, setting);
     view.camera.turn_deg = std::remainder(view.camera.turn_deg, 20);  // the order of the bars is judged as seen
     cv::RNG random(i + 7);

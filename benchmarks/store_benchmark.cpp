@@ -105,7 +105,7 @@ int main(int argc, char** argv) {
   try {
     qv::ScratchFolder scratch;
     return qv::Main(argc > 1 ? argv[1] : scratch.path());
-  } catch (const qv::Failure& e) {
+  } catch (const std::exception& e) {
     std::fprintf(stderr, "%s\n", e.what());
     return 1;
   }

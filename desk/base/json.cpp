@@ -42,7 +42,7 @@ void RefuseDepth(const std::string& text, const std::string& where) {
 // Refuses what the parser lets pass: a name given twice in one object.
 class NamesOnce {
  public:
-  explicit NamesOnce(const std::string& where) : where_(where) {}
+  explicit NamesOnce(std::string where) : where_(std::move(where)) {}
 
   bool operator()(int /*depth*/, Json::parse_event_t event, const Json& parsed) {
     if (event == Json::parse_event_t::object_start) open_.emplace_back();

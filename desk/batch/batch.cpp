@@ -27,8 +27,8 @@ struct Todo {
 
 class Running {
  public:
-  Running(const Plan& plan, const std::vector<Job>& jobs, FolderWatch* watch, Store& store, const BatchOptions& options)
-      : order_{plan, options, known_}, jobs_(jobs), watch_(watch), store_(store) {
+  Running(const Plan& plan, std::vector<Job> jobs, FolderWatch* watch, Store& store, const BatchOptions& options)
+      : order_{plan, options, known_}, jobs_(std::move(jobs)), watch_(watch), store_(store) {
     store.EachRow(Selected(plan), [&](const RunRow& run) { known_[run.key] = run.outcome; });
     for (std::size_t i = 0; i < jobs_.size(); ++i) todo_.push_back({i, 0});
     progress_.jobs = jobs_.size();
