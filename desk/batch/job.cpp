@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <charconv>
 #include <cstring>
 #include <filesystem>
 #include <sstream>
@@ -120,9 +121,11 @@ std::vector<Job> JobsOfJsonl(const std::string& text, const std::string& name, c
 
 Shard ParseShard(const std::string& text) {
   Shard shard;
-  char rest = 0;
-  const bool numbers = std::sscanf(text.c_str(), "%u/%u%c", &shard.index, &shard.count, &rest) == 2;
-  if (!numbers || text.find('-') != std::string::npos || shard.index < 1 || shard.index > shard.count) {
+  const char* const end = text.data() + text.size();
+  const auto [slash, no_index] = std::from_chars(text.data(), end, shard.index);
+  const bool parted = no_index == std::errc() && slash != end && *slash == '/';
+  const auto [rest, no_count] = std::from_chars(parted ? slash + 1 : end, end, shard.count);
+  if (!parted || no_count != std::errc() || rest != end || shard.index < 1 || shard.index > shard.count) {
     throw Failure(kWrongUsage, "--shard " + Printable(text) + ": takes K/N, with K from 1 to N");
   }
   return shard;

@@ -89,7 +89,9 @@ std::optional<Picture> LcdFinding::Draw(const Record& record) const {
   }
   const PhotoPlace at = picture.PlacePhoto(screen, {width + 20, kHeadPx}, FitScale(screen, kScreenPx));
   for (int i = 0; i < 9; ++i) {
-    const cv::Point2d point((2 * (i % 3) + 1) * screen.cols / 6.0, (2 * (i / 3) + 1) * screen.rows / 6.0);
+    const int column = i % 3;
+    const int row = i / 3;
+    const cv::Point2d point((2 * column + 1) * screen.cols / 6.0, (2 * row + 1) * screen.rows / 6.0);
     picture.Text(Format("%.0f", result.levels_[i]), at(point), 14, kGood, Align::kCentre, true);
   }
   for (const QVRECT& r : result.error_areas_) {
