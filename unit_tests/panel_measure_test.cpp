@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 
@@ -21,10 +22,8 @@ Record MeasureAnew(const Request& request) {
 }
 
 bool Says(const Record& record, const std::string& name) {
-  for (const Remark& remark : record.remarks) {
-    if (remark.name == name) return true;
-  }
-  return false;
+  return std::any_of(record.remarks.begin(), record.remarks.end(),
+                     [&](const Remark& remark) { return remark.name == name; });
 }
 
 class PanelPhotos : public ::testing::Test {

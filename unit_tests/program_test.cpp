@@ -100,7 +100,7 @@ TEST_F(Program, LimitsDecideTheVerdict) {
         {R"({"camera_autofocus_mtf50_vertical": {"min": 0, "unit": "px"}})", R"(its unit is "Nyquist", not "px")"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": "0"}})", "not a number"},
         {R"({"camera_autofocus_mtf50_vertical": {"minimum": 0}})",
-         "\"minimum\" is not known here; did you mean \"min\"?"},
+         R"("minimum" is not known here; did you mean "min"?)"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": 2, "max": 1}})", "its min lies above its max"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": 2, "marginal_min": 1}})",
          "its min lies above its marginal_min"},

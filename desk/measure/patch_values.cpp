@@ -51,7 +51,8 @@ Json Lines(const std::string& text) {
 
 bool IsPatch(const Json& patch) {
   if (!patch.is_array() || patch.size() != 4 || !patch[0].is_number_integer()) return false;
-  if (patch[0] < 0 || patch[0] >= static_cast<int>(kPatches.size())) return false;
+  const auto number = patch[0].get<std::int64_t>();
+  if (number < 0 || number >= static_cast<std::int64_t>(kPatches.size())) return false;
   return std::all_of(patch.begin(), patch.end(),
                      [](const Json& v) { return v.is_number() && std::abs(v.get<double>()) < 1000; });
 }
