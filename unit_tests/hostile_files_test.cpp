@@ -87,7 +87,7 @@ TEST_F(Files, EveryFilmIsOpened) {
 
 TEST_F(Files, WhatIsNoPictureOrFilmReachesNoDecoder) {
   const std::string playlist = "#EXTM3U\n#EXTINF:1,\nother.ts\n";
-  std::string raster = "<VRTDataset rasterXSize=\"9\" rasterYSize=\"9\"><!--";
+  std::string raster = R"(<VRTDataset rasterXSize="9" rasterYSize="9"><!--)";
   raster.resize(140, ' ');
   raster += "DTED--><VRTRasterBand><SimpleSource><SourceFilename>/etc/passwd</SourceFilename></SimpleSource>";
   std::string tagged = ReadFile(folder_.Write("a.bmp", cv::Mat(9, 20, CV_8UC3, cv::Scalar(3))));
@@ -101,8 +101,8 @@ TEST_F(Files, WhatIsNoPictureOrFilmReachesNoDecoder) {
       {"hls.avi", playlist},
       {"list.mp4", "ffconcat version 1.0\nfile '/etc/passwd'\n"},
       {"session.mp4", "v=0\nm=video 5000 RTP/AVP 96\n"},
-      {"manifest.mp4", "<?xml version=\"1.0\"?><MPD xmlns=\"urn:mpeg:dash:schema:mpd:2011\"/>"},
-      {"drawing.png", "<svg xmlns=\"http://www.w3.org/2000/svg\"><image href=\"/etc/passwd\"/></svg>"},
+      {"manifest.mp4", R"(<?xml version="1.0"?><MPD xmlns="urn:mpeg:dash:schema:mpd:2011"/>)"},
+      {"drawing.png", R"(<svg xmlns="http://www.w3.org/2000/svg"><image href="/etc/passwd"/></svg>)"},
       {"none.tif", std::string("II*\0\x08\0\0\0\0\0", 10)},
       {"loop.jp2", std::string("\0\0\0\x0CjP  \r\n\x87\n\0\0\0\0junk", 20)},
       {"empty", ""},
