@@ -65,7 +65,7 @@ TEST_F(Dispatch, RecordsOwnTheirArrays) {  // the address sanitizer sees what is
   EXPECT_EQ(1, ReleaseTestResult(Index(4)));
   EXPECT_EQ(nullptr, record.image_);
   EXPECT_EQ(0, record.error_point_count_);
-  for (int test = 0; test < 13; ++test) theTester->SetResultRawData(&Results().phase1_[test], 1, 1, new float[1]{});
+  for (QVPhase1Result& any : Results().phase1_) theTester->SetResultRawData(&any, 1, 1, new float[1]{});
   for (int test = 0; test < 13; ++test) {
     EXPECT_NE(nullptr, Results().phase1_[test].raw_data_) << test;
     ReleaseTestResult(Index(test));
