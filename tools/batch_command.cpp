@@ -1,6 +1,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cmath>
 #include <filesystem>
 #include <iostream>
 #include <iterator>
@@ -94,7 +95,7 @@ std::string Verdicts(const BatchProgress& progress) {
 }
 
 std::string Duration(double seconds) {
-  const auto whole = static_cast<long long>(seconds + 0.5);
+  const auto whole = std::llround(seconds);
   return Format("%lld:%02lld:%02lld", whole / 3600, whole / 60 % 60, whole % 60);
 }
 
