@@ -41,7 +41,7 @@ TEST(JsonReader, RefusesWithTheLineAndInItsOwnWords) {
       {"", "f: line 1: ends before the document does"},
       {"{\"a\":\n[1,\n2", "f: line 3: ends before the document does"},
       {"{\"a\": 1,\n\"b\": nul}", "f: line 2: this is no JSON"},
-      {"{\"a\": 1, \"a\": 2}", "f: \"a\" stands there twice"},
+      {R"({"a": 1, "a": 2})", "f: \"a\" stands there twice"},
       {"[1e999]", "f: holds a number that no double can take"},
       {"\"\xff\"", "f: line 1: this is no JSON"},
       {std::string(150000, '['), "f: line 1: nested deeper than 64 levels"},
