@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <array>
 #include <climits>
 #include <cmath>
 #include <sstream>
@@ -28,10 +29,8 @@ std::function<std::string(const std::string&)> Within(double low, double high) {
 }
 
 bool NamesFile(const std::string& type) {
-  for (const char* one : {"FILE", "PNG", "OUT", "STORE", "DIR", "HTML", "XML", "SVG", "PHOTO"}) {
-    if (type == one) return true;
-  }
-  return false;
+  constexpr std::array<const char*, 9> kTypes = {"FILE", "PNG", "OUT", "STORE", "DIR", "HTML", "XML", "SVG", "PHOTO"};
+  return std::any_of(kTypes.begin(), kTypes.end(), [&](const char* one) { return type == one; });
 }
 
 // A script's variable that is not set ends here, and not in an output that nobody gets.

@@ -51,6 +51,7 @@ std::string Compare(const Record& record, const Json& truth) {
                 npix, straightened_by);
 }
 
+// NOLINTNEXTLINE(bugprone-exception-escape): letting go of JSON throws nothing
 class TruthComparison : public CommandExtra {
  public:
   void Declare(Options& command) override {
