@@ -5,6 +5,7 @@
 #include <limits>
 
 #include "desk/base/kept_stderr.h"
+#include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
 
@@ -84,10 +85,7 @@ bool RunFilmTest(QVTester& tester, const Spec& spec, const Request& request, Rec
   const KeptStderr kept;
   const bool measured = RunNumberedTest(tester, spec, request, record.phase) != nullptr;
   const std::vector<std::string> chatter = kept.Lines();
-  if (!chatter.empty()) {
-    record.Say(Remark::kWarning, "decoder_complaint",
-               record.inputs[0].path + ": the decoder says \"" + chatter.front() + "\"; is the film whole?");
-  }
+  SayComplaint(record, record.inputs[0].path, chatter);
   record.chatter.insert(record.chatter.end(), chatter.begin(), chatter.end());
   return measured;
 }

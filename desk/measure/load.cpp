@@ -2,6 +2,7 @@
 
 #include <xxhash.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
@@ -40,6 +41,29 @@ std::string PixelsHash(const cv::Mat& pixels) {
   XXH3_freeState(state);
   return Format("%016llx%016llx", static_cast<unsigned long long>(hash.high64),
                 static_cast<unsigned long long>(hash.low64));
+}
+
+// Whether a JPEG's last scan comes to an end: the library ends a cut one itself, and a progressive one that is cut
+// between two scans is then decoded, coarser, without a word. Markers are found as ITU-T T.81, annex B, has them.
+bool EndsAsJpeg(const std::string& file) {
+  constexpr unsigned char kEnd = 0xD9;
+  constexpr unsigned char kScan = 0xDA;
+  const auto at = [&](std::size_t i) { return static_cast<unsigned char>(file[i]); };
+  std::size_t i = 2;
+  while (i + 3 < file.size()) {
+    if (at(i) != 0xFF || at(i + 1) == 0xFF) {
+      ++i;  // fill, or what decoders skip with a complaint
+      continue;
+    }
+    const unsigned char marker = at(i + 1);
+    if (marker == kEnd) return true;
+    i += 2 + std::size_t{at(i + 2)} * 256 + at(i + 3);
+    if (marker != kScan) continue;
+    // The scan's own bytes: an 0xFF of theirs is followed by 0, or by the mark of a restart.
+    while (i + 1 < file.size() && (at(i) != 0xFF || at(i + 1) == 0 || (at(i + 1) & 0xF8) == 0xD0)) ++i;
+    if (i + 1 < file.size() && at(i + 1) == kEnd) return true;
+  }
+  return false;
 }
 
 // A float picture of three channels, red first; by the library's rules for what reaches a decoder.
@@ -116,6 +140,7 @@ class Loader {
         const std::string content = Content(input);
         record_.inputs.push_back({slot, input.name, HexDigest(content, "SHA256"), ""});
         if (content.empty()) throw Failure(kCouldNotMeasure, "the file is empty");
+        DoubtEnd(input.name, content);
         files.push_back(std::make_unique<MemoryFile>(content));
         paths.push_back(files.back()->path());
       } catch (const Failure& e) {
@@ -128,9 +153,9 @@ class Loader {
     for (std::size_t k = 0; k < paths.size(); ++k) {
       NameInput(log_.lines(), first_line, paths[k] + ":", request_.inputs[i + k].name + ":");
     }
-    const std::vector<std::string> chatter = kept.Lines();
-    record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+    Hear(kept.Lines());
     if (code != QV_SUCCESS) return RefuseList(i, code, first_line);
+    SayComplaint(record_, "one of the " + std::to_string(paths.size()) + " pictures", said_);
     for (std::size_t k = 0; k < paths.size(); ++k) {
       const cv::Mat& held = tester_.kept_->image_list.gray[k];
       RecordedInput& entry = record_.inputs[i + k];
@@ -159,6 +184,16 @@ class Loader {
     record_.phase.code = code;
     record_.remarks = {{Remark::kMiss, "refused_input", input.name + ": " + why}};
     return false;
+  }
+
+  void Hear(const std::vector<std::string>& chatter) {
+    said_.insert(said_.end(), chatter.begin(), chatter.end());
+    record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+  }
+
+  void DoubtEnd(const std::string& name, const std::string& content) {
+    if (content.compare(0, 3, "\xFF\xD8\xFF") != 0 || EndsAsJpeg(content)) return;
+    record_.Say(Remark::kDoubt, "decoder_complaint", name + ": the file ends before its picture does; it was cut");
   }
 
   // The library's line names the file.
@@ -194,8 +229,8 @@ class Loader {
     std::string path = input.name;
     const int code = Guarded("SetResource", [&] { return tester_.SetResource(slot, path.data()); });
     const std::vector<std::string> chatter = kept.Lines();
-    if (code != QV_SUCCESS && !chatter.empty()) said_ = "the decoder says \"" + chatter.front() + "\"";
     record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+    if (code != QV_SUCCESS) said_ = chatter;
     return code;
   }
 
@@ -208,9 +243,8 @@ class Loader {
                          ? TakeFloats(tester_, slot, ReadFloats(path))
                          : Guarded("SetResource", [&] { return tester_.SetResource(slot, path.data()); });
     NameInput(log_.lines(), first_line, path, name);
-    const std::vector<std::string> chatter = kept.Lines();
-    if (!chatter.empty()) said_ = "the decoder says \"" + chatter.front() + "\"";
-    record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+    Hear(kept.Lines());
+    if (said_.empty()) DoubtEnd(name, content);
     return code;
   }
 
@@ -219,13 +253,12 @@ class Loader {
       const bool frame = LowerExtension(input.name) == ".nv21";
       const char* const wanted = KindOfSlot(slot) == SlotKind::kVideo ? "film" : "picture";
       return Refuse(input, code,
-                    Format("not a %s that can be decoded", wanted) + (said_.empty() ? "" : "; " + said_) +
+                    Format("not a %s that can be decoded", wanted) +
+                        (said_.empty() ? "" : "; the decoder says \"" + said_.front() + "\"") +
                         (frame ? "; a raw frame needs its size: --raw WxH, where the command takes it" : ""));
     }
     if (code != QV_SUCCESS) return Refuse(input, code, FindCode(code).meaning);
-    if (!said_.empty()) {
-      record_.Say(Remark::kWarning, "decoder_complaint", input.name + ": " + said_ + "; is the file cut?");
-    }
+    SayComplaint(record_, input.name, said_);
     if (KindOfSlot(slot) == SlotKind::kVideo) return NoteFrameSize(slot);
     const cv::Mat held = KindOfSlot(slot) == SlotKind::kHdr ? SlotFloats(tester_, slot) : SlotPhoto(tester_, slot);
     RecordedInput& entry = record_.inputs.back();
@@ -248,7 +281,7 @@ class Loader {
   const Request& request_;
   Record& record_;
   LogCollector& log_;
-  std::string said_;
+  std::vector<std::string> said_;  // by the decoder of the input at hand
 };
 
 }  // namespace
@@ -260,6 +293,19 @@ bool LoadInputs(QVTester& tester, const Spec& spec, const Request& request, Reco
     if (!loader.Load(i)) return false;
   }
   return true;
+}
+
+void SayComplaint(Record& record, const std::string& name, const std::vector<std::string>& lines) {
+  const auto is_warning = [](const std::string& line) {
+    return line.find("warning") != std::string::npos || line.find("Warning") != std::string::npos;
+  };
+  const auto complaint = std::find_if_not(lines.begin(), lines.end(), is_warning);
+  if (complaint != lines.end()) {
+    record.Say(Remark::kDoubt, "decoder_complaint",
+               name + ": the decoder says \"" + *complaint + "\", and fills up what it can't read; is the file whole?");
+  } else if (!lines.empty()) {
+    record.Say(Remark::kWarning, "decoder_warning", name + ": the decoder says \"" + lines.front() + "\"");
+  }
 }
 
 cv::Mat SlotPhoto(const QVTester& tester, QV_RESOURCE_INDEX slot) {
