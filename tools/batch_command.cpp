@@ -78,7 +78,7 @@ std::vector<Job> JobsFor(const BatchWanted& wanted, Plan& plan) {
   const bool single = plan.name.empty();
   if (fs::is_directory(wanted.inputs)) {
     if (single) return JobsOfPhotos(wanted.inputs);
-    plan.folder = wanted.inputs;
+    plan.unit_folder = wanted.inputs;
     return JobsOfUnits(wanted.inputs);
   }
   const bool stdin_given = wanted.inputs == "-";
@@ -123,9 +123,8 @@ int RunIt(BatchWanted& wanted) {
     watch = std::make_unique<FolderWatch>(wanted.inputs);  // before the folder is read, so that none is missed
   }
   const Shard shard = ParseShard(wanted.shard);
-  std::vector<Job> jobs = JobsFor(wanted, plan);
-  jobs.erase(std::remove_if(jobs.begin(), jobs.end(), [&](const Job& job) { return !FallsTo(shard, job); }),
-             jobs.end());
+  const std::vector<Job> jobs = ShareOf(shard, JobsFor(wanted, plan));
+  if (watch) watch->Take(shard);
   if (jobs.empty() && !wanted.watch && shard.count == 1) {
     throw Failure(kWrongUsage, Printable(wanted.inputs) + ": holds " + (plan.name.empty() ? "no photo" : "no unit"));
   }
@@ -134,11 +133,15 @@ int RunIt(BatchWanted& wanted) {
                             : wanted.pictures == "failures" ? KeepPictures::kFailures
                                                             : KeepPictures::kNone;
   Store store(wanted.store, Store::Use::kWrite);
+  store.TellOfWaiting([](const std::string& sentence) { std::cerr << sentence << '\n'; });
+  FinishWhenInterrupted();
   const bool terminal = isatty(STDERR_FILENO) != 0 && !wanted.quiet;
-  const BatchProgress done =
-      RunBatch(plan, jobs, watch.get(), store, wanted.options, [&](const BatchProgress& progress) {
+  const BatchProgress done = RunBatch(
+      plan, jobs, watch.get(), store, wanted.options,
+      [&](const BatchProgress& progress) {
         if (terminal) ShowProgress(progress);
-      });
+      },
+      [] { return InterruptedStatus() != 0; });
   if (terminal) std::cerr << '\n';
   if (!wanted.quiet) {
     std::cout << Format("%s: %s, %s stored, %zu there before; %.1f s\n", store.name().c_str(),
@@ -146,7 +149,7 @@ int RunIt(BatchWanted& wanted) {
                         done.seconds)
               << Verdicts(done).substr(std::min<std::size_t>(2, Verdicts(done).size())) << '\n';
   }
-  return StatusOf(done);
+  return InterruptedStatus() != 0 ? InterruptedStatus() : StatusOf(done);
 }
 
 }  // namespace

@@ -1,5 +1,6 @@
 #include "tools/program.h"
 
+#include <atomic>
 #include <csignal>
 #include <cstdlib>
 #include <iostream>
@@ -13,6 +14,8 @@ namespace qv {
 namespace {
 
 std::vector<std::string> command_line;
+std::atomic<bool> finishes_first = false;
+std::atomic<int> interrupted_by = 0;
 
 }  // namespace
 
@@ -38,9 +41,17 @@ void WatchForInterrupts() {
   std::thread([] {
     int signal = 0;
     sigwait(&interrupts, &signal);
+    if (finishes_first) {
+      interrupted_by = signal;
+      sigwait(&interrupts, &signal);
+    }
     ScratchFolder::RemoveForGood();
     std::_Exit(128 + signal);
   }).detach();
 }
+
+void FinishWhenInterrupted() { finishes_first = true; }
+
+int InterruptedStatus() { return interrupted_by == 0 ? 0 : 128 + interrupted_by; }
 
 }  // namespace qv

@@ -36,6 +36,10 @@ void WriteOutput(const std::string& path, const std::string& content);
 /// From here on an interrupt removes the scratch folder and ends the program with status 130. Call before any thread is
 /// started.
 void WatchForInterrupts();
+/// From here on the first interrupt is only told by InterruptedStatus; the second ends the program.
+void FinishWhenInterrupted();
+/// The status to end with once interrupted (130); 0 before.
+int InterruptedStatus();
 
 }  // namespace qv
 

@@ -56,8 +56,18 @@ TEST(Plans, WhatCantBeRunAsItStandsIsRefused) {
   }
   const Plan plan = ReadPlan(folder.Write("plan.json", R"({"name": "a", "steps": [)" + step + "]}"));
   EXPECT_EQ(folder.Path("sn1.jpg"), RequestFor(plan, plan.steps[0], "sn1").inputs.at(0).name);
-  EXPECT_THAT(Sentence([&] { RequestFor(plan, plan.steps[0], "../sn1"); }),
-              HasSubstr("leads out of the plan's folder"));
+  Plan elsewhere = plan;
+  elsewhere.unit_folder = "/lots/7";
+  EXPECT_EQ("/lots/7/sn1.jpg", RequestFor(elsewhere, plan.steps[0], "sn1").inputs.at(0).name);
+  for (const char* const unit : {"../sn1", "/etc/sn1", "a/../../sn1", "../7x/sn1"}) {
+    for (const char* const name : {"{unit}.jpg", "{unit}/{unit}.jpg"}) {
+      elsewhere.steps[0].request.inputs[0].name = name;
+      EXPECT_THAT(Sentence([&] { RequestFor(elsewhere, elsewhere.steps[0], unit); }), HasSubstr("out of the folder"))
+          << name << " " << unit;
+    }
+  }
+  elsewhere.steps[0].request.inputs[0].name = "/photos/{unit}.jpg";
+  EXPECT_THAT(Sentence([&] { RequestFor(elsewhere, elsewhere.steps[0], "../sn1"); }), HasSubstr("folder \"/photos\""));
   EXPECT_EQ("no failure", Sentence([&] { ReadPlan(folder.Write("new.json", NewPlan())); }));
 }
 

@@ -10,6 +10,7 @@
 
 #include "desk/base/text.h"
 #include "desk/batch/worker.h"
+#include "qvtester/indices.h"
 
 namespace qv {
 
@@ -29,7 +30,9 @@ class Running {
  public:
   Running(const Plan& plan, std::vector<Job> jobs, FolderWatch* watch, Store& store, const BatchOptions& options)
       : order_{plan, options, known_}, jobs_(std::move(jobs)), watch_(watch), store_(store) {
-    store.EachRow(Selected(plan), [&](const RunRow& run) { known_[run.key] = run.outcome; });
+    store.EachRow(Selected(plan), [&](const RunRow& run) {
+      if (run.result_code != QV_ERROR_INTERNAL) known_[run.key] = run.outcome;  // what a fault ended is tried again
+    });
     for (std::size_t i = 0; i < jobs_.size(); ++i) todo_.push_back({i, 0});
     progress_.jobs = jobs_.size();
     const auto least = static_cast<std::size_t>(std::max(options.workers, 1));
@@ -144,6 +147,10 @@ class Running {
     if (pending_.empty()) return;
     store_.Put(pending_);
     pending_.clear();
+    // While the store was waited for, nobody listened to the workers: that time is not theirs.
+    for (const std::unique_ptr<Worker>& worker : workers_) {
+      if (worker) worker->Excuse(Clock::now() - stored_);
+    }
   }
 
   std::unordered_map<std::string, std::string> known_;

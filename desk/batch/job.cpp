@@ -35,6 +35,9 @@ Job JobOfPhoto(const fs::path& path) {
   return job;
 }
 
+// Copying programs write names that start with a dot, and rename them when they are done.
+bool IsPhoto(const std::string& name) { return IsPictureName(name) && name[0] != '.'; }
+
 std::vector<fs::path> Entries(const std::string& folder) {
   std::error_code error;
   std::vector<fs::path> entries;
@@ -137,6 +140,12 @@ bool FallsTo(const Shard& shard, const Job& job) {
   return std::stoul(HexDigest(name, "SHA256").substr(0, 8), nullptr, 16) % shard.count == shard.index - 1;
 }
 
+std::vector<Job> ShareOf(const Shard& shard, std::vector<Job> jobs) {
+  jobs.erase(std::remove_if(jobs.begin(), jobs.end(), [&](const Job& job) { return !FallsTo(shard, job); }),
+             jobs.end());
+  return jobs;
+}
+
 bool IsPictureName(const std::string& path) {
   const std::string ending = LowerExtension(path);
   return std::find(kPictureEndings.begin(), kPictureEndings.end(), ending) != kPictureEndings.end();
@@ -145,7 +154,7 @@ bool IsPictureName(const std::string& path) {
 std::vector<Job> JobsOfPhotos(const std::string& folder) {
   std::vector<Job> jobs;
   for (const fs::path& path : Entries(folder)) {
-    if (IsPictureName(path.string()) && !fs::is_directory(path)) jobs.push_back(JobOfPhoto(path));
+    if (IsPhoto(path.filename().string()) && !fs::is_directory(path)) jobs.push_back(JobOfPhoto(path));
   }
   return jobs;
 }
@@ -219,12 +228,13 @@ std::vector<Job> FolderWatch::Arrived() {
   alignas(inotify_event) std::array<char, 65536> buffer;
   for (;;) {
     const ssize_t got = read(inotify_, buffer.data(), buffer.size());
-    if (got <= 0) return jobs;
+    if (got <= 0) return ShareOf(shard_, std::move(jobs));
     for (ssize_t at = 0; at < got;) {
       inotify_event event;
       std::memcpy(&event, buffer.data() + at, sizeof event);
       const std::string name = event.len > 0 ? buffer.data() + at + sizeof event : "";
-      if (IsPictureName(name) && name[0] != '.') jobs.push_back(JobOfPhoto(fs::path(folder_) / name));
+      if ((event.mask & IN_Q_OVERFLOW) != 0) return ShareOf(shard_, JobsOfPhotos(folder_));  // too many to be told
+      if (IsPhoto(name)) jobs.push_back(JobOfPhoto(fs::path(folder_) / name));
       at += static_cast<ssize_t>(sizeof event + event.len);
     }
   }

@@ -26,8 +26,11 @@ Shard ParseShard(const std::string& text);
 
 /// Whether the job falls to the shard: by a hash of unit and inputs, the same on every machine.
 bool FallsTo(const Shard& shard, const Job& job);
+/// The jobs that fall to it.
+std::vector<Job> ShareOf(const Shard& shard, std::vector<Job> jobs);
 
-/// A job for every picture file of a folder (not of its subfolders), in the order of their names; the unit is the
+/// A job for every picture file of a folder (not of its subfolders; none whose name starts with a dot, which is still
+/// being written), in the order of their names; the unit is the
 /// file's name without its ending.
 std::vector<Job> JobsOfPhotos(const std::string& folder);
 
@@ -55,12 +58,15 @@ class FolderWatch {
   FolderWatch& operator=(const FolderWatch&) = delete;
 
   int descriptor() const { return inotify_; }  // to poll for reading
+  /// Leaves the others to other machines.
+  void Take(const Shard& shard) { shard_ = shard; }
   /// What arrived since the last call; waits for nothing.
   std::vector<Job> Arrived();
 
  private:
   int inotify_;
   std::string folder_;
+  Shard shard_;
 };
 
 }  // namespace qv

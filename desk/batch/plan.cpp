@@ -27,21 +27,21 @@ bool NamesFile(const Spec& spec, const std::string& parameter) {
   });
 }
 
-// A file's name with the unit filled in, from the folder.
-std::string Placed(const Plan& plan, std::string name, const std::string& unit) {
-  const bool absolute = fs::path(name).is_absolute();
-  bool by_unit = false;
-  for (std::size_t at = name.find(kUnit); at != std::string::npos; at = name.find(kUnit, at + unit.size())) {
-    name.replace(at, std::string(kUnit).size(), unit);
-    by_unit = true;
+// A file's name from its folder, with the unit filled in: a unit's name stays below the folder that the plan names.
+std::string Placed(const Plan& plan, const std::string& name, const std::string& unit) {
+  const std::size_t first = name.find(kUnit);
+  if (first == std::string::npos) return (fs::path(plan.folder) / name).string();
+  const fs::path folder = plan.unit_folder.empty() ? plan.folder : plan.unit_folder;
+  const fs::path below = (folder / fs::path(name.substr(0, first)).parent_path()).lexically_normal();
+  std::string filled = name;
+  for (std::size_t at = first; at != std::string::npos; at = filled.find(kUnit, at + unit.size())) {
+    filled.replace(at, std::string(kUnit).size(), unit);
   }
-  const fs::path place = absolute ? fs::path(name) : fs::path(plan.folder) / name;
-  if (by_unit && !absolute) {
-    const fs::path relative = fs::path(name).lexically_normal();
-    if (relative.is_absolute() || (!relative.empty() && *relative.begin() == "..")) {
-      throw Failure(kWrongUsage,
-                    "unit \"" + Printable(unit) + "\": " + Printable(name) + " leads out of the plan's folder");
-    }
+  const fs::path place = folder / filled;
+  const fs::path from_there = place.lexically_normal().lexically_relative(below);
+  if (from_there.empty() || *from_there.begin() == "..") {
+    throw Failure(kWrongUsage, "unit \"" + Printable(unit) + "\": " + Printable(filled) +
+                                   " leads out of the folder \"" + Printable(below.string()) + "\" of the plan");
   }
   return place.string();
 }

@@ -21,7 +21,8 @@ struct PlanStep {
 /// What is measured of each unit, in this order (docs/plans.md).
 struct Plan {
   std::string name, revision;
-  std::string folder;  // from which inputs are seen; empty: the current one
+  std::string folder;       // from which inputs are seen; empty: the current one
+  std::string unit_folder;  // from which those with {unit} in their names are seen; empty: the same
   bool stop_on_error = false;
   std::vector<PlanStep> steps;
 };
@@ -34,7 +35,7 @@ Plan ReadPlan(const std::string& path);
 Plan PlanOf(const Request& request, const Limits& limits);
 
 /// The step's request for a unit: {unit} filled in, files seen from the plan's folder. Throws Failure (wrong usage)
-/// where the unit's name would lead out of that folder.
+/// where the unit's name would lead out of the folder that the plan names.
 Request RequestFor(const Plan& plan, const PlanStep& step, const std::string& unit);
 
 /// A plan to start from, as a file's content.

@@ -196,7 +196,8 @@ void KeepMemory() {
 void BecomeWorker(int line, pid_t parent) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (getppid() != parent) _exit(0);
-  for (const int signal : {SIGINT, SIGTERM, SIGPIPE}) std::signal(signal, SIG_DFL);
+  for (const int signal : {SIGTERM, SIGPIPE}) std::signal(signal, SIG_DFL);
+  std::signal(SIGINT, SIG_IGN);  // a terminal sends it to all: the parent decides
   sigset_t none;
   sigemptyset(&none);
   sigprocmask(SIG_SETMASK, &none, nullptr);

@@ -53,6 +53,9 @@ class Worker {
   std::size_t next_step() const { return next_step_; }
   std::chrono::steady_clock::time_point since() const { return since_; }  // when it began its step
 
+  /// Puts off the end of its time.
+  void Excuse(std::chrono::steady_clock::duration time) { since_ += time; }
+
   void Give(std::size_t index, const Job& job, std::size_t first_step);
   /// Takes what has arrived; false when the process is gone. `finished` says that the job is done.
   bool Receive(std::vector<StepDone>& done, bool& finished);

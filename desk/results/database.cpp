@@ -8,6 +8,7 @@
 #include <filesystem>
 #include <thread>
 
+#include "desk/base/text.h"
 #include "desk/results/inserts.h"
 #include "desk/results/schema.h"
 
@@ -176,7 +177,7 @@ Store::Database::Inserts& Store::Database::inserts() {
 
 void Store::Database::Persist(const std::function<void()>& work) {
   const auto give_up = std::chrono::steady_clock::now() + kPatience;
-  for (;;) {
+  for (bool told = false;;) {
     try {
       if (session_ == nullptr) Connect();
       work();
@@ -185,6 +186,11 @@ void Store::Database::Persist(const std::function<void()>& work) {
       const bool again = session_ == nullptr || WorthAnotherTry(e);
       Rollback();
       if (!again || std::chrono::steady_clock::now() > give_up) Lost(e);
+      if (!told && told_of_waiting) {
+        told_of_waiting(shown_ + ": " + OneLine(e.what()) +
+                        Format("; trying again for %lld s", static_cast<long long>(kPatience.count())));
+      }
+      told = true;
     } catch (...) {
       Rollback();
       throw;

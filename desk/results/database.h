@@ -49,6 +49,7 @@ class Store::Database {
   /// Made on the present session when first asked for.
   Inserts& inserts();
 
+  std::function<void(const std::string&)> told_of_waiting;
   std::map<std::tuple<std::string, std::string, std::string>, std::int64_t> quantity_ids;  // by name, unit, method
 
  private:

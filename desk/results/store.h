@@ -64,10 +64,14 @@ class Store {
   /// Of all runs, or of those of one plan or measurement: what a batch need not measure again.
   std::vector<std::string> Keys(const Selection& selection = {});
 
-  /// Stores these in one transaction, whole or not at all; those whose key is there are left as they are. Waits up to
-  /// half a minute for a file that is locked or a server that is gone, then throws. Answers how many were new.
+  /// Stores these in one transaction, whole or not at all; those whose key is there are left as they are, but for runs
+  /// that an internal fault ended (-99), which give way to one that was measured. Waits up to half a minute for a file
+  /// that is locked or a server that is gone, then throws. Answers how many went in.
   std::size_t Put(const std::vector<StoredRun>& runs);
   std::size_t Put(const StoredRun& run) { return Put(std::vector<StoredRun>{run}); }
+
+  /// Whom to tell, in a sentence, that Put waits for the database.
+  void TellOfWaiting(std::function<void(const std::string&)> told);
 
   std::int64_t Count(const Selection& selection = {});
   /// In the order they were stored.

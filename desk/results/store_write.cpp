@@ -5,6 +5,7 @@
 #include "desk/results/database.h"
 #include "desk/results/inserts.h"
 #include "desk/results/pack.h"
+#include "qvtester/indices.h"
 
 namespace qv {
 
@@ -146,18 +147,36 @@ void AddFigure(Store::Database::Inserts& to, const StoredFigure& figure, long lo
   to.add_figure.execute(true);
 }
 
+// Whether the row went in: not where its key is there. A run that an internal fault ended (the process that measured it
+// was killed, say) tells nothing of the unit, and gives way to one that was measured.
+bool AddRow(Store::Database::Inserts& to, soci::session& session) {
+  to.add_run.execute(true);
+  if (to.add_run.get_affected_rows() != 0) return true;
+  if (to.run_code == QV_ERROR_INTERNAL) return false;
+  long long fault = 0;
+  int code = QV_ERROR_INTERNAL;
+  session << "SELECT id FROM run WHERE key = :key AND result_code = :code", soci::use(to.run.key), soci::use(code),
+      soci::into(fault);
+  if (!session.got_data()) return false;
+  for (const char* const rows : {"figure WHERE run", "run_column WHERE run", "picture WHERE run", "run WHERE id"}) {
+    session << std::string("DELETE FROM ") + rows + " = :id", soci::use(fault);
+  }
+  to.add_run.execute(true);
+  return to.add_run.get_affected_rows() != 0;
+}
+
 // Whether it was new.
-bool AddRun(Store::Database::Inserts& to, const Prepared& run, const std::map<QuantityKey, std::int64_t>& quantities) {
+bool AddRun(Store::Database& database, const Prepared& run) {
+  Store::Database::Inserts& to = database.inserts();
   to.run = run.row;
   to.record = run.record;
   to.run_marginal = run.row.marginal ? 1 : 0;
   to.run_code = run.row.result_code;
   to.start = run.row.start_millis;
   to.end = run.row.end_millis;
-  to.add_run.execute(true);
-  if (to.add_run.get_affected_rows() == 0) return false;
+  if (!AddRow(to, database.session())) return false;
   to.find_run.execute(true);
-  for (const StoredFigure& figure : run.figures) AddFigure(to, figure, quantities.at(KeyOf(figure)));
+  for (const StoredFigure& figure : run.figures) AddFigure(to, figure, database.quantity_ids.at(KeyOf(figure)));
   for (const auto& [name, value] : run.columns) {
     to.name = name;
     to.text = value;
@@ -200,6 +219,10 @@ void AddQuantities(Store::Database& database, const std::vector<Prepared>& runs)
 
 }  // namespace
 
+void Store::TellOfWaiting(std::function<void(const std::string&)> told) {
+  database_->told_of_waiting = std::move(told);
+}
+
 std::size_t Store::Put(const std::vector<StoredRun>& runs) {
   std::vector<Prepared> prepared;
   prepared.reserve(runs.size());
@@ -210,7 +233,7 @@ std::size_t Store::Put(const std::vector<StoredRun>& runs) {
     added = 0;
     database_->Begin();
     for (const Prepared& run : prepared) {
-      added += AddRun(database_->inserts(), run, database_->quantity_ids) ? 1U : 0U;
+      added += AddRun(*database_, run) ? 1U : 0U;
     }
     database_->Commit();
   });
