@@ -9,6 +9,7 @@
 #include "desk/base/text.h"
 #include "desk/batch/plan.h"
 #include "desk/measure/measurement.h"
+#include "desk/measure/telling.h"
 #include "desk/results/store.h"
 #include "tools/commands.h"
 #include "tools/program.h"
@@ -49,20 +50,13 @@ std::string ValueText(const Reading& reading) {
   return suffix == "1" ? text : text + " " + suffix;
 }
 
-std::string LimitText(const Limit& limit) {
-  std::string text;
-  if (limit.min) text += Format("at least %g", *limit.min);
-  if (limit.max) text += Format("%sat most %g", text.empty() ? "" : ", ", *limit.max);
-  return text;
-}
-
 void AddLines(const PlanStep& step, const Record& record, std::vector<Line>& lines) {
   for (const Reading& reading : record.phase.readings) {
     if (reading.info->figure->axis != nullptr && !reading.limit.given()) continue;  // curves are in the record
     const std::string value = reading.info->figure->axis != nullptr ? "a list" : ValueText(reading);
     lines.push_back({RankOf(reading.outcome), step.name, reading.info->name,
                      std::string(Name(reading.outcome)) + (reading.marginal ? ", marginal" : ""), value,
-                     LimitText(reading.limit)});
+                     LimitWords(reading)});
   }
 }
 

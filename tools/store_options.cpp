@@ -4,6 +4,7 @@
 #include <cmath>
 
 #include "desk/base/text.h"
+#include "desk/measure/figures.h"
 #include "desk/measure/limits.h"
 
 namespace qv {
@@ -31,8 +32,17 @@ Selection StoreOptions::selection() const {
 ArchiveLimits ReadArchiveLimits(const std::string& path) {
   const Limits read = ReadLimits(path);
   ArchiveLimits limits = {{}, read.accept_doubts};
+  const auto bounds_of = [](const Limit& limit) {
+    return Bounds{limit.min, limit.max, limit.marginal_min, limit.marginal_max};
+  };
   for (const auto& [name, limit] : read.by_name) {
-    limits.by_name[name] = {limit.min, limit.max, limit.marginal_min, limit.marginal_max};
+    if (FindFigure(name)->figure->axis == nullptr) {
+      limits.by_name[name] = bounds_of(limit);
+      continue;
+    }
+    ListBounds& list = limits.lists[name];
+    list.each = bounds_of(limit);
+    for (const auto& [number, own] : limit.by_number) list.by_number[number] = bounds_of(own);
   }
   return limits;
 }

@@ -126,6 +126,33 @@ TEST_F(Archive, IsJudgedAgainByOtherLimits) {
   }
 }
 
+TEST_F(Archive, ListsAreJudgedAgainByTheirEntries) {
+  Store store = Open("lists.db");
+  StoredRun run = RunOf("x", 1);
+  run.record["request"]["measurement"] = run.record["phases"][0]["name"] = "camera_capture";
+  run.record["phases"][0]["measurements"] = {
+      {"camera_capture_delta_e_76", {{"outcome", "MEASURED"}, {"measured_value", {{0, 1.5}, {7, 2.5}}}}},
+      {"camera_capture_lab_l",
+       {{"outcome", "FAIL"}, {"limits", {{"each", {{"max", 1}}}}}, {"measured_value", {{0, 2}}}}}};
+  store.Put(run);
+  const std::string name = "camera_capture_delta_e_76";
+  const ListBounds each = {{{}, 2.0, {}, {}}, {}};
+  const ListBounds own = {{{}, 2.0, {}, {}}, {{7, {{}, 3.0, {}, {}}}}};
+  const ListBounds lacking = {{{}, 3.0, {}, {}}, {{8, {{}, 3.0, {}, {}}}}};
+  for (const auto& [bounds, outcome] : {std::pair(each, "FAIL"), {own, "PASS"}, {lacking, "ERROR"}}) {
+    const Judgement judged = JudgeAgain(store, {}, {{}, {}, {{name, bounds}}}, nullptr);
+    EXPECT_EQ(1, judged.runs_after.of(outcome)) << outcome;
+    EXPECT_EQ(name, judged.figures.back().name);
+  }
+  const ArchiveLimits before = {{}, {}, {{name, each}}};
+  EXPECT_EQ(1, JudgeAgain(store, {}, {{}, {}, {{name, own}}}, &before).runs_before.of("FAIL"));
+  EXPECT_EQ(1, JudgeAgain(store, {}, {{}, {}, {{"camera_capture_lab_l", own}}}, nullptr).runs_after.of("ERROR"));
+  EXPECT_THROW(JudgeAgain(store, {}, {{}, {}, {{"camera_capture_delta_e_2000", own}}}, nullptr), Failure);
+  // The front camera's limits are not asked of the main one.
+  ArchiveLimits both = {{{"camera_capture_front_delta_e_76_mean", {{}, 1.0, {}, {}}}}, {}, {{name, own}}};
+  EXPECT_EQ(1, JudgeAgain(store, {}, both, nullptr).runs_after.of("PASS"));
+}
+
 TEST_F(Archive, TellsYieldByFigureBeforeAndAfter) {
   Store store = Open("store.db");
   for (int i = 0; i < 10; ++i) store.Put(RunOf(std::to_string(i), i, nullptr, i == 0 ? "FAIL" : "PASS"));

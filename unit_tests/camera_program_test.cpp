@@ -69,6 +69,11 @@ TEST_F(CameraProgram, CaptureReadsThePatchesAsDrawn) {
     }
     EXPECT_EQ(largest, Measured(record, "camera_capture_delta_e_76_max"));
   }
+  folder_.Write("limits.json", R"({"limits": {"camera_capture_delta_e_2000":
+                {"each": {"max": 90}, "patches": {"7": {"max": 0}}}}})");
+  const json judged = Record("capture photo.png --standard standard.png --limits limits.json", 1);
+  EXPECT_EQ(json::array({7}), judged["phases"][0]["measurements"]["camera_capture_delta_e_2000"]["decision"]["broken"]);
+  EXPECT_THAT(err_, HasSubstr("camera_capture_delta_e_2000: outside its limit: patch 7 ("));
   const json alone = Record("capture photo.png --front");
   EXPECT_EQ(20, alone["metadata"]["test_index"]);
   EXPECT_EQ(4u, Measured(alone, "camera_capture_front_lab_l").size());

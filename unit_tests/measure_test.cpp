@@ -111,6 +111,48 @@ TEST(Measure, TheRefusedInputIsNamed) {
               AllOf(HasSubstr("gray.png: "), Not(HasSubstr("photo.png"))));
 }
 
+// Patches 0 to 3 read 1, 2, 3 and NaN.
+Reading JudgedPatches(const std::string& limit, const char* rule, double uncertainty) {
+  Record record;
+  record.phase.name = "camera_capture";
+  record.phase.code = QV_SUCCESS;
+  const Uncertainty u = {uncertainty / 2, uncertainty, 2, kPixelMethod};
+  Reading& m = record.phase.Add("delta_e_2000", {0, 1, 2, 3}, {1, 2, 3, NAN});
+  if (uncertainty > 0) m.Trust({u, u, u, u});
+  record.limits = LimitsFromJson(ParseJson(R"({"decision": {"rule": ")" + std::string(rule) +
+                                               R"("}, "limits": {"camera_capture_delta_e_2000": )" + limit + "}}",
+                                           "limits"),
+                                 "limits");
+  record.Judge();
+  EXPECT_EQ(record.outcome() == Outcome::kFail, !record.remarks.empty());
+  return record.phase.readings.at(0);
+}
+
+TEST(Measure, AListIsHeldAgainstItsLimitsEntryByEntry) {
+  for (const auto& [limit, rule, uncertainty, outcome, broken, marginal] :
+       {std::tuple(R"({"each": {"max": 2.5}})", "simple", 0.0, Outcome::kFail, "[2,3]", "[]"),
+        {R"({"patches": {"0": {"max": 2.5}, "1": {"min": 2}}})", "simple", 0.0, Outcome::kPass, "[]", "[]"},
+        {R"({"each": {"max": 2.5}, "patches": {"2": {"max": 3}, "1": {"max": 1.5}}})", "simple", 0.0, Outcome::kFail,
+         "[1,3]", "[]"},
+        {R"({"patches": {"0": {"max": 2.5, "marginal_max": 0.5}}})", "simple", 0.4, Outcome::kPass, "[]", "[0]"},
+        {R"({"patches": {"0": {"max": 1.2}, "1": {"max": 3}}})", "simple", 0.4, Outcome::kPass, "[]", "[0]"},
+        {R"({"patches": {"0": {"max": 1.2}, "1": {"max": 3}}})", "guarded", 0.4, Outcome::kFail, "[0]", "[0]"},
+        {R"({"patches": {"0": {"max": 0.8}}})", "guarded_rejection", 0.4, Outcome::kPass, "[]", "[0]"},
+        {R"({"patches": {"0": {"max": 2}, "7": {"max": 2}}})", "simple", 0.0, Outcome::kUnset, "[]", "[]"}}) {
+    const Reading m = JudgedPatches(limit, rule, uncertainty);
+    EXPECT_EQ(outcome, m.outcome) << limit;
+    std::string outside;
+    std::string near;
+    for (const EntryVerdict& entry : m.entries) {
+      if (!entry.decision.pass) outside += (outside.empty() ? "" : ",") + std::to_string(entry.place);
+      if (entry.marginal) near += (near.empty() ? "" : ",") + std::to_string(entry.place);
+    }
+    EXPECT_EQ(broken, "[" + outside + "]") << limit;
+    EXPECT_EQ(marginal, "[" + near + "]") << limit;
+    EXPECT_EQ(marginal != std::string("[]"), m.marginal) << limit;
+  }
+}
+
 TEST(Measure, OnlyARequestToPublishReachesTheStore) {
   const TemporaryFolder folder;
   const std::string store = folder.Path("store");

@@ -134,6 +134,10 @@ std::string CaptureFinding::Report(const Record& record) const {
     const std::string value = m->values.empty() ? "not measured" : ValueText(*m, 2);
     text += Format("%-17s %s%s\n", figure, value.c_str(), LimitText(*m).c_str());
   }
+  for (const Reading& m : phase.readings) {
+    if (m.info->figure->axis == nullptr || !m.limit.given()) continue;
+    text += Format("%-17s%s\n", m.info->figure->name, LimitText(m).c_str());
+  }
   return text;
 }
 

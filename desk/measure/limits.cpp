@@ -3,6 +3,7 @@
 #include <array>
 #include <utility>
 
+#include "chart/chart_layout.h"
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
 #include "desk/measure/figures.h"
@@ -35,14 +36,16 @@ void RefuseDisorder(const JsonView& view, const Limit& limit) {
   if (above(limit.marginal_min, limit.marginal_max)) view.Refuse("its marginal_min lies above its marginal_max");
 }
 
-Limit ReadLimit(const FigureInfo& info, const JsonView& view) {
-  if (info.figure->axis != nullptr) view.Refuse("a list has no limits");
+void CheckUnit(const Figure& figure, const JsonView& view) {
+  if (!view.Has("unit")) return;
+  const std::string unit = figure.unit.suffix;
+  const std::string given = view.At("unit").Text();
+  if (given != unit) view.Refuse("its unit is \"" + unit + "\", not \"" + Printable(given) + "\"");
+}
+
+Limit ReadBounds(const Figure& figure, const JsonView& view) {
   view.KnowOnly({"min", "max", "marginal_min", "marginal_max", "unit"});
-  if (view.Has("unit")) {
-    const std::string unit = info.figure->unit.suffix;
-    const std::string given = view.At("unit").Text();
-    if (given != unit) view.Refuse("its unit is \"" + unit + "\", not \"" + Printable(given) + "\"");
-  }
+  CheckUnit(figure, view);
   Limit limit;
   for (const auto& [name, bound] : kBounds) {
     if (view.Has(name)) limit.*bound = view.At(name).Number();
@@ -50,6 +53,45 @@ Limit ReadLimit(const FigureInfo& info, const JsonView& view) {
   if (!limit.given()) view.Refuse("it has no bound");
   RefuseDisorder(view, limit);
   return limit;
+}
+
+// The bounds of entries by their numbers: {"7": {"max": 2}}.
+std::map<int, Limit> ReadNumbered(const Figure& figure, const JsonView& view) {
+  constexpr std::size_t kMostDigits = 6;
+  std::map<int, Limit> limits;
+  for (const auto& [number, bounds] : view.Members()) {
+    const bool whole = !number.empty() && number.size() <= kMostDigits && (number[0] != '0' || number.size() == 1) &&
+                       number.find_first_not_of("0123456789") == std::string::npos;
+    if (!whole || (figure.axis == &kPatchAxis && std::stoul(number) >= kPatches.size())) {
+      view.Refuse("\"" + Printable(number) + "\" is the number of no " + figure.axis->name);
+    }
+    limits[std::stoi(number)] = ReadBounds(figure, bounds);
+  }
+  if (limits.empty()) view.Refuse("is empty");
+  return limits;
+}
+
+// {"each": {"max": 3}, "patches": {"7": {"max": 2}}}
+FigureLimit ReadListLimit(const Figure& figure, const JsonView& view) {
+  const std::string entries = EntriesName(*figure.axis);
+  const bool numbered = !entries.empty();
+  if (!view.Has("each") && !(numbered && view.Has(entries.c_str()))) {
+    view.Refuse(R"(a list takes its bounds as {"each": {"max": 3}})" +
+                (numbered ? R"( or by number, as {")" + entries + R"(": {"7": {"max": 2}}})" : std::string()));
+  }
+  view.KnowOnly(numbered ? std::vector<std::string>{"each", entries, "unit"}
+                         : std::vector<std::string>{"each", "unit"});
+  CheckUnit(figure, view);
+  FigureLimit limit;
+  if (view.Has("each")) static_cast<Limit&>(limit) = ReadBounds(figure, view.At("each"));
+  if (numbered && view.Has(entries.c_str())) limit.by_number = ReadNumbered(figure, view.At(entries));
+  return limit;
+}
+
+FigureLimit ReadLimit(const FigureInfo& info, const JsonView& view) {
+  if (info.figure->axis != nullptr) return ReadListLimit(*info.figure, view);
+  if (view.Has("each")) view.Refuse(R"("each" is for lists, and this is a single value)");
+  return {ReadBounds(*info.figure, view), {}};
 }
 
 // {"rule": "guarded", "factor": 1.0}
@@ -67,6 +109,18 @@ DecisionRule ReadRule(const JsonView& view) {
 }
 
 }  // namespace
+
+const Limit& FigureLimit::Of(double number) const {
+  const auto own = by_number.empty() ? by_number.end() : by_number.find(static_cast<int>(number));
+  return own == by_number.end() ? *this : own->second;
+}
+
+std::string EntriesName(const Unit& axis) {
+  const std::string name = axis.name;
+  if (axis.suffix != std::string("1")) return "";
+  const bool hissing = name.size() > 2 && name.compare(name.size() - 2, 2, "ch") == 0;
+  return name + (hissing ? "es" : "s");
+}
 
 Limits ReadLimits(const std::string& path) { return LimitsFromJson(ReadJson(path), Printable(path)); }
 

@@ -38,12 +38,29 @@ Json JsonOf(const Limit& limit) {
   return json;
 }
 
+Json JsonOf(const FigureLimit& limit, const Figure& figure) {
+  if (figure.axis == nullptr) return JsonOf(limit);
+  Json json = Json::object();
+  if (limit.Limit::given()) json["each"] = JsonOf(static_cast<const Limit&>(limit));
+  for (const auto& [number, own] : limit.by_number) {
+    json[EntriesName(*figure.axis)][std::to_string(number)] = JsonOf(own);
+  }
+  return json;
+}
+
 // Of one value, or lists that go with the values.
 Json JsonOf(const Reading& m, double Uncertainty::*part) {
   if (m.info->figure->axis == nullptr) return m.uncertainties[0].*part;
   Json list = Json::array();
   for (const Uncertainty& u : m.uncertainties) list.push_back(u.*part);
   return list;
+}
+
+// Where an entry of a list stands.
+Json AxisJson(const Reading& m, std::size_t place) {
+  const std::string suffix = m.info->figure->axis->suffix;
+  const bool whole = suffix == "1" || suffix == "level";
+  return JsonOf(m.axis[place], whole ? Number::kWhole : Number::kReal);
 }
 
 Json JsonOfUncertainty(const Reading& m) {
@@ -59,24 +76,38 @@ Json JsonOfRepeats(const Reading& m) {
   return {{"values", values}, {"spread", JsonOf(Spread(m.repeats), Number::kReal)}};
 }
 
-Json JsonOf(const Decision& decision, const DecisionRule& rule, bool known) {
-  return {{"rule", rule.Name()},
-          {"guard_band", decision.guard_band},
-          {"wrong_probability", known ? Json(decision.wrong_probability) : Json()}};
+// Of one value, or lists that go with the values: null for an entry without a limit.
+Json JsonOfDecision(const Reading& m, const DecisionRule& rule) {
+  const bool known = !m.uncertainties.empty();
+  if (m.info->figure->axis == nullptr) {
+    return {{"rule", rule.Name()},
+            {"guard_band", m.decision->guard_band},
+            {"wrong_probability", known ? Json(m.decision->wrong_probability) : Json()}};
+  }
+  const Json none = Json(m.values.size(), nullptr);
+  Json json = {{"rule", rule.Name()},
+               {"guard_band", none},
+               {"wrong_probability", none},
+               {"broken", Json::array()},
+               {"marginal", Json::array()}};
+  for (const EntryVerdict& entry : m.entries) {
+    json["guard_band"][entry.place] = entry.decision.guard_band;
+    if (known) json["wrong_probability"][entry.place] = entry.decision.wrong_probability;
+    if (!entry.decision.pass) json["broken"].push_back(AxisJson(m, entry.place));
+    if (entry.marginal) json["marginal"].push_back(AxisJson(m, entry.place));
+  }
+  return json;
 }
 
 Json JsonOf(const Reading& m, const DecisionRule& rule) {
   Json json = {{"name", m.info->name}, {"outcome", Name(m.outcome)}};
   if (m.marginal) json["marginal"] = true;
-  if (m.outcome == Outcome::kUnset) {
+  if (m.outcome == Outcome::kUnset && m.values.empty()) {
     // No value: it was asked for, and not measured.
   } else if (m.info->figure->axis != nullptr) {
     Json& points = json["measured_value"] = Json::array();
-    const std::string axis_suffix = m.info->figure->axis->suffix;
-    const bool whole_axis = axis_suffix == "1" || axis_suffix == "level";
     for (std::size_t i = 0; i < m.values.size(); ++i) {
-      points.push_back({JsonOf(m.axis[i], whole_axis ? Number::kWhole : Number::kReal),
-                        JsonOf(m.values[i], m.info->figure->number)});
+      points.push_back({AxisJson(m, i), JsonOf(m.values[i], m.info->figure->number)});
     }
     Json dimension = JsonOf(*m.info->figure->axis);
     dimension["description"] = "";
@@ -90,8 +121,8 @@ Json JsonOf(const Reading& m, const DecisionRule& rule) {
   if (!m.uncertainties.empty()) json["uncertainty"] = JsonOfUncertainty(m);
   json["units"] = JsonOf(m.info->figure->unit);
   json["method"] = m.info->figure->method.name;
-  if (const Json limits = JsonOf(m.limit); !limits.empty()) json["limits"] = limits;
-  if (m.decision) json["decision"] = JsonOf(*m.decision, rule, !m.uncertainties.empty());
+  if (const Json limits = JsonOf(m.limit, *m.info->figure); !limits.empty()) json["limits"] = limits;
+  if (m.decision) json["decision"] = JsonOfDecision(m, rule);
   json["docstring"] = Explanation(*m.info->figure);
   return json;
 }
@@ -135,17 +166,13 @@ Json JsonOf(const Limits& limits) {
   Json json = {{"name", limits.name}, {"revision", limits.revision}};
   if (!limits.given() && limits.accept_doubts.empty()) return json;
   Json content = {{"limits", Json::object()}, {"accept_doubts", limits.accept_doubts}};
-  for (const auto& [name, limit] : limits.by_name) content["limits"][name] = JsonOf(limit);
+  for (const auto& [name, limit] : limits.by_name) content["limits"][name] = JsonOf(limit, *FindFigure(name)->figure);
   json["sha256"] = HexDigest(content.dump(), "SHA256");
   return json;
 }
 
 bool Holds(const std::vector<Remark>& remarks, Remark::Weight weight) {
   return std::any_of(remarks.begin(), remarks.end(), [=](const Remark& remark) { return remark.weight == weight; });
-}
-
-bool Within(double value, const std::optional<double>& min, const std::optional<double>& max) {
-  return std::isfinite(value) && !(min && value < *min) && !(max && value > *max);
 }
 
 }  // namespace
@@ -195,45 +222,6 @@ void Reading::Trust(std::vector<Uncertainty> known) {
   const auto finite = [](const Uncertainty& u) { return std::isfinite(u.standard) && std::isfinite(u.expanded); };
   if (known.size() == values.size() && std::all_of(known.begin(), known.end(), finite))
     uncertainties = std::move(known);
-}
-
-void Reading::Judge(const DecisionRule& rule) {
-  const Uncertainty u = uncertainty();
-  decision = Decide(value(), u.standard, u.expanded, {limit.min, limit.max}, rule);
-  outcome = decision->pass ? Outcome::kPass : Outcome::kFail;
-  const bool bounded = limit.marginal_min || limit.marginal_max;
-  marginal =
-      bounded ? decision->pass && !Within(value(), limit.marginal_min, limit.marginal_max) : decision->near_limit;
-}
-
-void Record::Judge() {
-  for (Remark& remark : remarks) {
-    if (remark.weight == Remark::kDoubt && limits.accept_doubts.count(remark.name) != 0)
-      remark.weight = Remark::kAccepted;
-  }
-  for (const auto& [name, limit] : limits.by_name) {  // what was asked of this test and not measured is shown as such
-    const FigureInfo* const info = FindFigure(name);
-    if (info->measurement != phase.name || phase.Find(info->figure->name) != nullptr) continue;
-    Reading unset;
-    unset.info = info;
-    unset.limit = limit;
-    unset.outcome = Outcome::kUnset;
-    phase.readings.push_back(unset);
-  }
-  for (Reading& m : phase.readings) {
-    const auto limit = limits.by_name.find(m.info->name);
-    if (limit == limits.by_name.end() || m.outcome == Outcome::kUnset) continue;
-    m.limit = limit->second;
-    if (limits.rule.kind != DecisionRule::Kind::kSimple && m.uncertainties.empty() &&
-        m.info->figure->number == Number::kReal && std::isfinite(m.value())) {
-      Say(Remark::kNoJudgement, "no_uncertainty",
-          Format("%s: the limits ask for the rule \"%s\", and how far this figure may be trusted is not known%s",
-                 m.info->name.c_str(), limits.rule.Name(),
-                 request.parameters.contains("uncertainty") ? "; give --uncertainty" : ""),
-          m.info->figure->name);
-    }
-    m.Judge(limits.rule);
-  }
 }
 
 bool Record::measured() const { return phase.code == QV_SUCCESS && !Holds(remarks, Remark::kNoJudgement); }

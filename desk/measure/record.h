@@ -30,6 +30,13 @@ inline constexpr const char kRecordSchema[] = "qvtester-record-1";
 enum class Outcome { kPass, kFail, kMeasured, kError, kUnset };
 const char* Name(Outcome outcome);
 
+/// An entry of a list against its limit.
+struct EntryVerdict {
+  std::size_t place = 0;  // among the list's values
+  Decision decision;
+  bool marginal = false;
+};
+
 /// A figure's value.
 struct Reading {
   const FigureInfo* info = nullptr;
@@ -37,8 +44,9 @@ struct Reading {
   std::vector<double> axis;                // of a list: frequencies in units of Nyquist, or columns
   std::vector<double> repeats;             // of several photos of one unit: what a single value is the median of
   std::vector<Uncertainty> uncertainties;  // one, or one for each value; none where nothing is known
-  std::optional<Decision> decision;        // how the verdict came about, where a limit is set
-  Limit limit;
+  std::optional<Decision> decision;        // how the verdict came about, where a limit is set; of a list, the worst
+  std::vector<EntryVerdict> entries;       // of a list: those that have a limit, in their order
+  FigureLimit limit;
   Outcome outcome = Outcome::kMeasured;
   bool marginal = false;
 
@@ -48,8 +56,11 @@ struct Reading {
   Uncertainty uncertainty() const { return uncertainties.size() == 1 ? uncertainties[0] : Uncertainty(); }
   /// Keeps them where they say something: all must be numbers.
   void Trust(std::vector<Uncertainty> known);
-  /// Holds the value against its limit.
+  /// Holds the value, or each that has one, against its limit. A list that lacks an entry with a limit is UNSET.
   void Judge(const DecisionRule& rule);
+
+ private:
+  void JudgeEntries(const DecisionRule& rule);
 };
 
 struct Attachment {

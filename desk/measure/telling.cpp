@@ -8,6 +8,17 @@
 
 namespace qv {
 
+namespace {
+
+std::string BoundsWords(const Limit& limit) {
+  std::string text;
+  if (limit.min) text += Format("at least %g", *limit.min);
+  if (limit.max) text += Format("%sat most %g", text.empty() ? "" : ", ", *limit.max);
+  return text;
+}
+
+}  // namespace
+
 double FitScale(const cv::Mat& photo, double side) { return std::min(1.0, side / std::max(photo.cols, photo.rows)); }
 
 bool ShowsPhoto(int code) {
@@ -30,11 +41,21 @@ std::string FrequencyText(const Reading& m, int photo_height, double pixel_pitch
   return text;
 }
 
+std::string LimitWords(const Reading& m) {
+  std::string text = BoundsWords(m.limit);
+  const Unit* const axis = m.info->figure->axis;
+  if (axis == nullptr) return text;
+  if (!text.empty()) text = "each " + text;
+  for (const auto& [number, own] : m.limit.by_number) {
+    text += (text.empty() ? "" : ", ") + Format("%s %d %s", axis->name, number, BoundsWords(own).c_str());
+  }
+  return text;
+}
+
 std::string LimitText(const Reading& m) {
   if (!m.limit.given()) return "";
-  std::string text = "  (";
-  if (m.limit.min) text += Format("at least %g, ", *m.limit.min);
-  if (m.limit.max) text += Format("at most %g, ", *m.limit.max);
+  const std::string bounds = LimitWords(m);
+  std::string text = "  (" + bounds + (bounds.empty() ? "" : ", ");
   text += Name(m.outcome) + std::string(m.marginal ? ", marginal" : "");
   const bool unsure = m.decision && m.decision->near_limit && !m.uncertainties.empty();
   return text + (unsure ? Format(", wrong with a probability of %.0f %%)", 100 * m.decision->wrong_probability) : ")");

@@ -25,6 +25,9 @@ std::string ValueText(const Reading& m, int decimals);
 /// "0.3124 Nyquist  0.1562 c/p  937 LW/PH", and lp/mm when the pixel pitch is known (not 0).
 std::string FrequencyText(const Reading& m, int photo_height, double pixel_pitch_um);
 
+/// "at least 0.38, at most 0.6"; of a list "each at most 3, patch 7 at most 2".
+std::string LimitWords(const Reading& m);
+
 /// "  (at least 0.38, at most 0.6, FAIL)" for a figure with a limit, nothing for one without.
 std::string LimitText(const Reading& m);
 

@@ -6,6 +6,9 @@
 #include <sstream>
 #include <unordered_map>
 
+#include "desk/measure/figures.h"
+#include "desk/results/list_verdicts.h"
+
 namespace qv {
 
 namespace {
@@ -35,7 +38,7 @@ class Judge {
   const char* Of(const FigureRow& figure) const {
     const auto at = static_cast<std::size_t>(figure.quantity);
     const Bounds* const bounds = at < bounds_.size() ? bounds_[at] : nullptr;
-    if (bounds == nullptr) return figure.measured ? "MEASURED" : "UNSET";
+    if (bounds == nullptr) return figure.measured || figure.outcome != "UNSET" ? "MEASURED" : "UNSET";  // lists too
     return figure.measured ? VerdictOf(figure.value, *bounds) : "UNSET";
   }
   bool Limits(std::int64_t quantity) const {
@@ -46,9 +49,13 @@ class Judge {
   const std::vector<std::string>& Asked(const std::string& measurement) {
     const auto [asked, made] = asked_.try_emplace(measurement);
     if (!made) return asked->second;
-    for (const auto& [name, bounds] : limits_.by_name) {
-      if (name.rfind(measurement + "_", 0) == 0) asked->second.push_back(name);
-    }
+    const auto ask = [&, &list = asked->second](const std::string& name) {
+      const FigureInfo* const info = FindFigure(name);  // camera_capture's do not begin camera_capture_front's
+      if (info != nullptr ? info->measurement == measurement : name.rfind(measurement + "_", 0) == 0)
+        list.push_back(name);
+    };
+    for (const auto& [name, bounds] : limits_.by_name) ask(name);
+    for (const auto& [name, bounds] : limits_.lists) ask(name);
     return asked->second;
   }
   bool Accepts(const std::string& doubts) const {
@@ -67,7 +74,8 @@ class Judge {
 
 struct RunFigures {
   const RunRow* row;
-  std::vector<FigureRow> figures;
+  std::vector<FigureRow> figures;  // single values
+  const std::vector<ListVerdict>* lists;
 };
 
 // A run's verdict, figure by figure, and of those that a limit asks for in vain.
@@ -77,33 +85,33 @@ struct RunVerdict {
   std::vector<std::string> missing;
 };
 
-RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::string>& names) {
+bool Has(const RunFigures& run, const std::string& name, const std::vector<std::string>& names) {
+  return std::any_of(
+             run.figures.begin(), run.figures.end(),
+             [&](const FigureRow& figure) { return names[static_cast<std::size_t>(figure.quantity)] == name; }) ||
+         std::any_of(run.lists->begin(), run.lists->end(), [&](const ListVerdict& list) { return list.name == name; });
+}
+
+RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::string>& names,
+                   std::string ListVerdict::*of_lists) {
   RunVerdict verdict;
-  int passed = 0;
-  bool failed = false;
-  bool unset = false;
+  Tally tally;
   for (const FigureRow& figure : run.figures) {
     const char* const outcome = judge.Of(figure);
     verdict.figures.push_back(outcome);
-    if (!judge.Limits(figure.quantity)) continue;
-    passed += *outcome == 'P' ? 1 : 0;
-    failed = failed || *outcome == 'F';
-    unset = unset || *outcome == 'U';
+    if (judge.Limits(figure.quantity)) tally.Add(outcome);
   }
-  const std::vector<std::string>& asked = judge.Asked(run.row->measurement);
-  for (const std::string& name : asked) {
-    const bool there = std::any_of(run.figures.begin(), run.figures.end(), [&](const FigureRow& figure) {
-      return names[static_cast<std::size_t>(figure.quantity)] == name;
-    });
-    if (!there) verdict.missing.push_back(name);
+  for (const ListVerdict& list : *run.lists) tally.Add(list.*of_lists);
+  for (const std::string& name : judge.Asked(run.row->measurement)) {
+    if (!Has(run, name, names)) verdict.missing.push_back(name);
   }
   const bool doubted = !judge.Accepts(run.row->doubts);
-  const bool measured = run.row->result_code == 1;
-  verdict.outcome = run.row->outcome == "ABORTED"                               ? "ABORTED"
-                    : !measured || doubted || unset || !verdict.missing.empty() ? "ERROR"
-                    : failed                                                    ? "FAIL"
-                    : passed > 0                                                ? "PASS"
-                                                                                : "MEASURED";
+  const bool whole = run.row->result_code == 1 && verdict.missing.empty() && tally.of("UNSET") == 0;
+  verdict.outcome = run.row->outcome == "ABORTED" ? "ABORTED"
+                    : !whole || doubted           ? "ERROR"
+                    : tally.of("FAIL") > 0        ? "FAIL"
+                    : tally.of("PASS") > 0        ? "PASS"
+                                                  : "MEASURED";
   return verdict;
 }
 
@@ -153,8 +161,10 @@ namespace {
 // Holds what grows while runs are judged.
 class Session {
  public:
-  Session(Store& store, const ArchiveLimits& now, const ArchiveLimits* against)
-      : quantities_(store.Quantities()), now_(now, quantities_) {
+  Session(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against)
+      : quantities_(store.Quantities()),
+        now_(now, quantities_),
+        lists_(VerdictsOnLists(store, selection, now, against)) {
     if (against != nullptr) before_.emplace(*against, quantities_);
     for (const Quantity& quantity : quantities_) {
       names_.resize(std::max(names_.size(), static_cast<std::size_t>(quantity.id) + 1));
@@ -165,12 +175,21 @@ class Session {
     for (const auto& [name, bounds] : now.by_name) {
       if (std::find(names_.begin(), names_.end(), name) == names_.end()) result.idle_limits.push_back(name);
     }
+    std::set<std::string> listed;
+    for (const auto& [run, lists] : lists_) {
+      for (const ListVerdict& list : lists) listed.insert(list.name);
+    }
+    for (const auto& [name, bounds] : now.lists) {
+      if (listed.count(name) == 0) result.idle_limits.push_back(name);
+    }
   }
 
-  void Take(const RunFigures& run) {
+  void Take(RunFigures& run) {
+    TakeLists(run);
     const RunRow& row = *run.row;
-    const RunVerdict after = Verdict(now_, run, names_);
-    const RunVerdict before = before_ ? Verdict(*before_, run, names_) : RunVerdict{row.outcome, {}, {}};
+    const RunVerdict after = Verdict(now_, run, names_, &ListVerdict::after);
+    const RunVerdict before =
+        before_ ? Verdict(*before_, run, names_, &ListVerdict::before) : RunVerdict{row.outcome, {}, {}};
     for (std::size_t i = 0; i < run.figures.size(); ++i) {
       const FigureRow& figure = run.figures[i];
       const auto quantity = static_cast<std::size_t>(figure.quantity);
@@ -179,7 +198,7 @@ class Session {
         continue;
       }
       const std::string was = before_ ? before.figures[i] : figure.outcome;
-      Count(row, quantity, names_[quantity], was, after.figures[i]);
+      Count(row, quantity, was, after.figures[i]);
       Changed(row, names_[quantity], figure.measured ? figure.value : kNone, was, after.figures[i]);
     }
     for (const std::string& name : after.missing) {
@@ -205,10 +224,34 @@ class Session {
  private:
   static constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
 
-  void Count(const RunRow& row, std::size_t quantity, const std::string& name, const std::string& was,
-             const std::string& is) {
+  // Judged lists leave the rows, where they have no value.
+  void TakeLists(RunFigures& run) {
+    static const std::vector<ListVerdict> none;
+    const auto found = lists_.find(run.row->id);
+    run.lists = found == lists_.end() ? &none : &found->second;
+    for (const ListVerdict& list : *run.lists) {
+      const auto own = [&](const FigureRow& row) {
+        return names_[static_cast<std::size_t>(row.quantity)] == list.name;
+      };
+      run.figures.erase(std::remove_if(run.figures.begin(), run.figures.end(), own), run.figures.end());
+      Count(*run.row, QuantityOf(list), list.before, list.after);
+      Changed(*run.row, list.name, kNone, list.before, list.after);
+    }
+  }
+
+  // A list that was never judged before is none of the store's quantities.
+  std::size_t QuantityOf(const ListVerdict& list) {
+    const auto found = std::find(names_.begin(), names_.end(), list.name);
+    const auto at = static_cast<std::size_t>(found - names_.begin());
+    if (found != names_.end()) return at;
+    names_.push_back(list.name);
+    units_.push_back(list.unit);
+    return at;
+  }
+
+  void Count(const RunRow& row, std::size_t quantity, const std::string& was, const std::string& is) {
     JudgedFigure& figure = figures_[{row.step, quantity}];
-    if (figure.name.empty()) figure = {row.step, name, units_[quantity], {}, {}};
+    if (figure.name.empty()) figure = {row.step, names_[quantity], units_[quantity], {}, {}};
     figure.before.Add(was);
     figure.after.Add(is);
   }
@@ -220,7 +263,8 @@ class Session {
   std::vector<Quantity> quantities_;
   Judge now_;
   std::optional<Judge> before_;
-  std::vector<std::string> names_, units_;  // by quantity
+  std::map<std::int64_t, std::vector<ListVerdict>> lists_;  // by run
+  std::vector<std::string> names_, units_;                  // by quantity
   std::map<std::pair<std::string, std::size_t>, JudgedFigure> figures_;
   UnitVerdicts units_before_, units_after_;
 };
@@ -228,14 +272,14 @@ class Session {
 }  // namespace
 
 Judgement JudgeAgain(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against) {
-  Session session(store, now, against);
-  if (session.result.idle_limits.size() == now.by_name.size()) {
+  Session session(store, selection, now, against);
+  if (session.result.idle_limits.size() == now.by_name.size() + now.lists.size()) {
     throw Failure(kWrongUsage, store.name() + ": no run measures anything that these limits hold for");
   }
   std::vector<RunRow> rows;
   store.EachRow(selection, [&](const RunRow& row) { rows.push_back(row); });
   std::size_t next = 0;
-  RunFigures run = {nullptr, {}};
+  RunFigures run = {nullptr, {}, nullptr};
   const auto take_before = [&](std::int64_t id) {
     for (; next < rows.size() && rows[next].id < id; ++next) {
       run.row = &rows[next];

@@ -13,14 +13,23 @@
 
 namespace qv {
 
+/// Of a list: what each entry must keep to, but for those with bounds of their own.
+struct ListBounds {
+  Bounds each;
+  std::map<int, Bounds> by_number;
+};
+
 /// Limits as an archive is judged by them: bounds by the figures' names, and the doubts that are accepted.
 struct ArchiveLimits {
   std::map<std::string, Bounds> by_name;
   std::set<std::string> accepted_doubts;
+  std::map<std::string, ListBounds> lists = {};
 };
 
 /// "PASS" or "FAIL"; what is not finite fails.
 const char* VerdictOf(double value, const Bounds& bounds);
+/// The same of a list, [number, value] each; UNSET where it lacks an entry that has bounds of its own, or is none.
+const char* VerdictOf(const Json& points, const ListBounds& bounds);
 
 /// How many of each.
 struct Tally {
