@@ -5,10 +5,9 @@
 #include <cstdlib>
 #include <map>
 #include <memory>
-#include <random>
 
 #include "qvtester/tester.h"
-#include "unit_tests/plain/colour.h"
+#include "unit_tests/agreement_test.h"
 
 namespace {
 
@@ -86,40 +85,9 @@ TEST(Colour, TemperaturesAreExactToTheLastBit) {
   for (const auto& [xyz, kelvin] : lights) EXPECT_EQ(kelvin, Temperature(xyz));
 }
 
-// Bit for bit; which NaN comes of two is the compiler's choice.
-void ExpectSame(const std::vector<float>& expected, const float* got, unsigned seed) {
-  for (std::size_t i = 0; i < expected.size(); ++i) {
-    if (std::isnan(expected[i]) && std::isnan(got[i])) continue;
-    ASSERT_TRUE(expected[i] == got[i] && std::signbit(expected[i]) == std::signbit(got[i]))
-        << "seed " << seed << ", value " << i << ": " << expected[i] << ", " << got[i];
-  }
-}
-
 TEST(Colour, WholeBuffersAreAsTheirPixels) {
+  ExpectAgreement(plain::Colours, 600, 0.1);
   QVTester tester;
-  for (unsigned seed = 0; seed < 600; ++seed) {
-    std::mt19937 random(seed);
-    const bool negative = seed % 4 == 0;  // all of them, so that quotients are as of a picture
-    std::uniform_real_distribution<float> any(negative ? -1.0f : -0.1f, negative ? -0.1f : 1.0f);
-    const int rows = 1 + static_cast<int>(random() % 20);
-    const int cols = static_cast<int>(random() % 40);
-    const std::size_t pixels = static_cast<std::size_t>(rows) * cols;
-    std::vector<float> triples(3 * pixels, random() % 2 == 0 ? 0.0f : -0.0f);  // black, and then some are not
-    const std::size_t first = random() % (3 * pixels + 1);
-    for (std::size_t i = first; i < triples.size(); ++i) triples[i] = any(random);
-    const float odd[] = {0.0f, -0.0f, 1e-45f, 1e38f, -1e38f, INFINITY, NAN};
-    for (unsigned n = random() % 8; n > 0 && pixels > 0; --n) {
-      triples[random() % triples.size()] = odd[random() % std::size(odd)];
-    }
-    for (float& value : tester.prop_color_matrix_) value = any(random);
-
-    std::vector<float> xyz(3 * pixels);
-    plain::rgb2xyz(tester.prop_color_matrix_, triples.data(), pixels, xyz.data());
-    ExpectSame(xyz, Buffer(tester.rgb2xyz(triples.data(), rows, cols), &std::free).get(), seed);
-    std::vector<float> cct(pixels);
-    plain::xyz2cct(triples.data(), pixels, cct.data());
-    ExpectSame(cct, Buffer(tester.xyz2cct(triples.data(), rows, cols), &std::free).get(), seed);
-  }
   float pixel[3] = {};
   EXPECT_EQ(nullptr, tester.rgb2xyz(pixel, 1 << 30, 1 << 30)) << "no memory for such a one";
   EXPECT_EQ(nullptr, tester.xyz2cct(pixel, 1 << 30, 1 << 30));

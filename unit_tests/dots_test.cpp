@@ -5,9 +5,7 @@
 #include <cstdlib>
 
 #include "qvtester/tester.h"
-#include "unit_tests/log_lines.h"
-#include "unit_tests/plain/error_areas.h"
-#include "unit_tests/plain/hdr_dots.h"
+#include "unit_tests/agreement_test.h"
 
 namespace {
 
@@ -60,39 +58,7 @@ TEST(Dots, SmallPicturesAreLoggedAndLeftAlone) {
   EXPECT_THAT(Capture(5, 5, 4).Flagged(0, -1), IsEmpty());
 }
 
-TEST(Dots, AreThoseOfTheWholeTable) {
-  const LogLines log;
-  // From the smallest to the largest, so that every guard of the undivided test is met.
-  constexpr float kLevels[] = {0, 1e-45f, 1e-38f, 3e-37f, 1e-6f, 1, 100, 1e6f, 1e30f, 3e38f};
-  constexpr float kOdd[] = {0, -0.0f, NAN, INFINITY, -INFINITY, 3e38f, -3e38f, 1e-45f, -1};
-  constexpr float kThresholds[] = {0, -1, 1e-7f, 1.1e-6f, 0.01f, 0.1f, 0.5f, 1, 3, 10, 1e38f, NAN, INFINITY};
-  cv::RNG random(1);
-  std::size_t flagged = 0;
-  std::size_t pixels = 0;
-  for (int round = 0; round < 4000; ++round) {
-    const int radius = random.uniform(0, 7);
-    const int height = 2 * radius + random.uniform(1, 25);
-    const int width = 2 * radius + random.uniform(1, 151);
-    Capture capture(height, width, kLevels[random.uniform(0, 10)]);
-    const float spread = std::ldexp(1.0f, -random.uniform(0, 24));
-    for (int i = 0; i < height * width; ++i) capture.data[3 * i] *= 1 + spread * random.uniform(0.0f, 1.0f);
-    const float other = random.uniform(0, 2) == 0 ? kLevels[random.uniform(0, 10)] : kOdd[random.uniform(0, 9)];
-    for (int n = random.uniform(0, 4); n > 0; --n) {
-      const int row = random.uniform(0, height);
-      capture.at(row, random.uniform(0, width)) = other;
-    }
-    const float threshold = random.uniform(0, 2) == 0 ? spread : kThresholds[random.uniform(0, 13)];
-    std::vector<unsigned char> expected(capture.data.size() / 3, 7);  // what is not flagged is not written
-    std::vector<unsigned char> mask = expected;
-    plain::DetectDot(capture.data.data(), height, width, threshold, radius, expected.data());
-    QVTester().DetectDot(capture.data.data(), height, width, threshold, radius, mask.data());
-    ASSERT_EQ(expected, mask) << "round " << round;
-    flagged += std::count(mask.begin(), mask.end(), 1);
-    pixels += mask.size();
-  }
-  EXPECT_GT(flagged, pixels / 20) << "or the two would agree on nothing";
-  EXPECT_LT(flagged, pixels / 2);
-}
+TEST(Dots, AreThoseOfTheWholeTable) { ExpectAgreement(plain::Dots, 4000, 0.05, 0.5); }
 
 // At the dot's departure to the last bit, where the undivided test alone would be a few roundings off.
 TEST(Dots, AreExactAtTheThreshold) {
@@ -159,24 +125,6 @@ TEST(Areas, CountsAreOptionalAndOneAreaIsLeftAsItIs) {
   EXPECT_EQ(0, QVTester().ErrorAreaClustering(8, 10, 10, &areas, nullptr, nullptr, nullptr));
 }
 
-TEST(Areas, ChangedAreasAreAllThatNeedsASecondLook) {
-  cv::RNG any(4);
-  int lists_merged = 0;
-  for (int list = 0; list < 400; ++list) {
-    std::vector<ErrorArea> areas;
-    const int distance = any.uniform(0, 13);
-    const int width = any.uniform(2, 301);
-    const int height = any.uniform(2, 201);
-    for (int n = any.uniform(2, 151); n > 0; --n) {
-      const cv::Point at{any.uniform(0, width), any.uniform(0, height)};
-      const cv::Point size{any.uniform(0, 9), any.uniform(0, 40) == 0 ? 59 : any.uniform(0, 9)};
-      areas.push_back({at, at + size, any.uniform(0, 10), 0});
-    }
-    const auto merged = plain::ClusterByTester(distance, width, height, areas);
-    ASSERT_EQ(plain::ErrorAreaClustering(distance, width, height, areas), merged) << "list " << list;
-    lists_merged += merged.size() < areas.size() ? 1 : 0;
-  }
-  EXPECT_GT(lists_merged, 200) << "most lists have something to merge";
-}
+TEST(Areas, ChangedAreasAreAllThatNeedsASecondLook) { ExpectAgreement(plain::Areas, 400, 0.1); }
 
 }  // namespace

@@ -4,10 +4,8 @@
 
 #include <opencv2/imgproc.hpp>
 
-#include "chart/chart_rows.h"
-#include "chart/find_chart.h"
 #include "tests/video/film.h"
-#include "unit_tests/drawing.h"
+#include "unit_tests/agreement_test.h"
 
 namespace {
 
@@ -49,37 +47,8 @@ TEST(FilmTime, StampsBecomeTimes) {
   }
 }
 
-// Marks and blots anywhere, also cut and overlapping, in colours around the threshold.
-cv::Mat RandomPhoto(cv::RNG& any) {
-  cv::Mat photo(any.uniform(1, 200), any.uniform(1, 240), any.uniform(0, 4) == 0 ? CV_8UC4 : CV_8UC3);
-  cv::randu(photo, 150, 256);
-  for (int k = any.uniform(0, 5); k > 0; --k) {
-    const int module = any.uniform(2, 7);
-    const cv::Point at(any.uniform(-9, photo.cols), any.uniform(-9, photo.rows));
-    for (const int side : {7, 5, 3}) {
-      const cv::Rect square(at + cv::Point(7 - side, 7 - side) * module / 2, cv::Size(side, side) * module);
-      cv::Mat part = photo(square & cv::Rect({}, photo.size()));
-      if (!part.empty()) cv::randu(part, side == 5 ? 150 : 0, side == 5 ? 256 : 100);
-    }
-  }
-  return photo;
-}
-
 TEST(ChartRows, FindWhatTheWholePictureShows) {
-  cv::RNG any(7);
-  std::size_t found = 0;
-  for (int i = 0; i < 3000 && !HasFailure(); ++i) {
-    const cv::Mat photo = RandomPhoto(any);
-    const int threshold = std::array{125, 125, 125, -1, 0, 254, 255, 400}[static_cast<std::size_t>(i % 8)];
-    QVTester whole;
-    QVTester rows;
-    rows.kept_->binary = cv::Mat(200, 240, CV_8UC1, cv::Scalar(i % 2 == 0 ? 0 : 255));  // what the frame before left
-    const auto expected = whole.GetFinderPoints(Binarise(whole, photo, threshold, nullptr));
-    ASSERT_EQ(expected, FindMarks(rows, photo, threshold)) << i;
-    ASSERT_EQ(whole.possibleCenters.size(), rows.possibleCenters.size()) << i;
-    found += expected.size();
-  }
-  EXPECT_GT(found, 600U) << "too few marks to tell anything";
+  ExpectAgreement(plain::ScanOfRowsAndOfThePicture, 6000, 0.05);
   QVTester tester;
   EXPECT_THROW(FindMarks(tester, cv::Mat(40, 40, CV_16UC3), 125), cv::Exception);
   EXPECT_EQ(nullptr, tester.kept_->rows);

@@ -4,9 +4,9 @@
 #include <opencv2/imgproc.hpp>
 
 #include "qvtester/tester.h"
+#include "unit_tests/agreement_test.h"
 #include "unit_tests/drawing.h"
 #include "unit_tests/log_lines.h"
-#include "unit_tests/plain/finder.h"
 
 namespace {
 
@@ -145,73 +145,7 @@ TEST(FinderPoints, FewerThanThreeAreHandedOutAndLogged) {
   }
 }
 
-// What a search leaves; the cross checks' counts tell of its last call, also of one that failed.
-std::vector<float> Traces(const QVTester& tester) {
-  std::vector<float> traces(tester.crossCheckStateCount, tester.crossCheckStateCount + 5);
-  traces.push_back(static_cast<float>(tester.startSize));
-  traces.push_back(tester.hasSkipped ? 1 : 0);
-  for (const QVFinderPattern& c : tester.possibleCenters) {
-    traces.insert(traces.end(), {c.x, c.y, c.estimatedModuleSize, c.average, static_cast<float>(c.count)});
-  }
-  return traces;
-}
-
-// Marks, some cut by the border, on paper with specks of any density and grain or among the blocks of a two-dimensional
-// code; widths around and below a block of 64 pixels.
-cv::Mat Marks(cv::RNG& random) {
-  const int module = random.uniform(1, 9);
-  const int dark = std::array<int, 4>{0, 2, 50, random.uniform(0, 101)}[random.uniform(0, 4)];
-  const int grain = dark == 50 ? module : random.uniform(1, 4);
-  const int width = random.uniform(0, 3) == 0 ? 64 * random.uniform(1, 4) : random.uniform(1, 31) * module;
-  cv::Mat image(random.uniform(1, 31) * module / grain + 1, width / grain + 1, CV_8UC1);
-  random.fill(image, cv::RNG::UNIFORM, 0, 100);
-  cv::resize(image >= dark, image, {}, grain, grain, cv::INTER_NEAREST);
-  const int margin = 7 * (module + 1);
-  cv::Mat canvas;
-  cv::copyMakeBorder(image, canvas, margin, margin, margin, margin, cv::BORDER_CONSTANT);
-  for (int marks = random.uniform(0, 7); marks > 0; --marks) {
-    const int row = random.uniform(margin / 2, image.rows + margin / 2);
-    const int column = random.uniform(margin / 2, image.cols + margin / 2);
-    DrawMark(canvas, row, column, std::max(1, module + random.uniform(-1, 2)));
-  }
-  return canvas({margin, margin, std::min(width, image.cols), image.rows}).clone();
-}
-
-// One sampled row of runs near the limits of the ratio.
-cv::Mat Limits(cv::RNG& random) {
-  std::vector<uchar> row(random.uniform(0, 4), 255);
-  const int total = random.uniform(7, 91);
-  for (int run = 0; run < 18; ++run) {
-    const int modules = run % 6 == 2 ? 3 : 1;
-    const int ideal = modules * total * random.uniform(1, 4) / 14;
-    row.insert(row.end(), std::max(0, ideal + random.uniform(-1, 2)), row.empty() || row.back() != 0 ? 0 : 255);
-  }
-  return cv::repeat(cv::Mat(row).reshape(1, 1), 3, 1);
-}
-
-// In a wider picture of other pixels, and with any value but 0 for light.
-cv::Mat Disguised(cv::RNG& random, const cv::Mat& image) {
-  cv::Mat around = cv::Mat::zeros(image.rows + 3, image.cols + random.uniform(1, 71), CV_8UC1);
-  cv::Mat view = around({{random.uniform(0, around.cols - image.cols + 1), 2}, image.size()});
-  random.fill(view, cv::RNG::UNIFORM, 1, 256);
-  view &= image;
-  return view;
-}
-
-TEST(FinderPoints, TheScanByRunsEqualsTheScanByPixels) {
-  const LogLines log;
-  cv::RNG random(1);
-  for (int round = 0; round < 1500; ++round) {
-    for (const cv::Mat& image : {Marks(random), Marks(random), Limits(random)}) {
-      for (const cv::Mat& picture : {image, Disguised(random, image)}) {
-        QVTester plain;
-        QVTester fast;
-        ASSERT_EQ(plain::GetFinderPoints(plain, picture), fast.GetFinderPoints(picture)) << "round " << round;
-        ASSERT_EQ(Traces(plain), Traces(fast)) << "round " << round;
-      }
-    }
-  }
-}
+TEST(FinderPoints, TheScanByRunsEqualsTheScanByPixels) { ExpectAgreement(plain::ScanOfRunsAndOfPixels, 8000, 0.1); }
 
 TEST(FinderSelection, ThePatternIsConfirmedBySizes) {
   QVTester tester;

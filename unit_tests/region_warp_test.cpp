@@ -4,6 +4,8 @@
 
 #include <opencv2/imgproc.hpp>
 
+#include "unit_tests/agreement_test.h"
+
 namespace {
 
 // Holds regions of a picture, turned about the middle of its square canvas, against the whole warp's.
@@ -23,15 +25,17 @@ void ExpectPartsOfTheWhole(const cv::Mat& image, double degrees, const std::vect
 
 // Should this fail on a later OpenCV, or on another processor, cv::warpAffine forms its places differently there: then
 // WarpRegion has to do the same, or to cut its region from the whole.
+TEST(RegionWarp, EveryPixelIsThatOfTheWholeWarp) { ExpectAgreement(plain::Warp, 2000); }
+
 TEST(RegionWarp, EveryPixelIsThatOfTheWholeWarpAtAllDegrees) {
-  cv::RNG any(1);
+  SeededDraws any(1);
   for (const cv::Size& size : {cv::Size(320, 240), cv::Size(167, 251), cv::Size(500, 31), cv::Size(5, 3)}) {
     const int side = std::max(size.width, size.height);
     for (int degrees = 0; degrees < 360 && !HasFailure(); ++degrees) {
       cv::Mat image(size, degrees % 3 == 0 ? CV_8UC3 : CV_8UC1);
       cv::randu(image, 0, 256);
-      const cv::Point at{any.uniform(0, side), any.uniform(0, side)};
-      const cv::Size part{any.uniform(1, side - at.x + 1), any.uniform(1, side - at.y + 1)};
+      const cv::Point at{any.Whole(0, side - 1), any.Whole(0, side - 1)};
+      const cv::Size part{any.Whole(1, side - at.x), any.Whole(1, side - at.y)};
       ExpectPartsOfTheWhole(image, degrees,
                             {{0, 0, side, side},
                              {at, part},

@@ -7,8 +7,8 @@
 
 #include "desk/simulation/method_law.h"
 #include "qvtester/tester.h"
+#include "unit_tests/agreement_test.h"
 #include "unit_tests/drawing.h"
-#include "unit_tests/plain/sfr.h"
 
 namespace {
 
@@ -168,55 +168,11 @@ TEST(SfrSteps, Mtf50LiesOnTheLineThroughTheTwoNearest) {
   EXPECT_FLOAT_EQ(0.5f, of({1, 1, 1, 0.875f, 0.75f})) << "with all above, distances count without their sign";
 }
 
-void ExpectPlainOutcome(const cv::Mat& region, int round) {
-  QVTester tester;
-  EXPECT_EQ(plain::Outcome([&](auto&... out) { plain::CalculateSFR(tester, region, out...); }),
-            plain::Outcome([&](auto&... out) { tester.CalculateSFR(region, out...); }))
-      << "round " << round << " " << region.size;
-}
-
-// Blurred edges of any slant, direction and polarity, noise, stripes and plain grey; part of a larger matrix.
-cv::Mat RandomRegion(cv::RNG& random) {
-  const bool large = random.uniform(0, 10) == 0;
-  const int rows = random.uniform(1, large ? 400 : 60);
-  const int cols = random.uniform(1, large ? 180 : 60);
-  cv::Mat_<float> region(rows, cols);
-  random.fill(region, cv::RNG::NORMAL, 0, random.uniform(0, 3) == 0 ? 0 : random.uniform(0.0, 60.0));
-  const double slope = random.uniform(0, 4) == 0 ? 0 : random.gaussian(0.2);
-  const double place = region.cols * random.uniform(0.2, 0.8);
-  const double blur = random.uniform(0.1, 6.0);
-  const double level = random.uniform(0.0, 255.0);
-  const int kind = random.uniform(0, 8);
-  const double step = kind == 0 ? 0 : random.uniform(0.0, 255.0) - level;
-  region.forEach([&](float& value, const int* at) {
-    value += static_cast<float>(level + step * std::clamp((at[1] - place - slope * at[0]) / blur + 0.5, 0.0, 1.0));
-  });
-  if (kind == 1) cv::repeat(region.row(0).clone(), region.rows, 1, region);
-  if (random.uniform(0, 2) == 0) region = region.t();
-  cv::copyMakeBorder(region, region, 1, 2, 2, 3, cv::BORDER_CONSTANT, random.uniform(0, 256));
-  return region(cv::Rect(2, 1, region.cols - 5, region.rows - 3));
-}
-
 TEST(SfrForms, AgreeOnAnyRegion) {
-  cv::RNG random(7);
-  const float limits[] = {NAN, INFINITY, -INFINITY, 1e38f, -3e38f, 1e-38f, 1e-45f, -1, 256, 255.5f, 8388609, -0.0f};
-  for (int round = 0; round < 2500 && !HasFailure(); ++round) {
-    cv::Mat region = RandomRegion(random);
-    cv::Mat levels;
-    region.convertTo(levels, round % 7 == 0 ? CV_16U : CV_8U, round % 14 == 0 ? 200 : 1);
-    ExpectPlainOutcome(levels, round);
-    if (round % 3 == 0) {
-      cv::Mat(region * std::pow(10.0, random.uniform(-44.0, 36.0))).copyTo(region);
-    } else {
-      levels.convertTo(region, CV_32F);
-      for (int i = round % 2 == 0 ? round % 3 : 0; i > 0; --i) {
-        const cv::Point at{random.uniform(0, region.cols), random.uniform(0, region.rows)};
-        region.at<float>(at) = limits[random.uniform(0, 12)];
-      }
-    }
-    ExpectPlainOutcome(region, round);
-  }
-  ExpectPlainOutcome({}, -1);
+  ExpectAgreement(plain::Sfr, 4000);
+  QVTester tester;
+  EXPECT_EQ(plain::Outcome([&](auto&... out) { plain::CalculateSFR(tester, {}, out...); }),
+            plain::Outcome([&](auto&... out) { tester.CalculateSFR({}, out...); }));
 }
 
 TEST(SfrForms, AgreeOnBinsOfAnySlope) {
