@@ -14,13 +14,21 @@ namespace {
 // By FFmpeg alone, and under a name that is no protocol and no pattern of file names.
 cv::VideoCapture OpenFilm(const std::string& path) {
   const RegularFile file(path.c_str());
-  const bool film = file.valid() && StartsAsFilm(file.Read(kFilmHead));
   cv::VideoCapture video;
-  if (film && video.open(file.Name(), cv::CAP_FFMPEG)) {
-    video.set(cv::CAP_PROP_ORIENTATION_AUTO, 0);
-  } else {
-    QVDEBUGP("[%s] %s: %s", "SetVideo", path.c_str(), film ? "not a video that can be opened" : "not a video file");
+  const char* refused = nullptr;
+  if (!file.valid() || !StartsAsFilm(file.Read(kFilmHead))) {
+    refused = "not a video file";
+  } else if (!video.open(file.Name(), cv::CAP_FFMPEG)) {
+    refused = "not a video that can be opened";
+  } else if (video.get(cv::CAP_PROP_FRAME_WIDTH) * video.get(cv::CAP_PROP_FRAME_HEIGHT) >
+             static_cast<double>(QVResource::most_pixels_)) {
+    refused = "too many pixels";
   }
+  if (refused != nullptr) {
+    QVDEBUGP("[%s] %s: %s", "SetVideo", path.c_str(), refused);
+    return {};
+  }
+  video.set(cv::CAP_PROP_ORIENTATION_AUTO, 0);
   return video;
 }
 

@@ -41,6 +41,16 @@ std::vector<double> UsableIntervals(const std::vector<double>& stamps) {
   return intervals;
 }
 
+// False for a frame that can't be decoded, or comes in another size than the film's head says and doesn't fit.
+bool Retrieve(cv::VideoCapture& video, cv::Mat& frame) {
+  try {
+    return video.retrieve(frame) && !frame.empty();
+  } catch (const cv::Exception& e) {
+    if (e.code == cv::Error::StsNoMem) throw;
+    return false;
+  }
+}
+
 }  // namespace
 
 double Median(std::vector<double> values) {
@@ -94,7 +104,7 @@ int ReadFilm(QVTester& tester, int slot, const char* test, int most, const std::
     }
     film.bad += failures;  // passed over, so the film went on
     failures = 0;
-    if (!video.retrieve(frame) || frame.empty()) {
+    if (!Retrieve(video, frame)) {
       ++film.bad;
       continue;
     }
