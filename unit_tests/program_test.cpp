@@ -144,7 +144,7 @@ TEST_F(Program, MissesSayWhy) {
   EXPECT_GT(PixelsOf({26, 26, 230}, folder_.Path("seen.png")), 100) << "the candidates are ringed in red";
 
   folder_.Write("small.png", DrawMarks({300, 300}, 2, {{50, 50}, {50, 200}}));
-  ExpectComplaint("circles small.png", 3, "the marks are small (2.0 pixels a module");
+  ExpectComplaint("circles small.png", 3, "marks of 2.0 px a module: at least 3 are needed");
 }
 
 TEST_F(Program, AThresholdIsSuggestedOnceItHasWorked) {

@@ -10,7 +10,6 @@
 #include "desk/base/text.h"
 #include "desk/drawing/picture.h"
 #include "desk/measure/doubts.h"
-#include "desk/measure/histogram.h"
 
 namespace qv {
 
@@ -21,63 +20,8 @@ const Method kScanMethod = {
 
 namespace {
 
-constexpr double kSmallestModulePx = 3;
-constexpr double kLeastContrast = 20;  // grey levels between the two peaks
-
 // The search counts from pixel corners.
 Mark MarkOf(const QVFinderPattern& mark) { return {{mark.x - 0.5, mark.y - 0.5}, mark.estimatedModuleSize}; }
-
-// The commonest level, neighbours counted in, on each side of the level that parts dark from light best (Otsu's).
-struct GreyHistogram {
-  GreyPeaks peaks;
-  int parting;
-};
-
-// Of the photo as the tests weigh it: the first channel is taken for red.
-GreyHistogram LookAtLevels(const cv::Mat& photo) {
-  cv::Mat gray;
-  cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-  cv::Mat light;
-  const int parting = cvRound(cv::threshold(gray, light, 0, 255, cv::THRESH_BINARY | cv::THRESH_OTSU));
-  std::array<double, kGreyLevels> counts = {};
-  for (int i = 0; i < gray.rows; ++i) {
-    const auto* row = gray.ptr<uchar>(i);
-    for (int j = 0; j < gray.cols; ++j) ++counts[row[j]];
-  }
-  const auto commonest = [&](int first, int last) {
-    constexpr int kNeighbours = 4;  // to each side, nearer ones weigh more
-    int best = -1;                  // nothing there
-    double most = 0;
-    for (int level = first; level <= last; ++level) {
-      double sum = 0;
-      for (int k = std::max(first, level - kNeighbours); k <= std::min(last, level + kNeighbours); ++k) {
-        sum += counts[k] * (1 + kNeighbours - std::abs(k - level));
-      }
-      if (sum <= most) continue;
-      most = sum;
-      best = level;
-    }
-    return static_cast<double>(best);
-  };
-  const double dark = commonest(0, parting);
-  const double bright = commonest(std::min(parting + 1, 255), 255);
-  return {{dark < 0 ? bright : dark, bright < 0 ? dark : bright}, parting};  // one level alone is both
-}
-
-// The first threshold between the peaks at which a search succeeds.
-void TryThresholds(Miss& miss, const ChartView& view, const cv::Mat& photo, int parting) {
-  const auto [dark, light] = miss.peaks;
-  for (const int threshold :
-       {cvRound((dark + light) / 2), parting, cvRound((3 * dark + light) / 4), cvRound((dark + 3 * light) / 4)}) {
-    if (threshold == view.threshold) continue;
-    QVTester trial;
-    const ChartView found = LookAtChart(trial.FindChart(photo, threshold));
-    if (!found.complete() || !found.plausible()) continue;
-    miss.threshold = threshold;
-    miss.marks = found.marks;
-    return;
-  }
-}
 
 std::string MissSentence(const Miss& miss, const std::string& photo_path, QV_PROPERTY_INDEX threshold_property) {
   std::string sentence = photo_path + ": ";
@@ -173,37 +117,12 @@ void AddChartFigures(Phase& phase, const ChartView& view) {
   phase.Add("straightened_by", view.straightened_by_deg);
 }
 
-Miss ExplainMiss(const ChartView& view, const cv::Mat& photo) {
-  Miss miss;
-  const char* const counts[] = {"no finder mark was", "1 of 3 finder marks was", "2 of 3 finder marks were"};
-  miss.reasons.push_back(Format("%s found", counts[std::min<std::size_t>(view.marks.size(), 2)]));
-  const GreyHistogram levels = LookAtLevels(photo);
-  miss.peaks = levels.peaks;
-  const auto [dark, light] = levels.peaks;
-  const double margin = (light - dark) / 8;
-  if (light - dark < kLeastContrast) {
-    miss.reasons.push_back(Format("the picture has hardly any contrast (grey peaks at %.0f and %.0f)", dark, light));
-  } else if (view.threshold < dark + margin || view.threshold > light - margin) {
-    miss.reasons.push_back(
-        Format("the threshold of %d is far from the middle of the picture's grey peaks at %.0f and %.0f",
-               view.threshold, dark, light));
-  }
-  for (const Mark& mark : view.marks) {
-    if (mark.module_px >= kSmallestModulePx) continue;
-    miss.reasons.push_back(
-        Format("the marks are small (%.1f pixels a module; %.0f are needed)", mark.module_px, kSmallestModulePx));
-    break;
-  }
-  TryThresholds(miss, view, photo, levels.parting);
-  return miss;
-}
-
 ChartView DescribeChart(Record& record, const FoundChart& found, const std::string& photo_path, const cv::Mat& photo,
                         QV_PROPERTY_INDEX threshold_property) {
   ChartView view = LookAtChart(found);
   AddChartFigures(record.phase, view);
   if (!view.complete()) {
-    view.miss = ExplainMiss(view, photo);
+    view.miss = ExplainMiss(view.marks, view.threshold, photo);
     record.phase.Add("grey_peak_dark", view.miss->peaks.dark);
     record.phase.Add("grey_peak_light", view.miss->peaks.light);
     if (view.miss->threshold) record.phase.Add("suggested_threshold", *view.miss->threshold);
@@ -258,10 +177,9 @@ void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place)
     return;
   }
   if (!view.miss) return;
-  for (const Mark& mark : view.miss->marks) {
-    ring(mark, Format("found at threshold %d", *view.miss->threshold), kDoubtful);
-  }
+  for (const Mark& mark : view.miss->marks) ring(mark, view.miss->how, kDoubtful);
   for (const Mark& mark : view.marks) ring(mark, "candidate", kPoor);
+  for (const Candidate& candidate : view.miss->candidates) ring(candidate.mark, candidate.failed.text, kPoor);
   cv::Point2d line = place.origin + cv::Point2d(10, 24);
   for (const std::string& reason : view.miss->reasons) {
     picture.Text(reason, line, 16, kPoor, Align::kLeft, true);

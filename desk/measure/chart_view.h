@@ -9,30 +9,13 @@
 
 #include "desk/drawing/picture.h"
 #include "desk/measure/measurement.h"
+#include "desk/measure/miss.h"
 #include "desk/measure/record.h"
 #include "qvtester/tester.h"
 
 namespace qv {
 
 // What a search for finder marks saw of a chart photo, told to people.
-
-struct Mark {
-  cv::Point2d centre;  // column, row; pixel centres at whole numbers
-  double module_px;
-};
-
-/// The two commonest grey levels of a picture: what is dark in it, and what is light.
-struct GreyPeaks {
-  double dark, light;
-};
-
-/// Why three marks did not come back, and what would help.
-struct Miss {
-  std::vector<std::string> reasons;  // a phrase each
-  GreyPeaks peaks;
-  std::optional<int> threshold;  // a search at it finds three marks that look like a chart's
-  std::vector<Mark> marks;       // which it finds there
-};
 
 struct ChartView {
   std::vector<Mark> marks;   // with three: corner, second, third; otherwise the candidates, in the order found
@@ -52,10 +35,6 @@ struct ChartView {
 
 /// What a search has found, in photo coordinates.
 ChartView LookAtChart(const FoundChart& found);
-
-/// Why three marks did not come back: how many did, a threshold off the picture's two grey peaks, marks too small. A
-/// threshold between the peaks is suggested only when a search at it succeeds.
-Miss ExplainMiss(const ChartView& view, const cv::Mat& photo);
 
 /// Looks at what a test has found on this photo: adds its figures to the record, and a remark about a miss, a doubtful
 /// find or more candidates than marks. `threshold_property` is the one that the test's search read.
