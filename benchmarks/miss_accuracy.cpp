@@ -159,7 +159,7 @@ Outcome Look(const Fault& fault, int trial, int trials) {
 }
 
 int Run(bool check, bool quick, bool show) {
-  const int kTrials = quick ? 10 : 40;
+  const int kTrials = quick ? 10 : 30;
   int misses = 0;
   int right = 0;
   std::printf(
