@@ -80,10 +80,15 @@ class ChartSheets : public SimulatedPhotos {
 
 class SheetFiles : public ChartSheets, public ::testing::WithParamInterface<const char*> {};
 
-TEST_P(SheetFiles, ShowWhatTheTableSays) {
+// Darkness along a line of pixels, in pixels of full black; what lies past the ends is white.
+double Darkness(const cv::Mat& line) { return static_cast<double>(line.total()) * (1 - cv::mean(line)[0] / 255); }
+
+// In chart units: the marks' square has 6970 of them a side, the paper's width between its margins of 10 mm 7910.
+TEST_P(SheetFiles, HaveTheChartsMeasures) {
   const Sheet sheet = Draw(GetParam());
   ASSERT_NEAR(2100, sheet.picture.cols, 1);
   ASSERT_NEAR(2970, sheet.picture.rows, 1);
+  EXPECT_NEAR(1900 / 7910.0, sheet.px_per_unit, 1e-4);
   cv::Mat grey;
   cv::cvtColor(sheet.picture, grey, cv::COLOR_BGR2GRAY);
 
@@ -91,45 +96,45 @@ TEST_P(SheetFiles, ShowWhatTheTableSays) {
   std::vector<cv::Point2d> marks;
   // Drawn, not photographed: its white paper ends at level 255, which is a doubt.
   for (const json& mark : Measured(Record("autofocus sheet.png", 3), "camera_autofocus_marks")) {
-    const int half = static_cast<int>(4.5 * kMarkSizes[0].module * sheet.px_per_unit);
+    const int half = static_cast<int>(4.5 * 25 * sheet.px_per_unit);
     const cv::Rect window(mark[0].get<int>() - half, mark[1].get<int>() - half, 2 * half, 2 * half);
     const cv::Moments dark = cv::moments(255 - grey(window));
     marks.emplace_back(window.x + dark.m10 / dark.m00, window.y + dark.m01 / dark.m00);
+    EXPECT_NEAR((1 + 3 + 1) * 25 * sheet.px_per_unit, Darkness(grey(window).row(half)), 0.4) << "fine marks";
   }
   // The scale is printed with four digits; the SVG's coordinates go in steps of 1/256 mm.
-  const double side = kChartSide * sheet.px_per_unit;
-  EXPECT_NEAR(side, marks[1].x - marks[0].x, 0.5);
-  EXPECT_NEAR(side, marks[2].y - marks[0].y, 0.5);
+  EXPECT_NEAR(1674.2, marks[1].x - marks[0].x, 0.5);
+  EXPECT_NEAR(1674.2, marks[2].y - marks[0].y, 0.5);
   EXPECT_NEAR(marks[0].y, marks[1].y, 0.1);
   EXPECT_NEAR(marks[0].x, marks[2].x, 0.1);
   EXPECT_NEAR(sheet.picture.cols, marks[0].x + marks[1].x + 1, 1) << "the chart is not in the middle";
   const auto place = [&](double x, double y) { return marks[0] + cv::Point2d(x, y) * sheet.px_per_unit; };
 
-  // Edges, where lines across the two regions meet them.
-  const auto target = EdgeTarget();
-  for (const double share : {0.1, 0.5, 0.9}) {
-    const ChartRegion& upright = kHorizontalRegion;
-    const double y = upright.y + share * upright.height;
-    const cv::Point2d left = target[0] + (target[3] - target[0]) * (y - target[0].y) / (target[3].y - target[0].y);
-    const cv::Rect across(cvRound(place(upright.x, y).x), cvRound(place(0, y).y),
-                          cvRound(upright.width * sheet.px_per_unit), 1);
-    EXPECT_NEAR(place(left.x, y).x, across.x + Crossing(grey(across)), 0.5);
-
-    const ChartRegion& lying = kVerticalRegion;
-    const double x = lying.x + share * lying.width;
-    const cv::Point2d low = target[0] + (target[1] - target[0]) * (x - target[0].x) / (target[1].x - target[0].x);
-    const cv::Rect down(cvRound(place(x, 0).x), cvRound(place(0, lying.y).y), 1,
-                        cvRound(lying.height * sheet.px_per_unit));
-    EXPECT_NEAR(place(x, low.y).y, down.y + Crossing(grey(down)), 0.5);
+  // Edges of 5 degrees through the whole of two regions of 2160 x 750, crossing their middles.
+  const double slope = std::tan(5 * CV_PI / 180);
+  for (const double along : {-1080.0, -500.0, 0.0, 500.0, 1080.0}) {
+    const cv::Point2d upright = place(3605 + slope * along, 2020 + along);
+    const cv::Rect across(cvRound(place(3230, 0).x), cvRound(upright.y), cvRound(750 * sheet.px_per_unit), 1);
+    EXPECT_NEAR(upright.x, across.x + Crossing(grey(across)), 0.5) << along;
+    const cv::Point2d lying = place(4960 + along, 3635 - slope * along);
+    const cv::Rect down(cvRound(lying.x), cvRound(place(0, 3260).y), 1, cvRound(750 * sheet.px_per_unit));
+    EXPECT_NEAR(lying.y, down.y + Crossing(grey(down)), 0.5) << along;
   }
 
-  for (std::size_t i = 0; i < kPatches.size(); ++i) {
-    const cv::Point2d at = PatchCentre(static_cast<int>(i));
-    const int half = static_cast<int>(0.9 * kPatchHalf * sheet.px_per_unit);
-    const cv::Point middle = place(at.x, at.y);
+  // Patches of 940 at the sevenths of the square's sides: six along the top, the bottom, the left, the right.
+  for (int i = 0; i < 24; ++i) {
+    const double along = (i % 6 + 1) * 6970 / 7.0;
+    const double across = i / 6 % 2 * 6970;
+    const cv::Point middle = i < 12 ? place(along, across) : place(across, along);
+    const int half = static_cast<int>(0.9 * 470 * sheet.px_per_unit);
     const cv::Scalar seen = cv::mean(sheet.picture({middle.x - half, middle.y - half, 2 * half, 2 * half}));
     const cv::Scalar drawn(kPatches[i].blue, kPatches[i].green, kPatches[i].red);
     EXPECT_LE(cv::norm(seen, drawn, cv::NORM_INF), 1) << kPatches[i].name;  // renderers round colours their own way
+    if (drawn == cv::Scalar(255, 255, 255)) continue;                       // as the paper
+    const int reach = cvRound(498 * sheet.px_per_unit);
+    const cv::Rect line(middle.x - (i < 12 ? reach : 0), middle.y - (i < 12 ? 0 : reach), i < 12 ? 2 * reach : 1,
+                        i < 12 ? 1 : 2 * reach);
+    EXPECT_NEAR(940 * sheet.px_per_unit, cv::countNonZero(grey(line) < 250), 2.5) << kPatches[i].name;
   }
 }
 
@@ -176,7 +181,7 @@ TEST_F(ChartSheets, ThePaperIsTurnedForTheLargestChart) {
   EXPECT_THAT(Draw(".svg", "--kind dust").facts, HasSubstr("paper A4, 297 x 210 mm"));
   const Sheet wide = Draw(".png", "--paper A3 --margin 0");
   EXPECT_EQ(cv::Size(2970, 4200), wide.picture.size());
-  EXPECT_NEAR(2970.0 / (kChartSide + 2 * kPatchHalf), wide.px_per_unit, 1e-4) << "a chart less wide than the paper";
+  EXPECT_NEAR(2970 / 7910.0, wide.px_per_unit, 1e-4) << "a chart less wide than the paper";
   const std::string per_metre = {0, 0, '\x27', '\x10'};  // 10 000: the picture knows its printed size
   EXPECT_EQ("pHYs" + per_metre + per_metre + '\1', ReadFile(folder_.Path("sheet.png")).substr(37, 13));
 }
