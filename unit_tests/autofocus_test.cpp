@@ -154,4 +154,16 @@ TEST(ChartMtf, ARegionOutsideTheUprightPictureIsTheSameError) {
   }
 }
 
+// In so flat a triangle the second mark comes to lie to the left of the corner; one measure minds, the other does not.
+TEST(ChartMtf, OnlyTheAutofocusMeasureTakesTheDistanceWithItsSign) {
+  QVTester tester;
+  const LogLines log;
+  cv::Mat photo;
+  cv::cvtColor(DrawMarks({716, 750}, 5, {{429, 127}, {653, 251}, {290, 70}}), photo, cv::COLOR_GRAY2BGR);
+  std::vector<float> list;
+  float mtf50 = 0;
+  EXPECT_THROW(tester.GetSFRFromImage(photo, list, list, list, mtf50, mtf50), cv::Exception);
+  EXPECT_EQ(QV_SUCCESS, tester.GetMTFFromImage(photo, mtf50, mtf50));
+}
+
 }  // namespace

@@ -73,6 +73,19 @@ TEST_F(Capture, WithoutAStandardFourPatchesAreKept) {
                                                "[TestCameraCapture] calculate_differences, false"}));
 }
 
+// Marks in a triangle, between which the third patch of the left column, or the fourth, lies outside.
+TEST_F(Capture, FifteenPatchesAreEnough) {
+  for (const auto& [size, module, marks, code] :
+       {std::tuple(cv::Size(713, 525), 5, std::vector<cv::Point>{{39, 141}, {145, 471}, {58, 626}}, -87),
+        {cv::Size(759, 761), 6, {{119, 434}, {117, 49}, {13, 498}}, 1}}) {
+    cv::Mat photo;
+    cv::cvtColor(DrawMarks(size, module, marks), photo, cv::COLOR_GRAY2BGR);
+    Load(17, photo);
+    EXPECT_EQ(code, TestCameraCapture(false));
+    EXPECT_THAT(theTester->kept_->chart.patches, SizeIs(code == 1 ? 15 : 14));
+  }
+}
+
 TEST_F(Capture, DifferencesAreTakenToTheStandard) {
   Load(18, DrawPatches(Drawn));
   const auto seen = [](int i) { return i == 5 ? cv::Scalar(60, 80, 70) : Drawn(i); };

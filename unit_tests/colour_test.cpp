@@ -72,7 +72,8 @@ TEST(Colour, TemperaturesAreThePublishedOnes) {  // CIE 15's A, D50, D65, D75 an
   }
   EXPECT_EQ(5550.0f, Temperature({0.333083928f, 0.464719504f, 0.202196568f})) << "in double it is not 5550";
   // x = 0.331 in single precision belongs to the cool side: sums that are exact, so that x is the quotient itself.
-  EXPECT_NEAR(Temperature(0.331f, 0.34f), Temperature(0.33f, 0.34f), 60);
+  EXPECT_EQ(static_cast<float>(CoolTemperature(0.331f, 0.34f)), Temperature({0.331f, 0.34f, 0.329f}));
+  EXPECT_NE(static_cast<float>(WarmTemperature(0.331f, 0.34f)), Temperature({0.331f, 0.34f, 0.329f}));
 }
 
 // Worked out once from the fits as they are published, each step in its own width; a last digit would show.

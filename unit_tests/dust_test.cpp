@@ -70,6 +70,13 @@ TEST_F(Dust, TheSearchSeesSizesAndLevelsAsTuned) {
     return Results().dust_blob_count_main_;
   };
   EXPECT_EQ(0, count(300, 3)) << "under 20 pixels";
+  for (const int bump : {1, 2}) {  // areas of 19 and 20, as the outline goes through the light pixels around
+    cv::Mat photo = DrawDust({});
+    photo(cv::Rect(300, 200, 4, 3)).setTo(60);
+    photo(cv::Rect(301, 199, bump, 1)).setTo(60);
+    EXPECT_EQ(1, Measure(photo));
+    EXPECT_EQ(bump - 1, Results().dust_blob_count_main_);
+  }
   for (const int diameter : {7, 9, 13}) EXPECT_EQ(1, count(300, diameter)) << diameter;
   EXPECT_EQ(0, count(300, 31)) << "hollow in the binary picture";
   EXPECT_EQ(0, count(300, 9, 124)) << "too dark a photo to see any";
@@ -134,6 +141,9 @@ TEST_F(Dust, DarkPixelsAreCountedInTwoRegions) {
                   "[detectMung] (roi2) total_pixels: 5000, black_pixels: 0", "[detectMung] detecting black pixel!!!"));
   EXPECT_EQ(0, theTester->detectMung(gray, {50, 0, 50, 100}, {50, 50, 50, 50}));
   EXPECT_EQ("[detectMung] no black pixel.", LogLines::Texts().back());
+  cv::Mat halves(10, 10, CV_8UC1, cv::Scalar(180));
+  halves.rowRange(0, 5).setTo(60);
+  EXPECT_EQ(0, theTester->detectMung(halves, {0, 0, 10, 10}, {0, 0, 1, 1})) << "half the mean is not dark";
   EXPECT_THROW(theTester->detectMung(gray, {0, 0, 101, 10}, {0, 0, 1, 1}), cv::Exception);
 }
 

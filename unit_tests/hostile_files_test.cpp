@@ -67,6 +67,7 @@ TEST_F(Files, EveryFilmIsOpened) {
   for (const auto& [name, options] :
        std::vector<std::pair<std::string, std::string>>{{"a.mp4", kH264},
                                                         {"a.mov", kH264},
+                                                        {"turned.mov", kH264 + " -metadata:s:v:0 rotate=90"},
                                                         {"a.3gp", kH264},
                                                         {"a.mkv", kH264},
                                                         {"a.avi", kLossless},
@@ -117,6 +118,21 @@ TEST_F(Files, WhatIsNoFileEndsAtOnce) {
   std::filesystem::create_symlink(pipe, link);
   for (const std::string& path : {pipe, link, std::string("/dev/zero"), std::string("/dev/tty"), folder_.Path("")}) {
     ExpectRefused(path);
+  }
+}
+
+// An extended WebP file gives width and height less one, three bytes each.
+TEST_F(Files, SizesOfExtendedWebPsAreReadInTheirOrder) {
+  const std::string start = std::string("RIFF\x16\0\0\0WEBPVP8X\x0A\0\0\0\0\0\0\0", 24);
+  const std::string large("\x1F\x4E\0", 3);  // 20000
+  const std::string small("\x09\0\0", 3);
+  std::string reason;
+  for (const auto& [size, expected] : {std::pair{large + small, "not an image"},
+                                       {small + large, "not an image"},
+                                       {large + large, "too many pixels"}}) {
+    const std::string file = start + size;
+    EXPECT_TRUE(QVResource::DecodePicture({file.begin(), file.end()}, reason).empty());
+    EXPECT_THAT(reason, HasSubstr(expected));
   }
 }
 

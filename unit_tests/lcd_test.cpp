@@ -124,6 +124,85 @@ TEST(Lcd, TheScreenIsToldFromWhatElseIsBrightOrDark) {
   }
 }
 
+// A white screen of 400 x 300 that fills the photo but for its rim, with the corners given.
+struct Shown {
+  cv::Mat photo = cv::Mat(320, 420, CV_8UC3, cv::Scalar::all(20));
+  cv::Mat screen = photo(cv::Rect(10, 10, 400, 300));
+  QVTester_LCD lcd;
+  QVLcdResult result;
+
+  Shown() {
+    screen.setTo(cv::Scalar::all(200));
+    lcd.keep_corners_ = true;
+    lcd.corners_ = {{9.5f, 9.5f}, {409.5f, 9.5f}, {409.5f, 309.5f}, {9.5f, 309.5f}};
+    lcd.expected_ratio_ = 4 / 3.0f;
+  }
+  const QVLcdResult& Judge(QV_LCD_PATTERN pattern) {
+    EXPECT_EQ(1, lcd.JudgePattern(photo, pattern, &result));
+    return result;
+  }
+};
+
+TEST(Lcd, DotsCountFromTheLeastOfPixelsAndAboveTheNoise) {
+  const LogLines log;
+  Shown s;
+  s.screen(cv::Rect(100, 100, 3, 1)).setTo(0);
+  for (const int least : {3, 4}) {
+    s.lcd.min_dot_pixels_ = least;
+    EXPECT_EQ(least == 3 ? 1 : 0, s.Judge(QV_LCD_WHITE).error_count_);
+  }
+  Shown noisy;
+  cv::Mat grain(noisy.screen.size(), CV_16SC3);
+  cv::RNG(1).fill(grain, cv::RNG::NORMAL, 0, 15);
+  noisy.lcd.dot_threshold_ = 0.05f;
+  cv::Mat levels;
+  cv::add(noisy.screen - cv::Scalar::all(80), grain, levels, cv::noArray(), CV_8U);
+  levels.copyTo(noisy.screen);
+  EXPECT_EQ(0, noisy.Judge(QV_LCD_WHITE).error_count_) << "of 360,000 samples one in 300,000 lies 4.5 sigma off";
+}
+
+TEST(Lcd, PatchesOfLevelsAreATwelfthOfTheShorterSide) {
+  const LogLines log;
+  Shown s;
+  s.screen.setTo(cv::Scalar::all(100));
+  for (int i = 0; i < 9; ++i) {  // 25 pixels about the middles of the ninths
+    s.screen(cv::Rect((2 * (i % 3) + 1) * 400 / 6 - 12, (2 * (i / 3) + 1) * 50 - 12, 25, 25)).setTo(220);
+  }
+  EXPECT_THAT(s.Judge(QV_LCD_WHITE).levels_, Each(220));
+}
+
+TEST(Lcd, BarsAreReadWithoutTheirRims) {
+  const LogLines log;
+  Shown s;
+  const cv::Scalar bars[] = {{20, 20, 200}, {20, 200, 20}, {200, 20, 20}, {104, 104, 104}};  // white: hardly enough
+  for (int i = 0; i < 4; ++i) s.screen.colRange(100 * i, 100 * i + 100).setTo(bars[i]);
+  EXPECT_EQ(1, s.Judge(QV_LCD_CONTROL).verdict_);
+  cv::rectangle(s.screen, cv::Rect(0, 0, 400, 300), cv::Scalar::all(0), 5);
+  EXPECT_EQ(1, s.Judge(QV_LCD_CONTROL).verdict_) << s.result.reason_;
+}
+
+TEST(Lcd, KeptCornersAreFoundAnewWhenAskedFor) {
+  const LogLines log;
+  Shown s;
+  s.lcd.corners_ = {{50, 50}, {100, 50}, {100, 90}, {50, 90}};
+  ASSERT_EQ(1, s.lcd.FindScreen(s.photo));
+  EXPECT_NEAR(9.5, s.lcd.corners_[0].x, 0.3);
+}
+
+TEST(Lcd, AScreenCutSmallerKeepsItsMeans) {
+  const LogLines log;
+  Shown s;
+  for (int i = 0; i < 400 * 300; ++i)
+    s.screen.at<cv::Vec3b>(i / 400, i % 400) = cv::Vec3b::all((i + i / 400) % 2 * 200);
+  cv::Mat small;
+  ASSERT_EQ(1, s.lcd.Straighten(s.photo, {160, 120}, small));
+  cv::Scalar mean;
+  cv::Scalar deviation;
+  cv::meanStdDev(small, mean, deviation);
+  EXPECT_NEAR(100, mean[0], 1);
+  EXPECT_LT(deviation[0], 15) << "single pixels of a chequered screen would scatter by 60";
+}
+
 // By pattern asked for, and what is shown: "t" where green is shown with a tick on it, which either answer suits.
 TEST(Lcd, APatternIsToldFromTheOthersHoweverThePhotoIsTurned) {
   const LogLines log;

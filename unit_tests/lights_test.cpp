@@ -88,6 +88,18 @@ TEST_F(Lights, DotsAreLookedForInEachRegion) {
   EXPECT_EQ(0, Measure(photo(cv::Rect(0, 0, 16, 16))).error_count_) << "smaller than the window";
 }
 
+TEST_F(Lights, UpToTwentyThousandSpotsAreMerged) {
+  float threshold = 1;
+  int distance = 4;
+  SetProperty(QV_PROPERTY_DOT_THRESHOLD, &threshold);
+  SetProperty(QV_PROPERTY_AREA_DISTANCE, &distance);
+  for (const auto& [rows, areas] : {std::pair(100, 1), {101, 20200}}) {
+    cv::Mat photo(2 * rows, 400, CV_8UC3, cv::Scalar::all(10));
+    for (int i = 0; i < 200 * rows; ++i) photo.at<cv::Vec3b>(2 * (i / 200), 2 * (i % 200)) = {250, 250, 250};
+    EXPECT_EQ(areas, Measure(photo).error_count_);
+  }
+}
+
 TEST_F(Lights, WhatCannotBeMeasuredChangesNothing) {
   const cv::Mat photo(100, 160, CV_8UC3, cv::Scalar::all(80));
   const QVLightRegion* const before = Measure(photo).regions_;
@@ -111,6 +123,8 @@ TEST_F(Lights, WhatCannotBeMeasuredChangesNothing) {
   EXPECT_EQ(1, ReleaseTestResult(QV_TEST_TOUCH_PANEL_LED));
   EXPECT_EQ(nullptr, Results().touch_led_.regions_);
   EXPECT_EQ(before, Results().led_.regions_) << "each test has a result of its own";
+  SetRegions({{{155, 0, 5, 100, 42}}}, 1);
+  EXPECT_EQ(1, Measure(photo).region_count_) << "up to the photo's edges";
 }
 
 }  // namespace

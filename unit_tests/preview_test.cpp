@@ -109,6 +109,7 @@ TEST_F(Preview, TheCentreIsTheMiddleOfTheLongestSide) {
                   "x : -5, final y : 5"));
   EXPECT_EQ("0,10", centre({{0, 0}, {0, 10}, {0, 20}}));
   EXPECT_EQ("0,8", centre({{0, 0}, {6, 8}, {0, 16}})) << "of a middle one";
+  EXPECT_EQ("20,5", centre({{0, 0}, {40, 10}, {0, 20}})) << "of two alike the first";
   EXPECT_EQ("0,0", centre({{0, 0}, {0, 10}, {8, 5}, {4, 2}})) << "four points have no centre";
   EXPECT_EQ("4,2", Property("t82.vi_circle_loc_0_3"));
   EXPECT_EQ("0,0", centre({}));
@@ -132,6 +133,9 @@ TEST_F(Preview, SavedFramesShareAFileByThrees) {
     EXPECT_EQ(cv::Size(64, 48), cv::imread(folder_.Path(file)).size());
   }
   EXPECT_FALSE(std::filesystem::exists(folder_.Path("vi_pview_2.jpg")));
+  EXPECT_NE(std::filesystem::perms::none,
+            std::filesystem::status(folder_.Path("vi_pview_0.jpg")).permissions() & std::filesystem::perms::others_read)
+      << "others look at them";
   EXPECT_EQ(-95, SavePreview(frame.data(), 0, 63, 48));
   EXPECT_EQ(-97, SavePreview(nullptr, 0, 64, 48));
   EXPECT_EQ(-97, SavePreview(frame.data(), 0, 0, 48));

@@ -117,6 +117,14 @@ TEST_F(Print, WhatNoGoodPrintHasIsAnErrorArea) {
   EXPECT_EQ(0, Measure(Photograph(bad, truth, 1)).print_error_count_);
 }
 
+TEST_F(Print, TheMeanIsOverWhatIsSeen) {
+  cv::Mat bad = Good(true);
+  bad(cv::Rect(205, 85, 30, 30)).setTo(0);
+  const float whole = Measure(bad).print_rms_;
+  const float part = Measure(bad.rowRange(0, 210)).print_rms_;  // three quarters, and all of the fault
+  EXPECT_NEAR(std::sqrt(280.0 / 210), part / whole, 0.05);
+}
+
 TEST_F(Print, WhatCannotBeRegisteredChangesNothing) {
   const QVResultData& result = Measure(Good(true));
   const float rms = result.print_rms_;

@@ -140,6 +140,8 @@ TEST_F(ImageList, OtherSizesComeIntoTheFirstOnesFrame) {
   const std::string wide = folder_.Write("wide.png", scene_);
   ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {files_[0], wide}));
   EXPECT_EQ(cv::Size(640, 480), Held().registered[1].size());
+  int none = 0;
+  SetProperty(QV_PROPERTY_LIST_COMPONENTS, &none);
   ASSERT_EQ(1, SetResourceWithList(QV_RESOURCE_IMAGE_LIST, {wide})) << "a list of one";
   EXPECT_EQ(1, Held().components);
   EXPECT_EQ(0, cv::norm(Held().matrix.reshape(1, 520), theTester->RebuildListImage(0), cv::NORM_INF));
