@@ -354,7 +354,7 @@ std::string Report::Plot() const {
     for (const double value : values) {
       ++bars.points[std::min(bins - 1, static_cast<std::size_t>((value - *low) / width))].second;
     }
-    SvgPanel panel = {figure.step + ": " + figure.about.name, figure.about.unit, "runs", {bars}, {}};
+    SvgPanel panel = {figure.step + ": " + figure.about.name, figure.about.unit == "1" ? "" : figure.about.unit, "runs", {bars}, {}};
     if (bounds.min) panel.lines.emplace_back(*bounds.min, Format("min %.6g", *bounds.min));
     if (bounds.max) panel.lines.emplace_back(*bounds.max, Format("max %.6g", *bounds.max));
     panels.push_back(std::move(panel));

@@ -69,10 +69,12 @@ Frame FrameOf(const SvgPanel& panel, double top) {
   double y_high = 0;
   double y_low = 0;
   for (const SvgSeries& series : panel.series) {
+    const bool wide = series.bars && series.points.size() > 1;
+    const double half = wide ? (series.points[1].first - series.points[0].first) / 2 : 0;
     for (const auto& [x, y] : series.points) {
       if (!std::isfinite(x) || !std::isfinite(y)) continue;
-      x_low = std::min(x_low, x);
-      x_high = std::max(x_high, x);
+      x_low = std::min(x_low, x - half);
+      x_high = std::max(x_high, x + half);
       y_low = std::min(y_low, y);
       y_high = std::max(y_high, y);
     }

@@ -38,7 +38,7 @@ function verdict(word, marginal) {
 const value_of = (column, i) => column.values[column.index[i]];
 const column_of = name => D[name] && D[name].index ? D[name] : D.columns[name];
 const field = (name, i) => value_of(column_of(name), i);
-const number = x => x === null || x === undefined ? '' : typeof x === 'string' ? x : String(Number(x.toPrecision(6)));
+const number = x => x === null || x === undefined ? '' : typeof x === 'string' ? x : Math.abs(x) < 1e-3 && x !== 0 ? x.toExponential(3).replace(/\.?0*e/, 'e') : String(Number(x.toPrecision(6)));
 const percent = x => isFinite(x) ? (100 * x).toFixed(1) + ' %' : '–';
 const two = x => String(x).padStart(2, '0');
 function time(ms) {
@@ -109,23 +109,25 @@ function colours() {
   const style = getComputedStyle(document.documentElement);
   return name => style.getPropertyValue('--' + name).trim();
 }
-/* Times as 24 hours, with the day where it changes. */
+/* Times as 24 hours, with the day where it changes and the year where there is room. */
 function clock(p, splits, axis, space, step) {
-  let before = '';
-  return splits.map(t => {
-    const text = time(t * 1000), day = text.slice(0, 10), change = day !== before;
-    before = day;
-    const seconds = step < 60 ? ':' + two(new Date(t * 1000).getSeconds()) : '';
-    return step >= 86400 ? day : text.slice(11) + seconds + (change ? '\n' + day : '');
+  const days = splits.map(t => time(t * 1000).slice(0, 10));
+  return splits.map((t, i) => {
+    if (step >= 86400) return days[i];
+    const moment = new Date(t * 1000), seconds = step < 60 ? ':' + two(moment.getSeconds()) + (step < 1 ? (moment.getMilliseconds() / 1000).toFixed(step < 0.1 ? 2 : 1).slice(1) : '') : '';
+    const day = days[i] === days[i - 1] ? '' : '\n' + (i === 0 && days[1] === days[0] ? days[i] : days[i].slice(5));
+    return time(t * 1000).slice(11) + seconds + day;
   });
 }
+/* Where an axis of time ends: a little beyond the first and the last, also when they are one. */
+const around = pad => (u, from, to) => { const x = u.data[0]; return [from - pad, (x[0] === x[x.length - 1] ? from : to) + pad]; };
 function axes(c, x_label, y_label, extra) {
   const grid = {stroke: c('line'), width: 1}, ticks = grid;
   return [{label: x_label, stroke: c('text'), grid, ticks, ...(extra || {}).x}, {label: y_label, stroke: c('text'), grid, ticks, size: 62, ...(extra || {}).y},
     ...((extra || {}).more || [])];
 }
-/* Zones and lines of limits, upright or level. */
-function limit_marks(c, b, u, upright) {
+/* Zones and lines of limits, upright or level; or the words beside them, which go on top of what is drawn. */
+function limit_marks(c, b, u, upright, words_only) {
   return plot => {
     const ctx = plot.ctx, box = plot.bbox;
     const scale = upright ? 'x' : 'y';
@@ -140,20 +142,31 @@ function limit_marks(c, b, u, upright) {
     const line = (v, words, dashes) => {
       const p = at(v);
       if (upright ? p < box.left || p > box.left + box.width : p < box.top || p > box.top + box.height) return;
+      if (words_only) {
+        const em = 12 * devicePixelRatio;
+        ctx.font = em + 'px system-ui, sans-serif'; ctx.textAlign = 'left';
+        const wide = ctx.measureText(words).width, x = upright ? Math.min(p + 4, box.left + box.width - wide) : box.left + 4, y = upright ? box.top + em : Math.max(p - 4, box.top + em);
+        ctx.fillStyle = c('back'); ctx.fillRect(x - 2, y - em, wide + 4, 1.3 * em);
+        ctx.fillStyle = c('text'); ctx.fillText(words, x, y);
+        return;
+      }
       ctx.strokeStyle = c('text'); ctx.lineWidth = 1.5 * devicePixelRatio; ctx.setLineDash(dashes.map(d => d * devicePixelRatio));
       ctx.beginPath();
       if (upright) { ctx.moveTo(p, box.top); ctx.lineTo(p, box.top + box.height); } else { ctx.moveTo(box.left, p); ctx.lineTo(box.left + box.width, p); }
       ctx.stroke(); ctx.setLineDash([]);
-      ctx.fillStyle = c('text'); ctx.font = 12 * devicePixelRatio + 'px system-ui, sans-serif'; ctx.textAlign = 'left';
-      if (upright) ctx.fillText(words, p + 4, box.top + 12 * devicePixelRatio); else ctx.fillText(words, box.left + 4, p - 4);
     };
     ctx.save();
+    if (words_only) {
+      for (const side of ['min', 'max']) if (side in b) line(b[side], side + ' ' + number(b[side]), []);
+      ctx.restore();
+      return;
+    }
     const far = {min: at(-1e300), max: at(1e300)};
     for (const side of ['min', 'max']) {
       if (!(side in b)) continue;
       fill(far[side], at(b[side]), c('bad-zone'));
       if (u > 0) fill(at(b[side] - 2 * u), at(b[side] + 2 * u), c('guard'));
-      line(b[side], side + ' ' + number(b[side]), []);
+      line(b[side], '', []);
       const marginal = 'marginal_' + side;
       if (marginal in b) line(b[marginal], '', [4, 4]);
     }
@@ -222,7 +235,7 @@ function summary() {
   const cards = h('div', {class: 'cards', id: 'summary'},
     h('div', {class: 'card'}, 'yield of units', h('b', {id: 'yield'}, percent(yield_of(counts))), h('span', {class: 'quiet'}, units.size + (units.size === 1 ? ' unit' : ' units'))),
     Object.keys(RANK).filter(word => counts[word]).reverse().map(word =>
-      h('div', {class: 'card'}, verdict(word), h('b', {}, counts[word]), h('span', {class: 'quiet'}, 'units; ' + (runs[word] || 0) + ' runs'))));
+      h('div', {class: 'card'}, verdict(word), h('b', {}, counts[word]), h('span', {class: 'quiet'}, (counts[word] === 1 ? 'unit; ' : 'units; ') + (runs[word] || 0) + (runs[word] === 1 ? ' run' : ' runs')))));
   return cards;
 }
 function by_station() {
@@ -242,7 +255,7 @@ function by_station() {
     h('thead', {}, h('tr', {}, h('th', {scope: 'col'}, 'station'), ['PASS', 'FAIL', 'ERROR', 'MEASURED'].map(w => h('th', {scope: 'col', class: 'number'}, w)), h('th', {scope: 'col'}, 'yield'))),
     h('tbody', {}, rows)));
 }
-const STEPS = [[60e3, 'minute'], [600e3, '10 minutes'], [3600e3, 'hour'], [6 * 3600e3, '6 hours'], [864e5, 'day'], [7 * 864e5, 'week'], [28 * 864e5, '4 weeks']];
+const STEPS = [[1e3, 'second'], [10e3, '10 seconds'], [60e3, 'minute'], [600e3, '10 minutes'], [3600e3, 'hour'], [6 * 3600e3, '6 hours'], [864e5, 'day'], [7 * 864e5, 'week'], [28 * 864e5, '4 weeks']];
 function over_time() {
   if (shown.length < 2) return null;
   let first = Infinity, last = -Infinity;
@@ -255,6 +268,7 @@ function over_time() {
     const counts = buckets.get(at), word = field('outcome', i);
     counts[word] = (counts[word] || 0) + 1;
   }
+  if (buckets.size < 2) return null;
   const x = [], rate = [], count = [];
   for (const [at, counts] of [...buckets].sort((a, b) => a[0] - b[0])) {
     const y = yield_of(counts);
@@ -263,10 +277,10 @@ function over_time() {
   const [box, host] = plot_box('Yield of runs over time', 'by ' + name + '; bars: how many runs');
   later(() => plot(host, c => ({
     options: {
-      scales: {x: {time: true, range: (u, a, b) => [a - width / 1000, b + width / 1000]}, y: {range: (u, a) => [Math.max(0, Math.min(90, Math.floor((a ?? 0) / 10) * 10 - 10)), 101]}, n: {range: (u, a, b) => [0, 3 * (b || 1)]}},
-      axes: axes(c, '', 'yield [%]', {x: {values: clock}, more: [{side: 1, scale: 'n', label: 'runs', stroke: c('quiet'), grid: {show: false}, size: 55}]}),
-      series: [{}, {label: 'yield [%]', stroke: c('curve'), width: 2, points: {show: true, size: 6}}, {label: 'runs', scale: 'n', stroke: c('quiet'), fill: c('line'), paths: uPlot.paths.bars({size: [0.7, 40]}), points: {show: false}}]},
-    data: [x, rate, count]})));
+      scales: {x: {time: true, range: around(width / 1000)}, y: {range: (u, a) => [Math.max(0, Math.min(90, Math.floor((a ?? 0) / 10) * 10 - 10)), 101]}, n: {range: (u, a, b) => [0, 3 * (b || 1)]}},
+      axes: axes(c, '', 'yield [%]', {x: {values: clock, space: 75}, more: [{side: 1, scale: 'n', label: 'runs', stroke: c('quiet'), grid: {show: false}, size: 55}]}),
+      series: [{label: 'time'}, {label: 'runs', scale: 'n', stroke: c('quiet'), fill: c('line'), paths: uPlot.paths.bars({size: [0.7, 40]}), points: {show: false}}, {label: 'yield [%]', stroke: c('curve'), width: 2, points: {show: true, size: 6}}]},
+    data: [x, count, rate]})));
   return box;
 }
 let mask;
@@ -285,21 +299,25 @@ function figure_rows() {
     const numbers = trusted(f, ks).map(k => f.value[k]), m = moments(numbers), b = f.bounds[f.bound[ks[ks.length - 1]]];
     const bad = ks.filter(k => f.outcome[k] === 'FAIL' || f.outcome[k] === 'UNSET').length;
     const judged = ks.filter(k => f.outcome[k] !== 'MEASURED').length;
-    return {f, place, m, b, bad, judged, odd: ks.filter(k => typeof f.value[k] === 'string').length, capability: cpk(m, b)};
+    const us = ks.map(k => f.uncertainty[k]).filter(finite), uncertainty = us.length ? us.reduce((a, x) => a + x, 0) / us.length : 0;
+    return {f, place, m, b, bad, judged, uncertainty, odd: ks.filter(k => typeof f.value[k] === 'string').length, capability: cpk(m, b)};
   }).filter(row => row);
 }
 function figures() {
   const rows = figure_rows();
   if (!rows.some(row => row.place === state.figure) && rows.length) state.figure = rows[0].place;
-  const cell = text => h('td', {class: 'number'}, text);
-  const body = rows.map(r => h('tr', {class: r.place === state.figure ? 'chosen' : undefined},
-    h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', 'aria-pressed': String(r.place === state.figure), onclick: () => { state.figure = r.place; render('figure'); }}, short_name(r.f))),
+  const cell = text => h('td', {class: 'number'}, text), unsure = rows.some(r => r.uncertainty > 0);
+  const row_of = r => h('tr', {class: r.place === state.figure ? 'chosen' : undefined},
+    h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', 'aria-pressed': String(r.place === state.figure), onclick: () => { state.figure = r.place; render('figure'); }}, r.f.name)),
     cell(r.m.n + (r.odd ? ' (+' + r.odd + ' not finite)' : '')), cell(r.m.n ? number(r.m.mean) : '–'), cell(isFinite(r.m.s) ? number(r.m.s) : '–'),
-    cell(r.m.n ? number(r.m.min) : '–'), cell(r.m.n ? number(r.m.max) : '–'), h('td', {}, r.f.unit), h('td', {}, bounds_text(r.b)), cell(isFinite(r.capability) ? r.capability.toFixed(2) : '–'),
-    h('td', {}, r.judged ? (r.bad ? verdict('FAIL') : verdict('PASS')) : verdict('MEASURED'), r.bad ? ' ' + r.bad + ' of ' + r.judged : '')));
-  return h('div', {class: 'scroll'}, h('table', {id: 'figures'}, h('caption', {class: 'quiet'}, 'Count to Cpk leave out runs that ended in ERROR'), h('thead', {}, h('tr', {}, h('th', {scope: 'col'}, 'figure'),
-    ['count', 'mean', 'deviation', 'min', 'max'].map(t => h('th', {scope: 'col', class: 'number'}, t)), h('th', {scope: 'col'}, 'unit'), h('th', {scope: 'col'}, 'limits'),
-    h('th', {scope: 'col', class: 'number'}, 'Cpk'), h('th', {scope: 'col'}, 'verdicts'))), h('tbody', {}, body)));
+    cell(r.m.n ? number(r.m.min) : '–'), cell(r.m.n ? number(r.m.max) : '–'), unsure ? cell(r.uncertainty > 0 ? '± ' + Number((2 * r.uncertainty).toPrecision(2)) : '') : null,
+    h('td', {}, r.f.unit === '1' ? '' : r.f.unit), h('td', {class: 'whole'}, bounds_text(r.b)), cell(isFinite(r.capability) ? r.capability.toFixed(2) : '–'),
+    h('td', {class: 'whole'}, r.judged ? (r.bad ? verdict('FAIL') : verdict('PASS')) : verdict('MEASURED'), r.bad ? ' ' + r.bad + ' of ' + r.judged : ''));
+  const steps = [...new Set(rows.map(r => r.f.step))], wide = unsure ? 11 : 10;
+  const body = steps.map(step => h('tbody', {}, many_steps() ? h('tr', {}, h('th', {class: 'step', scope: 'rowgroup', colspan: wide}, step)) : null, rows.filter(r => r.f.step === step).map(row_of)));
+  return h('div', {class: 'scroll'}, h('table', {id: 'figures'}, h('caption', {class: 'quiet'}, 'Count to Cpk leave out runs that ended in ERROR' + (unsure ? '; uncertainty: mean of the readings’, expanded (95 %)' : '')), h('thead', {}, h('tr', {}, h('th', {scope: 'col'}, 'figure'),
+    ['count', 'mean', 'deviation', 'min', 'max', ...(unsure ? ['uncertainty'] : [])].map(t => h('th', {scope: 'col', class: 'number'}, t)), h('th', {scope: 'col'}, 'unit'), h('th', {scope: 'col'}, 'limits'),
+    h('th', {scope: 'col', class: 'number'}, 'Cpk'), h('th', {scope: 'col'}, 'verdicts'))), body));
 }
 function histogram(values, extra) {
   const all = values.concat(extra);
@@ -334,7 +352,8 @@ function figure_detail() {
   later(() => plot(left_host, c => ({
     options: {scales: {x: {time: false, range: (p, a, z) => [a - width, z + width]}, y: {range: (p, a, z) => [0, z * 1.1]}}, axes: axes(c, with_unit('value', f.unit === '1' ? '' : '[' + f.unit + ']'), 'runs'),
       legend: {show: false}, series: [{}, {label: 'runs', stroke: c('curve'), fill: c('curve') + '66', paths: uPlot.paths.bars({size: [0.9, 100]}), points: {show: false}}],
-      hooks: {drawClear: [limit_marks(c, b, u, true)], draw: picked === undefined ? [] : [p => {
+      hooks: {drawClear: [limit_marks(c, b, u, true)], draw: [limit_marks(c, b, u, true, true), p => {
+        if (picked === undefined) return;
         const at = p.valToPos(f.value[picked], 'x', true), ctx = p.ctx;
         ctx.save(); ctx.fillStyle = c('pick'); ctx.beginPath(); ctx.moveTo(at, p.bbox.top + p.bbox.height); ctx.lineTo(at - 8, p.bbox.top + p.bbox.height + 14); ctx.lineTo(at + 8, p.bbox.top + p.bbox.height + 14); ctx.fill(); ctx.restore();
       }]}},
@@ -342,11 +361,11 @@ function figure_detail() {
   const order = ks.slice().sort((p, q) => D.start_millis[f.run[p]] - D.start_millis[f.run[q]]);
   const [right, right_host] = plot_box('Trend', 'one point a run, by its start; drag to look closer, double-click to go back');
   later(() => plot(right_host, c => ({
-    options: {scales: {x: {time: true}, y: {range: (p, a, z) => { const all = [a, z, ...['min', 'max'].filter(s => s in b).map(s => b[s])]; const lo = Math.min(...all), hi = Math.max(...all), pad = 0.06 * (hi - lo) || 0.5; return [lo - pad, hi + pad]; }}},
-      axes: axes(c, '', f.unit === '1' ? '' : f.unit, {x: {values: clock}}), legend: {show: false},
+    options: {scales: {x: {time: true, range: around(Math.max(0.5, 0.01 * (D.start_millis[f.run[order[order.length - 1]]] - D.start_millis[f.run[order[0]]]) / 1000))}, y: {range: (p, a, z) => { const all = [a, z, ...['min', 'max'].filter(s => s in b).map(s => b[s])]; const lo = Math.min(...all), hi = Math.max(...all), pad = 0.06 * (hi - lo) || 0.5; return [lo - pad, hi + pad]; }}},
+      axes: axes(c, '', f.unit === '1' ? '' : f.unit, {x: {values: clock, space: 75}}), legend: {show: false},
       series: [{}, {label: f.name, stroke: c('curve'), paths: () => null, points: {show: true, size: order.length > 2000 ? 2 : 5, fill: c('curve')}},
         {label: 'chosen', stroke: c('pick'), paths: () => null, points: {show: true, size: 13, width: 3, fill: c('back')}}],
-      hooks: {drawClear: [limit_marks(c, b, u, false)]}},
+      hooks: {drawClear: [limit_marks(c, b, u, false)], draw: [limit_marks(c, b, u, false, true)]}},
     data: [order.map(k => D.start_millis[f.run[k]] / 1000), order.map(k => f.value[k]), order.map(k => f.run[k] === state.run ? f.value[k] : null)]})));
   box.append(h('div', {class: 'two'}, left, right));
   return box;
@@ -477,7 +496,9 @@ function start(data) {
 }
 const redraw = () => plots.forEach(p => p.draw());
 matchMedia('(prefers-color-scheme: dark)').addEventListener('change', redraw);
-addEventListener('beforeprint', redraw); addEventListener('afterprint', redraw);
+/* Plots are pictures: they are drawn for paper before a dark screen is printed. */
+addEventListener('beforeprint', () => { document.documentElement.dataset.paper = 'yes'; redraw(); });
+addEventListener('afterprint', () => { delete document.documentElement.dataset.paper; redraw(); });
 let timer; addEventListener('resize', () => { clearTimeout(timer); timer = setTimeout(redraw, 150); });
 addEventListener('keydown', e => { if (e.key === 'Escape' && state.run >= 0 && N > 1) { state.run = -1; render('pick'); } });
 async function unpack() {

@@ -113,6 +113,16 @@ async function usedByAReader(file) {
   assert.deepEqual(refused, ['rejected', 'rejected']);
   await page.emulateMedia({media: 'print'});
   assert.equal(await page.locator('.filters').isVisible(), false);
+  // A dark screen prints dark ink on white paper, plots too.
+  await page.emulateMedia({media: 'screen', colorScheme: 'dark'});
+  await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
+  const ink = await page.evaluate(() => {
+    const canvas = document.querySelector('canvas'), pixels = canvas.getContext('2d').getImageData(0, 0, canvas.width, canvas.height).data;
+    let pale = 0, dark = 0;
+    for (let i = 0; i < pixels.length; i += 4) if (pixels[i + 3] > 250) pixels[i] + pixels[i + 1] + pixels[i + 2] > 660 ? ++pale : ++dark;
+    return {pale, dark};
+  });
+  assert.ok(ink.dark > 500 && ink.pale < ink.dark / 10, JSON.stringify(ink));
   await page.context().close();
 }
 
