@@ -7,12 +7,14 @@
 #include <iterator>
 #include <memory>
 #include <thread>
+#include <unordered_set>
 
 #include "desk/base/files.h"
 #include "desk/base/text.h"
 #include "desk/batch/batch.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
+#include "desk/results/report.h"
 #include "tools/commands.h"
 #include "tools/program.h"
 
@@ -23,7 +25,7 @@ namespace {
 namespace fs = std::filesystem;
 
 struct BatchWanted {
-  std::string what, inputs, store, limits, pictures = "failures", shard = "1/1";
+  std::string what, inputs, store, limits, junit, pictures = "failures", shard = "1/1";
   std::vector<std::string> parameters, properties;
   bool watch = false, quiet = false;
   int workers = static_cast<int>(std::max(1U, std::thread::hardware_concurrency()));
@@ -113,6 +115,27 @@ int StatusOf(const BatchProgress& progress) {
   return progress.outcomes.count("FAIL") != 0 ? kExitLimitBroken : kExitWithinLimits;
 }
 
+// The verdicts of this batch's runs, those that were there before among them.
+void WriteJUnit(const BatchWanted& wanted, const Plan& plan, Store& store, const BatchProgress& done) {
+  const std::unordered_set<std::string> keys(done.keys.begin(), done.keys.end());
+  Report report(plan.name.empty() ? wanted.what : plan.name, Report::Pictures::kNone);
+  store.EachRun(RunsOf(plan), false, [&](const RunRow& row, StoredRun&& run) {
+    if (keys.count(row.key) != 0) report.Add(run);
+  });
+  WriteOutput(wanted.junit, report.JUnit());
+}
+
+void Tell(const Store& store, const BatchProgress& done) {
+  std::cout << Format("%s: %s, %s stored, %zu there before; %.1f s\n", store.name().c_str(),
+                      Count(done.jobs_done, "unit").c_str(), Count(done.runs, "run").c_str(), done.known, done.seconds)
+            << Verdicts(done).substr(std::min<std::size_t>(2, Verdicts(done).size())) << '\n';
+}
+
+KeepPictures PicturesOf(const BatchWanted& wanted) {
+  if (wanted.pictures == "none") return KeepPictures::kNone;
+  return wanted.pictures == "all" ? KeepPictures::kAll : KeepPictures::kFailures;
+}
+
 int RunIt(BatchWanted& wanted) {
   Plan plan = PlanFor(wanted);
   std::unique_ptr<FolderWatch> watch;
@@ -128,27 +151,23 @@ int RunIt(BatchWanted& wanted) {
   if (jobs.empty() && !wanted.watch && shard.count == 1) {
     throw Failure(kWrongUsage, Printable(wanted.inputs) + ": holds " + (plan.name.empty() ? "no photo" : "no unit"));
   }
+  CheckOutputs({{"the inputs", wanted.inputs}, {"the plan", wanted.what}},
+               {{"the store", wanted.store.find("://") == std::string::npos ? wanted.store : ""},
+                {"the test results", wanted.junit}});
   wanted.options.workers = wanted.workers;
-  wanted.options.pictures = wanted.pictures == "all"        ? KeepPictures::kAll
-                            : wanted.pictures == "failures" ? KeepPictures::kFailures
-                                                            : KeepPictures::kNone;
+  wanted.options.pictures = PicturesOf(wanted);
   Store store(wanted.store, Store::Use::kWrite);
   store.TellOfWaiting([](const std::string& sentence) { std::cerr << sentence << '\n'; });
   FinishWhenInterrupted();
   const bool terminal = isatty(STDERR_FILENO) != 0 && !wanted.quiet;
-  const BatchProgress done = RunBatch(
-      plan, jobs, watch.get(), store, wanted.options,
-      [&](const BatchProgress& progress) {
-        if (terminal) ShowProgress(progress);
-      },
-      [] { return InterruptedStatus() != 0; });
+  const auto show = [&](const BatchProgress& progress) {
+    if (terminal) ShowProgress(progress);
+  };
+  const BatchProgress done =
+      RunBatch(plan, jobs, watch.get(), store, wanted.options, show, [] { return InterruptedStatus() != 0; });
   if (terminal) std::cerr << '\n';
-  if (!wanted.quiet) {
-    std::cout << Format("%s: %s, %s stored, %zu there before; %.1f s\n", store.name().c_str(),
-                        Count(done.jobs_done, "unit").c_str(), Count(done.runs, "run").c_str(), done.known,
-                        done.seconds)
-              << Verdicts(done).substr(std::min<std::size_t>(2, Verdicts(done).size())) << '\n';
-  }
+  if (!wanted.junit.empty()) WriteJUnit(wanted, plan, store, done);
+  if (!wanted.quiet) Tell(store, done);
   return InterruptedStatus() != 0 ? InterruptedStatus() : StatusOf(done);
 }
 
@@ -173,6 +192,7 @@ CommandBody DeclareBatch(Options& command) {
   command.Text("--station", wanted->options.station, "Name of the station", "ID");
   command.Text("--operator", wanted->options.operator_name, "Who measures", "NAME");
   command.Text("--lot", wanted->options.lot, "What the units belong to", "NAME");
+  command.Text("--junit", wanted->junit, "Write the verdicts as JUnit XML, for a CI server", "XML");
   command.Flag("--quiet", wanted->quiet, "Print nothing but errors");
   return [wanted] { return RunIt(*wanted); };
 }

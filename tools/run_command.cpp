@@ -10,6 +10,7 @@
 #include "desk/batch/plan.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/telling.h"
+#include "desk/results/report.h"
 #include "desk/results/store.h"
 #include "tools/commands.h"
 #include "tools/program.h"
@@ -21,7 +22,7 @@ namespace {
 namespace fs = std::filesystem;
 
 struct RunWanted {
-  std::string plan, unit, station, operator_name, lot, store, records, pictures;
+  std::string plan, unit, station, operator_name, lot, store, records, pictures, junit;
   bool quiet = false;
 };
 
@@ -123,7 +124,7 @@ class PlanRun {
       for (const Input& input : RequestFor(plan_, step, wanted_.unit).inputs)
         inputs.push_back({"an input", input.name});
     }
-    std::vector<NamedFile> outputs = {{"the records", wanted_.records}};
+    std::vector<NamedFile> outputs = {{"the records", wanted_.records}, {"the test results", wanted_.junit}};
     for (const PlanStep& step : plan_.steps) {
       if (!wanted_.pictures.empty()) outputs.push_back({"a picture", wanted_.pictures + "/" + FileName(step.name)});
     }
@@ -158,11 +159,18 @@ class PlanRun {
     // Said only when what was asked for is kept.
     if (store_) store_->Put(runs_);
     if (!wanted_.records.empty()) WriteOutput(wanted_.records, records_);
+    if (!wanted_.junit.empty()) WriteJUnit();
     if (!wanted_.quiet && wanted_.records != "-") {
       PrintTable(lines_);
       std::cout << Printable(wanted_.unit) << ": " << verdicts_ << '\n';
     }
     return worst_;
+  }
+
+  void WriteJUnit() const {
+    Report report(plan_.name, Report::Pictures::kNone);
+    for (const StoredRun& run : runs_) report.Add(run);
+    WriteOutput(wanted_.junit, report.JUnit());
   }
 
   static int StatusOf(Outcome outcome) {
@@ -193,6 +201,7 @@ CommandBody DeclareRun(Options& command) {
                "STORE");
   command.Text("--json", wanted->records, "Write the records, one a line; - is standard output", "FILE");
   command.Text("--annotate", wanted->pictures, "Write a picture of each step into this folder", "DIR");
+  command.Text("--junit", wanted->junit, "Write the verdicts as JUnit XML, for a CI server", "XML");
   command.Flag("--quiet", wanted->quiet, "Print nothing but errors");
   return [wanted] { return PlanRun(*wanted).Go(); };
 }

@@ -40,7 +40,9 @@ std::string FiguresText(Store& store, const Selection& selection, const RunRow& 
   for (const FigureRow& figure : figures) {
     const Quantity& quantity = quantities.at(figure.quantity);
     lines.push_back({"  " + quantity.name, figure.outcome + (figure.marginal ? ", marginal" : ""),
-                     figure.measured ? ValueText(figure.value, figure.uncertainty, quantity.unit) : "not measured",
+                     figure.measured             ? ValueText(figure.value, figure.uncertainty, quantity.unit)
+                     : figure.outcome == "UNSET" ? "not measured"
+                                                 : "a list",
                      BoundsText(figure.bounds)});
   }
   return Table(lines, {false, false, false, false});

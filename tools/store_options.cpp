@@ -47,12 +47,6 @@ ArchiveLimits ReadArchiveLimits(const std::string& path) {
   return limits;
 }
 
-std::string BoundsText(const Bounds& bounds) {
-  if (bounds.min && bounds.max) return Format("%.6g to %.6g", *bounds.min, *bounds.max);
-  if (bounds.min) return Format("at least %.6g", *bounds.min);
-  return bounds.max ? Format("at most %.6g", *bounds.max) : "";
-}
-
 std::string ValueText(double value, const std::optional<double>& uncertainty, const std::string& unit) {
   std::string text = std::isnan(value) ? "not a number" : Format("%.6g", value);
   if (uncertainty) text += Format(" ± %.2g", 2 * *uncertainty);

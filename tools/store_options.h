@@ -21,8 +21,6 @@ struct StoreOptions {
 
 ArchiveLimits ReadArchiveLimits(const std::string& path);
 
-/// "at least 0.38", "0.38 to 0.6", or nothing.
-std::string BoundsText(const Bounds& bounds);
 /// "0.4213 ± 0.002 Nyquist", the uncertainty expanded by 2.
 std::string ValueText(double value, const std::optional<double>& uncertainty, const std::string& unit);
 /// "12 runs: 10 PASS, 2 FAIL; yield 83.3 %".

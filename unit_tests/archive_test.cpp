@@ -206,6 +206,12 @@ Json DataOf(const std::string& html) {
 TEST_F(Archive, BecomesAReportWhoseWordsAreData) {
   Report report(kEvil, Report::Pictures::kAll);
   for (const StoredRun& run : SomeRuns()) report.Add(run);
+  StoredRun list = RunOf("F", 1, nullptr, "FAIL");
+  list.record["phases"][0]["measurements"]["flash_patches"] = {{"outcome", "FAIL"},
+                                                               {"measured_value", {{3, 0.5}, {7, nullptr}, {8, 4}}},
+                                                               {"decision", {{"broken", {7, 8}}}},
+                                                               {"limits", {{"each", {{"max", 3}}}}}};
+  report.Add(list);
   const std::string html = report.Html();
   const Json data = DataOf(html);
   ExpectValid(nlohmann::json(data), "report.schema.json");
@@ -215,12 +221,14 @@ TEST_F(Archive, BecomesAReportWhoseWordsAreData) {
   EXPECT_EQ(Json({0.05, 3, 4}),
             Json({data["figures"][1]["value"][1], data["figures"][1]["value"][2], data["figures"][1]["value"][3]}));
   EXPECT_EQ("nan", data["figures"][1]["value"][0]);
+  EXPECT_EQ("3 values, 0.5 to 4; outside: 7, 8", data["figures"][2]["list"]["5"]);
   const Json& curve = data["curves"][0]["points"][0];  // straight from 1 at 0 to 0.25 at 0.75, then nothing
   EXPECT_EQ(Json({10000, 5000, 2500, nullptr}), Json({curve[0], curve[50], curve[75], curve[76]}));
   const std::string junit = report.JUnit();
-  EXPECT_THAT(junit, HasSubstr(R"(tests="5" failures="2" errors="2")"));
+  EXPECT_THAT(junit, HasSubstr(R"(tests="6" failures="3" errors="2")"));
   EXPECT_THAT(junit, HasSubstr("name=\"&lt;b&gt;&amp;&quot;' ,;"));
   EXPECT_THAT(junit, HasSubstr(R"(message="flash_mean: 0.05 level, limit at least 0.1")"));
+  EXPECT_THAT(junit, HasSubstr("flash_patches: 3 values, 0.5 to 4; outside: 7, 8, limit each at most 3"));
   EXPECT_THAT(report.Plot(), HasSubstr("min 0.1"));
 }
 

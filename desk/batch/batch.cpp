@@ -30,7 +30,7 @@ class Running {
  public:
   Running(const Plan& plan, std::vector<Job> jobs, FolderWatch* watch, Store& store, const BatchOptions& options)
       : order_{plan, options, known_}, jobs_(std::move(jobs)), watch_(watch), store_(store) {
-    store.EachRow(Selected(plan), [&](const RunRow& run) {
+    store.EachRow(RunsOf(plan), [&](const RunRow& run) {
       if (run.result_code != QV_ERROR_INTERNAL) known_[run.key] = run.outcome;  // what a fault ended is tried again
     });
     for (std::size_t i = 0; i < jobs_.size(); ++i) todo_.push_back({i, 0});
@@ -56,12 +56,6 @@ class Running {
   }
 
  private:
-  // Only runs of the same plan or measurement can be the same run.
-  static Selection Selected(const Plan& plan) {
-    if (!plan.name.empty()) return {{"plan", "=", plan.name}};
-    return {{"measurement", "=", plan.steps.at(0).request.measurement}};
-  }
-
   bool Busy() const {
     return watch_ != nullptr || !todo_.empty() ||
            std::any_of(workers_.begin(), workers_.end(), [](const auto& worker) { return worker && !worker->idle(); });
@@ -134,11 +128,13 @@ class Running {
     if (!done.run) {
       ++progress_.known;
       ++progress_.outcomes[known_.at(done.known_key)];
+      progress_.keys.push_back(done.known_key);
       return;
     }
     done.run->filing = FilingFor(order_, jobs_[job], order_.plan.steps.at(done.step));
     ++progress_.runs;
     ++progress_.outcomes[TextAt(done.run->record, "outcome")];
+    progress_.keys.push_back(done.run->key);
     pending_.push_back(std::move(*done.run));
   }
 
@@ -166,6 +162,11 @@ class Running {
 };
 
 }  // namespace
+
+Selection RunsOf(const Plan& plan) {
+  if (!plan.name.empty()) return {{"plan", "=", plan.name}};
+  return {{"measurement", "=", plan.steps.at(0).request.measurement}};
+}
 
 BatchProgress RunBatch(const Plan& plan, const std::vector<Job>& jobs, FolderWatch* watch, Store& store,
                        const BatchOptions& options, const std::function<void(const BatchProgress&)>& progress,

@@ -26,8 +26,12 @@ struct BatchProgress {
   std::size_t runs = 0;                         // measured and stored in this batch
   std::size_t known = 0;                        // steps whose run was in the store before
   std::map<std::string, std::size_t> outcomes;  // of all these runs, by word
+  std::vector<std::string> keys;                // of all these runs
   double seconds = 0;
 };
+
+/// The runs of a plan, or of a measurement that no plan asks for: none other can be the same run.
+Selection RunsOf(const Plan& plan);
 
 /// Measures all jobs by the plan in worker processes of their own and stores every run as it comes; what the store
 /// holds already is not measured again. A worker that dies, hangs or is killed costs the step it was at an ERROR that

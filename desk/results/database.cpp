@@ -30,10 +30,10 @@ std::string WithoutPassword(const std::string& name) {
   return at == std::string::npos || colon > at ? name : name.substr(0, colon) + name.substr(at);
 }
 
-// What the database said, in one line, without the statement it said it of.
+// What the database said, without its hints and the statement it said it of.
 std::string OneLine(std::string text) {
   text.erase(std::min(text.find(" while executing"), text.size()));
-  std::replace(text.begin(), text.end(), '\n', ' ');
+  text.erase(std::min(text.find('\n', text.find_first_not_of('\n')), text.size()));
   text.erase(text.find_last_not_of(' ') + 1);
   return text;
 }

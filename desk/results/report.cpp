@@ -72,9 +72,13 @@ std::string LimitsName(const Json& record) {
   return name.empty() ? "" : name + " revision " + TextAt(limits, "revision");
 }
 
-std::string BoundsText(const Bounds& bounds) {
-  if (bounds.min && bounds.max) return Format("%.6g to %.6g", *bounds.min, *bounds.max);
-  return bounds.min ? Format("at least %.6g", *bounds.min) : bounds.max ? Format("at most %.6g", *bounds.max) : "";
+// A reading and what it must keep to, for people.
+std::string ReadingWords(const StoredFigure& figure) {
+  const std::string value = !figure.list.empty() ? figure.list
+                            : figure.value       ? Format("%.6g %s", *figure.value, figure.unit.c_str())
+                                                 : "not measured";
+  return figure.name + ": " + value + ", limit " +
+         (figure.list_limits.empty() ? BoundsText(figure.bounds) : figure.list_limits);
 }
 
 std::string Xml(const std::string& text) {
@@ -133,7 +137,7 @@ void Report::AddFigures(std::size_t run, const std::string& step, const Json& re
   for (const StoredFigure& figure : FiguresOf(record)) {
     const auto [at, made] = figure_places_.try_emplace(
         step + '\n' + figure.name + '\n' + figure.unit + '\n' + figure.method, figures_.size());
-    if (made) figures_.push_back({figure, step, {}, {}, {}, {}, {}, {}, {}});
+    if (made) figures_.emplace_back(FigureColumn{figure, step, {}, {}, {}, {}, {}, {}, {}, {}, {}});
     FigureColumn& column = figures_[at->second];
     const auto bound = std::find(column.bounds.begin(), column.bounds.end(), figure.bounds);
     column.bound.push_back(static_cast<std::size_t>(bound - column.bounds.begin()));
@@ -143,10 +147,12 @@ void Report::AddFigures(std::size_t run, const std::string& step, const Json& re
     column.uncertainty.push_back(figure.uncertainty);
     column.outcome.push_back(figure.outcome);
     column.marginal.push_back(figure.marginal);
+    if (!figure.list.empty() || !figure.list_limits.empty()) {
+      column.list[run] = figure.list;
+      column.list_limits[run] = figure.list_limits;
+    }
     if (figure.outcome != "FAIL" && figure.outcome != "UNSET") continue;
-    const std::string value = figure.value ? Format("%.6g %s", *figure.value, figure.unit.c_str()) : "not measured";
-    (figure.outcome == "FAIL" ? cases_[run].failure : cases_[run].error) +=
-        figure.name + ": " + value + ", limit " + BoundsText(figure.bounds) + "\n";
+    (figure.outcome == "FAIL" ? cases_[run].failure : cases_[run].error) += ReadingWords(figure) + "\n";
   }
   for (const Json& phase : At(record, "phases")) {
     const Json& measurements = At(phase, "measurements");
@@ -196,6 +202,47 @@ void Report::AddWords(std::size_t run, const StoredRun& source, bool failed) {
   }
 }
 
+Json Report::FiguresJson() const {
+  Json figures = Json::array();
+  for (const FigureColumn& f : figures_) {
+    Json figure = {{"name", f.about.name},
+                   {"step", f.step},
+                   {"unit", f.about.unit},
+                   {"method", f.about.method},
+                   {"docstring", f.about.docstring},
+                   {"bounds", Json::array()},
+                   {"run", f.run},
+                   {"bound", f.bound},
+                   {"value", Json::array()},
+                   {"uncertainty", Json::array()},
+                   {"outcome", f.outcome},
+                   {"marginal", f.marginal}};
+    for (const Bounds& bounds : f.bounds) figure["bounds"].push_back(ToJson(bounds));
+    for (const auto& value : f.value) figure["value"].push_back(NumberOrWord(value));
+    for (const auto& uncertainty : f.uncertainty) figure["uncertainty"].push_back(NumberOrWord(uncertainty));
+    for (const auto& [run, words] : f.list) figure["list"][std::to_string(run)] = words;
+    for (const auto& [run, words] : f.list_limits) figure["list_limits"][std::to_string(run)] = words;
+    figures.push_back(std::move(figure));
+  }
+  return figures;
+}
+
+Json Report::CurvesJson() const {
+  Json curves = Json::array();
+  for (const CurveColumn& c : curves_) {
+    Json curve = {{"name", c.name},       {"step", c.step}, {"docstring", c.docstring},
+                  {"scale", kCurveScale}, {"run", c.run},   {"points", Json::array()}};
+    for (const std::vector<double>& points : c.points) {
+      Json row = Json::array();
+      for (const double value : points)
+        row.push_back(std::isfinite(value) ? Json(std::lround(value * kCurveScale)) : Json());
+      curve["points"].push_back(std::move(row));
+    }
+    curves.push_back(std::move(curve));
+  }
+  return curves;
+}
+
 Json Report::Data() const {
   const auto column = [](const Column& c) { return Json{{"values", c.values}, {"index", c.index}}; };
   Json data = {{"schema", "qvtester-report-1"},
@@ -213,8 +260,8 @@ Json Report::Data() const {
                {"library_version", column(version_)},
                {"limits", column(limits_)},
                {"columns", Json::object()},
-               {"figures", Json::array()},
-               {"curves", Json::array()},
+               {"figures", FiguresJson()},
+               {"curves", CurvesJson()},
                {"details", details_},
                {"inputs", inputs_},
                {"logs", logs_},
@@ -223,35 +270,6 @@ Json Report::Data() const {
     Column whole = values;
     whole.index.resize(units_.size(), whole.Place(""));
     data["columns"][name] = column(whole);
-  }
-  for (const FigureColumn& f : figures_) {
-    Json figure = {{"name", f.about.name},
-                   {"step", f.step},
-                   {"unit", f.about.unit},
-                   {"method", f.about.method},
-                   {"docstring", f.about.docstring},
-                   {"bounds", Json::array()},
-                   {"run", f.run},
-                   {"bound", f.bound},
-                   {"value", Json::array()},
-                   {"uncertainty", Json::array()},
-                   {"outcome", f.outcome},
-                   {"marginal", f.marginal}};
-    for (const Bounds& bounds : f.bounds) figure["bounds"].push_back(ToJson(bounds));
-    for (const auto& value : f.value) figure["value"].push_back(NumberOrWord(value));
-    for (const auto& uncertainty : f.uncertainty) figure["uncertainty"].push_back(NumberOrWord(uncertainty));
-    data["figures"].push_back(std::move(figure));
-  }
-  for (const CurveColumn& c : curves_) {
-    Json curve = {{"name", c.name},       {"step", c.step}, {"docstring", c.docstring},
-                  {"scale", kCurveScale}, {"run", c.run},   {"points", Json::array()}};
-    for (const std::vector<double>& points : c.points) {
-      Json row = Json::array();
-      for (const double value : points)
-        row.push_back(std::isfinite(value) ? Json(std::lround(value * kCurveScale)) : Json());
-      curve["points"].push_back(std::move(row));
-    }
-    data["curves"].push_back(std::move(curve));
   }
   return data;
 }
@@ -354,7 +372,8 @@ std::string Report::Plot() const {
     for (const double value : values) {
       ++bars.points[std::min(bins - 1, static_cast<std::size_t>((value - *low) / width))].second;
     }
-    SvgPanel panel = {figure.step + ": " + figure.about.name, figure.about.unit == "1" ? "" : figure.about.unit, "runs", {bars}, {}};
+    SvgPanel panel = {
+        figure.step + ": " + figure.about.name, figure.about.unit == "1" ? "" : figure.about.unit, "runs", {bars}, {}};
     if (bounds.min) panel.lines.emplace_back(*bounds.min, Format("min %.6g", *bounds.min));
     if (bounds.max) panel.lines.emplace_back(*bounds.max, Format("max %.6g", *bounds.max));
     panels.push_back(std::move(panel));

@@ -50,6 +50,7 @@ class Report {
     std::vector<std::optional<double>> value, uncertainty;
     std::vector<std::string> outcome;
     std::vector<bool> marginal;
+    std::map<std::size_t, std::string> list, list_limits;  // by run, of a list
   };
   struct CurveColumn {
     std::string name, step, docstring;
@@ -63,6 +64,8 @@ class Report {
 
   void AddFigures(std::size_t run, const std::string& step, const Json& record);
   void AddCurve(std::size_t run, const std::string& step, const std::string& name, const Json& measurement);
+  Json FiguresJson() const;
+  Json CurvesJson() const;
   void AddWords(std::size_t run, const StoredRun& source, bool failed);
 
   std::string title_;

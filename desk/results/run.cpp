@@ -1,11 +1,13 @@
 #include "desk/results/run.h"
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
 #include <set>
 
 #include "desk/base/digest.h"
 #include "desk/base/failure.h"
+#include "desk/base/text.h"
 
 namespace qv {
 
@@ -36,6 +38,44 @@ Json RequestOf(const Json& record) {
           {"command", At(metadata, "command")}};
 }
 
+Bounds BoundsOf(const Json& limits) {
+  return {NumberAt(limits, "min"), NumberAt(limits, "max"), NumberAt(limits, "marginal_min"),
+          NumberAt(limits, "marginal_max")};
+}
+
+// A list's values, and which of its entries are outside their limits.
+std::string ListWords(const Json& measurement) {
+  const Json& points = At(measurement, "measured_value");
+  double low = std::numeric_limits<double>::infinity();
+  double high = -low;
+  for (const Json& point : points) {
+    if (!point.is_array() || point.size() < 2 || !point[1].is_number()) continue;
+    low = std::min(low, point[1].get<double>());
+    high = std::max(high, point[1].get<double>());
+  }
+  std::string words = Count(points.size(), "value");
+  if (low <= high) words += Format(", %.6g to %.6g", low, high);
+  const Json& broken = At(At(measurement, "decision"), "broken");
+  for (std::size_t i = 0; i < broken.size(); ++i) words += (i == 0 ? "; outside: " : ", ") + broken[i].dump();
+  return words;
+}
+
+// {"each": {...}, "patches": {"7": {...}}} -> "each at most 3; patches 7 at most 2"
+std::string ListLimitWords(const Json& limits) {
+  std::string words;
+  for (const auto& [name, bounds] : limits.items()) {
+    if (!bounds.is_object()) continue;
+    if (name == "each") {
+      words += (words.empty() ? "each " : "; each ") + BoundsText(BoundsOf(bounds));
+      continue;
+    }
+    for (const auto& [number, own] : bounds.items()) {
+      words += (words.empty() ? "" : "; ") + name + " " + number + " " + BoundsText(BoundsOf(own));
+    }
+  }
+  return words;
+}
+
 std::optional<double> ValueOf(const Json& measurement) {
   const Json& value = At(measurement, "measured_value");
   if (value.is_number()) return value.get<double>();
@@ -50,6 +90,11 @@ std::optional<double> ValueOf(const Json& measurement) {
 std::string TextAt(const Json& object, const char* name) {
   const Json& value = At(object, name);
   return value.is_string() ? value.get<std::string>() : std::string();
+}
+
+std::string BoundsText(const Bounds& bounds) {
+  if (bounds.min && bounds.max) return Format("%.6g to %.6g", *bounds.min, *bounds.max);
+  return bounds.min ? Format("at least %.6g", *bounds.min) : bounds.max ? Format("at most %.6g", *bounds.max) : "";
 }
 
 std::set<std::string> DoubtsOf(const Json& record) {
@@ -96,13 +141,13 @@ std::vector<StoredFigure> FiguresOf(const Json& record) {
     if (!measurements.is_object()) continue;
     for (const auto& [name, m] : measurements.items()) {
       const Json& limits = At(m, "limits");
-      if ((At(m, "measured_value").is_array() && !limits.is_object()) || !seen.insert(name).second) continue;
+      const bool list = At(m, "measured_value").is_array();
+      if ((list && !limits.is_object()) || !seen.insert(name).second) continue;
       const Json& doubt = At(m, "marginal");
       figures.push_back({name, TextAt(At(m, "units"), "suffix"), TextAt(m, "method"), TextAt(m, "docstring"),
                          ValueOf(m), NumberAt(At(m, "uncertainty"), "standard"), TextAt(m, "outcome"),
-                         doubt.is_boolean() && doubt.get<bool>(),
-                         Bounds{NumberAt(limits, "min"), NumberAt(limits, "max"), NumberAt(limits, "marginal_min"),
-                                NumberAt(limits, "marginal_max")}});
+                         doubt.is_boolean() && doubt.get<bool>(), BoundsOf(limits), list ? ListWords(m) : "",
+                         ListLimitWords(limits)});
     }
   }
   return figures;

@@ -54,7 +54,11 @@ struct StoredFigure {
   std::string outcome;                // PASS, FAIL, MEASURED, UNSET
   bool marginal = false;
   Bounds bounds;
+  std::string list, list_limits;  // in words, of a list: "24 values, 0.3 to 8.1; outside: 3, 7"
 };
+
+/// "0.4 to 2", "at least 0.4"; empty without bounds.
+std::string BoundsText(const Bounds& bounds);
 
 /// The figures of a record, in its order; throws Failure (wrong usage) where the record is none.
 std::vector<StoredFigure> FiguresOf(const Json& record);

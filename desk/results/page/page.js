@@ -52,7 +52,9 @@ function bounds_text(b) {
   if ('min' in b && 'max' in b) return number(b.min) + ' to ' + number(b.max);
   return 'min' in b ? 'at least ' + number(b.min) : 'max' in b ? 'at most ' + number(b.max) : '';
 }
+const limits_text = (f, k) => f.list_limits && f.list_limits[f.run[k]] || bounds_text(f.bounds[f.bound[k]]);
 function reading(f, k) {
+  if (f.list && f.list[f.run[k]]) return f.list[f.run[k]];
   if (f.value[k] === null) return 'not measured';
   const u = f.uncertainty[k];
   const text = number(f.value[k]) + (typeof u === 'number' ? ' ± ' + Number((2 * u).toPrecision(2)) : '');
@@ -300,7 +302,7 @@ function figure_rows() {
     const bad = ks.filter(k => f.outcome[k] === 'FAIL' || f.outcome[k] === 'UNSET').length;
     const judged = ks.filter(k => f.outcome[k] !== 'MEASURED').length;
     const us = ks.map(k => f.uncertainty[k]).filter(finite), uncertainty = us.length ? us.reduce((a, x) => a + x, 0) / us.length : 0;
-    return {f, place, m, b, bad, judged, uncertainty, odd: ks.filter(k => typeof f.value[k] === 'string').length, capability: cpk(m, b)};
+    return {f, place, m, b, last: ks[ks.length - 1], bad, judged, uncertainty, odd: ks.filter(k => typeof f.value[k] === 'string').length, capability: cpk(m, b)};
   }).filter(row => row);
 }
 function figures() {
@@ -309,9 +311,9 @@ function figures() {
   const cell = text => h('td', {class: 'number'}, text), unsure = rows.some(r => r.uncertainty > 0);
   const row_of = r => h('tr', {class: r.place === state.figure ? 'chosen' : undefined},
     h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', 'aria-pressed': String(r.place === state.figure), onclick: () => { state.figure = r.place; render('figure'); }}, r.f.name)),
-    cell(r.m.n + (r.odd ? ' (+' + r.odd + ' not finite)' : '')), cell(r.m.n ? number(r.m.mean) : '–'), cell(isFinite(r.m.s) ? number(r.m.s) : '–'),
+    cell(r.f.list ? 'a list' : r.m.n + (r.odd ? ' (+' + r.odd + ' not finite)' : '')), cell(r.m.n ? number(r.m.mean) : '–'), cell(isFinite(r.m.s) ? number(r.m.s) : '–'),
     cell(r.m.n ? number(r.m.min) : '–'), cell(r.m.n ? number(r.m.max) : '–'), unsure ? cell(r.uncertainty > 0 ? '± ' + Number((2 * r.uncertainty).toPrecision(2)) : '') : null,
-    h('td', {}, r.f.unit === '1' ? '' : r.f.unit), h('td', {class: 'whole'}, bounds_text(r.b)), cell(isFinite(r.capability) ? r.capability.toFixed(2) : '–'),
+    h('td', {}, r.f.unit === '1' ? '' : r.f.unit), h('td', {class: r.f.list ? undefined : 'whole'}, limits_text(r.f, r.last)), cell(isFinite(r.capability) ? r.capability.toFixed(2) : '–'),
     h('td', {class: 'whole'}, r.judged ? (r.bad ? verdict('FAIL') : verdict('PASS')) : verdict('MEASURED'), r.bad ? ' ' + r.bad + ' of ' + r.judged : ''));
   const steps = [...new Set(rows.map(r => r.f.step))], wide = unsure ? 11 : 10;
   const body = steps.map(step => h('tbody', {}, many_steps() ? h('tr', {}, h('th', {class: 'step', scope: 'rowgroup', colspan: wide}, step)) : null, rows.filter(r => r.f.step === step).map(row_of)));
@@ -342,6 +344,7 @@ function figure_detail() {
   const b = ks.length ? f.bounds[f.bound[ks[ks.length - 1]]] : {};
   const us = ks.map(k => f.uncertainty[k]).filter(finite), u = us.length ? us.reduce((a, x) => a + x, 0) / us.length : 0;
   box.append(h('h3', {}, short_name(f)), h('p', {}, f.docstring), h('p', {class: 'quiet'}, 'Method: ' + f.method));
+  if (f.list) box.append(h('p', {}, 'A list: choose a run below to see which of its values are outside their limits.'));
   if (!ks.length) return box;
   const zone = 'red zone: beyond the limits; dashed: marginal' + (u > 0 ? '; yellow: guard band, the limit ± the expanded uncertainty (2 × ' + number(u) + ')' : '');
   const has_limits = 'min' in b || 'max' in b;
@@ -449,7 +452,7 @@ function run_pane() {
   const rows = by_run[i].slice().sort((a, b) => order[D.figures[a[0]].outcome[a[1]]] - order[D.figures[b[0]].outcome[b[1]]]).map(([p, k]) => {
     const f = D.figures[p];
     return h('tr', {}, h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', onclick: () => { state.figure = p; render('figure'); $('figure').scrollIntoView({block: 'nearest'}); }}, f.name)), h('td', {}, verdict(f.outcome[k], f.marginal[k])),
-      h('td', {class: 'number'}, reading(f, k)), h('td', {}, bounds_text(f.bounds[f.bound[k]])), h('td', {class: 'quiet'}, f.docstring.split('. ')[0].replace(/\.?$/, '.')));
+      h('td', {class: 'number'}, reading(f, k)), h('td', {}, limits_text(f, k)), h('td', {class: 'quiet'}, f.docstring.split('. ')[0].replace(/\.?$/, '.')));
   });
   const about = [['start', time(D.start_millis[i])], ['step', field('step', i)], ['station', field('station', i)], ['lot', field('lot', i)], ['operator', field('operator', i)], ['limits', field('limits', i)],
     ['library', field('library_version', i)], ['input', D.inputs[i].join(', ')], ...Object.keys(D.columns).map(name => [name, field(name, i)])].filter(([, word]) => word);

@@ -118,11 +118,11 @@ async function usedByAReader(file) {
   await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
   const ink = await page.evaluate(() => {
     const canvas = document.querySelector('canvas'), pixels = canvas.getContext('2d').getImageData(0, 0, canvas.width, canvas.height).data;
-    let pale = 0, dark = 0;
-    for (let i = 0; i < pixels.length; i += 4) if (pixels[i + 3] > 250) pixels[i] + pixels[i + 1] + pixels[i + 2] > 660 ? ++pale : ++dark;
-    return {pale, dark};
+    let dark = 0;
+    for (let i = 0; i < pixels.length; i += 4) if (pixels[i + 3] > 250 && pixels[i] + pixels[i + 1] + pixels[i + 2] < 150) ++dark;
+    return dark;
   });
-  assert.ok(ink.dark > 500 && ink.pale < ink.dark / 10, JSON.stringify(ink));
+  assert.ok(ink > 200, ink + ' dark pixels');
   await page.context().close();
 }
 
