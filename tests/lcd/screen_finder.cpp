@@ -29,7 +29,9 @@ constexpr double kLeastSupport = 0.6;   // of a side by steps in one line
 constexpr double kLeastAngle = 0.6;     // sine of a corner's angle
 constexpr double kScreenOfPhone = 0.3;  // a bright area this large in a dark one is a screen in its bezel
 constexpr int kMostTried = 120;
-constexpr double kSkipped = 0.06;  // of a side at either end: corners may be rounded
+constexpr double kSkipped = 0.06;       // of a side at either end: corners may be rounded
+constexpr double kLeastGreyStep = 0.4;  // of the highest step of a colour
+constexpr double kClearly = 0.1;        // vote for grey: as much as noise alone gives here and there
 
 double Cross(cv::Point2d a, cv::Point2d b) { return a.x * b.y - a.y * b.x; }
 
@@ -550,10 +552,17 @@ EdgeFit FitEdge(const Profile& profile, Transfer stored) {
   return {edge[0], error};
 }
 
+double StepOf(const std::vector<Sample>& profile) {
+  const std::size_t few = profile.size() / 4 + 1;
+  double step = 0;
+  for (std::size_t i = 0; i < few; ++i) step += profile[i].level - profile[profile.size() - 1 - i].level;
+  return std::abs(step) / static_cast<double>(few);
+}
+
 // A side in pieces, so that its direction comes out as well as its place.
 struct PiecewiseFit {
   std::vector<cv::Point2d> points;
-  std::vector<double> errors;  // of all pieces
+  std::vector<double> errors;  // of all pieces, over the noise's
 };
 
 PiecewiseFit FitPieces(const std::vector<Profile>& pieces, const Line& line, double length, Transfer stored) {
@@ -563,7 +572,7 @@ PiecewiseFit FitPieces(const std::vector<Profile>& pieces, const Line& line, dou
     const EdgeFit edge = FitEdge(pieces[i], stored);
     const double along = kSkipped * length + used * (static_cast<double>(i) + 0.5) / static_cast<double>(pieces.size());
     if (std::abs(edge.place) < 3) fit.points.push_back(line.p + line.d * along + line.n() * edge.place);
-    fit.errors.push_back(edge.error);
+    fit.errors.push_back(edge.error / (std::pow(pieces[i].noise, 2) + 0.01));
   }
   return fit;
 }
@@ -611,63 +620,83 @@ void CutAtNextEdge(std::vector<Sample>& profile) {
   }
 }
 
-// Of the profiles of one piece by channel, the one with the highest step: the brightest channel at each place would
-// bend the profile where noise decides which that is.
-Profile BestProfile(const std::vector<Levels>& channels, cv::Point2d from, cv::Point2d to, const Line& line,
-                    double reach) {
-  Profile best;
+// Profiles of one piece: of the colour with the highest step, since the brightest one at each place would bend the
+// profile where noise decides which that is; and of grey, unless its step is far lower.
+struct Piece {
+  std::array<Profile, 2> by_source;  // colour, grey
+};
+
+std::optional<Piece> ProfilesOf(const std::vector<Levels>& channels, const Levels& grey, cv::Point2d from,
+                                cv::Point2d to, const Line& line, double reach) {
+  Piece piece;
+  Profile& best = piece.by_source[0];
   double highest = -1;
   for (const Levels& channel : channels) {
     Profile found = EdgeProfile(channel, from, to, line, reach);
-    const std::vector<Sample>& profile = found.samples;
-    if (profile.size() < 5) return {};
-    const std::size_t few = profile.size() / 4 + 1;
-    double step = 0;
-    for (std::size_t i = 0; i < few; ++i) step += profile[i].level - profile[profile.size() - 1 - i].level;
-    step = std::abs(step) / static_cast<double>(few);
+    if (found.samples.size() < 5) return std::nullopt;
+    const double step = StepOf(found.samples);
     if (step <= highest) continue;
     highest = step;
     std::swap(best, found);
   }
-  CutAtNextEdge(best.samples);
-  return best;
+  Profile mixed = EdgeProfile(grey, from, to, line, reach);
+  piece.by_source[1] = StepOf(mixed.samples) >= kLeastGreyStep * highest ? mixed : best;
+  for (Profile& profile : piece.by_source) CutAtNextEdge(profile.samples);
+  return piece;
 }
 
-Quad Refine(const std::vector<Levels>& channels, const Screen& screen) {
+// How much better the second fits than the first, on average of the pieces; one that neither fits, at the end of a bar
+// or under a reflection, has no more than one vote.
+double Vote(const std::array<PiecewiseFit, 4>& first, const std::array<PiecewiseFit, 4>& second) {
+  double vote = 0;
+  std::size_t pieces = 0;
+  for (int i = 0; i < 4; ++i) {
+    for (std::size_t k = 0; k < first[i].errors.size(); ++k, ++pieces) {
+      vote += std::clamp(std::log((first[i].errors[k] + 1e-9) / (second[i].errors[k] + 1e-9)), -1.0, 1.0);
+    }
+  }
+  return vote / static_cast<double>(pieces);
+}
+
+// By the colours or by grey, and by either transfer, whichever fits best. JPEG, and a sensor's mosaic, blur colours
+// more than grey, and that blur is none of light: there grey fits better by far.
+Quad Refine(const std::vector<Levels>& channels, const Levels& grey, const Screen& screen) {
   const Sides sides = SidesOf(screen.corners);
   double shortest = 1e9;
   for (int i = 0; i < 4; ++i) shortest = std::min(shortest, cv::norm(screen.corners[(i + 1) % 4] - screen.corners[i]));
   const double reach = std::min(8.0, shortest / 4);
-  std::array<std::array<PiecewiseFit, 4>, 2> fits;  // by transfer, by side
+  std::array<std::array<std::array<PiecewiseFit, 4>, 2>, 2> fits;  // by source, by transfer, by side
+  const std::size_t sources = channels.size() > 1 ? 2 : 1;
   for (int i = 0; i < 4; ++i) {
     const cv::Point2d from = screen.corners[i];
     const cv::Point2d way = screen.corners[(i + 1) % 4] - from;
     const int count = static_cast<int>(std::clamp(cv::norm(way) / 24, 2.0, 10.0));
-    std::vector<Profile> pieces;
+    std::array<std::vector<Profile>, 2> pieces;
     for (int k = 0; k < count; ++k) {
       const auto at = [&](int end) { return from + way * (kSkipped + (1 - 2 * kSkipped) * end / count); };
-      pieces.push_back(BestProfile(channels, at(k), at(k + 1), sides[i], reach));
-      if (pieces.back().samples.empty()) return screen.corners;
+      const auto piece = ProfilesOf(channels, grey, at(k), at(k + 1), sides[i], reach);
+      if (!piece) return screen.corners;
+      for (std::size_t source = 0; source < sources; ++source) pieces[source].push_back(piece->by_source[source]);
     }
-    fits[0][i] = FitPieces(pieces, sides[i], cv::norm(way), AsLight);
-    fits[1][i] = FitPieces(pieces, sides[i], cv::norm(way), AsSrgb);
-  }
-  double vote =
-      0;  // for sRGB; a piece that neither fits, at the end of a bar or under a reflection, has no more than one
-  for (int i = 0; i < 4; ++i) {
-    for (std::size_t k = 0; k < fits[0][i].errors.size(); ++k) {
-      vote += std::clamp(std::log((fits[0][i].errors[k] + 1e-9) / (fits[1][i].errors[k] + 1e-9)), -1.0, 1.0);
+    for (std::size_t source = 0; source < sources; ++source) {
+      fits[source][0][i] = FitPieces(pieces[source], sides[i], cv::norm(way), AsLight);
+      fits[source][1][i] = FitPieces(pieces[source], sides[i], cv::norm(way), AsSrgb);
     }
   }
-  const auto& best = fits[vote > 0 ? 1 : 0];
+  const auto better = [](const auto& both) { return &both[Vote(both[0], both[1]) > 0 ? 1 : 0]; };
+  const auto* best = better(fits[0]);
+  if (sources > 1) {
+    const auto* by_grey = better(fits[1]);
+    if (Vote(*best, *by_grey) > kClearly) best = by_grey;
+  }
   Sides fitted;
-  for (int i = 0; i < 4; ++i) fitted[i] = Through(best[i].points, sides[i]);
+  for (int i = 0; i < 4; ++i) fitted[i] = Through((*best)[i].points, sides[i]);
   return CornersOf(fitted).value_or(screen.corners);
 }
 
 // Of the colour channels.
 cv::Mat Brightest(const std::vector<cv::Mat>& channels) {
-  cv::Mat brightest = channels[0];
+  cv::Mat brightest = channels[0].clone();  // the maximum is taken in place
   for (std::size_t i = 1; i < channels.size(); ++i) brightest = cv::max(brightest, channels[i]);
   return brightest;
 }
@@ -688,6 +717,9 @@ std::vector<cv::Point2d> FindScreenCorners(const cv::Mat& photo, const ScreenRul
   }
   const Screen* chosen = Choose(screens, rules.dark_first);
   if (chosen == nullptr) return {};
-  const Quad corners = InOrder(Refine({channels.begin(), channels.end()}, *chosen));
+  cv::Mat grey;
+  if (channels.size() == 3) cv::cvtColor(photo, grey, photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
+  const Quad corners =
+      InOrder(Refine({channels.begin(), channels.end()}, Levels(grey.empty() ? brightest : grey), *chosen));
   return {corners.begin(), corners.end()};
 }
