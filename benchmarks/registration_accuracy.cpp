@@ -49,7 +49,7 @@ void PrintRow(const char* name, const std::vector<double>& errors) {
 }  // namespace
 
 void PrintRegistration() {
-  constexpr int kPairs = 200;
+  const int kPairs = Trials(200, 20);
   std::vector<double> fixed(kPairs, 1e9);
   std::vector<double> refined(kPairs, 1e9);
   std::vector<double> robust(kPairs, 1e9);
@@ -83,5 +83,10 @@ void PrintRegistration() {
     if (fixed[i] < 10 && refined[i] < 0.3) ++fine;
     if (robust[i] >= 0.3) std::printf("\nPair %d, all matches, %.2f px: %s\n", i + 1, robust[i], doubts[i].c_str());
   }
+  Hold("registration_median", Quantile(fixed, 0.5));
+  Hold("registration_near", ShareBelow(fixed, 10));
+  Hold("robust_median", Quantile(robust, 0.5));
+  Hold("robust_within", ShareBelow(robust, 0.3));
+  Hold("refined_within", 100.0 * fine / coarse);
   std::printf("\nOf %d that the test's map brings within 10 px, %d end under 0.3 px when refined.\n", coarse, fine);
 }

@@ -3,7 +3,10 @@
 #include <algorithm>
 #include <atomic>
 #include <cmath>
+#include <cstdio>
 #include <thread>
+
+#include "desk/measure/promises.h"
 
 void ForEachTrial(int trials, const std::function<void(int)>& run) {
   std::atomic<int> next = 0;
@@ -23,6 +26,42 @@ double Quantile(std::vector<double> values, double share) {
   std::sort(values.begin(), values.end());
   return values[static_cast<std::size_t>(std::lround(share * static_cast<double>(values.size() - 1)))];
 }
+
+namespace {
+
+bool checking = false;
+bool quick = false;
+bool all_kept = true;
+
+bool Take(std::vector<std::string>& words, const char* word) {
+  const auto found = std::find(words.begin(), words.end(), word);
+  if (found == words.end()) return false;
+  words.erase(found);
+  return true;
+}
+
+}  // namespace
+
+void TakeCheckOptions(std::vector<std::string>& words) {
+  checking = Take(words, "--check");
+  quick = Take(words, "--quick");
+}
+
+int Trials(int full, int few) { return quick ? few : full; }
+
+void Hold(const char* promise, double measured) {
+  if (!checking) return;
+  const qv::Promise& row = qv::FindPromise(promise);
+  const bool kept = qv::IsKept(row, measured);
+  all_kept = all_kept && kept;
+  std::printf("promise %s %s: %.3g%s, promised is %g%s (%s)\n", promise, kept ? "kept" : "BROKEN", measured, row.unit,
+              row.value, row.unit, row.of);
+  std::fflush(stdout);
+}
+
+bool IsChecking() { return checking; }
+
+bool AllKept() { return all_kept; }
 
 double Mean(const std::vector<double>& values) {
   double sum = 0;

@@ -2,6 +2,7 @@
 #define QVTESTER_BENCHMARKS_TRIALS_H_
 
 #include <functional>
+#include <string>
 #include <vector>
 
 // What the accuracy tables share.
@@ -16,6 +17,22 @@ double Mean(const std::vector<double>& values);
 
 /// Percent.
 double ShareBelow(const std::vector<double>& values, double limit);
+
+/// What a table has found of a promised number (desk/measure/promises.h), printed as "promise NAME ...". With --check
+/// the script takes each promise that no line keeps for broken.
+void Hold(const char* promise, double measured);
+
+/// Whether promises are held to.
+bool IsChecking();
+
+/// False when some promise held so far is broken.
+bool AllKept();
+
+/// `full` trials, or with --quick `few`.
+int Trials(int full, int few);
+
+/// Takes "--check" and "--quick" out of a program's words. Promises are printed with --check alone.
+void TakeCheckOptions(std::vector<std::string>& words);
 
 // Tables in files of their own.
 void PrintRegistration();

@@ -19,7 +19,7 @@ std::string Explain(const FigureInfo& info) {
   if (figure.axis != nullptr) unit += std::string(", over ") + figure.axis->name;
   const double repeatability = Repeatability(figure);
   return info.name + "\n  meaning        " + figure.docstring + "\n  unit           " + unit + "\n  method         " +
-         figure.method.name + "\n  accuracy       " + figure.method.accuracy + "\n  influences     " +
+         figure.method.name + "\n  accuracy       " + Accuracy(figure.method) + "\n  influences     " +
          figure.method.moved_by + "\n  same photo     " +
          (repeatability == 0 ? "the same number on every machine\n"
                              : Format("may differ by %g from one machine to another\n", repeatability));

@@ -20,17 +20,18 @@ namespace qv {
 
 namespace {
 
-constexpr Method kLab = {"mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1",
-                         "Within 0.3 of the colour as photographed in the mean, 0.7 at most on an upright chart; patch "
-                         "means are cut to whole levels.",
-                         "Moved by exposure, white balance, light and shading; by clipping."};
+constexpr Method kLab = {
+    "mean over the patch, sRGB to L*a*b* relative to an implicit white of 1, 1, 1",
+    "Within {patches_mean} of the colour as photographed in the mean, {patches_upright} at most on an upright chart, "
+    "{patches_turned} on one turned by up to 10 degrees; patch means are cut to whole levels.",
+    "Moved by exposure, white balance, light and shading; by clipping."};
 constexpr Method kDelta = {"CIE 1976 difference to the standard photo's patch",
-                           "As good as the two L*a*b* readings: about 0.4 in the mean.",
+                           "As good as the two L*a*b* readings: each within {patches_mean} in the mean.",
                            "Moved by whatever makes the photo's light or colour unlike the standard's."};
 
 constexpr Method kLabD65 = {
     "mean over the patch, sRGB (IEC 61966-2-1) to CIE 1976 L*a*b* relative to D65",
-    "Within 0.3 of the colour as photographed in the mean; patch means are cut to whole levels.",
+    "Within {patches_mean} of the colour as photographed in the mean; patch means are cut to whole levels.",
     "Moved by exposure, white balance, light and shading; by clipping."};
 constexpr Method kDelta2000 = {
     "CIEDE2000 difference (CIE 142-2001) to the standard photo's patch, or to the given values",
@@ -178,19 +179,6 @@ std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
   return picture;
 }
 
-// Patches are looked for on a square: seen obliquely they lie beside their places, and their neighbours get in.
-void DoubtView(Record& record, const ChartView& view) {
-  constexpr double kMostOblique = 0.015;
-  constexpr double kMostSkewDeg = 0.9;
-  if (std::fabs(view.legs_ratio - 1) <= kMostOblique && std::fabs(view.legs_angle_deg - 90) <= kMostSkewDeg) return;
-  record.Say(
-      Remark::kDoubt, "oblique",
-      Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; patches may lie beside "
-             "their places",
-             record.inputs[0].path.c_str(), view.legs_ratio, view.legs_angle_deg),
-      "legs_ratio");
-}
-
 // Mean colour inside an outline, shrunk to so much of its size about its middle.
 cv::Scalar MeanInside(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline, double size) {
   const cv::Point2d middle = (outline[0] + outline[1] + outline[2] + outline[3]) / 4;
@@ -263,7 +251,7 @@ class Capture : public Measurement {
                                     missed_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
     }
     if (code != QV_SUCCESS) return finding;
-    DoubtView(record, finding->view);
+    DoubtView(record, finding->view, "patches");
     TakePatches(*finding, tester);
     DoubtEvenness(record, *finding);
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));

@@ -13,10 +13,10 @@
 
 namespace qv {
 
-const Method kScanMethod = {
-    "row scan for 1:1:3:1:1 with three cross-checks",
-    "Centres are good to 0.3 to 0.9 px, at most 0.3 of a module on charts turned by about 30 degrees.",
-    "Moved by threshold and light where they reach a mark's edges, and by modules under 3 px."};
+const Method kScanMethod = {"row scan for 1:1:3:1:1 with three cross-checks",
+                            "Centres are good to {marks_median} in the median at any turn, and to {marks_largest} at "
+                            "worst, by turns of about 30 degrees.",
+                            "Moved by threshold and light where they reach a mark's edges, and by modules under 3 px."};
 
 namespace {
 
@@ -151,6 +151,17 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
                "mark_candidates");
   }
   return view;
+}
+
+void DoubtView(Record& record, const ChartView& view, const char* parts) {
+  constexpr double kMostOblique = 0.015;
+  constexpr double kMostSkewDeg = 0.9;
+  if (std::fabs(view.legs_ratio - 1) <= kMostOblique && std::fabs(view.legs_angle_deg - 90) <= kMostSkewDeg) return;
+  record.Say(Remark::kDoubt, "oblique",
+             Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; %s may lie beside "
+                    "their places",
+                    record.inputs[0].path.c_str(), view.legs_ratio, view.legs_angle_deg, parts),
+             "legs_ratio");
 }
 
 std::string ReportChart(const ChartView& view) {

@@ -44,6 +44,11 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
 /// How the marks are found.
 extern const Method kScanMethod;
 
+/// A doubt where the chart is seen obliquely: what is looked for on a square lies beside its place then.
+///
+/// @param parts  of the chart that are measured: "patches".
+void DoubtView(Record& record, const ChartView& view, const char* parts);
+
 /// The figures that DescribeChart adds.
 const std::vector<Figure>& ChartFigures();
 

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "chart/chart_layout.h"
+#include "desk/measure/slanted_edge.h"
 
 namespace qv {
 
@@ -53,7 +54,15 @@ double NoiseOf(const Pixels& side) {
   return std::accumulate(steps.begin(), end, 0.0) / static_cast<double>(end - steps.begin()) / 0.728;
 }
 
-std::optional<LevelPile> PileOf(Pixels side, double noise_elsewhere, bool top, int channel) {
+// Of so many of a side's pixels at its outermost level it depends on the edge's shape whether they were cut off.
+constexpr double kShareToLookAt = 0.5;
+
+struct Candidate {
+  LevelPile pile;
+  bool sure;
+};
+
+std::optional<Candidate> PileOf(Pixels side, double noise_elsewhere, bool top, int channel) {
   if (side.levels.size() < kFewestPixels) return std::nullopt;
   const auto [lowest, highest] = std::minmax_element(side.levels.begin(), side.levels.end());
   const int level = top ? *highest : *lowest;
@@ -66,7 +75,41 @@ std::optional<LevelPile> PileOf(Pixels side, double noise_elsewhere, bool top, i
   const bool one_sided = std::abs(*far - level) >= kTail || share > kShareFlat;
   const bool noisy = NoiseOf(side) >= kLeastNoise || (noise_elsewhere >= kNoiseElsewhere && one_sided);
   const bool piled = at_end ? share > kShareAtEnd : share > kShareInside && noisy;
-  return piled ? std::optional<LevelPile>({level, top, channel, share}) : std::nullopt;
+  return piled || share > kShareToLookAt ? std::optional<Candidate>({{level, top, channel, share}, piled})
+                                         : std::nullopt;
+}
+
+// Distance from the edge at which its spread first comes so near to a plateau: share 0.1 and 0.01 of the step, from the
+// middle outwards.
+std::optional<double> Corner(const EdgeSpread& spread, bool right) {
+  const auto rest = [&](int k) {
+    const double share = spread.levels[spread.middle + (right ? k : -k)];
+    return right ? 1 - share : share;
+  };
+  double begin = NAN;
+  for (int k = 1; k <= spread.middle; ++k) {
+    const auto crosses = [&](double level) { return rest(k) <= level && rest(k - 1) > level; };
+    const auto place = [&](double level) { return k - (level - rest(k)) / (rest(k - 1) - rest(k)); };
+    if (std::isnan(begin) && crosses(0.1)) begin = place(0.1);
+    if (!std::isnan(begin) && crosses(0.01)) return place(0.01) - begin;
+  }
+  return std::nullopt;
+}
+
+// Whether the edge comes to its light (or dark) plateau far more abruptly than to the other: there it is cut off, which
+// a photo without noise tells by nothing else. A lens does both alike; a transfer function makes the dark corner the
+// sharper one.
+bool IsCut(const cv::Mat& channel, const std::array<cv::Point2d, 4>& outline, bool top) {
+  constexpr double kSharperTop = 0.6;
+  constexpr double kSharperBottom = 0.55;
+  const SlantedEdge edge = LocateEdge(channel, outline, {Transfer::Kind::kLinear, 1});
+  if (edge.reason != nullptr) return false;
+  const EdgeSpread spread = ProjectEdge(edge, edge.room).whole;
+  if (spread.levels.empty()) return false;
+  const bool light_right = edge.right.level > edge.left.level;
+  const std::optional<double> here = Corner(spread, light_right == top);
+  const std::optional<double> there = Corner(spread, light_right != top);
+  return here && there && *here < (top ? kSharperTop : kSharperBottom) * *there;
 }
 
 // Mean grey level about a place of the chart, in chart units.
@@ -91,6 +134,8 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
   for (cv::Point& corner : corners) corner -= bounds.tl();
   cv::Mat inside(bounds.size(), CV_8UC1, cv::Scalar(0));
   cv::fillConvexPoly(inside, corners, cv::Scalar(255));
+  std::array<cv::Point2d, 4> within = outline;
+  for (cv::Point2d& corner : within) corner -= cv::Point2d(bounds.tl());
   std::vector<cv::Mat> channels;
   cv::split(photo(bounds), channels);
   std::optional<LevelPile> worst;
@@ -102,8 +147,9 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
     const Pixels light = SideOf(channels[channel], inside, middle, true);
     const Pixels dark = SideOf(channels[channel], inside, middle, false);
     for (const bool top : {true, false}) {
-      const std::optional<LevelPile> pile = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
-      if (pile && (!worst || pile->share > worst->share)) worst = pile;
+      const std::optional<Candidate> found = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
+      if (!found || (worst && found->pile.share <= worst->share)) continue;
+      if (found->sure || IsCut(channels[channel], within, top)) worst = found->pile;
     }
   }
   return worst;

@@ -19,8 +19,8 @@ struct LevelPile {
   double share;  // of the region's light, or dark, pixels
 };
 
-/// The worst pile of a region that shows dark and light; outline: corners, column and row. A photo of less noise than a
-/// level tells nothing below the ends of its range: flat paper is no pile there.
+/// The worst pile of a region that shows one edge between dark and light; outline: corners, column and row. Where there
+/// is hardly any noise flat paper is no pile, unless the edge comes to it abruptly.
 ///
 /// @param photo  rows x cols, 8 bits, one, three or four channels.
 std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline);

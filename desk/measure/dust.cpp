@@ -20,14 +20,15 @@ constexpr Unit kSpotAxis = {"spot", "C62", "1"};
 
 constexpr Method kBlob = {
     "local threshold 15 x 15, blob detector at levels 0 and 125",
-    "Of discs 0.3 or more darker than the target, all of 4 to 16 px are found, none of 20 px and more.",
-    "Moved by focus on the target, by light (photos of mean level under 126 show none), by noise near the local "
+    "Of sharp-rimmed discs 0.3 or more darker than the target {dust_found} of 4 to 16 px are found, of 20 px and more "
+    "{dust_hollow}; soft ones of 24 px are.",
+    "Moved by focus on the target, by light (photos whose mean level is under 126 show none), by noise near the local "
     "threshold."};
 
 constexpr Method kSpots = {
     "differences of Gaussians in a pyramid, after a smooth surface of the fourth degree is taken out",
     "Dark spots of 3 to 300 px, sharp or soft, whose contrast times the root of their pixels is 9 times the noise: "
-    "nearly all are found, with under 0.1 false ones a photo (docs/accuracy.md).",
+    "{spots_found} are found, with under {spots_false} false ones a photo (docs/accuracy.md).",
     "Moved by noise, by structure of the target, by light that falls off otherwise than smoothly."};
 
 constexpr double kDarkestToJudge = 126;  // the blob search sees nothing in photos whose mean is below

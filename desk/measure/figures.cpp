@@ -3,11 +3,14 @@
 #include <algorithm>
 
 #include "desk/measure/measurement.h"
+#include "desk/measure/promises.h"
 
 namespace qv {
 
+std::string Accuracy(const Method& method) { return WithNumbers(method.accuracy); }
+
 std::string Explanation(const Figure& figure) {
-  return std::string(figure.docstring) + " " + figure.method.accuracy + " " + figure.method.moved_by;
+  return std::string(figure.docstring) + " " + Accuracy(figure.method) + " " + figure.method.moved_by;
 }
 
 double Repeatability(const Figure& figure) { return figure.number == Number::kWhole ? 0 : figure.unit.repeatability; }

@@ -38,7 +38,7 @@ enum class Number { kWhole, kReal };
 /// How figures are taken: the sentences stand in records and are what `explain` prints.
 struct Method {
   const char* name;
-  const char* accuracy;  // how true they are
+  const char* accuracy;  // how true they are; promised numbers by their names in braces (promises.h)
   const char* moved_by;  // what changes them
 };
 
@@ -61,6 +61,9 @@ struct FigureInfo {
   std::string measurement;  // camera_autofocus
   const Figure* figure;
 };
+
+/// How true figures of this method are, promised numbers filled in.
+std::string Accuracy(const Method& method);
 
 /// Meaning, accuracy and what moves it, as one text.
 std::string Explanation(const Figure& figure);

@@ -19,19 +19,25 @@ namespace {
 
 constexpr Method kDots = {
     "relative difference to the mean of a square window, single precision",
-    "All of 1,000 dots of contrast 0.2 are found at a threshold of 0.1 and 0.5 % noise, corners included; the means "
+    "Of 1,000 dots of contrast 0.2 {dots_found} are found at a threshold of 0.1 and 0.5 % noise, corners included; the "
+    "means "
     "are single precision, whose rounding counts on large pictures with small windows.",
     "Moved by the picture's noise, by neighbouring dots in the same window, by formats that round."};
 constexpr Method kAreas = {"connected dots, then rectangles closer than the distance, merged until none are",
                            "Exact for the dots that were found.", "Moved by the dots and by the distance."};
+
+constexpr Method kNoise = {"picture's own departures from the local mean (median), taken for normal ones",
+                           "As good as noise is normal: within a fifth for Gaussian noise.",
+                           "Moved by exposure and by the threshold; structure of the panel counts as noise."};
 
 constexpr int kMostSpots = 20'000;  // merging is quadratic; so many are noise, not defects
 
 struct Dots {
   cv::Mat mask;  // CV_8UC1, 1 at a dot
   Areas areas;
-  int spots = 0;       // connected dots, before they are merged
-  int non_finite = 0;  // pixels
+  int spots = 0;        // connected dots, before they are merged
+  int non_finite = 0;   // pixels
+  double by_noise = 0;  // dots that noise alone would give
 };
 
 // What malloc gave and the clustering exchanges.
@@ -77,6 +83,26 @@ cv::Mat WithChannelFirst(const cv::Mat& rgb, const std::string& channel) {
   return picture;
 }
 
+// Dots to be expected of normal noise as strong as the picture's departures from their local mean are in the median.
+double DotsByNoise(const cv::Mat& first, double threshold, int radius) {
+  constexpr std::size_t kStep = 7;  // pixels looked at: one of so many
+  const int side = 2 * radius + 1;
+  cv::Mat mean;
+  cv::boxFilter(first, mean, CV_64F, {side, side});
+  std::vector<double> departures;
+  for (std::size_t i = 0; i < first.total(); i += kStep) {
+    const int row = static_cast<int>(i / first.cols);
+    const int column = static_cast<int>(i % first.cols);
+    const double departure = std::fabs(first.at<float>(row, column) / mean.at<double>(row, column) - 1);
+    if (std::isfinite(departure)) departures.push_back(departure);
+  }
+  if (departures.empty()) return 0;
+  const auto middle = departures.begin() + static_cast<std::ptrdiff_t>(departures.size() / 2);
+  std::nth_element(departures.begin(), middle, departures.end());
+  const double sigma = *middle / 0.6745;
+  return sigma > 0 ? static_cast<double>(first.total()) * std::erfc(threshold / sigma / std::sqrt(2.0)) : 0;
+}
+
 Dots FindDots(QVTester& tester, cv::Mat& picture, const Json& parameters) {
   Dots dots;
   dots.mask = cv::Mat::zeros(picture.size(), CV_8U);
@@ -86,6 +112,9 @@ Dots FindDots(QVTester& tester, cv::Mat& picture, const Json& parameters) {
   cv::extractChannel(picture, first, 0);
   dots.non_finite = static_cast<int>(
       std::count_if(first.begin<float>(), first.end<float>(), [](float value) { return !std::isfinite(value); }));
+  if (dots.non_finite == 0) {
+    dots.by_noise = DotsByNoise(first, parameters.at("threshold"), parameters.at("radius"));
+  }
   cv::Mat labels;
   cv::Mat stats;
   cv::Mat centres;
@@ -96,6 +125,7 @@ Dots FindDots(QVTester& tester, cv::Mat& picture, const Json& parameters) {
 
 void Collect(Phase& phase, const Dots& dots) {
   phase.Add("dot_count", cv::countNonZero(dots.mask));
+  phase.Add("dots_by_noise", dots.by_noise);
   if (dots.spots > kMostSpots) return;
   AddAreas(phase, dots.areas);
 }
@@ -114,6 +144,16 @@ void Look(Record& record, const Dots& dots) {
   if (dots.spots > kMostSpots) {
     refuse("too_many_dots",
            Format("%s: %d separate dots are noise, not defects; use a higher --threshold", path, dots.spots));
+  }
+  constexpr double kMostByNoise = 0.5;
+  const int count = cv::countNonZero(dots.mask);
+  if (dots.by_noise > kMostByNoise && count > 0 && dots.spots <= kMostSpots) {
+    record.Say(
+        Remark::kDoubt, "dots_in_noise",
+        Format("%s: doubtful: noise as strong as this picture's alone would give %.*f dots, and %d are seen; use a "
+               "higher --threshold or a longer exposure",
+               path, dots.by_noise < 10 ? 1 : 0, dots.by_noise, count),
+        "dots_by_noise");
   }
   if (dots.non_finite > 0) {
     refuse("pixels_not_finite", Format("%s: %d pixels are not finite, and no dot is seen below and to the right of one",
@@ -205,7 +245,9 @@ class HdrDots : public Measurement {
  private:
   static std::vector<Figure> Figures() {
     std::vector<Figure> figures = {
-        {"dot_count", kOne, Number::kWhole, nullptr, kDots, "Pixels that depart from their local mean."}};
+        {"dot_count", kOne, Number::kWhole, nullptr, kDots, "Pixels that depart from their local mean."},
+        {"dots_by_noise", kOne, Number::kReal, nullptr, kNoise,
+         "Dots to be expected of the picture's noise alone, at this threshold."}};
     for (const Figure& figure : AreaFigures(kAreas)) figures.push_back(figure);
     return figures;
   }

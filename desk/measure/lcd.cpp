@@ -15,11 +15,12 @@ namespace {
 
 constexpr Method kScreen = {
     "lines fitted to the screen's edges, each a blurred step fitted to its profile",
-    "Corners lie within 0.03 px in the median, up to 30 degrees of pan and tilt (docs/accuracy.md).",
+    "Corners lie within {display_corners} in the median, up to 30 degrees of pan and tilt; within {display_jpeg} on "
+    "JPEGs of quality 75 (docs/accuracy.md).",
     "Moved by lens distortion, by what covers an edge; rounded corners are taken for sharp ones."};
 constexpr Method kVerdict = {
     "means of the colour channels, relative to one another and to the full range, and the ratio of the sides",
-    "None of 300 judgements of 60 simulated photos was wrong (docs/accuracy.md).",
+    "At most {display_wrong} of the judgements of simulated photos are wrong (docs/accuracy.md).",
     "Moved by exposure and white balance of the outer camera, by light that the glass mirrors."};
 constexpr Method kMeans = {"means of stored levels over the straightened screen", "Exact for the photo as stored.",
                            "Moved by exposure, by light that the glass mirrors, by the lens's shading."};

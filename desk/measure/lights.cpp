@@ -14,21 +14,22 @@ namespace qv {
 
 namespace {
 
-constexpr Method kLight = {"means over the region's pixels, linear light by the transfer function of IEC 61966-2-1",
-                           "Exact for the photo as stored; x and y within 0.001 of simulated black bodies.",
-                           "Moved by exposure, clipping, white balance and the camera's own colour matrix: comparable "
-                           "between photos of one camera at one setting."};
+constexpr Method kLight = {
+    "means over the region's pixels, linear light by the transfer function of IEC 61966-2-1",
+    "Exact for the photo as stored; x and y within {lights_xy} of simulated black bodies at 2 % noise.",
+    "Moved by exposure, clipping, white balance and the camera's own colour matrix: comparable "
+    "between photos of one camera at one setting."};
 constexpr Method kTemperature = {
     "correlated colour temperature by a fit to the Planckian locus on either side of 5550 K",
-    "The fit alone is off by up to 25 K from 2,700 to 10,000 K on the locus.",
+    "The fit alone is off by up to {lights_fit} from 2,700 to 10,000 K on the locus.",
     "Moved as x and y are, and more the further the light lies from the locus; 0 where the fit has no answer."};
 constexpr Method kEvenness = {"smallest over largest mean of 8 x 8 equal blocks", "Exact for the photo as stored.",
                               "Moved by a lens's own fall-off, by spots, and by a region that reaches over the rim."};
 constexpr Method kDots = {
     "relative difference of grey to the mean of a square window, areas merged within the distance",
-    "Of squares 40 % darker all of 2 px and more are found at 1 % noise, and none where there is none; of 25 % all "
-    "from "
-    "3 px, of 15 % all from 5 px.",
+    "Of squares 40 % darker {lights_spots} of 2 px and more are found at 1 % noise; of 25 % {lights_spots} from 3 px, "
+    "of "
+    "15 % {lights_spots} from 5 px.",
     "Moved by noise, by the window's size and by what else lies in it."};
 
 constexpr double kClipped = 0.01;  // share of a region's pixels, above which its colour is another one
@@ -274,9 +275,35 @@ class Lights : public Measurement {
                          0,
                          10'000,
                          {},
-                         QV_PROPERTY_DOT_RADIUS}};
-    for (const Parameter& parameter : AreaParameters()) spec_.parameters.push_back(parameter);
-    spec_.figures = Figures();
+                         QV_PROPERTY_DOT_RADIUS},
+                        {"distance",
+                         Parameter::kWhole,
+                         "PX",
+                         "Areas closer than this are merged",
+                         nullptr,
+                         0,
+                         100'000,
+                         {},
+                         QV_PROPERTY_AREA_DISTANCE},
+                        {"least_pixels",
+                         Parameter::kWhole,
+                         "N",
+                         "Smaller areas are dropped",
+                         nullptr,
+                         0,
+                         1'000'000'000,
+                         {},
+                         QV_PROPERTY_AREA_LEAST_PIXELS}};
+    spec_.figures = {{"region_count", kOne, Number::kWhole, nullptr, kLight, "Regions that were measured."}};
+    for (const LightFigure& row : LightFigures()) spec_.figures.push_back(row.figure);
+    for (const Extreme& extreme : Extremes()) {
+      Figure figure = extreme.figure->figure;
+      figure.name = extreme.name.c_str();
+      figure.docstring = extreme.docstring.c_str();
+      figure.axis = nullptr;
+      spec_.figures.push_back(figure);
+    }
+    for (const Figure& figure : AreaFigures(kDots)) spec_.figures.push_back(figure);
     spec_.advice = "is it a photo of the lit panel, of 8 bits a channel, with all regions inside?";
   }
 
@@ -297,21 +324,6 @@ class Lights : public Measurement {
   }
 
  private:
-  static std::vector<Figure> Figures() {
-    std::vector<Figure> figures = {
-        {"region_count", kOne, Number::kWhole, nullptr, kLight, "Regions that were measured."}};
-    for (const LightFigure& row : LightFigures()) figures.push_back(row.figure);
-    for (const Extreme& extreme : Extremes()) {
-      Figure figure = extreme.figure->figure;
-      figure.name = extreme.name.c_str();
-      figure.docstring = extreme.docstring.c_str();
-      figure.axis = nullptr;
-      figures.push_back(figure);
-    }
-    for (const Figure& figure : AreaFigures(kDots)) figures.push_back(figure);
-    return figures;
-  }
-
   // Said before the test refuses them, in plain words.
   static bool Fit(const Request& request, cv::Size photo, Record& record) {
     for (const Json& r : request.parameters.value("regions", Json::array())) {

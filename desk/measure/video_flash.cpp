@@ -17,7 +17,8 @@ constexpr Method kMeans = {"mean over all pixels of the first channel of each fr
                            "Moved by exposure, flash and clipping; the first channel of a film's frames is blue."};
 constexpr Method kWidth = {
     "width of the pulse about the peak at half height, straight lines between the frames",
-    "Within 3 % for pulses as long as six frames and more. Not a number when the peak is less than 5 levels above the "
+    "Within {film_pulse} for pulses of three frames and more. Not a number when the peak is less than 5 levels "
+    "above the "
     "base.",
     "Moved by an exposure control that answers the flash, by clipping, and by a film that cuts the pulse."};
 constexpr Colour kBlue = {0.1, 0.35, 0.75};

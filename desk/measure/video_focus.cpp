@@ -15,7 +15,7 @@ namespace {
 
 constexpr Method kSettling = {
     "running median of five measured frames, within 10 % of the median of the last fifth",
-    "Within one frame interval of the first frame in which the focus has come to stay, at up to 1 % noise.",
+    "Within {film_settling} of the first frame in which the focus has come to stay, at up to 1 % noise.",
     "Moved by the frame rate, by noise, and by a film that ends before the lens has come to rest."};
 constexpr Colour kVertical = {0.1, 0.35, 0.75};
 constexpr Colour kHorizontal = {0.85, 0.45, 0.0};
