@@ -182,6 +182,8 @@ TEST_F(Archive, CountsAUnitByItsLatestRuns) {
   EXPECT_EQ(1, units.tally().of("PASS"));
   add("front", 3, "ERROR");
   EXPECT_EQ(1, units.tally().of("ERROR"));
+  add("front", 3, "PASS");  // in the same moment: what was stored last
+  EXPECT_EQ(0, units.tally().of("ERROR"));
 }
 
 TEST_F(Archive, IsStudiedWithoutWhatEndedInError) {
@@ -194,6 +196,11 @@ TEST_F(Archive, IsStudiedWithoutWhatEndedInError) {
   EXPECT_EQ(1, study.figures[1].moments.count());
   EXPECT_EQ(1, study.figures[1].moments.not_finite());
   EXPECT_EQ(0.05, study.figures[1].moments.mean());
+  EXPECT_FALSE(study.figures[1].bounds_vary);
+  StoredRun run = RunOf("SN9", 0.2);
+  run.record["phases"][0]["measurements"]["flash_mean"]["limits"]["min"] = 0.15;
+  store.Put(run);
+  EXPECT_TRUE(StudyFigures(store, {}, {}, {}, true).figures[1].bounds_vary);
 }
 
 // What a page holds, taken out of its HTML.

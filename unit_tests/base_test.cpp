@@ -1,3 +1,4 @@
+#include <android/log.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/resource.h>
@@ -13,8 +14,15 @@
 
 #include "desk/base/files.h"
 #include "desk/base/json.h"
+#include "desk/base/kept_stderr.h"
+#include "desk/base/log_lines.h"
+#include "desk/base/memory_file.h"
 #include "desk/base/text.h"
 #include "unit_tests/drawing.h"
+
+// Stands in for the system's: what the written file was called when it was flushed, and whether that works.
+static std::function<int(int)> flush = [](int) { return 0; };
+extern "C" int fsync(int file) { return flush(file); }
 
 namespace qv {
 
@@ -62,6 +70,7 @@ TEST(JsonReader, ViewsNameTheWayToWhatIsWrong) {
   EXPECT_EQ("plan.json: steps[0]: n: is -9e+18, not a whole number from 0 to 9",
             Sentence([&] { step.At("n").Integer(0, 9); }));
   EXPECT_THAT(Sentence([&] { step.At("big").Integer(0, INT64_MAX); }), HasSubstr("not a whole number"));
+  EXPECT_EQ(5, step.At("inputs").Integer(5, 5));
   EXPECT_EQ("plan.json: steps[0]: holds no \"name\"", Sentence([&] { step.At("name"); }));
   EXPECT_EQ("plan.json: steps[0]: inputs: is 5, not an object", Sentence([&] { step.At("inputs").At("x"); }));
   EXPECT_EQ("plan.json: steps[0]: \"inputs\" is not known here; did you mean \"input\"?", Sentence([&] {
@@ -74,6 +83,29 @@ TEST(Text, TerminalsSeeNoControlAndWordsFindTheirNeighbour) {
   EXPECT_EQ("ab...", Shortened("ab\xc3\xa9xyz", 6));
   EXPECT_EQ("; did you mean \"autofocus\"?", DidYouMean("autofcus", {"capture", "autofocus"}));
   EXPECT_EQ("", DidYouMean("video", {"capture", "autofocus"}));
+}
+
+// Files that this process holds open.
+std::ptrdiff_t OpenFiles() { return std::distance(fs::directory_iterator("/proc/self/fd"), fs::directory_iterator()); }
+
+TEST(Collectors, EachHearsWhatIsSaidWhileItIsTheInnermost) {
+  const std::ptrdiff_t before = OpenFiles();
+  LogCollector outer;
+  {
+    LogCollector inner;
+    __android_log_print(ANDROID_LOG_DEBUG, "QVTEST", "[OKAPI] inside\r\n");
+    ASSERT_EQ(1U, inner.lines().size());
+    EXPECT_EQ("inside", inner.lines()[0].text);
+  }
+  __android_log_print(ANDROID_LOG_DEBUG, "QVTEST", "[OKAPI] outside");
+  ASSERT_EQ(1U, outer.lines().size());
+  EXPECT_EQ("outside", outer.lines()[0].text);
+  for (int i = 0; i < 9; ++i) {
+    const KeptStderr kept;
+    const MemoryFile file("content");
+    EXPECT_EQ("content", ReadWholeFile(file.path(), kWrongUsage));
+  }
+  EXPECT_EQ(before, OpenFiles()) << "a batch of thousands ends when no more can be opened";
 }
 
 class Files : public ::testing::Test {
@@ -105,6 +137,7 @@ TEST_F(Files, NothingIsWaitedForAndNoDeviceIsRead) {
   EXPECT_THAT(Sentence([&] { ReadWholeFile(Path(""), kWrongUsage); }), HasSubstr("is a directory"));
   Put("long", std::string(3 << 20, 'x'));
   EXPECT_THAT(Sentence([&] { ReadWholeFile(Path("long"), kWrongUsage, 2 << 20); }), HasSubstr("longer than 2 MB"));
+  EXPECT_EQ(std::size_t{3} << 20, ReadWholeFile(Path("long"), kWrongUsage, 3 << 20).size());
   EXPECT_EQ(std::size_t{3} << 20, Get("long").size());
 }
 
@@ -123,6 +156,38 @@ TEST_F(Files, AWriteThatFailsKeepsWhatWasThere) {
   EXPECT_EXIT(_exit(WriteBeyondLimit(Path("record"))), ::testing::ExitedWithCode(0), "");
   EXPECT_EQ("new", Get("record"));
   EXPECT_EQ(2U, Entries());
+}
+
+TEST_F(Files, ANameIsTakenOverByAFileThatIsOnTheDisk) {
+  Put("record", "whole");
+  std::string before;
+  flush = [&](int) {
+    before = Get("record");
+    return 0;
+  };
+  WriteWholeFile(Path("record"), "new");
+  EXPECT_EQ("whole", before);
+  EXPECT_EQ("new", Get("record"));
+  flush = [](int) {
+    errno = EIO;
+    return -1;
+  };
+  EXPECT_THAT(Sentence([&] { WriteWholeFile(Path("record"), "lost"); }), HasSubstr("can't be written"));
+  flush = [&](int) {  // another takes the name for a folder meanwhile
+    fs::remove(Path("record"));
+    fs::create_directories(Path("record/full"));
+    return 0;
+  };
+  EXPECT_THAT(Sentence([&] { WriteWholeFile(Path("record"), "lost"); }), HasSubstr("can't be written"));
+  flush = [](int) { return 0; };
+  EXPECT_EXIT(WriteWholeFile(Path("other"),
+                             [](const Sink& sink) {
+                               sink("half");
+                               ScratchFolder::RemoveForGood();
+                               _exit(0);
+                             }),
+              ::testing::ExitedWithCode(0), "");
+  EXPECT_EQ(1U, Entries()) << "nothing is left beside it";
 }
 
 TEST_F(Files, OutputsAreCheckedBeforeAnythingIsDone) {

@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <csignal>
@@ -80,6 +81,7 @@ TEST(Manifests, RowsBecomeJobs) {
   EXPECT_THAT(jobs[0].inputs, ElementsAre("/lots/a.jpg"));
   EXPECT_THAT(jobs[0].columns, ElementsAre(std::pair("my, column", "say \"hi\"\nthere")));
   EXPECT_EQ("SN2", jobs[1].unit);
+  EXPECT_EQ("5\" wide", JobsOfManifest("path,note\na.jpg,5\" wide\n", "m", "").at(0).columns.at("note"));
   EXPECT_EQ(7U, std::stoul(JobsOfManifest(R"({"path": "a", "n": 7})", "m", "").at(0).columns.at("n")));
   EXPECT_EQ("m: row 2: 1 values for 2 columns", Sentence([] { JobsOfManifest("path,unit\na,b\nc\n", "m", ""); }));
   EXPECT_THAT(Sentence([] { JobsOfManifest("path\n\"a", "m", ""); }), HasSubstr("a quote stays open"));
@@ -104,10 +106,11 @@ TEST(Manifests, ShardsShareOutEveryJobOnce) {
   for (unsigned k = 1; k <= 3; ++k) EXPECT_GT(taken[k], 60);
 }
 
-// The processes that this one has started and that still live.
-std::vector<pid_t> Children() {
+// The processes that this one, or another, has started and that still live.
+std::vector<pid_t> Children(pid_t parent = getpid()) {
   std::vector<pid_t> children;
-  std::ifstream file("/proc/self/task/" + std::to_string(getpid()) + "/children");
+  const std::string process = std::to_string(parent);
+  std::ifstream file("/proc/" + process + "/task/" + process + "/children");
   for (pid_t child = 0; file >> child;) children.push_back(child);
   return children;
 }
@@ -183,6 +186,83 @@ TEST_F(Batches, AWorkerThatHangsOrDiesCostsItsOwnUnit) {
   close(held);
   EXPECT_THAT(Stored().at("hung"), AnyOf(HasSubstr("SIGSEGV"), HasSubstr("status")));
   EXPECT_EQ("5.0", Stored().at("sn5"));
+}
+
+TEST_F(Batches, WhatComesBehindAHungStepIsMeasured) {
+  std::filesystem::create_directory(folder_.Path("u1"));
+  cv::Mat noise(700, 900, CV_8UC3);  // its picture comes in many pieces
+  cv::randu(noise, 0, 256);
+  folder_.Write("u1/flash.png", noise);
+  ASSERT_EQ(0, mkfifo(folder_.Path("u1/hung.png").c_str(), 0600));
+  const int held = open(folder_.Path("u1/hung.png").c_str(), O_RDWR);
+  Plan plan;
+  plan.name = "p";
+  plan.folder = folder_.Path("");
+  for (const char* const name : {"a", "hung", "b", "c"}) {
+    const std::string file = name == std::string("hung") ? "{unit}/hung.png" : "{unit}/flash.png";
+    plan.steps.push_back({name, {"camera_flash", {file}}, {}});
+  }
+  plan.steps.push_back({"focus", {"camera_autofocus", {"{unit}/flash.png"}}, {}});
+  BatchOptions options;
+  options.timeout_seconds = 0.5;
+  options.pictures = KeepPictures::kFailures;
+  Job job;
+  job.unit = "u1";
+  Store store(folder_.Path("results.db"), Store::Use::kWrite);
+  RunBatch(plan, {job}, nullptr, store, options, [](const BatchProgress&) {});
+  close(held);
+  std::map<std::string, std::string> outcomes;
+  store.EachRun({}, true, [&](const RunRow& row, StoredRun&& run) {
+    outcomes[row.step] = row.outcome + " " + std::to_string(run.pictures.size());
+  });
+  EXPECT_EQ(
+      (std::map<std::string, std::string>{
+          {"a", "MEASURED 0"}, {"hung", "ERROR 0"}, {"b", "MEASURED 0"}, {"c", "MEASURED 0"}, {"focus", "ERROR 1"}}),
+      outcomes)
+      << "the picture of a miss is kept with the failures'";
+}
+
+TEST_F(Batches, FilesThatAreStillHiddenHaveNotArrived) {
+  FolderWatch watch(folder_.Path("photos"));
+  for (const char* const name : {".half.png", "whole.png", "notes.txt"}) {
+    folder_.Write(std::string("photos/") + name, std::string("x"));
+  }
+  const std::vector<Job> jobs = watch.Arrived();
+  ASSERT_EQ(1U, jobs.size());
+  EXPECT_EQ("whole", jobs[0].unit);
+}
+
+// "Z" when it has ended and waits to be missed, or "" when it is gone.
+std::string StateOf(pid_t process) {
+  std::ifstream file("/proc/" + std::to_string(process) + "/stat");
+  std::string number;
+  std::string name;
+  std::string state;
+  file >> number >> name >> state;
+  return state;
+}
+
+TEST_F(Batches, WorkersEndWithWhoStartedThem) {
+  ASSERT_EQ(0, mkfifo(folder_.Path("photos/hung.png").c_str(), 0600));
+  const int held = open(folder_.Path("photos/hung.png").c_str(), O_RDWR);
+  const pid_t batch = fork();
+  if (batch == 0) {
+    Run();
+    _exit(0);
+  }
+  std::vector<pid_t> workers;
+  for (int tries = 0; tries < 1000 && workers.size() < 2; ++tries) {
+    usleep(10'000);
+    workers = Children(batch);
+  }
+  ASSERT_EQ(2U, workers.size());
+  kill(batch, SIGKILL);
+  waitpid(batch, nullptr, 0);
+  for (const pid_t worker : workers) {
+    for (int tries = 0; tries < 1000 && StateOf(worker) != "Z" && !StateOf(worker).empty(); ++tries) usleep(10'000);
+    EXPECT_TRUE(StateOf(worker) == "Z" || StateOf(worker).empty()) << kill(worker, SIGKILL);
+  }
+  close(held);
 }
 
 }  // namespace

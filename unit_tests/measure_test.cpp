@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 
 #include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
 
 #include "chart/chart_layout.h"
 #include "desk/base/failure.h"
@@ -36,6 +37,10 @@ cv::Mat DustPhoto(double gain) {
   return Sense(options.camera, Simulate(options).levels[0], 8);
 }
 
+cv::Mat DecodePng(const std::string& file) {
+  return cv::imdecode(std::vector<uchar>(file.begin(), file.end()), cv::IMREAD_COLOR);
+}
+
 std::string Refusal(const Request& request) {
   try {
     Resolved(request);
@@ -54,6 +59,10 @@ TEST(Measure, APictureAndItsFileGiveTheSameRecord) {
   Json of_picture = MeasureAnew({"camera_autofocus", {photo}}).ToJson();
   EXPECT_EQ(of_file["phases"][0]["measurements"], of_picture["phases"][0]["measurements"]);
   EXPECT_EQ(of_file["inputs"][0]["pixels_hash"], of_picture["inputs"][0]["pixels_hash"]);
+  cv::Mat other = photo.clone();
+  other.at<cv::Vec3b>(500, 3)[1] ^= 1;
+  EXPECT_NE(of_file["inputs"][0]["pixels_hash"],
+            MeasureAnew({"camera_autofocus", {other}}).ToJson()["inputs"][0]["pixels_hash"]);
   EXPECT_EQ(nullptr, of_picture["inputs"][0]["sha256"]);
   EXPECT_EQ(nullptr, of_picture["request"]["inputs"][0]) << "can't be measured again";
 
@@ -209,6 +218,7 @@ TEST(Measure, PatchValuesStandInForAStandardPhoto) {
       folder.Write("values.txt", Format("# number, L*, a*, b*\n9, %.9f, 0, 0\n", lightness.at(9) - 1));
   const Record one = MeasureAnew({"camera_capture", {photo}, {{"reference", values}}});
   EXPECT_EQ(std::vector<double>{9}, one.phase.Find("delta_e_2000")->axis);
+  EXPECT_EQ(one.phase.Find("delta_e_2000_max")->value(), one.phase.Find("delta_e_2000_mean")->value()) << "of one";
   // A step of 1 in L* alone is 1 / (1 + 0.015 d^2 / sqrt(20 + d^2)), d from 50 to the mean of both.
   const double d = lightness.at(9) - 0.5 - 50;
   EXPECT_NEAR(1 / (1 + 0.015 * d * d / std::sqrt(20 + d * d)), one.phase.Find("delta_e_2000_max")->value(), 1e-6);
@@ -226,6 +236,48 @@ TEST(Measure, EveryChannelOfAFlashPhotoIsCounted) {
                                       {"mean", 10}}) {
     EXPECT_DOUBLE_EQ(value, record.phase.Find(figure)->value()) << figure;
   }
+}
+
+std::vector<std::string> Remarks(const Record& record) {
+  std::vector<std::string> names;
+  for (const Remark& remark : record.remarks) names.emplace_back(remark.name);
+  return names;
+}
+
+TEST(Measure, DustIsJudgedFromLevel126OnAndOutsideTheCorners) {
+  for (const int level : {125, 126}) {
+    const Record record = MeasureAnew({"lens_dust", {cv::Mat(300, 400, CV_8UC3, cv::Scalar::all(level))}});
+    EXPECT_THAT(Remarks(record), ::testing::Contains("too_dark").Times(126 - level));
+  }
+  cv::Mat dusty(300, 400, CV_8UC3, cv::Scalar::all(180));
+  for (const cv::Point& at : {cv::Point(12, 12), {200, 150}}) cv::circle(dusty, at, 4, cv::Scalar::all(60), -1);
+  const Record record = MeasureAnew({"lens_dust", {dusty}});
+  EXPECT_EQ(1, record.phase.Find("blob_count")->value());
+  EXPECT_THAT(record.phase.Find("blobs")->axis, ::testing::ElementsAre(::testing::DoubleNear(200, 0.5)));
+}
+
+TEST(Measure, MarksAreToldWhereTheyLieAndUnequalLegsDoubted) {
+  cv::Mat photo = DrawChart();
+  const Record straight = MeasureAnew({"camera_capture", {photo}});
+  const Reading& marks = *straight.phase.Find("marks");
+  const std::vector<cv::Point2d> truth = MarkCentres({});
+  for (std::size_t i = 0; i < truth.size(); ++i) {
+    EXPECT_NEAR(truth[i].x, marks.axis.at(i), 0.4) << i;
+    EXPECT_NEAR(truth[i].y, marks.values.at(i), 0.4) << i;
+  }
+  EXPECT_THAT(Remarks(straight), Not(::testing::Contains("oblique")));
+  cv::resize(photo, photo, {}, 1.03, 1);
+  EXPECT_THAT(Remarks(MeasureAnew({"camera_capture", {photo}})), ::testing::Contains("oblique"));
+}
+
+TEST(Measure, EachReasonOfAMissHasALineOfThePicture) {
+  cv::Mat photo(600, 900, CV_8UC3, cv::Scalar::all(255));
+  DrawMark(photo, 100, 700, 2);
+  const Record record = MeasureAnew({"circle_check", {photo}, {{"threshold", 3}}});
+  const cv::Mat seen = DecodePng(record.finding->Draw(record)->Png());
+  int dark = 0;  // of the lines' backing, at the photo's left
+  for (int row = 0; row < seen.rows; ++row) dark += cv::norm(seen.at<cv::Vec3b>(row, 8)) < 200 ? 1 : 0;
+  EXPECT_GT(dark, 38) << "two lines at least";
 }
 
 TEST(Measure, SoftAndLargeSpotsStandBesideTheTestsOwnBlobs) {

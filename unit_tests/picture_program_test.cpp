@@ -96,6 +96,10 @@ TEST_F(PictureProgram, RegistrationsThatFailOrMayBeFalseSaySo) {
   Simulate("--scene pair --size 640x480");
   Simulate("--scene dust --specks 0", "blank.png");
   Simulate("--scene pair --size 640x480 --seed 9", "other.png");
+  Run("register photo.png blank.png -oout.png --json cut.json --quiet");
+  EXPECT_THAT(json::parse(ReadFile(folder_.Path("cut.json")))["metadata"]["command"].dump(),
+              HasSubstr(R"("-o","out.png")"));
+  folder_.Write("out.png", cv::Mat(9, 9, CV_8UC1, cv::Scalar(3)));  // of an earlier run
   EXPECT_EQ(-90, Record("register photo.png blank.png -o out.png", 3)["phases"][0]["result_code"]);
   EXPECT_THAT(err_, HasSubstr("too few features match"));
   EXPECT_FALSE(std::filesystem::exists(folder_.Path("out.png")));

@@ -86,6 +86,29 @@ TEST(Gauge, MeetsTheManualsPublishedExample) {
   EXPECT_NEAR(30.2, study.percent_of_tolerance, 0.05);
 }
 
+// The manual pools what has a p above 0.25, and counts 1.41 times the ratio of the deviations, cut.
+TEST(Gauge, PoolsAndCountsAsTheManualDoes) {
+  int between = 0;
+  int cut = 0;
+  for (int k = 1; k <= 600; ++k) {
+    std::vector<GaugeReading> readings = Crossed();
+    for (std::size_t i = 0; i < readings.size(); ++i) {
+      const double part = std::stod(readings[i].part);
+      const double who = std::stod(readings[i].operator_name);
+      readings[i].value =
+          0.011 * k * part + 0.3 * who + 0.005 * k * std::sin(3 * part + 5 * who) + (i % 2 == 0 ? 0.5 : -0.5);
+    }
+    const GaugeStudy study = StudyGauge(readings, {});
+    EXPECT_EQ(study.interaction.p > 0.25, study.pooled) << study.interaction.p;
+    const double ratio = study.part_to_part.deviation / study.gauge.deviation;
+    EXPECT_EQ(std::max(1.0, std::floor(1.41 * ratio)), study.distinct_categories) << ratio;
+    between += study.interaction.p > 0.05 && study.interaction.p < 0.25 ? 1 : 0;
+    cut += std::floor(1.41 * ratio) < std::floor(1.4142 * ratio) ? 1 : 0;
+  }
+  EXPECT_GT(between, 0);
+  EXPECT_GT(cut, 0);
+}
+
 TEST(Gauge, RefusesWhatIsNotCrossedAndBalanced) {
   std::vector<GaugeReading> missing = Manual();
   missing.pop_back();

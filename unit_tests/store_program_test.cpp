@@ -2,6 +2,8 @@
 
 #include <gmock/gmock.h>
 
+#include <regex>
+
 #include "unit_tests/program.h"
 
 namespace {
@@ -34,6 +36,14 @@ TEST_F(StoreProgram, ShowsJudgesAndReportsWhatWasMeasured) {
   EXPECT_THAT(judged.out, HasSubstr("2 verdicts changed"));
   EXPECT_EQ(1, Run("judge store.db --limits dark.json --against limits.json").status);
   EXPECT_THAT(Run("study store.db --where 'unit=SN<1>'").out, HasSubstr("camera_flash_mean [level]"));
+  // Of many changes the first forty are listed; a unit has two, its figure's and its run's.
+  const std::string record = Read("record.json");
+  for (int i = 0; i < 21; ++i) {
+    Write("more" + std::to_string(i) + ".json",
+          std::regex_replace(record, std::regex("SN<1>"), "SN" + std::to_string(i)));
+  }
+  EXPECT_THAT(Run("import more*.json -o many.db").out, HasSubstr("21 new"));
+  EXPECT_THAT(Run("judge many.db --limits dark.json").out, HasSubstr("\n... and 2 more; --all shows them"));
   // Another bound makes another run, though nobody raised the revision.
   Write("limits.json", R"({"name": "l", "revision": "1", "limits": {"camera_flash_mean": {"min": 2}}})");
   Run("flash photo.png --dut 'SN<1>' --limits limits.json --json again.json --quiet");

@@ -54,8 +54,9 @@ TEST_F(Store, KeepsWhatWasPutBitForBitAndOnce) {
                   EXPECT_EQ(RunKey(run.record, run.filing), back.key);
                   EXPECT_EQ(run.pictures[0].content, back.pictures.at(0).content);
                   EXPECT_EQ("3", back.filing.columns.at("part"));
-                  EXPECT_EQ("L7/ann/00ff/flash",
-                            row.lot + "/" + row.operator_name + "/" + row.input_hash + "/" + row.measurement);
+                  EXPECT_EQ("L7/ann/00ff/flash/l/2", row.lot + "/" + row.operator_name + "/" + row.input_hash + "/" +
+                                                         row.measurement + "/" + row.limits_name + "/" +
+                                                         row.limits_revision);
                   run.key = "seen";
                 });
   EXPECT_EQ("seen", run.key);

@@ -79,6 +79,14 @@ TEST_F(Verify, TheNumberThatMovedIsNamed) {
   EXPECT_EQ(3, Run("verify golden.json").status);
 }
 
+TEST_F(Verify, AnotherPhotoOfTheSameNameIsPassedOver) {
+  std::filesystem::create_directory(folder_.Path("station"));
+  Run("flash \"$PWD/" + Simulate() + "\" --json station/record.json --quiet");
+  std::filesystem::rename(folder_.Path("photo.png"), folder_.Path("station/photo.png"));
+  Simulate("--seed 2 --noise 1");
+  EXPECT_THAT(Run("verify station").out, HasSubstr("record.json  as stored"));
+}
+
 TEST_F(Explain, EveryFigureOfARecordIsExplained) {
   EXPECT_THAT(Run("explain").out, HasSubstr("lens_dust_blob_count\n"));
   const ProgramRun one = Run("explain camera_autofocus_mtf50_vertical");

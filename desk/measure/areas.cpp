@@ -17,6 +17,27 @@ Areas AreasOf(int count, const QVRECT* areas, const int* pixels) {
   return found;
 }
 
+std::vector<Parameter> AreaParameters() {
+  return {{"distance",
+           Parameter::kWhole,
+           "PX",
+           "Areas closer than this are merged",
+           nullptr,
+           0,
+           100'000,
+           {},
+           QV_PROPERTY_AREA_DISTANCE},
+          {"least_pixels",
+           Parameter::kWhole,
+           "N",
+           "Smaller areas are dropped",
+           nullptr,
+           0,
+           1'000'000'000,
+           {},
+           QV_PROPERTY_AREA_LEAST_PIXELS}};
+}
+
 std::vector<Figure> AreaFigures(const Method& method) {
   constexpr auto kWhole = Number::kWhole;
   constexpr auto kReal = Number::kReal;

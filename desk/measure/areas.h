@@ -21,6 +21,9 @@ struct Areas {
 /// Of the result block's arrays.
 Areas AreasOf(int count, const QVRECT* areas, const int* pixels);
 
+/// What decides which dots make an area, and which areas count.
+std::vector<Parameter> AreaParameters();
+
 /// area_count, and of each area the middle and the figures of its size.
 std::vector<Figure> AreaFigures(const Method& method);
 void AddAreas(Phase& phase, const Areas& areas);

@@ -275,35 +275,9 @@ class Lights : public Measurement {
                          0,
                          10'000,
                          {},
-                         QV_PROPERTY_DOT_RADIUS},
-                        {"distance",
-                         Parameter::kWhole,
-                         "PX",
-                         "Areas closer than this are merged",
-                         nullptr,
-                         0,
-                         100'000,
-                         {},
-                         QV_PROPERTY_AREA_DISTANCE},
-                        {"least_pixels",
-                         Parameter::kWhole,
-                         "N",
-                         "Smaller areas are dropped",
-                         nullptr,
-                         0,
-                         1'000'000'000,
-                         {},
-                         QV_PROPERTY_AREA_LEAST_PIXELS}};
-    spec_.figures = {{"region_count", kOne, Number::kWhole, nullptr, kLight, "Regions that were measured."}};
-    for (const LightFigure& row : LightFigures()) spec_.figures.push_back(row.figure);
-    for (const Extreme& extreme : Extremes()) {
-      Figure figure = extreme.figure->figure;
-      figure.name = extreme.name.c_str();
-      figure.docstring = extreme.docstring.c_str();
-      figure.axis = nullptr;
-      spec_.figures.push_back(figure);
-    }
-    for (const Figure& figure : AreaFigures(kDots)) spec_.figures.push_back(figure);
+                         QV_PROPERTY_DOT_RADIUS}};
+    for (const Parameter& parameter : AreaParameters()) spec_.parameters.push_back(parameter);
+    spec_.figures = Figures();
     spec_.advice = "is it a photo of the lit panel, of 8 bits a channel, with all regions inside?";
   }
 
@@ -324,6 +298,21 @@ class Lights : public Measurement {
   }
 
  private:
+  static std::vector<Figure> Figures() {
+    std::vector<Figure> figures = {
+        {"region_count", kOne, Number::kWhole, nullptr, kLight, "Regions that were measured."}};
+    for (const LightFigure& row : LightFigures()) figures.push_back(row.figure);
+    for (const Extreme& extreme : Extremes()) {
+      Figure figure = extreme.figure->figure;
+      figure.name = extreme.name.c_str();
+      figure.docstring = extreme.docstring.c_str();
+      figure.axis = nullptr;
+      figures.push_back(figure);
+    }
+    for (const Figure& figure : AreaFigures(kDots)) figures.push_back(figure);
+    return figures;
+  }
+
   // Said before the test refuses them, in plain words.
   static bool Fit(const Request& request, cv::Size photo, Record& record) {
     for (const Json& r : request.parameters.value("regions", Json::array())) {

@@ -128,25 +128,8 @@ class TouchPanelPrint : public Measurement {
                          1,
                          10'000,
                          {},
-                         QV_PROPERTY_LIST_COMPONENTS},
-                        {"distance",
-                         Parameter::kWhole,
-                         "PX",
-                         "Areas closer than this are merged",
-                         nullptr,
-                         0,
-                         100'000,
-                         {},
-                         QV_PROPERTY_AREA_DISTANCE},
-                        {"least_pixels",
-                         Parameter::kWhole,
-                         "N",
-                         "Smaller areas are dropped",
-                         nullptr,
-                         0,
-                         1'000'000'000,
-                         {},
-                         QV_PROPERTY_AREA_LEAST_PIXELS}};
+                         QV_PROPERTY_LIST_COMPONENTS}};
+    for (const Parameter& parameter : AreaParameters()) spec_.parameters.push_back(parameter);
     spec_.figures = {
         {"rms", kOne, Number::kReal, nullptr, kDeparture,
          "Root mean square departure from what good prints can be, over the range from black to white."},

@@ -45,6 +45,22 @@ std::string TextOf(double value) {
   return Format("%.17g", value);
 }
 
+// Of every run, as the table's head names them.
+constexpr const char* kRunFields =
+    "unit,station,operator,lot,plan,step,measurement,outcome,marginal,result_code,start,library_version,limits_name,"
+    "limits_revision,key";
+
+std::string FieldsOf(const RunRow& row) {
+  std::string line = Field(row.unit);
+  for (const std::string& text :
+       {row.station, row.operator_name, row.lot, row.plan, row.step, row.measurement, row.outcome,
+        std::string(row.marginal ? "1" : "0"), std::to_string(row.result_code), TimeText(row.start_millis),
+        row.library_version, row.limits_name, row.limits_revision, row.key}) {
+    line += "," + Field(text);
+  }
+  return line;
+}
+
 }  // namespace
 
 void ExportLines(Store& store, const Selection& selection, bool with_pictures, const Sink& sink) {
@@ -55,9 +71,7 @@ void ExportTable(Store& store, const Selection& selection, const Sink& sink) {
   const std::vector<Quantity> quantities = store.Quantities();
   const std::vector<std::string> columns = store.ColumnNames();
   std::map<std::int64_t, std::size_t> place;  // of a quantity's field
-  std::string head =
-      "unit,station,operator,lot,plan,step,measurement,outcome,marginal,result_code,start,library_version,limits_name,"
-      "limits_revision,key";
+  std::string head = kRunFields;
   for (const std::string& column : columns) head += "," + Field(column);
   for (const Quantity& quantity : quantities) {
     place.emplace(quantity.id, place.size());
@@ -76,13 +90,7 @@ void ExportTable(Store& store, const Selection& selection, const Sink& sink) {
   const auto flush = [&](std::int64_t until) {  // writes the runs before this one
     for (; next < rows.size() && rows[next].id < until; ++next) {
       const RunRow& row = rows[next];
-      std::string line = Field(row.unit);
-      for (const std::string& text :
-           {row.station, row.operator_name, row.lot, row.plan, row.step, row.measurement, row.outcome,
-            std::string(row.marginal ? "1" : "0"), std::to_string(row.result_code), TimeText(row.start_millis),
-            row.library_version, row.limits_name, row.limits_revision, row.key}) {
-        line += "," + Field(text);
-      }
+      std::string line = FieldsOf(row);
       for (const std::string& column : columns) line += "," + Field(free[row.id][column]);
       for (std::string& field : fields) {
         line += "," + field;
