@@ -167,6 +167,38 @@ TEST_F(Batches, WhatIsStoredIsNotMeasuredAgain) {
   EXPECT_EQ(1U, second.outcomes.at("ERROR")) << "a known run counts in the verdict";
 }
 
+// Those there before, renamed into the folder and closed in it; no others, and of them one machine's share.
+TEST_F(Batches, AWatchedFolderIsMeasuredAsItFills) {
+  const std::string photos = folder_.Path("photos");
+  FolderWatch watch(photos);
+  const Shard shard = {1, 2};
+  watch.Take(shard);
+  std::vector<Job> expected = JobsOfPhotos(photos);
+  const std::vector<Job> first = ShareOf(shard, expected);
+  const std::string aside = folder_.Write("aside.png", ReadFile(folder_.Path("photos/sn0.png")));
+  folder_.Write("photos/.sn7.png", std::string("half a picture"));
+  folder_.Write("photos/notes.txt", std::string("no picture"));
+  for (int i = 10; i < 20; ++i) {
+    Job& job = expected.emplace_back();
+    job.unit = "sn" + std::to_string(i);
+    job.inputs = {photos + "/" + job.unit + ".png"};
+    std::filesystem::copy_file(aside, i % 2 == 0 ? job.inputs[0] : aside + "2");
+    if (i % 2 != 0) std::filesystem::rename(aside + "2", job.inputs[0]);
+  }
+  const std::size_t wanted = ShareOf(shard, expected).size();
+  Store store(folder_.Path("watched.db"), Store::Use::kWrite);
+  Request request;
+  request.measurement = "camera_flash";
+  std::size_t done = 0;
+  const auto late = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+  const BatchProgress progress = RunBatch(
+      PlanOf(request, {}), first, &watch, store, {}, [&](const BatchProgress& p) { done = p.jobs_done; },
+      [&] { return done >= wanted || std::chrono::steady_clock::now() > late; });
+  EXPECT_EQ(wanted, progress.runs);
+  EXPECT_EQ(0U, progress.outcomes.count("ERROR"));
+  EXPECT_EQ(static_cast<std::int64_t>(wanted), store.Count());
+}
+
 // A pipe that is open for writing, but to which nobody writes, holds up whoever reads it.
 TEST_F(Batches, AWorkerThatHangsOrDiesCostsItsOwnUnit) {
   const std::string pipe = folder_.Path("photos/hung.png");

@@ -2,7 +2,9 @@
 
 #include <gmock/gmock.h>
 
+#include <filesystem>
 #include <regex>
+#include <sstream>
 
 #include "unit_tests/program.h"
 
@@ -10,6 +12,7 @@ namespace {
 
 using nlohmann::json;
 using ::testing::HasSubstr;
+using ::testing::Not;
 
 class StoreProgram : public SimulatedPhotos {
  protected:
@@ -100,6 +103,57 @@ TEST_F(StoreProgram, KeepsWhatWasStoredWhenTheDiskIsFull) {
   EXPECT_THAT(Run("show store.db 'SN<1>'").out, HasSubstr("PASS"));
   EXPECT_THAT(Run("import many.jsonl -o store.db").out, HasSubstr("400 runs read"));
   EXPECT_THAT(Run("show store.db").out, HasSubstr("401 runs"));
+}
+
+// A unit's photo is measured by three steps; the first can't, one has a standard, the last is judged by limits of its
+// own.
+TEST_F(StoreProgram, PlansCarryNothingOverAndStopWhereTheySay) {
+  std::filesystem::create_directory(folder_.Path("SN1"));
+  Simulate("--noise 0", "SN1/chart.png");
+  Write("SN1/broken.png", "\x89PNG\r\n\x1a\n no picture");
+  const auto plan = [](const char* stop) {
+    return std::string(R"({"name": "p", "stop_on_error": )") + stop + R"(, "steps": [
+      {"name": "broken", "measurement": "camera_flash", "inputs": ["{unit}/broken.png"]},
+      {"name": "compared", "measurement": "camera_capture", "inputs": ["{unit}/chart.png"],
+       "parameters": {"standard": "SN1/chart.png"}, "properties": {"93": 120}},
+      {"name": "alone", "measurement": "camera_capture", "inputs": ["{unit}/chart.png"],
+       "limits": {"limits": {"camera_capture_marks_found": {"min": 4}}}}]})";
+  };
+  const auto records = [&](const char* stop) {
+    Write("p.json", plan(stop));
+    EXPECT_EQ(3, Run("run p.json --unit SN1 --json - --quiet --junit p.xml -o " + std::string(stop) + ".db").status);
+    std::vector<json> lines;
+    std::istringstream stream(Run("run p.json --unit SN1 --json -").out);
+    for (std::string line; std::getline(stream, line);) lines.push_back(json::parse(line));
+    return lines;
+  };
+  EXPECT_EQ(1U, records("true").size());
+  const std::vector<json> all = records("false");
+  ASSERT_EQ(3U, all.size());
+  EXPECT_EQ("ERROR", all[0]["outcome"]);
+  EXPECT_EQ(0.0, Measured(all[1], "camera_capture_delta_e_76_max"));  // its own standard
+  EXPECT_FALSE(all[2]["phases"][0]["measurements"].contains("camera_capture_delta_e_76_max"));
+  EXPECT_EQ(120, Measured(all[1], "camera_capture_threshold"));
+  EXPECT_NE(120, Measured(all[2], "camera_capture_threshold"));
+  EXPECT_EQ("MEASURED", all[1]["outcome"]);
+  EXPECT_EQ("FAIL", all[2]["outcome"]);
+  EXPECT_THAT(Read("p.xml"), HasSubstr(R"(tests="3" failures="1" errors="1")"));
+  // A batch over the folder that holds the unit stores the same runs; a standard is seen from the plan's folder.
+  EXPECT_THAT(Run("batch p.json . -o false.db -j 1 --junit b.xml").out, HasSubstr("0 runs stored, 3 there before"));
+  EXPECT_THAT(Read("b.xml"), HasSubstr(R"(tests="3" failures="1" errors="1")"));
+}
+
+TEST_F(StoreProgram, WhatIsNoNumberPassesNowhere) {
+  folder_.Write("sn1.png", DrawMarks({900, 900}, 8, {{50, 50}, {50, 750}, {750, 50}}));  // marks, and no edges
+  const std::string limit = R"({"limits": {"camera_autofocus_mtf50_vertical": {"min": -1e300, "max": 1e300}}})";
+  Write("wide.json", limit);
+  Write("plan.json", R"({"name": "p", "limits": )" + limit +
+                         R"(, "steps": [{"measurement": "camera_autofocus", "inputs": ["{unit}.png"]}]})");
+  Write("units.csv", "unit\nsn1\n");
+  EXPECT_THAT(Run("run plan.json --unit sn1").out, Not(HasSubstr("PASS")));
+  EXPECT_EQ(3, Run("batch plan.json units.csv -o results.db --quiet").status);
+  EXPECT_EQ(3, Run("judge results.db --limits wide.json").status);
+  EXPECT_THAT(Run("show results.db sn1").out, Not(HasSubstr("PASS")));
 }
 
 }  // namespace

@@ -28,7 +28,7 @@ namespace qv {
 namespace {
 
 // The line carries frames: eight bytes of length, then the content. Parent to worker: {"job", "first"}. Back: a frame a
-// step, {"step", "run"} and behind it a frame for each picture; a last one, {"done"}.
+// step, {"step", "key", "pictures"} and behind it the record and each picture; a last one, {"done"}.
 
 bool SendAll(int line, const char* bytes, std::size_t length) {
   while (length > 0) {
@@ -130,11 +130,11 @@ std::vector<StoredPicture> PicturesOf(Record& record, KeepPictures keep) {
 
 bool SendRun(int line, std::size_t step, const std::string& key, const Json& record,
              const std::vector<StoredPicture>& pictures) {
-  Json head = {{"step", step}, {"key", key}, {"record", record}, {"pictures", Json::array()}};
+  Json head = {{"step", step}, {"key", key}, {"pictures", Json::array()}};
   for (const StoredPicture& picture : pictures) {
     head["pictures"].push_back({{"name", picture.name}, {"mimetype", picture.mimetype}});
   }
-  bool sent = SendFrame(line, Dump(head));
+  bool sent = SendFrame(line, Dump(head)) && SendFrame(line, TextOf(record));
   for (const StoredPicture& picture : pictures) sent = sent && SendFrame(line, picture.content);
   return sent;
 }
@@ -287,9 +287,13 @@ bool Worker::TakeFrame(std::vector<StepDone>& done, bool& finished) {
   if (received_.size() - taken_ - sizeof length < length) return false;
   std::string content = received_.substr(taken_ + sizeof length, length);
   taken_ += sizeof length + length;
-  if (incomplete_) {
+  if (incomplete_ && incomplete_->run->text.empty()) {
+    incomplete_->run->record = Json::parse(content);
+    incomplete_->run->text = std::move(content);
+    --frames_due_;
+  } else if (incomplete_) {
     std::vector<StoredPicture>& pictures = incomplete_->run->pictures;
-    pictures[pictures.size() - pictures_due_--].content = std::move(content);
+    pictures[pictures.size() - frames_due_--].content = std::move(content);
   } else {
     Json head = Json::parse(content);
     if (head.contains("done")) {
@@ -299,19 +303,18 @@ bool Worker::TakeFrame(std::vector<StepDone>& done, bool& finished) {
     }
     StepDone step;
     step.step = head.at("step");
-    if (!head.contains("record")) {
+    if (!head.contains("pictures")) {
       step.known_key = head.at("key");
     } else {
       StoredRun& run = step.run.emplace();
       run.key = head.at("key");
-      run.record = std::move(head.at("record"));
       for (const Json& picture : head.at("pictures"))
         run.pictures.push_back({picture.at("name"), picture.at("mimetype"), ""});
-      pictures_due_ = run.pictures.size();
+      frames_due_ = 1 + run.pictures.size();
     }
     incomplete_ = std::move(step);
   }
-  if (pictures_due_ > 0) return true;
+  if (frames_due_ > 0) return true;
   next_step_ = incomplete_->step + 1;
   since_ = std::chrono::steady_clock::now();
   done.push_back(std::move(*incomplete_));

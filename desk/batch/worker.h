@@ -73,8 +73,8 @@ class Worker {
   std::chrono::steady_clock::time_point since_;
   std::string received_;
   std::size_t taken_ = 0;
-  std::optional<StepDone> incomplete_;  // whose pictures are still to come
-  std::size_t pictures_due_ = 0;
+  std::optional<StepDone> incomplete_;  // whose record or pictures are still to come
+  std::size_t frames_due_ = 0;
 };
 
 }  // namespace qv

@@ -92,6 +92,8 @@ std::string TextAt(const Json& object, const char* name) {
   return value.is_string() ? value.get<std::string>() : std::string();
 }
 
+std::string TextOf(const Json& record) { return record.dump(-1, ' ', false, Json::error_handler_t::replace); }
+
 std::string BoundsText(const Bounds& bounds) {
   if (bounds.min && bounds.max) return Format("%.6g to %.6g", *bounds.min, *bounds.max);
   return bounds.min ? Format("at least %.6g", *bounds.min) : bounds.max ? Format("at most %.6g", *bounds.max) : "";

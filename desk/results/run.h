@@ -29,7 +29,11 @@ struct StoredRun {  // NOLINT(bugprone-exception-escape): moving a JSON value th
   Filing filing;
   Json record;
   std::vector<StoredPicture> pictures;
+  std::string text = {};  // the record as TextOf writes it; empty: it is made when the run is stored
 };
+
+/// A record on one line, as it is kept.
+std::string TextOf(const Json& record);
 
 /// What makes a run one and the same: the unit, plan and step, the inputs' hashes (the path of an input without one),
 /// the request without its inputs, limits and library version. Needs of the record only what is known before measuring:

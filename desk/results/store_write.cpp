@@ -83,11 +83,8 @@ struct Prepared {
 };
 
 Prepared Prepare(const StoredRun& run) {
-  Prepared prepared = {RowOf(run),
-                       Pack(run.record.dump(-1, ' ', false, Json::error_handler_t::replace)),
-                       FiguresOf(run.record),
-                       {},
-                       &run.pictures};
+  Prepared prepared = {
+      RowOf(run), Pack(run.text.empty() ? TextOf(run.record) : run.text), FiguresOf(run.record), {}, &run.pictures};
   for (StoredFigure& figure : prepared.figures) {
     for (std::string* text : {&figure.name, &figure.unit, &figure.method, &figure.docstring, &figure.outcome}) {
       *text = Clean(*text);
