@@ -42,11 +42,6 @@ const Setting kSettings[] = {
     {"2000 x 1500, sRGB", {2000, 1500}, 1.2, 1, true},
 };
 
-float Decoded(float level) {
-  const float v = std::clamp(level / 255, 0.0f, 1.0f);
-  return 255 * (v <= 0.04045f ? v / 12.92f : std::pow((v + 0.055f) / 1.055f, 2.4f));
-}
-
 float Encoded(float level) {
   const float v = std::clamp(level / 255, 0.0f, 1.0f);
   return 255 * (v <= 0.0031308f ? 12.92f * v : 1.055f * std::pow(v, 1 / 2.4f) - 0.055f);
@@ -82,11 +77,7 @@ SimulationOptions Draw(int seed, const std::string& pattern, const Setting& sett
 }
 
 Display Photograph(SimulationOptions o, const Setting& setting) {
-  if (setting.srgb) {  // the drawn levels are what is to be stored: the light of the surround and of black behind them
-    o.display.surround = Decoded(static_cast<float>(o.display.surround));
-    o.display.black = Decoded(static_cast<float>(o.display.black));
-    o.display.bezel_level = Decoded(static_cast<float>(o.display.bezel_level));
-  }
+  o.camera.srgb = setting.srgb;  // drawn and blurred in light
   const Simulation simulation = Simulate(o);
   cv::Mat levels = simulation.levels[0] + cv::Scalar::all(setting.veil);
   if (setting.srgb) {
@@ -94,6 +85,7 @@ Display Photograph(SimulationOptions o, const Setting& setting) {
       for (float& level : pixel.val) level = Encoded(level);
     }
   }
+  o.camera.srgb = false;  // encoded here, since its noise is that of stored levels
   Display display;
   display.photo = Sense(o.camera, levels, 8);
   if (setting.jpeg > 0) {
@@ -157,7 +149,7 @@ Display PatternPhoto(int i, const std::string& shown, int quarters) {
   setting.srgb = i / 24 % 3 > 0;
   setting.jpeg = i / 24 % 3 > 1 ? random.uniform(60, 96) : 0;
   setting.exposure_ev = random.uniform(-0.5, 0.3);
-  setting.veil = random.uniform(0.0, setting.srgb ? 3.0 : 20.0);
+  setting.veil = random.uniform(0.0, setting.srgb ? 1.0 : 20.0);
   SimulationOptions view = Draw(i + 1000, shown, setting);
   view.camera.turn_deg = 90 * quarters + std::remainder(view.camera.turn_deg, 20);
   view.camera.cast = {random.uniform(0.94, 1.06), 1, random.uniform(0.94, 1.06)};

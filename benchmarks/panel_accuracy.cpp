@@ -309,6 +309,9 @@ void PrintPrints() {
       }
       std::printf("\n");
     }
+    std::printf("| %.0f | false areas |", side);
+    for (const double contrast : contrasts) std::printf(" %d |", sums[{side, contrast}].wrong);
+    std::printf("\n");
   }
   std::printf("\nFalse areas: %.2f a print.\n", static_cast<double>(all.wrong) / trusted);
   Hold("prints_extra", 100.0 * sure.found[0] / sure.drawn[0]);
