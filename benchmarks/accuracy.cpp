@@ -19,6 +19,7 @@
 #include "benchmarks/trials.h"
 #include "chart/chart_layout.h"
 #include "desk/base/files.h"
+#include "desk/base/text.h"
 #include "desk/drawing/plot.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/promises.h"
@@ -500,6 +501,15 @@ const std::vector<Sweep>& Sweeps() {
   return sweeps;
 }
 
+// Wilson's interval, at 95 %, of a share of so many trials.
+cv::Vec2d IntervalOf(double share, int trials) {
+  constexpr double kZ = 1.96;
+  const double n = trials;
+  const double middle = (share + kZ * kZ / (2 * n)) / (1 + kZ * kZ / n);
+  const double half = kZ / (1 + kZ * kZ / n) * std::sqrt(share * (1 - share) / n + kZ * kZ / (4 * n * n));
+  return {middle - half, middle + half};
+}
+
 std::string curves_file;
 
 void PrintDetection() {
@@ -511,9 +521,10 @@ void PrintDetection() {
       "detectors\n",
       kPhotos, CV_VERSION);
   constexpr double kWidth = 420;
-  constexpr double kHeight = 300;
+  constexpr double kHeight = 330;
   Picture picture(static_cast<int>(3 * kWidth), static_cast<int>(2 * kHeight + 40));
-  picture.Text("Share found: chart cyan, QR code yellow, ArUco marker red", {12, 26}, 16, kInk);
+  picture.Text(Format("Share of %d photos in which each was found; bars: its 95 %% interval", kPhotos), {12, 26}, 16,
+               kInk);
   cv::Rect2d place(0, 40, kWidth, kHeight);
   for (const Sweep& sweep : Sweeps()) {
     std::printf("\n| %s | chart | QR code | ArUco |\n|---|---|---|---|\n", sweep.axis);
@@ -534,18 +545,25 @@ void PrintDetection() {
     plot.y_label = "share found";
     plot.x_max = sweep.values.back();
     plot.y_max = 1.05;
-    plot.more_curves = {{{}, kDoubtful}, {{}, kPoor}, {{}, kGood}};
+    const char* const names[] = {"chart", "QR code", "ArUco marker"};
+    for (int k = 0; k < 3; ++k) {
+      plot.curves.push_back({names[k], {}, kSeries[k]});
+      plot.curves[k].shift_px = 5 * (k - 1);
+    }
     for (std::size_t i = 0; i < sweep.values.size(); ++i) {
       const auto share = [&](bool Detections::*target) {
         const auto first = found.begin() + static_cast<std::ptrdiff_t>(i * kPhotos);
         return std::count_if(first, first + kPhotos, [=](const Detections& d) { return d.*target; }) /
                static_cast<double>(kPhotos);
       };
-      const std::array<double, 3> shares = {share(&Detections::qr), share(&Detections::aruco),
-                                            share(&Detections::chart)};
-      std::printf("| %g | %.0f %% | %.0f %% | %.0f %% |\n", sweep.values[i], 100 * shares[2], 100 * shares[0],
-                  100 * shares[1]);
-      for (int k = 0; k < 3; ++k) plot.more_curves[k].points.emplace_back(sweep.values[i], shares[k]);
+      const std::array<double, 3> shares = {share(&Detections::chart), share(&Detections::qr),
+                                            share(&Detections::aruco)};
+      std::printf("| %g | %.0f %% | %.0f %% | %.0f %% |\n", sweep.values[i], 100 * shares[0], 100 * shares[1],
+                  100 * shares[2]);
+      for (int k = 0; k < 3; ++k) {
+        plot.curves[k].points.emplace_back(sweep.values[i], shares[k]);
+        plot.curves[k].spans.push_back(IntervalOf(shares[k], kPhotos));
+      }
     }
     DrawPlot(picture, plot, place);
     place.x += kWidth;

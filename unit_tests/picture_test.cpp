@@ -2,10 +2,12 @@
 
 #include <gmock/gmock.h>
 
+#include <cmath>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
 #include "desk/base/failure.h"
+#include "desk/drawing/labels.h"
 #include "desk/drawing/plot.h"
 
 namespace qv {
@@ -18,26 +20,97 @@ cv::Mat Decode(const Picture& picture) {
   return cv::imdecode(std::vector<uchar>(file.begin(), file.end()), cv::IMREAD_COLOR);
 }
 
-cv::Mat Gray(const cv::Mat& picture) {
-  cv::Mat gray;
-  cv::cvtColor(picture, gray, cv::COLOR_BGR2GRAY);
-  return gray;
-}
-
-int Count(const cv::Mat& picture, Colour colour) {
+cv::Mat MaskOf(const cv::Mat& picture, Colour colour, double slack = 1) {
   cv::Mat found;
   const cv::Vec3d bgr = 255 * cv::Vec3d(colour.blue, colour.green, colour.red);
-  cv::inRange(picture, bgr - cv::Vec3d::all(1), bgr + cv::Vec3d::all(1), found);
-  return cv::countNonZero(found);
+  cv::inRange(picture, bgr - cv::Vec3d::all(slack), bgr + cv::Vec3d::all(slack), found);
+  return found;
+}
+
+int Count(const cv::Mat& picture, Colour colour) { return cv::countNonZero(MaskOf(picture, colour)); }
+
+// Relative luminance and contrast as WCAG 2.1 defines them.
+double Luminance(Colour c) {
+  const auto linear = [](double v) { return v <= 0.03928 ? v / 12.92 : std::pow((v + 0.055) / 1.055, 2.4); };
+  return 0.2126 * linear(c.red) + 0.7152 * linear(c.green) + 0.0722 * linear(c.blue);
+}
+
+double Contrast(Colour a, Colour b) {
+  const auto [low, high] = std::minmax(Luminance(a), Luminance(b));
+  return (high + 0.05) / (low + 0.05);
+}
+
+// As seen without red cones, and without green ones (Vienot, Brettel and Mollon, 1999).
+Colour SeenBy(bool no_red, Colour c) {
+  const auto mix = [&](double r, double g, double b) { return r * c.red + g * c.green + b * c.blue; };
+  return no_red ? Colour{mix(0.11238, 0.88762, 0), mix(0.11238, 0.88762, 0), mix(0.00401, -0.00401, 1)}
+                : Colour{mix(0.29275, 0.70725, 0), mix(0.29275, 0.70725, 0), mix(-0.02234, 0.02234, 1)};
+}
+
+double Distance(Colour a, Colour b) {
+  return cv::norm(cv::Vec3d(a.red, a.green, a.blue) - cv::Vec3d(b.red, b.green, b.blue));
+}
+
+TEST(Palette, EveryWordIsReadableOnItsGroundAndEveryToneToldApart) {
+  constexpr double kReadable = 4.5;  // WCAG 2.1, level AA
+  constexpr double kApart = 0.25;
+  for (const PaletteRow& row : kPalette) {
+    EXPECT_GE(Contrast(row.on_label, kLabel), kReadable) << row.name;
+    EXPECT_GE(Contrast(row.on_paper, kPaper), kReadable) << row.name;
+    for (const PaletteRow& other : kPalette) {
+      for (const bool no_red : {true, false}) {
+        if (row.tone == other.tone) continue;
+        EXPECT_GE(Distance(SeenBy(no_red, row.on_label), SeenBy(no_red, other.on_label)), kApart)
+            << row.name << ", " << other.name;
+      }
+    }
+  }
+  for (std::size_t i = 0; i < kSeries.size(); ++i) {
+    EXPECT_GE(Contrast(kSeries[i].colour, kPaper), 3) << "WCAG 2.1 for what is no text";
+    for (std::size_t j = 0; j < i; ++j) {
+      EXPECT_NE(kSeries[i].dash, kSeries[j].dash);
+      EXPECT_NE(kSeries[i].shape, kSeries[j].shape);
+    }
+  }
+}
+
+TEST(Picture, WordsStandInTheColourOfTheirToneOnTheirGround) {
+  for (const PaletteRow& row : kPalette) {
+    Picture picture(200, 60);
+    picture.Text("MMMM", {10, 40}, 30, row.tone, Align::kLeft, true);
+    EXPECT_GT(Count(Decode(picture), row.on_label), 100) << row.name;
+    EXPECT_GT(Count(Decode(picture), kLabel), 1000) << row.name;
+    Picture badge(200, 60);
+    EXPECT_NEAR(10 + WidthOf("MMMM", 30) + 12, badge.Badge("MMMM", {10, 40}, 30, row.tone), 1e-6);
+    EXPECT_GT(Count(Decode(badge), row.on_paper), 1000) << row.name;
+  }
+  const std::vector<std::string> lines = Wrapped("the words of a long sentence, in lines", 14, 100);
+  EXPECT_GE(lines.size(), 3U);
+  for (const std::string& line : lines) EXPECT_LE(WidthOf(line, 14), 100) << line;
+}
+
+TEST(Labels, LieInsideAndOverNothingThatIsToBeSeen) {
+  const cv::Rect2d inside(0, 0, 300, 200);
+  Labels labels(inside);
+  Picture picture(300, 200);
+  std::vector<cv::Rect2d> seen = {{0, 0, 120, 80}, {130, 0, 40, 200}, {0, 90, 60, 60}, {280, 180, 20, 20}};
+  for (const cv::Rect2d& thing : seen) labels.Keep(thing);
+  for (const std::size_t thing : {0, 1, 2, 3}) {
+    const cv::Rect2d label = labels.Add(picture, {"a name", "and more"}, seen[thing], kGood);
+    EXPECT_EQ(label, label & inside);
+    for (const cv::Rect2d& other : seen) EXPECT_EQ(0, (label & other).area()) << thing;
+    EXPECT_GT(cv::countNonZero(MaskOf(Decode(picture)(label), OnLabel(kGood), 60)), 30) << "its words";
+    seen.push_back(label);
+  }
 }
 
 // After an error cairo draws nothing more and says nothing: the picture would look finished.
 TEST(Picture, APictureThatLostAStrokeIsNotHandedOut) {
   Picture picture(40, 20);
-  picture.FillRectangle({0, 0, 10, 10}, kPoor);
-  EXPECT_EQ(100, Count(Decode(picture), kPoor));
+  picture.FillRectangle({0, 0, 10, 10}, OnPaper(kPoor));
+  EXPECT_EQ(100, Count(Decode(picture), OnPaper(kPoor)));
   picture.Text("\xFF is not UTF-8", {2, 12}, 10, kInk);
-  picture.FillRectangle({10, 0, 10, 10}, kPoor);
+  picture.FillRectangle({10, 0, 10, 10}, OnPaper(kPoor));
   try {
     picture.Png();
     FAIL() << "a picture without its text";
@@ -62,35 +135,65 @@ TEST(Picture, TextAndOutlinesEndWhereTheyAreToldTo) {
   EXPECT_EQ(cv::Vec3b(9, 9, 250), photo.at<cv::Vec3b>(59, 159));
 }
 
-// A line at half of the height, and a marker where the curve meets it; what is beyond the frame is cut.
-TEST(Plot, CurvesLinesAndMarkersLieWhereTheAxesSay) {
+const cv::Rect kFrame(52, 28, 400 - 68, 300 - 28 - 44);  // of a plot of 400 x 300 without a legend
+
+// What is beyond the frame is cut, on all sides.
+TEST(Plot, CurvesAndMarkersLieWhereTheAxesSay) {
   Picture picture(400, 300);
   Plot plot;
   plot.y_max = 2;
-  plot.more_curves = {{{{0.5, 0}, {0.5, 9}}, kGood}};
+  plot.curves = {{"", {{0.5, 0}, {0.5, 9}, {3, 1}}, {OnLabel(kGood), Dash::kSolid, PointShape::kNone}}};
   plot.markers = {{{0.25, 1}, "", kPoor}, {{0.5, NAN}, "", kDoubtful}, {{1.03, 1}, "", kDoubtful}};
-  plot.horizontal_lines = {0.5};
-  plot.second_curve = {{0, 1.5}, {1, 1.5}};
   DrawPlot(picture, plot, {0, 0, 400, 300});
   const cv::Mat drawn = Decode(picture);
-  const cv::Rect frame(52, 28, 400 - 68, 300 - 72);
-  cv::Mat good;
-  cv::inRange(drawn, cv::Scalar(150, 120, 0), cv::Scalar(230, 220, 130), good);
-  const cv::Rect curve = cv::boundingRect(good);
-  EXPECT_NEAR(frame.x + 0.5 * frame.width, curve.x + curve.width / 2.0, 1);
-  EXPECT_NEAR(frame.y, curve.y, 5);  // a dot's radius and half a stroke
-  EXPECT_NEAR(frame.height, curve.height, 10);
-  EXPECT_EQ(0, Count(drawn, kDoubtful));
-  const auto dark = [&](const cv::Rect& part) { return cv::countNonZero(Gray(drawn(part)) < 150); };
-  for (const double y : {0.5, 1.5}) {  // a limit, and a second curve
-    EXPECT_GT(dark({frame.x + 5, cvRound(frame.y + frame.height * (1 - y / 2)) - 1, frame.width - 10, 2}), 300) << y;
+  const cv::Rect curve = cv::boundingRect(MaskOf(drawn, OnLabel(kGood), 40));
+  EXPECT_NEAR(kFrame.x + 0.5 * kFrame.width, curve.x + curve.width / 2.0, 1);
+  EXPECT_NEAR(kFrame.y, curve.y, 2);
+  EXPECT_NEAR(kFrame.height, curve.height, 3);
+  EXPECT_EQ(0, Count(drawn, OnPaper(kDoubtful)));
+  EXPECT_GT(Count(drawn(cv::Rect(kFrame.x - 20, kFrame.y - 8, 18, 14)), OnPaper(kInk)), 1) << "the topmost tick";
+  const cv::Rect marker = cv::boundingRect(MaskOf(drawn, OnPaper(kPoor), 20));
+  EXPECT_NEAR(kFrame.x + 0.25 * kFrame.width, marker.x + marker.width / 2.0, 1);
+  EXPECT_NEAR(kFrame.y + 0.5 * kFrame.height - 6, marker.y, 2);
+}
+
+// Each part is drawn, in its colour, where it should be: without it that place is empty.
+TEST(Plot, ShowsIntervalsLevelsAndALegend) {
+  const Series& series = kSeries[1];
+  Plot bare;
+  bare.curves = {{"", {{0.2, 0.5}, {0.8, 0.5}}, series}};
+  struct Part {
+    const char* name;
+    void (*add)(Plot& plot);
+    cv::Rect where;
+    Colour colour;
+  };
+  const int middle = kFrame.y + kFrame.height / 2;
+  const Part parts[] = {
+      {"interval",
+       [](Plot& plot) {
+         plot.curves[0].spans = {{0.1, 0.9}, {0.1, 0.9}};
+       },
+       cv::Rect(kFrame.x + kFrame.width / 5 - 4, kFrame.y + kFrame.height / 9, 8, kFrame.height / 4), series.colour},
+      {"limit",
+       [](Plot& plot) {
+         plot.levels = {{0.6, "at least 0.6", true, kPoor}};
+       },
+       cv::Rect(kFrame.x + kFrame.width * 6 / 10 - 3, kFrame.y + 10, 6, 60), OnPaper(kPoor)},
+      {"legend", [](Plot& plot) { plot.curves[0].name = "own"; }, cv::Rect(8, 270, 40, 30), series.colour},
+      {"bars", [](Plot& plot) { plot.curves[0].bars = true; },
+       cv::Rect(kFrame.x + kFrame.width / 5 - 3, middle + 20, 6, 40), series.colour}};
+  const auto coloured = [](const Plot& plot, const Part& part) {
+    Picture picture(400, 300);
+    DrawPlot(picture, plot, {0, 0, 400, 300});
+    return cv::countNonZero(MaskOf(Decode(picture)(part.where), part.colour, 120));
+  };
+  for (const Part& part : parts) {
+    Plot plot = bare;
+    part.add(plot);
+    EXPECT_EQ(0, coloured(bare, part)) << part.name;
+    EXPECT_GT(coloured(plot, part), 10) << part.name;
   }
-  EXPECT_GT(dark({frame.x - 20, frame.y - 8, 18, 14}), 5) << "the topmost tick";
-  cv::Mat poor;
-  cv::inRange(drawn, cv::Scalar(0, 0, 200), cv::Scalar(90, 90, 255), poor);
-  const cv::Rect marker = cv::boundingRect(poor);
-  EXPECT_NEAR(frame.x + 0.25 * frame.width, marker.x + marker.width / 2.0, 1);
-  EXPECT_NEAR(frame.y + 0.5 * frame.height - 6, marker.y, 2);
 }
 
 }  // namespace

@@ -144,7 +144,7 @@ TEST_F(Program, MissesSayWhy) {
   folder_.Write("two.png", DrawChart(two));
   Record("mtf two.png --annotate seen.png", 3);
   EXPECT_THAT(err_, AllOf(HasSubstr("two.png: 2 of 3 finder marks were found"), Not(HasSubstr("--threshold"))));
-  EXPECT_GT(PixelsOf({26, 26, 230}, folder_.Path("seen.png")), 100) << "the candidates are ringed in red";
+  EXPECT_GT(PixelsOf({217, 191, 0}, folder_.Path("seen.png")), 100) << "what was found is ringed in cyan";
 
   folder_.Write("small.png", DrawMarks({300, 300}, 2, {{50, 50}, {50, 200}}));
   ExpectComplaint("circles small.png", 3, "marks of 2.0 px a module: at least 3 are needed");

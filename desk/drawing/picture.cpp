@@ -2,6 +2,7 @@
 
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
+#include <sstream>
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
@@ -32,7 +33,7 @@ Picture::Picture(int width, int height)
     throw Failure(kInternalFault, Format("no memory for a picture of %d x %d pixels", width, height));
   }
   cairo_select_font_face(cr_.get(), "sans-serif", CAIRO_FONT_SLANT_NORMAL, CAIRO_FONT_WEIGHT_NORMAL);
-  SetColour(cr_.get(), {1, 1, 1});
+  SetColour(cr_.get(), kPaper);
   cairo_paint(cr_.get());
 }
 
@@ -53,14 +54,27 @@ PhotoPlace Picture::PlacePhoto(const cv::Mat& image, cv::Point2d origin, double 
   return {origin, scale};
 }
 
-void Picture::Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed) {
+void Picture::Line(const std::vector<cv::Point2d>& points, Tone tone, double width, bool closed) {
+  Line(points, kLabel, width + 2, closed);
+  Line(points, OnLabel(tone), width, closed);
+}
+
+void Picture::Circle(cv::Point2d centre, double radius, Tone tone, double width) {
+  Circle(centre, radius, kLabel, width + 2);
+  Circle(centre, radius, OnLabel(tone), width);
+}
+
+void Picture::Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed, Dash dash) {
+  const double lengths[] = {dash == Dash::kDashed ? 7.0 : 1.5, dash == Dash::kDashed ? 4.0 : 3.0};
   SetColour(cr_.get(), colour);
   cairo_set_line_width(cr_.get(), width);
   cairo_set_line_join(cr_.get(), CAIRO_LINE_JOIN_ROUND);
+  cairo_set_dash(cr_.get(), lengths, dash == Dash::kSolid ? 0 : 2, 0);
   cairo_new_path(cr_.get());
   for (const cv::Point2d& p : points) cairo_line_to(cr_.get(), p.x, p.y);
   if (closed) cairo_close_path(cr_.get());
   cairo_stroke(cr_.get());
+  cairo_set_dash(cr_.get(), nullptr, 0, 0);
 }
 
 void Picture::FillRectangle(const cv::Rect2d& r, Colour colour) {
@@ -77,28 +91,59 @@ void Picture::Circle(cv::Point2d centre, double radius, Colour colour, double wi
   cairo_stroke(cr_.get());
 }
 
-void Picture::Text(const std::string& text, cv::Point2d place, double size, Colour colour, Align align, bool backed) {
+void Picture::Text(const std::string& text, cv::Point2d place, double size, Tone tone, Align align, bool backed) {
   cairo_set_font_size(cr_.get(), size);
   cairo_text_extents_t extents;
   cairo_text_extents(cr_.get(), text.c_str(), &extents);
   const double share = align == Align::kLeft ? 0 : align == Align::kCentre ? 0.5 : 1;
   const double left = place.x - share * extents.x_advance;
-  if (backed) {
-    cairo_rectangle(cr_.get(), left - 4, place.y - size, extents.x_advance + 8, size * 1.3);
-    cairo_set_source_rgba(cr_.get(), kInk.red, kInk.green, kInk.blue, 0.8);
-    cairo_fill(cr_.get());
-  }
-  SetColour(cr_.get(), colour);
+  if (backed) FillRectangle({left - 4, place.y - size, extents.x_advance + 8, size * 1.3}, kLabel);
+  SetColour(cr_.get(), backed ? OnLabel(tone) : OnPaper(tone));
   cairo_move_to(cr_.get(), left, place.y);
   cairo_show_text(cr_.get(), text.c_str());
 }
 
-void Picture::TextUpwards(const std::string& text, cv::Point2d place, double size, Colour colour) {
+double Picture::Badge(const std::string& text, cv::Point2d place, double size, Tone tone) {
+  const double width = WidthOf(text, size);
+  FillRectangle({place.x, place.y - size, width + 12, size * 1.35}, OnPaper(tone));
+  cairo_set_font_size(cr_.get(), size);
+  SetColour(cr_.get(), kPaper);
+  cairo_move_to(cr_.get(), place.x + 6, place.y);
+  cairo_show_text(cr_.get(), text.c_str());
+  return place.x + width + 12;
+}
+
+void Picture::TextUpwards(const std::string& text, cv::Point2d place, double size, Tone tone) {
   cairo_save(cr_.get());
   cairo_translate(cr_.get(), place.x, place.y);
   cairo_rotate(cr_.get(), -CV_PI / 2);
-  Text(text, {0, 0}, size, colour, Align::kCentre);
+  Text(text, {0, 0}, size, tone, Align::kCentre);
   cairo_restore(cr_.get());
+}
+
+double WidthOf(const std::string& text, double size) {
+  const std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface(
+      cairo_image_surface_create(CAIRO_FORMAT_A8, 1, 1), cairo_surface_destroy);
+  const std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr(cairo_create(surface.get()), cairo_destroy);
+  cairo_select_font_face(cr.get(), "sans-serif", CAIRO_FONT_SLANT_NORMAL, CAIRO_FONT_WEIGHT_NORMAL);
+  cairo_set_font_size(cr.get(), size);
+  cairo_text_extents_t extents;
+  cairo_text_extents(cr.get(), text.c_str(), &extents);
+  return extents.x_advance;
+}
+
+std::vector<std::string> Wrapped(const std::string& text, double size, double width) {
+  std::vector<std::string> lines(1);
+  std::istringstream words(text);
+  for (std::string word; words >> word;) {
+    const std::string longer = lines.back() + (lines.back().empty() ? "" : " ") + word;
+    if (lines.back().empty() || WidthOf(longer, size) <= width) {
+      lines.back() = longer;
+    } else {
+      lines.push_back(word);
+    }
+  }
+  return lines;
 }
 
 std::string Picture::Png() const {

@@ -8,18 +8,11 @@
 #include <string>
 #include <vector>
 
+#include "desk/drawing/palette.h"
+
 namespace qv {
 
 // A picture for a person to look at: lines and text, drawn with cairo.
-
-struct Colour {
-  double red, green, blue;
-};
-inline constexpr Colour kInk = {0.12, 0.12, 0.14};
-inline constexpr Colour kFaint = {0.72, 0.72, 0.74};
-inline constexpr Colour kGood = {0.0, 0.75, 0.85};      // cyan
-inline constexpr Colour kDoubtful = {0.95, 0.80, 0.0};  // yellow
-inline constexpr Colour kPoor = {0.90, 0.10, 0.10};     // red
 
 /// Where a photo's pixels lie on a picture: pixel centres at whole numbers.
 struct PhotoPlace {
@@ -36,14 +29,21 @@ class Picture {
 
   /// Puts a picture (8 bits; 1, 3 or 4 channels) with its top left corner there, scaled.
   PhotoPlace PlacePhoto(const cv::Mat& image, cv::Point2d origin, double scale);
-  void Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed = false);
-  void FillRectangle(const cv::Rect2d& rectangle, Colour colour);
+  /// On a photo: edged, so that it shows on any ground.
+  void Line(const std::vector<cv::Point2d>& points, Tone tone, double width, bool closed = false);
+  void Circle(cv::Point2d centre, double radius, Tone tone, double width);
+  /// On paper.
+  void Line(const std::vector<cv::Point2d>& points, Colour colour, double width, bool closed = false,
+            Dash dash = Dash::kSolid);
   void Circle(cv::Point2d centre, double radius, Colour colour, double width);
-  /// The baseline starts, is centred or ends at the place. Backed text stays readable on a photo.
-  void Text(const std::string& text, cv::Point2d place, double size, Colour colour, Align align = Align::kLeft,
+  void FillRectangle(const cv::Rect2d& rectangle, Colour colour);
+  /// The baseline starts, is centred or ends at the place. On paper, or backed by a label: for a photo.
+  void Text(const std::string& text, cv::Point2d place, double size, Tone tone, Align align = Align::kLeft,
             bool backed = false);
+  /// White on the tone's own colour; answers where it ends.
+  double Badge(const std::string& text, cv::Point2d place, double size, Tone tone);
   /// As Text, reading upwards.
-  void TextUpwards(const std::string& text, cv::Point2d place, double size, Colour colour);
+  void TextUpwards(const std::string& text, cv::Point2d place, double size, Tone tone);
   /// The picture as a PNG file's content; throws Failure when anything before could not be drawn.
   std::string Png() const;
 
@@ -54,6 +54,12 @@ class Picture {
   std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface_;
   std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr_;
 };
+
+/// Width of a text of this size.
+double WidthOf(const std::string& text, double size);
+
+/// The text in lines no wider than this; cut between words.
+std::vector<std::string> Wrapped(const std::string& text, double size, double width);
 
 }  // namespace qv
 

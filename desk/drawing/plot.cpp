@@ -25,6 +25,45 @@ std::string TickText(double value, double step) {
   return Format("%.*f", decimals, value);
 }
 
+constexpr double kText = 12;
+constexpr double kSample = 34;  // of a line in the legend
+constexpr double kRow = 18;
+
+// A name in the legend, and how its line is drawn.
+struct Entry {
+  std::string name;
+  Series series;
+  bool bars, level;
+};
+
+std::vector<Entry> LegendOf(const Plot& plot) {
+  std::vector<Entry> entries;
+  for (const Plot::Curve& curve : plot.curves) {
+    if (!curve.name.empty()) entries.push_back({curve.name, curve.series, curve.bars, false});
+    if (curve.ends_only && !curve.name.empty()) entries.back().series.shape = PointShape::kNone;
+  }
+  for (const Plot::Level& level : plot.levels) {
+    entries.push_back({level.name, {OnPaper(level.tone), Dash::kDashed, PointShape::kNone}, false, true});
+  }
+  return entries;
+}
+
+// Entries side by side, as many a row as have room.
+std::vector<std::vector<Entry>> LegendRows(const Plot& plot, double width) {
+  std::vector<std::vector<Entry>> rows;
+  double used = 0;
+  for (const Entry& entry : LegendOf(plot)) {
+    const double needed = kSample + 6 + WidthOf(entry.name, kText) + 16;
+    if (rows.empty() || used + needed > width) {
+      rows.emplace_back();
+      used = 0;
+    }
+    used += needed;
+    rows.back().push_back(entry);
+  }
+  return rows;
+}
+
 // A plot on its way onto a picture.
 struct Drawing {
   Picture& picture;
@@ -38,12 +77,14 @@ struct Drawing {
   }
   void Ticks() const;
   void Labels() const;
+  void Spots(const std::vector<cv::Point2d>& places, const Series& series) const;
+  void Piece(const std::vector<cv::Point2d>& piece, const Plot::Curve& curve) const;
   void Curves() const;
+  void Levels() const;
+  bool IsTaken(const cv::Rect2d& place, const std::vector<cv::Rect2d>& texts) const;
   void Markers() const;
+  void Legend() const;
 };
-
-constexpr double kText = 12;
-constexpr Colour kCurve = {0.1, 0.35, 0.75};
 
 bool Finite(const cv::Point2d& p) { return std::isfinite(p.x) && std::isfinite(p.y); }
 
@@ -74,41 +115,125 @@ void Drawing::Labels() const {
   picture.TextUpwards(plot.y_label, {area.x + 12, frame.y + frame.height / 2}, kText, kInk);
 }
 
-void Drawing::Curves() const {
-  for (const double y : plot.horizontal_lines) picture.Line({At({0, y}), At({plot.x_max, y})}, kInk, 1);
-  std::vector<cv::Point2d> line;
-  for (const cv::Point2d& point : plot.curve) {
-    if (!Finite(point)) continue;
-    if (plot.bars) picture.Line({At({point.x, plot.y_min}), At(point)}, kCurve, 1);
-    line.push_back(At(point));
-  }
-  std::vector<cv::Point2d> second_line;
-  for (const cv::Point2d& point : plot.second_curve) second_line.push_back(At(point));
-  if (!second_line.empty()) picture.Line(second_line, kInk, 1);
-  if (!plot.bars && !line.empty()) picture.Line(line, kCurve, 2);
-  for (const Plot::Curve& curve : plot.more_curves) {
-    std::vector<cv::Point2d> piece;
-    for (std::size_t i = 0; i <= curve.points.size(); ++i) {
-      const bool goes_on = i < curve.points.size() && Finite(curve.points[i]);
-      if (goes_on) piece.push_back(At(curve.points[i]));
-      if (goes_on || piece.empty()) continue;
-      const bool alone = piece.size() == 1;
-      if (!alone) picture.Line(piece, curve.colour, 2.5);
-      for (const cv::Point2d& point : piece) {
-        if (curve.dots || alone) picture.Circle(point, alone && !curve.dots ? 0.75 : 2.5, curve.colour, 2);
-      }
-      piece.clear();
+void Drawing::Spots(const std::vector<cv::Point2d>& places, const Series& series) const {
+  constexpr double kReach = 3.5;
+  for (const cv::Point2d& p : places) {
+    switch (series.shape) {
+      case PointShape::kNone: break;
+      case PointShape::kCircle: picture.Circle(p, kReach - 1, series.colour, 2); break;
+      case PointShape::kSquare:
+        picture.Line({p + cv::Point2d(-kReach, -kReach), p + cv::Point2d(kReach, -kReach),
+                      p + cv::Point2d(kReach, kReach), p + cv::Point2d(-kReach, kReach)},
+                     series.colour, 1.5, true);
+        break;
+      case PointShape::kTriangle:
+        picture.Line({p + cv::Point2d(0, -kReach - 1), p + cv::Point2d(kReach + 1, kReach),
+                      p + cv::Point2d(-kReach - 1, kReach)},
+                     series.colour, 1.5, true);
+        break;
     }
   }
 }
 
+// Points without a gap.
+void Drawing::Piece(const std::vector<cv::Point2d>& piece, const Plot::Curve& curve) const {
+  if (piece.size() > 1) picture.Line(piece, curve.series.colour, 2, false, curve.series.dash);
+  if (!curve.ends_only) {
+    Spots(piece, curve.series);
+  } else if (piece.size() == 1) {
+    picture.Circle(piece[0], 0.75, curve.series.colour, 2);
+  }
+}
+
+void Drawing::Curves() const {
+  for (const Plot::Curve& curve : plot.curves) {
+    const cv::Point2d shift(curve.shift_px, 0);
+    std::vector<cv::Point2d> piece;
+    for (std::size_t i = 0; i <= curve.points.size(); ++i) {
+      const bool goes_on = i < curve.points.size() && Finite(curve.points[i]) && curve.points[i].x <= plot.x_max;
+      if (goes_on && curve.bars) {
+        picture.Line({At({curve.points[i].x, plot.y_min}), At(curve.points[i])}, curve.series.colour, 1);
+      } else if (goes_on) {
+        piece.push_back(At(curve.points[i]) + shift);
+        if (i < curve.spans.size()) {
+          const cv::Point2d low = At({curve.points[i].x, curve.spans[i][0]}) + shift;
+          const cv::Point2d high = At({curve.points[i].x, curve.spans[i][1]}) + shift;
+          picture.Line({low, high}, curve.series.colour, 1);
+          for (const cv::Point2d& end : {low, high})
+            picture.Line({end - cv::Point2d(3, 0), end + cv::Point2d(3, 0)}, curve.series.colour, 1);
+        }
+      } else if (!piece.empty()) {
+        Piece(piece, curve);
+        piece.clear();
+      }
+    }
+  }
+}
+
+void Drawing::Levels() const {
+  for (const Plot::Level& level : plot.levels) {
+    if (!std::isfinite(level.at) || (level.upright && level.at > plot.x_max)) continue;
+    const cv::Point2d from = level.upright ? At({level.at, plot.y_min}) : At({0, level.at});
+    const cv::Point2d to = level.upright ? At({level.at, plot.y_max}) : At({plot.x_max, level.at});
+    picture.Line({from, to}, OnPaper(level.tone), 1, false, Dash::kDashed);
+  }
+}
+
+// Whether a text there would lie over another, over a curve, or be cut.
+bool Drawing::IsTaken(const cv::Rect2d& place, const std::vector<cv::Rect2d>& texts) const {
+  if ((place & frame).area() < place.area() * (1 - 1e-9)) return true;
+  if (std::any_of(texts.begin(), texts.end(), [&](const cv::Rect2d& other) { return (other & place).area() > 0; })) {
+    return true;
+  }
+  return std::any_of(plot.curves.begin(), plot.curves.end(), [&](const Plot::Curve& curve) {
+    return std::any_of(curve.points.begin(), curve.points.end(),
+                       [&](const cv::Point2d& p) { return Finite(p) && place.contains(At(p)); });
+  });
+}
+
 void Drawing::Markers() const {
+  constexpr double kOff = 8;
+  std::vector<cv::Rect2d> taken;
   for (const Plot::Marker& marker : plot.markers) {
     if (!Finite(marker.at) || marker.at.x > plot.x_max) continue;
     const cv::Point2d at = At(marker.at);
-    picture.Line({{at.x, frame.y + frame.height}, at}, marker.colour, 1.5);
-    picture.Circle(at, 4, marker.colour, 2.5);
-    picture.Text(marker.text, {at.x + 8, at.y - 8}, kText + 1, kInk);
+    const Colour colour = OnPaper(marker.tone);
+    picture.Line({{at.x, frame.y + frame.height}, at}, colour, 1.5);
+    picture.Circle(at, 4, colour, 2.5);
+    if (marker.text.empty()) continue;
+    const cv::Size2d size(WidthOf(marker.text, kText + 1) + 4, kText + 6);
+    // Beside the place; where nothing is free, at its right, or its left where the frame ends.
+    std::vector<cv::Rect2d> places;
+    for (const double up : {kOff + size.height, -kOff, 2 * (kOff + size.height), -2 * kOff - size.height}) {
+      places.emplace_back(cv::Point2d(at.x + kOff, at.y - up), size);
+      places.emplace_back(cv::Point2d(at.x - kOff - size.width, at.y - up), size);
+      places.emplace_back(cv::Point2d(at.x + 5 * kOff, at.y - up), size);
+    }
+    auto place = std::find_if(places.begin(), places.end(), [&](const cv::Rect2d& p) { return !IsTaken(p, taken); });
+    if (place == places.end()) place = places.begin() + (places[0].br().x > frame.br().x ? 1 : 0);
+    picture.FillRectangle(*place, kPaper);
+    picture.Text(marker.text, {place->x + 2, place->br().y - 5}, kText + 1, marker.tone);
+    taken.push_back(*place);
+  }
+}
+
+void Drawing::Legend() const {
+  double y = frame.br().y + 56;
+  for (const std::vector<Entry>& row : LegendRows(plot, area.width - 16)) {
+    double x = area.x + 12;
+    for (const Entry& entry : row) {
+      const cv::Point2d middle(x + kSample / 2, y - 4);
+      if (entry.bars) {
+        picture.FillRectangle({x + 8, y - 9, kSample - 16, 10}, entry.series.colour);
+      } else {
+        picture.Line({{x, middle.y}, {x + kSample, middle.y}}, entry.series.colour, entry.level ? 1 : 2, false,
+                     entry.series.dash);
+        Spots({middle}, entry.series);
+      }
+      picture.Text(entry.name, {x + kSample + 6, y}, kText, kInk);
+      x += kSample + 6 + WidthOf(entry.name, kText) + 16;
+    }
+    y += kRow;
   }
 }
 
@@ -116,15 +241,18 @@ void Drawing::Markers() const {
 
 void DrawPlot(Picture& picture, const Plot& plot, const cv::Rect2d& area) {
   const bool second_axis = !plot.second_x_label.empty();
-  const cv::Rect2d frame(area.x + 52, area.y + (second_axis ? 58 : 28), area.width - 68,
-                         area.height - (second_axis ? 102 : 72));
+  const double above = second_axis ? 58 : 28;
+  const double below = 44 + kRow * static_cast<double>(LegendRows(plot, area.width - 16).size());
+  const cv::Rect2d frame(area.x + 52, area.y + above, area.width - 68, area.height - above - below);
   const Drawing drawing = {picture, plot, area, frame};
   picture.Text(plot.title, {area.x + area.width / 2, area.y + 16}, kText + 2, kInk, Align::kCentre);
   drawing.Ticks();
   drawing.Labels();
+  drawing.Levels();
   drawing.Curves();
+  picture.Line({frame.tl(), {frame.br().x, frame.y}, frame.br(), {frame.x, frame.br().y}}, OnPaper(kInk), 1, true);
   drawing.Markers();
-  picture.Line({frame.tl(), {frame.br().x, frame.y}, frame.br(), {frame.x, frame.br().y}}, kInk, 1, true);
+  drawing.Legend();
 }
 
 }  // namespace qv

@@ -80,16 +80,37 @@ std::string AreaLines(const Areas& areas, const char* unit) {
   return text;
 }
 
-void DrawAreas(Picture& picture, const PhotoPlace& place, const Areas& areas) {
+void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const Areas& areas,
+               const std::vector<Tone>& tones) {
   constexpr double kFrame = 6;  // picture pixels around an area
+  constexpr std::size_t kNumbered = 200;
+  constexpr std::size_t kEdged = 2000;  // more would black out the photo with their edges
+  std::vector<cv::Rect2d> boxes;
   for (std::size_t i = 0; i < areas.rectangles.size(); ++i) {
     const cv::Rect& area = areas.rectangles[i];
     const cv::Point2d from = place(cv::Point2d(area.tl()) - cv::Point2d(0.5, 0.5)) - cv::Point2d(kFrame, kFrame);
     const cv::Point2d to = place(cv::Point2d(area.br()) - cv::Point2d(0.5, 0.5)) + cv::Point2d(kFrame, kFrame);
-    picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, kDoubtful, 2, true);
-    const bool at_right = to.x + 30 > picture.width();
-    picture.Text(std::to_string(i), {at_right ? from.x - 4 : to.x + 4, std::max(from.y + 10, kHeadPx + 12)}, 13,
-                 kDoubtful, at_right ? Align::kRight : Align::kLeft, true);
+    const Tone tone = tones.empty() ? kDoubtful : tones[i];
+    const std::vector<cv::Point2d> frame = {from, {to.x, from.y}, to, {from.x, to.y}};
+    if (areas.rectangles.size() > kEdged) {
+      picture.Line(frame, OnLabel(tone), 1, true);
+    } else {
+      picture.Line(frame, tone, 2, true);
+    }
+    boxes.emplace_back(from, to);
+    if (areas.rectangles.size() <= kNumbered) labels.Keep(boxes.back());
+  }
+  for (std::size_t i = 0; i < boxes.size() && boxes.size() <= kNumbered; ++i) {
+    labels.Add(picture, {std::to_string(i)}, boxes[i], tones.empty() ? kDoubtful : tones[i], 13);
+  }
+}
+
+void DrawKey(Picture& picture, cv::Point2d place, const std::vector<std::pair<std::string, Tone>>& entries) {
+  for (const auto& [name, tone] : entries) {
+    picture.Line({place, place + cv::Point2d(16, 0), place + cv::Point2d(16, -12), place + cv::Point2d(0, -12)}, tone,
+                 2, true);
+    picture.Text(name, place + cv::Point2d(24, 0), 14, kInk);
+    place.x += 44 + WidthOf(name, 14);
   }
 }
 

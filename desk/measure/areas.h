@@ -3,8 +3,10 @@
 
 #include <opencv2/core.hpp>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include "desk/drawing/labels.h"
 #include "desk/drawing/picture.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/record.h"
@@ -31,8 +33,13 @@ void AddAreas(Phase& phase, const Areas& areas);
 /// A line for each of the first twenty.
 std::string AreaLines(const Areas& areas, const char* unit);
 
-/// Frames with numbers; a frame keeps off what is wrong.
-void DrawAreas(Picture& picture, const PhotoPlace& place, const Areas& areas);
+/// Frames with numbers (none when there are very many); a frame keeps off what is wrong. A tone each, or none:
+/// doubtful.
+void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const Areas& areas,
+               const std::vector<Tone>& tones = {});
+
+/// What frames and rings of these tones stand for, side by side on paper; the baseline starts at the place.
+void DrawKey(Picture& picture, cv::Point2d place, const std::vector<std::pair<std::string, Tone>>& entries);
 
 }  // namespace qv
 

@@ -10,6 +10,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/chart_view.h"
 #include "desk/measure/cielab.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/patch_trust.h"
 #include "desk/measure/patch_values.h"
@@ -112,8 +113,7 @@ class CaptureFinding : public Finding {
   PatchColours measured, standard;
 
  private:
-  void DrawPatch(Picture& picture, const Record& record, const PhotoPlace& place, std::size_t i,
-                 cv::Point2d swatches) const;
+  void DrawPatch(Picture& picture, const Record& record, std::size_t i, cv::Point2d swatches) const;
 };
 
 std::string CaptureFinding::Report(const Record& record) const {
@@ -142,40 +142,51 @@ std::string CaptureFinding::Report(const Record& record) const {
   return text;
 }
 
-void CaptureFinding::DrawPatch(Picture& picture, const Record& record, const PhotoPlace& place, std::size_t i,
-                               cv::Point2d swatches) const {
-  std::vector<cv::Point2d> outline;
-  for (const cv::Point2d& corner : outlines[i]) outline.push_back(place(corner));
-  picture.Line(outline, kGood, 2, true);
-  picture.Text(std::to_string(i), (outline[0] + outline[2]) / 2 + cv::Point2d(0, 6), 15, kGood, Align::kCentre, true);
-
+void CaptureFinding::DrawPatch(Picture& picture, const Record& record, std::size_t i, cv::Point2d swatches) const {
   picture.Text(std::to_string(i), swatches + cv::Point2d(18, 34), 14, kInk, Align::kRight);
   const Reading* const delta = record.phase.Find("delta_e_76");
   const bool compared = delta != nullptr && i < standard.size() && i < delta->values.size();
   if (compared) Swatch(picture, {swatches.x + 26, swatches.y + 4, 84, 52}, standard[i]);
   Swatch(picture, {swatches.x + 38, swatches.y + 14, 60, 32}, measured[i]);
-  if (compared) picture.Text(Format("dE %.1f", delta->values[i]), swatches + cv::Point2d(120, 34), 14, kInk);
+  if (!compared) return;
+  const Reading& largest = *record.phase.Find("delta_e_76_max");
+  const bool over = largest.limit.max && delta->values[i] > *largest.limit.max;
+  picture.Text(Format("dE %.1f", delta->values[i]), swatches + cv::Point2d(120, 28), 14, over ? kPoor : kInk);
+  if (over) picture.Text(Format("over %g", *largest.limit.max), swatches + cv::Point2d(120, 48), 14, kPoor);
 }
 
-// Patches outlined and numbered on the photo; beside it, measured inside the standard's colour, and the difference.
+// Patches outlined, their numbers beside them on the photo; next to it, measured inside the standard's colour, and the
+// difference.
 std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
   constexpr std::size_t kRows = 12;
   constexpr double kRow = 62;
   constexpr double kColumn = 230;
+  constexpr double kLegend = 28;
   if (!ShowsPhoto(record.phase.code)) return std::nullopt;
   const double scale = FitScale(photo, 1000);
   const double width = photo.cols * scale;
-  Picture picture(cvRound(width + 2 * kColumn + 20), cvRound(std::max(photo.rows * scale, kRows * kRow) + kHeadPx));
-  picture.Text(Format("%s: %s", record.test_name.c_str(), Name(record.outcome())), {12, 28}, 18, kInk);
-  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
-  DrawMarks(picture, view, place);
+  const double swatches = width + 16;
+  const Heading heading(record, record.test_name, swatches + 2 * kColumn);
+  const double top = heading.height();
+  Picture picture(cvRound(swatches + 2 * kColumn), cvRound(std::max(photo.rows * scale, kRows * kRow + kLegend) + top));
+  heading.Draw(picture);
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, top}, scale);
+  Labels labels({0, top, width, photo.rows * scale});
+  DrawMarks(picture, labels, view, place);
   if (record.phase.code != QV_SUCCESS) return picture;
-  for (std::size_t i = 0; i < measured.size(); ++i) {
-    const std::size_t column = i / kRows;
-    const cv::Point2d at(static_cast<double>(column) * kColumn, static_cast<double>(i % kRows) * kRow);
-    DrawPatch(picture, record, place, i, cv::Point2d(width + 16, kHeadPx) + at);
+  std::vector<std::vector<cv::Point2d>> places;
+  for (const auto& outline : outlines) {
+    places.emplace_back();
+    for (const cv::Point2d& corner : outline) places.back().push_back(place(corner));
+    picture.Line(places.back(), kGood, 2, true);
+    labels.Keep(places.back());
   }
-  picture.Text(standard.empty() ? "measured" : "measured, framed by the standard", {width + 16, 28}, 14, kInk);
+  for (std::size_t i = 0; i < measured.size(); ++i) {
+    labels.Add(picture, {std::to_string(i)}, BoxAbout(places[i]), kGood, 13);
+    const cv::Point2d at(static_cast<double>(i / kRows) * kColumn, static_cast<double>(i % kRows) * kRow + kLegend);
+    DrawPatch(picture, record, i, cv::Point2d(swatches, top) + at);
+  }
+  picture.Text(standard.empty() ? "measured" : "measured, framed by the standard", {swatches, top + 18}, 14, kInk);
   return picture;
 }
 

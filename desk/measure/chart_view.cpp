@@ -5,6 +5,7 @@
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
+#include "chart/chart_layout.h"
 #include "chart/points.h"
 #include "chart/upright.h"
 #include "desk/base/text.h"
@@ -173,28 +174,62 @@ std::string ReportChart(const ChartView& view) {
                 view.straightened_by_deg);
 }
 
-void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place) {
-  const auto ring = [&](const Mark& mark, const std::string& name, Colour colour) {
-    const double radius = std::max(6.0, 5 * mark.module_px * place.scale);
-    picture.Circle(place(mark.centre), radius, colour, 3);
-    picture.Text(name, place(mark.centre) + cv::Point2d(0, radius + 20), 16, colour, Align::kCentre, true);
-  };
-  if (view.complete()) {
-    constexpr const char* kNames[] = {"1 corner", "2", "3"};
-    for (std::size_t i = 0; i < view.marks.size(); ++i) {
-      ring(view.marks[i], std::string(kNames[i]) + (view.plausible() ? "" : " doubtful"),
-           view.plausible() ? kGood : kDoubtful);
-    }
-    return;
+namespace {
+
+// The colour patches, where the marks put them.
+void KeepPatches(Labels& labels, const std::vector<Mark>& marks, const PhotoPlace& place) {
+  const cv::Point2d corner = marks[0].centre;
+  const cv::Point2d right = (marks[1].centre - corner) / kChartSide;
+  const cv::Point2d down = (marks[2].centre - corner) / kChartSide;
+  for (int i = 0; i < static_cast<int>(kPatches.size()); ++i) {
+    const cv::Point2d middle = corner + PatchCentre(i).x * right + PatchCentre(i).y * down;
+    labels.Keep({place(middle + kPatchHalf * (right + down)), place(middle + kPatchHalf * (right - down)),
+                 place(middle - kPatchHalf * (right + down)), place(middle - kPatchHalf * (right - down))});
   }
-  if (!view.miss) return;
-  for (const Mark& mark : view.miss->marks) ring(mark, view.miss->how, kDoubtful);
-  for (const Mark& mark : view.marks) ring(mark, "candidate", kPoor);
-  for (const Candidate& candidate : view.miss->candidates) ring(candidate.mark, candidate.failed.text, kPoor);
-  cv::Point2d line = place.origin + cv::Point2d(10, 24);
-  for (const std::string& reason : view.miss->reasons) {
-    picture.Text(reason, line, 16, kPoor, Align::kLeft, true);
-    line.y += 24;
+}
+
+struct Ring {
+  Mark mark;
+  std::string name;
+  Tone tone;
+};
+
+std::vector<Ring> RingsOf(const ChartView& view) {
+  constexpr const char* kNames[] = {"1 corner", "2", "3"};
+  std::vector<Ring> rings;
+  if (view.complete()) {
+    for (std::size_t i = 0; i < view.marks.size(); ++i) {
+      rings.push_back({view.marks[i], std::string(kNames[i]) + (view.plausible() ? "" : " doubtful"),
+                       view.plausible() ? kGood : kDoubtful});
+    }
+    return rings;
+  }
+  for (const Mark& mark : view.marks) rings.push_back({mark, "found", kGood});
+  if (!view.miss) return rings;
+  for (const Mark& mark : view.miss->marks) rings.push_back({mark, view.miss->how, kDoubtful});
+  for (const Candidate& candidate : view.miss->candidates) {
+    rings.push_back({candidate.mark, candidate.failed.text, kPoor});
+  }
+  return rings;
+}
+
+}  // namespace
+
+void DrawMarks(Picture& picture, Labels& labels, const ChartView& view, const PhotoPlace& place) {
+  constexpr double kWidest = 330;  // of a label
+  const std::vector<Mark>& marks = view.miss ? view.miss->marks : view.marks;
+  if (marks.size() == kMarks) KeepPatches(labels, marks, place);
+  const std::vector<Ring> rings = RingsOf(view);
+  std::vector<cv::Rect2d> boxes;
+  for (const Ring& ring : rings) {
+    const double radius = std::max(6.0, 5 * ring.mark.module_px * place.scale);
+    const cv::Point2d reach(radius, radius);
+    picture.Circle(place(ring.mark.centre), radius, ring.tone, 3);
+    boxes.emplace_back(place(ring.mark.centre) - reach, place(ring.mark.centre) + reach);
+    labels.Keep(boxes.back());
+  }
+  for (std::size_t i = 0; i < rings.size(); ++i) {
+    labels.Add(picture, Wrapped(rings[i].name, 15, kWidest), boxes[i], rings[i].tone);
   }
 }
 

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "desk/drawing/labels.h"
 #include "desk/drawing/picture.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/miss.h"
@@ -58,9 +59,9 @@ Parameter ThresholdParameter();
 /// "marks ..." and "chart ..." lines for a person.
 std::string ReportChart(const ChartView& view);
 
-/// Rings and numbers the marks: good, or doubtful ones in words. Of a miss the candidates, what another threshold
-/// finds, and the reasons.
-void DrawMarks(Picture& picture, const ChartView& view, const PhotoPlace& place);
+/// Rings and numbers the marks: good, or doubtful ones in words. Of a miss what was found, the nearest candidates with
+/// the check that each fails, and what another threshold, or a changed photo, shows. The chart's patches are kept free.
+void DrawMarks(Picture& picture, Labels& labels, const ChartView& view, const PhotoPlace& place);
 
 /// Corners of a rectangle of the upright picture where they lie on the photo: column and row, from top left clockwise.
 std::array<cv::Point2d, 4> OnPhoto(const FoundChart& found, const cv::Rect& region);

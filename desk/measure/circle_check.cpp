@@ -5,6 +5,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/chart_view.h"
 #include "desk/measure/frames.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -40,16 +41,21 @@ class CircleFinding : public Finding {
   std::optional<Picture> Draw(const Record& record) const override {
     if (!ShowsPhoto(record.phase.code)) return std::nullopt;
     const double scale = FitScale(frame, 1080);
-    Picture picture(std::max(700, cvRound(frame.cols * scale)), cvRound(frame.rows * scale + kHeadPx));
-    picture.Text(Format("Target check: %zu of 3 marks, threshold %d", view.marks.size(), view.threshold), {12, 28}, 18,
-                 kInk);
-    const PhotoPlace place = picture.PlacePhoto(frame, {0, kHeadPx}, scale);
-    DrawMarks(picture, view, place);
+    const double width = std::max(700.0, frame.cols * scale);
+    const Heading heading(
+        record, Format("Target check: %zu of 3 marks, threshold %d", view.marks.size(), view.threshold), width);
+    Picture picture(cvRound(width), cvRound(frame.rows * scale + heading.height()));
+    heading.Draw(picture);
+    const PhotoPlace place = picture.PlacePhoto(frame, {0, heading.height()}, scale);
+    Labels labels({0, heading.height(), frame.cols * scale, frame.rows * scale});
+    DrawMarks(picture, labels, view, place);
     if (const Reading* m = record.phase.Find("centre")) {
       const cv::Point2d at = place({m->axis[0], m->values[0]});
-      picture.Line({at - cv::Point2d(14, 0), at + cv::Point2d(14, 0)}, kGood, 3);
-      picture.Line({at - cv::Point2d(0, 14), at + cv::Point2d(0, 14)}, kGood, 3);
-      picture.Text("centre", at + cv::Point2d(0, 34), 16, kGood, Align::kCentre, true);
+      const cv::Rect2d cross(at - cv::Point2d(14, 14), at + cv::Point2d(14, 14));
+      picture.Line({{cross.x, at.y}, {cross.br().x, at.y}}, kGood, 3);
+      picture.Line({{at.x, cross.y}, {at.x, cross.br().y}}, kGood, 3);
+      labels.Keep(cross);
+      labels.Add(picture, {Format("centre (%.1f, %.1f)", m->axis[0], m->values[0])}, cross, kGood);
     }
     return picture;
   }

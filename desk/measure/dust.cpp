@@ -5,6 +5,8 @@
 
 #include "desk/base/text.h"
 #include "desk/drawing/plot.h"
+#include "desk/measure/areas.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/histogram.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
@@ -43,7 +45,7 @@ class DustFinding : public Finding {
   SpotFinding spots;
 
  private:
-  void DrawPhoto(Picture& picture, double scale) const;
+  void DrawPhoto(Picture& picture, double top, double scale) const;
 };
 
 // The blobs that were counted: the first five outside the corners.
@@ -89,13 +91,13 @@ std::string DustFinding::Report(const Record& record) const {
   return text;
 }
 
-void DustFinding::DrawPhoto(Picture& picture, double scale) const {
-  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
+void DustFinding::DrawPhoto(Picture& picture, double top, double scale) const {
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, top}, scale);
   for (const cv::Point corner : {cv::Point(0, 0), {1, 0}, {0, 1}, {1, 1}}) {
     const cv::Point2d at(corner.x * (photo.cols - kCornerPx) - 0.5, corner.y * (photo.rows - kCornerPx) - 0.5);
     picture.Line({place(at), place(at + cv::Point2d(kCornerPx, 0)), place(at + cv::Point2d(kCornerPx, kCornerPx)),
                   place(at + cv::Point2d(0, kCornerPx))},
-                 kFaint, 1.5, true);
+                 kInk, 1.5, true);
   }
   for (const cv::KeyPoint& blob : blobs) {
     picture.Circle(place(blob.pt), std::max(10.0, blob.size * scale), kPoor, 2.5);
@@ -108,23 +110,28 @@ void DustFinding::DrawPhoto(Picture& picture, double scale) const {
 Plot HistogramPlot(const Record& record) {
   const Json& reference = record.request.parameters.value("reference", Json::array());
   Plot plot;
-  plot.title = reference.empty() ? "Grey levels" : "Grey levels; the line is the reference";
+  plot.title = "Grey levels";
   plot.x_label = "grey level";
   plot.y_label = "share of pixels, %";
   plot.x_max = kGreyLevels - 1;
-  plot.bars = true;
+  plot.curves = {{"photo", {}, kSeries[0], true}};
   const std::vector<double>& counts = record.phase.Find("histogram")->values;
   const double pixels = std::accumulate(counts.begin(), counts.end(), 0.0);
   plot.y_max = 1;
   for (int i = 0; i < kGreyLevels; ++i) {
-    plot.curve.emplace_back(i, 100 * counts[i] / pixels);
+    plot.curves[0].points.emplace_back(i, 100 * counts[i] / pixels);
     plot.y_max = std::max(plot.y_max, 105 * counts[i] / pixels);
   }
   const auto levels = reference.get<std::vector<double>>();
   const double all = std::accumulate(levels.begin(), levels.end(), 0.0);
-  for (std::size_t i = 0; all > 0 && i < levels.size(); ++i) {
-    plot.second_curve.emplace_back(static_cast<double>(i), 100 * levels[i] / all);
+  if (all <= 0) return plot;
+  Plot::Curve curve = {"reference", {}, kSeries[1]};
+  curve.ends_only = true;
+  for (std::size_t i = 0; i < levels.size(); ++i) {
+    curve.points.emplace_back(static_cast<double>(i), 100 * levels[i] / all);
+    plot.y_max = std::max(plot.y_max, 105 * levels[i] / all);
   }
+  plot.curves.push_back(std::move(curve));
   return plot;
 }
 
@@ -133,14 +140,19 @@ std::optional<Picture> DustFinding::Draw(const Record& record) const {
   if (record.phase.code != QV_SUCCESS) return std::nullopt;
   const double scale = FitScale(photo, 1080);
   const double width = photo.cols * scale;
-  Picture picture(cvRound(width + kPlot + 10), cvRound(std::max(photo.rows * scale, 400.0) + kHeadPx));
   const Reading* const count = record.phase.Find("blob_count");
-  picture.Text(count != nullptr && count->outcome != Outcome::kUnset
-                   ? Format("%s: %.0f blobs, %s", record.test_name.c_str(), count->value(), Name(record.outcome()))
-                   : record.test_name + ": too dark to judge",
-               {12, 28}, 18, kInk);
-  DrawPhoto(picture, scale);
-  DrawPlot(picture, HistogramPlot(record), {width + 10, kHeadPx, kPlot, 380});
+  const bool counted = count != nullptr && count->outcome != Outcome::kUnset;
+  const Heading heading(record,
+                        record.test_name + (counted ? ": " + Count(static_cast<std::size_t>(count->value()), "blob") +
+                                                          ", " + Count(spots.spots.size(), "spot")
+                                                    : ": too dark to judge"),
+                        width + kPlot + 10);
+  const double top = heading.height();
+  Picture picture(cvRound(width + kPlot + 10), cvRound(std::max(photo.rows * scale, 440.0) + top));
+  heading.Draw(picture);
+  DrawPhoto(picture, top, scale);
+  DrawPlot(picture, HistogramPlot(record), {width + 10, top, kPlot, 380});
+  DrawKey(picture, {width + 22, top + 410}, {{"blob", kPoor}, {"spot", kDoubtful}, {"corner, left out", kInk}});
   return picture;
 }
 

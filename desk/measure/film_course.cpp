@@ -5,6 +5,8 @@
 #include <limits>
 
 #include "desk/base/kept_stderr.h"
+#include "desk/base/text.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -44,9 +46,10 @@ std::optional<Picture> FilmFinding::Draw(const Record& record) const {
   constexpr double kWidth = 1100;
   constexpr double kPlot = 400;
   const std::vector<Plot> plots = Plots(record);
-  Picture picture(static_cast<int>(kWidth), cvRound(kHeadPx + kPlot * static_cast<double>(plots.size())));
-  picture.Text(record.test_name + ", " + record.inputs[0].path + ": " + Name(record.outcome()), {12, 28}, 18, kInk);
-  double top = kHeadPx;
+  const Heading heading(record, record.test_name + ", " + record.inputs[0].path, kWidth);
+  Picture picture(static_cast<int>(kWidth), cvRound(heading.height() + kPlot * static_cast<double>(plots.size())));
+  heading.Draw(picture);
+  double top = heading.height();
   for (const Plot& plot : plots) {
     DrawPlot(picture, plot, {0, top, kWidth, kPlot});
     top += kPlot;
@@ -61,15 +64,20 @@ Plot FilmFinding::OverTime(const std::string& title, const std::string& y_label,
   plot.y_label = y_label;
   plot.x_max = time_.back() > 0 ? time_.back() : 1;
   plot.y_max = y_max > 0 ? y_max : 1;
+  Plot::Curve lost = {"frames lost", {}, {OnPaper(kPoor), Dash::kSolid, PointShape::kCircle}};
   for (const FilmGap& gap : gaps_) {
-    plot.more_curves.push_back({{{time_[gap.before], 0}, {time_[gap.after], 0}}, kPoor});
+    lost.points.emplace_back(time_[gap.before], 0);
+    lost.points.emplace_back(time_[gap.after], 0);
+    lost.points.emplace_back(NAN, NAN);
   }
+  if (!gaps_.empty()) plot.curves.push_back(std::move(lost));
   return plot;
 }
 
-Plot::Curve FilmFinding::Course(const std::vector<double>& values, Colour colour) const {
+Plot::Curve FilmFinding::Course(const std::string& name, const std::vector<double>& values, std::size_t series) const {
   constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-  Plot::Curve curve = {{}, colour, false};
+  Plot::Curve curve = {name, {}, kSeries[series]};
+  curve.ends_only = true;
   auto gap = gaps_.begin();
   for (std::size_t i = 0; i < time_.size(); ++i) {
     if (gap != gaps_.end() && gap->after == static_cast<int>(i)) {
@@ -79,6 +87,15 @@ Plot::Curve FilmFinding::Course(const std::vector<double>& values, Colour colour
     curve.points.emplace_back(time_[i], values[i]);
   }
   return curve;
+}
+
+void FilmFinding::AddLimits(Plot& plot, const Reading& figure, const std::string& name, bool upright) {
+  for (const auto& [limit, side] : {std::pair{figure.limit.min, "at least"}, {figure.limit.max, "at most"}}) {
+    if (!limit) continue;
+    plot.levels.push_back(
+        {*limit, Format("%s: %s %g, %s", name.c_str(), side, *limit, Name(figure.outcome)), upright, ToneOf(figure)});
+    if (!upright) plot.y_max = std::max(plot.y_max, 1.05 * *limit);
+  }
 }
 
 bool RunFilmTest(QVTester& tester, const Spec& spec, const Request& request, Record& record) {

@@ -42,10 +42,13 @@ class FilmFinding : public Finding {
  protected:
   virtual std::vector<Plot> Plots(const Record& record) const = 0;
 
+  /// Lines at a figure's limits.
+  static void AddLimits(Plot& plot, const Reading& figure, const std::string& name, bool upright = false);
+
   /// An empty plot over time, with the gaps as red bars on its axis.
   Plot OverTime(const std::string& title, const std::string& y_label, double y_max) const;
   /// One value a frame, broken at gaps and where there is none.
-  Plot::Curve Course(const std::vector<double>& values, Colour colour) const;
+  Plot::Curve Course(const std::string& name, const std::vector<double>& values, std::size_t series = 0) const;
 
   const std::vector<double> time_;
   const std::vector<FilmGap> gaps_;

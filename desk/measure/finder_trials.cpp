@@ -121,6 +121,9 @@ std::optional<Foreshortened> SearchStretched(const cv::Mat& gray, int threshold)
 double BlurOf(const cv::Mat& gray, const GreyPeaks& peaks) {
   constexpr double kOwn = 1;  // sigma that takes most of the noise, and is taken off again
   constexpr double kShare = 3e-4;
+  // A disc as large as all that is dark has the shortest edge.
+  const int dark = cv::countNonZero(gray <= (peaks.dark + peaks.light) / 2);
+  const double count = std::min(kShare * static_cast<double>(gray.total()), 1.7 * std::sqrt(dark));
   cv::Mat smooth;
   gray.convertTo(smooth, CV_32F);
   cv::GaussianBlur(smooth, smooth, {}, kOwn);
@@ -130,7 +133,7 @@ double BlurOf(const cv::Mat& gray, const GreyPeaks& peaks) {
     cv::Sobel(smooth, slope, CV_32F, along_rows ? 1 : 0, along_rows ? 0 : 1, 1, 0.5);
     slope = cv::abs(slope);
     std::vector<float> slopes(slope.begin<float>(), slope.end<float>());
-    const auto steep = slopes.end() - 1 - static_cast<std::ptrdiff_t>(kShare * static_cast<double>(slopes.size()));
+    const auto steep = slopes.end() - 1 - static_cast<std::ptrdiff_t>(count);
     std::nth_element(slopes.begin(), steep, slopes.end());
     const double sigma = (peaks.light - peaks.dark) / std::sqrt(2 * CV_PI) / std::max<double>(*steep, 1e-3);
     blur = std::max(blur, std::sqrt(std::max(0.0, sigma * sigma - kOwn * kOwn)));

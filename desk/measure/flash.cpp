@@ -5,6 +5,7 @@
 #include <opencv2/core.hpp>
 
 #include "desk/base/text.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -54,11 +55,12 @@ class FlashFinding : public Finding {
   std::optional<Picture> Draw(const Record& record) const override {
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
     const double scale = FitScale(photo_, 1200);
-    Picture picture(std::max(640, cvRound(photo_.cols * scale)), cvRound(photo_.rows * scale) + 40);
-    picture.Text(Format("Flash: mean of the first channel %.2f of 255 (%s)", record.phase.Find("mean")->value(),
-                        Name(record.outcome())),
-                 {12, 26}, 16, kInk);
-    picture.PlacePhoto(photo_, {0, 40}, scale);
+    const double width = std::max(640.0, photo_.cols * scale);
+    const double mean = record.phase.Find("mean")->value();
+    const Heading heading(record, Format("Flash: mean of the first channel %.2f of 255", mean), width);
+    Picture picture(cvRound(width), cvRound(photo_.rows * scale + heading.height()));
+    heading.Draw(picture);
+    picture.PlacePhoto(photo_, {0, heading.height()}, scale);
     return picture;
   }
 

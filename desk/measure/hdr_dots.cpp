@@ -9,6 +9,7 @@
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -161,8 +162,26 @@ void Look(Record& record, const Dots& dots) {
   }
 }
 
-// As grey levels for people, dots in red. One hot dot does not black out the rest.
-cv::Mat Seen(const cv::Mat& picture, const cv::Mat& mask) {
+constexpr Tone kBright = kDoubtful;
+constexpr Tone kDark = kGood;
+
+// 255 at dots that are brighter than the median about them; dots that are larger than the window count as they are.
+cv::Mat BrightDots(const cv::Mat& picture, const cv::Mat& mask) {
+  cv::Mat first;
+  cv::extractChannel(picture, first, 0);
+  cv::patchNaNs(first, 0);
+  cv::Mat around;
+  cv::blur(first, around, {21, 21}, {-1, -1}, cv::BORDER_REPLICATE);
+  return (first > around) & (mask != 0);
+}
+
+cv::Scalar BgrOf(Tone tone) {
+  const Colour colour = OnLabel(tone);
+  return 255 * cv::Scalar(colour.blue, colour.green, colour.red);
+}
+
+// As grey levels for people, dots in colour. One hot dot does not black out the rest.
+cv::Mat Seen(const cv::Mat& picture, const cv::Mat& mask, const cv::Mat& bright) {
   cv::Mat floats = picture.clone();
   floats.setTo(0, cv::Mat(cv::abs(floats.reshape(1)) <= FLT_MAX).reshape(3) == 0);
   cv::Mat first;
@@ -174,7 +193,8 @@ cv::Mat Seen(const cv::Mat& picture, const cv::Mat& mask) {
   QVTester painter;
   cv::Mat seen;
   cv::cvtColor(painter.HDR2UCHAR(floats), seen, cv::COLOR_GRAY2BGR);
-  seen.setTo(cv::Scalar(25, 25, 230), mask);
+  seen.setTo(BgrOf(kDark), mask);
+  seen.setTo(BgrOf(kBright), bright);
   return seen;
 }
 
@@ -192,15 +212,28 @@ class DotsFinding : public Finding {
   std::optional<Picture> Draw(const Record& record) const override {
     constexpr double kSide = 1280;
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
-    const cv::Mat seen = Seen(searched, dots.mask);
+    constexpr double kKey = 34;
+    const cv::Mat bright = BrightDots(searched, dots.mask);
+    const cv::Mat seen = Seen(searched, dots.mask, bright);
     const int longer = std::max(seen.cols, seen.rows);
     const double scale = longer < kSide / 2 ? std::floor(kSide / longer) : std::min(1.0, kSide / longer);
-    Picture picture(std::max(640, cvRound(seen.cols * scale)), cvRound(seen.rows * scale + kHeadPx));
-    picture.Text(Format("HDR dots: %d dots in %zu areas, %s", cv::countNonZero(dots.mask), dots.areas.rectangles.size(),
-                        Name(record.outcome())),
-                 {12, 28}, 18, kInk);
-    const PhotoPlace place = picture.PlacePhoto(seen, {0, kHeadPx}, scale);
-    DrawAreas(picture, place, dots.areas);
+    const double width = std::max(640.0, seen.cols * scale);
+    const int count = cv::countNonZero(dots.mask);
+    const Heading heading(record, Format("HDR dots: %d dots in %zu areas", count, dots.areas.rectangles.size()), width);
+    const double top = heading.height() + kKey;
+    Picture picture(cvRound(width), cvRound(seen.rows * scale + top));
+    heading.Draw(picture);
+    const int bright_count = cv::countNonZero(bright);
+    DrawKey(
+        picture, {12, top - 16},
+        {{Format("bright dots: %d", bright_count), kBright}, {Format("dark dots: %d", count - bright_count), kDark}});
+    const PhotoPlace place = picture.PlacePhoto(seen, {0, top}, scale);
+    Labels labels({0, top, width, seen.rows * scale});
+    std::vector<Tone> tones;
+    for (const cv::Rect& area : dots.areas.rectangles) {
+      tones.push_back(2 * cv::countNonZero(bright(area)) >= cv::countNonZero(dots.mask(area)) ? kBright : kDark);
+    }
+    DrawAreas(picture, labels, place, dots.areas, tones);
     return picture;
   }
 

@@ -4,6 +4,8 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/measure/areas.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -72,34 +74,38 @@ std::optional<Picture> LcdFinding::Draw(const Record& record) const {
   if (record.phase.code != QV_SUCCESS && record.phase.code != QV_ERROR_PATTERN_NOT_FOUND) return std::nullopt;
   const double scale = FitScale(photo, 900);
   const double width = photo.cols * scale;
-  Picture picture(cvRound(width + (screen.empty() ? 0 : kScreenPx + 20)),
-                  cvRound(std::max(photo.rows * scale, 420.0) + kHeadPx));
-  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
-  if (screen.empty()) {
-    picture.Text("no screen found", {12, 28}, 18, kPoor);
-    return picture;
-  }
-  picture.Text(Format("%s, verdict %d: %s", record.request.parameters.at("pattern").get<std::string>().c_str(),
-                      result.verdict_, result.reason_.c_str()),
-               {12, 28}, 16, result.verdict_ == 1 ? kInk : kPoor);
+  const double whole = std::max(width + (screen.empty() ? 0 : kScreenPx + 20), 640.0);
+  const auto pattern = record.request.parameters.at("pattern").get<std::string>();
+  const std::string verdict = screen.empty()         ? ": no screen found"
+                              : result.verdict_ == 1 ? ", verdict 1: " + result.reason_
+                                                     : Format(", verdict %d", result.verdict_);
+  const Heading heading(record, pattern + verdict, whole);
+  const double top = heading.height();
+  Picture picture(cvRound(whole), cvRound(std::max(photo.rows * scale, 420.0) + top));
+  heading.Draw(picture);
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, top}, scale);
+  if (screen.empty()) return picture;
+  Labels labels({0, top, width, photo.rows * scale});
   std::vector<cv::Point2d> outline;
   for (const cv::Point2f& corner : corners) outline.push_back(place(corner));
   picture.Line(outline, kGood, 2, true);
   for (std::size_t i = 0; i < outline.size(); ++i) {
-    picture.Text(std::to_string(i), outline[i] + cv::Point2d(6, -6), 15, kGood, Align::kLeft, true);
+    labels.Add(picture, {std::to_string(i)}, {outline[i], cv::Size2d(1, 1)}, kGood);
   }
-  const PhotoPlace at = picture.PlacePhoto(screen, {width + 20, kHeadPx}, FitScale(screen, kScreenPx));
-  for (int i = 0; i < 9; ++i) {
-    const int column = i % 3;
-    const int row = i / 3;
-    const cv::Point2d point((2 * column + 1) * screen.cols / 6.0, (2 * row + 1) * screen.rows / 6.0);
-    picture.Text(Format("%.0f", result.levels_[i]), at(point), 14, kGood, Align::kCentre, true);
-  }
+  const PhotoPlace at = picture.PlacePhoto(screen, {width + 20, top}, FitScale(screen, kScreenPx));
+  Labels levels({width + 20, top, screen.cols * at.scale, screen.rows * at.scale});
   for (const QVRECT& r : result.error_areas_) {
     const cv::Point2d middle((r.left + r.right) / 2.0, (r.top + r.bottom) / 2.0);
-    const double radius = std::hypot(r.right - r.left + 1, r.bottom - r.top + 1) / 2 * at.scale;
-    picture.Circle(at(middle), std::max(8.0, radius + 4), kPoor, 2);
+    const double radius = std::max(8.0, std::hypot(r.right - r.left + 1, r.bottom - r.top + 1) / 2 * at.scale + 4);
+    picture.Circle(at(middle), radius, kPoor, 2);
+    levels.Keep(cv::Rect2d(at(middle) - cv::Point2d(radius, radius), at(middle) + cv::Point2d(radius, radius)));
   }
+  for (int i = 0; i < 9; ++i) {
+    const cv::Point2d point((2 * (i % 3) + 1) * screen.cols / 6.0, (2 * (i / 3) + 1) * screen.rows / 6.0);
+    levels.Add(picture, {Format("%.0f", result.levels_[i])}, {at(point), cv::Size2d(1, 1)}, kGood, 14);
+  }
+  DrawKey(picture, {width + 20, top + screen.rows * at.scale + 26},
+          {{"mean grey level at each point", kGood}, {"dot", kPoor}});
   return picture;
 }
 

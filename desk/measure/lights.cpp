@@ -5,6 +5,7 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/regions.h"
 #include "desk/measure/run_test.h"
@@ -222,20 +223,32 @@ class LightFinding : public Finding {
     constexpr double kSide = 1280;
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
     const double scale = FitScale(photo_, kSide);
-    Picture picture(std::max(640, cvRound(photo_.cols * scale)), cvRound(photo_.rows * scale + kHeadPx));
-    picture.Text(Format("Lights: %zu regions, %zu areas of dots, %s", regions.size(), areas.rectangles.size(),
-                        Name(record.outcome())),
-                 {12, 28}, 18, kInk);
-    const PhotoPlace place = picture.PlacePhoto(photo_, {0, kHeadPx}, scale);
+    constexpr double kKey = 34;
+    const double width = std::max(640.0, photo_.cols * scale);
+    const Heading heading(
+        record, Format("Lights: %zu regions, %zu areas of dots", regions.size(), areas.rectangles.size()), width);
+    const double top = heading.height() + kKey;
+    Picture picture(cvRound(width), cvRound(photo_.rows * scale + top));
+    heading.Draw(picture);
+    DrawKey(picture, {12, top - 16},
+            {{"region", kGood}, {"clipped region, dark dots", kPoor}, {"dark region, bright dots", kDoubtful}});
+    const PhotoPlace place = picture.PlacePhoto(photo_, {0, top}, scale);
+    Labels labels({0, top, width, photo_.rows * scale});
+    std::vector<cv::Rect2d> boxes;
     for (const QVLightRegion& r : regions) {
       const cv::Point2d from = place(cv::Point2d(r.left_, r.top_) - cv::Point2d(0.5, 0.5));
       const cv::Point2d to = from + cv::Point2d(r.width_, r.height_) * scale;
-      const Colour colour = r.clipped_share_ > kClipped ? kPoor : r.mean_grey_ < kDark ? kDoubtful : kGood;
-      picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, colour, 2, true);
-      picture.Text(Format("%d: x %.3f y %.3f, %.0f K", r.label_, r.chromaticity_[0], r.chromaticity_[1], r.cct_),
-                   {from.x + 4, to.y - 6}, 13, colour, Align::kLeft, true);
+      picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, ToneOf(r), 2, true);
+      boxes.emplace_back(from, to);
     }
-    DrawAreas(picture, place, areas);
+    DrawAreas(picture, labels, place, areas, TonesOfAreas());
+    for (const cv::Rect2d& box : boxes) labels.Keep(box);
+    for (std::size_t i = 0; i < regions.size(); ++i) {
+      const QVLightRegion& r = regions[i];
+      labels.Add(picture,
+                 {Format("%d: x %.3f y %.3f, %.0f K", r.label_, r.chromaticity_[0], r.chromaticity_[1], r.cct_)},
+                 boxes[i], ToneOf(r), 13);
+    }
     return picture;
   }
 
@@ -245,6 +258,24 @@ class LightFinding : public Finding {
   Areas areas;
 
  private:
+  static Tone ToneOf(const QVLightRegion& r) {
+    return r.clipped_share_ > kClipped ? kPoor : r.mean_grey_ < kDark ? kDoubtful : kGood;
+  }
+
+  // Dark dots are red, bright ones yellow.
+  std::vector<Tone> TonesOfAreas() const {
+    std::vector<Tone> tones;
+    for (const cv::Rect& area : areas.rectangles) {
+      const cv::Rect about =
+          cv::Rect(area.x - area.width - 3, area.y - area.height - 3, 3 * area.width + 6, 3 * area.height + 6) &
+          cv::Rect({}, photo_.size());
+      const cv::Scalar inside = cv::mean(photo_(area & cv::Rect({}, photo_.size())));
+      const cv::Scalar all = cv::mean(photo_(about));
+      tones.push_back(inside[0] + inside[1] + inside[2] < all[0] + all[1] + all[2] ? kPoor : kDoubtful);
+    }
+    return tones;
+  }
+
   cv::Mat photo_;
 };
 

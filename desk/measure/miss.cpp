@@ -66,8 +66,7 @@ struct Placed {
 
 // How well the picture's levels at the chart's patches follow the patches' own: their correlation, where enough of
 // them are in view and differ.
-std::optional<double> Likeness(const cv::Mat& gray, const std::array<cv::Point2d, 3>& marks) {
-  constexpr int kFewest = 10;
+std::optional<double> Likeness(const cv::Mat& gray, const std::array<cv::Point2d, 3>& marks, int fewest = 10) {
   double n = 0;
   double sums[5] = {};  // of a, b, a a, b b, a b
   for (int i = 0; i < static_cast<int>(kPatches.size()); ++i) {
@@ -81,7 +80,7 @@ std::optional<double> Likeness(const cv::Mat& gray, const std::array<cv::Point2d
     ++n;
   }
   const double variances = (sums[2] - sums[0] * sums[0] / n) * (sums[3] - sums[1] * sums[1] / n);
-  if (n < kFewest || variances <= 0) return std::nullopt;
+  if (n < fewest || variances <= 0) return std::nullopt;
   return (sums[4] - sums[0] * sums[1] / n) / std::sqrt(variances);
 }
 
@@ -119,10 +118,43 @@ std::vector<Placed> WaysToPlace(const Mark& first, const Mark& other) {
 struct Expected {
   Placed placed;
   std::optional<double> likeness;
+  bool of_one = false;  // mark alone, so that there were far more ways
 
-  bool alike() const { return likeness && *likeness > 0.8; }
+  bool alike() const { return likeness && *likeness > (of_one ? 0.95 : 0.8); }
   bool unlike() const { return likeness && !alike(); }
 };
+
+// One mark may be any of three, of any size, and turned in any way. Of the two that lack, the one further out of view.
+std::optional<Expected> ExpectOthers(const cv::Mat& gray, const Mark& found) {
+  constexpr int kTurns = 360;
+  constexpr int kFewest = 14;
+  const cv::Point2d inner[3] = {{0, 0}, {1, 0}, {0, 1}};  // the marks, in legs
+  const cv::Point2d middle(gray.cols / 2.0, gray.rows / 2.0);
+  std::optional<Expected> best;
+  for (int turn = 0; turn < kTurns; ++turn) {
+    const double angle = turn * 2 * CV_PI / kTurns;
+    const cv::Point2d along(std::cos(angle), std::sin(angle));
+    const double upright = found.module_px * std::max(std::fabs(along.x), std::fabs(along.y));
+    for (const MarkSize& size : kMarkSizes) {
+      for (const double scale : {0.94, 0.97, 1.0, 1.03, 1.06}) {
+        const cv::Point2d right = along * (scale * upright * kChartSide / size.module);
+        const cv::Point2d down(-right.y, right.x);
+        for (const cv::Point2d& role : inner) {
+          const cv::Point2d corner = found.centre - role.x * right - role.y * down;
+          const std::array<cv::Point2d, 3> marks = {corner, corner + right, corner + down};
+          const std::optional<double> likeness = Likeness(gray, marks, kFewest);
+          if (!likeness || (best && *likeness <= *best->likeness)) continue;
+          const auto out = std::max_element(marks.begin(), marks.end(), [&](cv::Point2d a, cv::Point2d b) {
+            return std::max(std::fabs(a.x - middle.x) - middle.x, std::fabs(a.y - middle.y) - middle.y) <
+                   std::max(std::fabs(b.x - middle.x) - middle.x, std::fabs(b.y - middle.y) - middle.y);
+          });
+          best = {{marks, static_cast<int>(out - marks.begin()), found.module_px}, likeness, true};
+        }
+      }
+    }
+  }
+  return best;
+}
 
 // The likeliest; nothing where no two of the marks lie as a chart's.
 std::optional<Expected> ExpectThird(const cv::Mat& gray, const std::vector<Mark>& found) {
@@ -291,8 +323,10 @@ class Explainer {
 
   // Two marks tell where the third is.
   bool LacksThird() {
-    const std::optional<Expected> expected = ExpectThird(gray_, best_);
+    const std::optional<Expected> expected =
+        best_.size() == 1 ? ExpectOthers(gray_, best_[0]) : ExpectThird(gray_, best_);
     if (!expected || !expected->alike()) return false;
+    const char* const which = expected->of_one ? "a" : "the third";
     const double reach = 3.5 * expected->placed.module_px;
     const cv::Rect2d inside(reach - 0.5, reach - 0.5, gray_.cols - 2 * reach, gray_.rows - 2 * reach);
     const cv::Point2d at = expected->placed.marks[expected->placed.missing];
@@ -303,8 +337,8 @@ class Explainer {
       const char* const side = BorderNear(at, gray_.size());
       Because(MissCause::kCut,
               picture.contains(at)
-                  ? Format("the third mark, at %s, is cut by the picture's %s border", place.c_str(), side)
-                  : Format("the third mark's place, %s, lies beyond the picture's %s border", place.c_str(), side));
+                  ? Format("%s mark, at %s, is cut by the picture's %s border", which, place.c_str(), side)
+                  : Format("%s mark's place, %s, lies beyond the picture's %s border", which, place.c_str(), side));
       if (picture.contains(at))
         miss_.candidates.push_back({{at, expected->placed.module_px}, {Check::kCut, "cut by the border"}});
       return true;
@@ -312,7 +346,7 @@ class Explainer {
     Check failed = FirstFailure(binary, at, expected->placed.module_px);
     if (failed.kind == Check::kFits) failed.text = "the search does not stop at what lies there";
     Because(MissCause::kCovered,
-            Format("the third mark should be at %s, and %s: is it covered?", place.c_str(), failed.text.c_str()));
+            Format("%s mark should be at %s, and %s: is it covered?", which, place.c_str(), failed.text.c_str()));
     miss_.candidates.push_back({{at, expected->placed.module_px}, failed});
     return true;
   }
@@ -348,7 +382,8 @@ class Explainer {
   // What a changed picture shows, for the drawing.
   void ShowTrial(const std::vector<Mark>& marks, const char* how) {
     if (miss_.threshold || marks.size() != kMarks) return;
-    miss_.marks = marks;
+    const std::array<Mark, 3> order = InChartOrder(marks);
+    miss_.marks.assign(order.begin(), order.end());
     miss_.how = how;
   }
 

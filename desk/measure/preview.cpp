@@ -4,6 +4,7 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/frames.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -16,13 +17,20 @@ constexpr Method kDifference = {"mean absolute difference of the grey frames ove
                                 "Exact for the frames as delivered.",
                                 "Moved by motion, noise, flicker and exposure between the frames."};
 
-// A column of the map's colours, largest above.
-cv::Mat ColourBar(int steps) {
+// The map's colours, largest above, with the grey levels that they stand for.
+void DrawColourBar(Picture& picture, cv::Point2d origin, int steps, double largest) {
+  constexpr int kNumbers = 4;
   cv::Mat bar(steps, 1, CV_8U);
   for (int i = 0; i < steps; ++i) bar.at<uchar>(i) = static_cast<uchar>(255 - 255 * i / (steps - 1));
   cv::resize(bar, bar, {20, steps}, 0, 0, cv::INTER_NEAREST);
   cv::applyColorMap(bar, bar, cv::COLORMAP_VIRIDIS);
-  return bar;
+  picture.PlacePhoto(bar, origin, 1);
+  for (int i = 0; i <= kNumbers; ++i) {
+    const double y = origin.y + steps * i / static_cast<double>(kNumbers);
+    picture.Line({{origin.x + 20, y}, {origin.x + 24, y}}, OnPaper(kInk), 1);
+    picture.Text(Format("%.0f", largest * (kNumbers - i) / kNumbers), {origin.x + 28, y + 5}, 13, kInk);
+  }
+  picture.Text("grey levels", {origin.x, origin.y + steps + 24}, 13, kInk);
 }
 
 class PreviewFinding : public Finding {
@@ -35,25 +43,29 @@ class PreviewFinding : public Finding {
                   LimitText(mean).c_str());
   }
 
-  // The difference map beside the first frame; the map's own largest value is its lightest colour.
+  // The difference map beside the first frame; the map's largest value is its lightest colour.
   std::optional<Picture> Draw(const Record& record) const override {
     if (!record.measured()) return std::nullopt;
     constexpr int kSteps = 200;
     const double scale = FitScale(first_, 760);
     const double width = first_.cols * scale;
-    Picture picture(cvRound(2 * width + 120), cvRound(std::max(first_.rows * scale, kSteps + 20.0) + kHeadPx + 20));
-    picture.Text(Format("%s: mean difference %.5f of full scale, %s", record.test_name.c_str(),
-                        record.phase.Find("difference_mean")->value(), Name(record.outcome())),
-                 {12, 28}, 18, kInk);
-    picture.PlacePhoto(first_, {0, kHeadPx}, scale);
+    const double whole = std::max(2 * width + 110, 640.0);
+    const double difference = record.phase.Find("difference_mean")->value();
+    const Heading heading(
+        record, Format("%s: mean difference %.5f of full scale", record.test_name.c_str(), difference), whole);
+    const double top = heading.height() + 24;
+    Picture picture(cvRound(whole), cvRound(std::max(first_.rows * scale, kSteps + 40.0) + top));
+    heading.Draw(picture);
+    picture.Text("first frame", {4, top - 8}, 13, kInk);
+    picture.PlacePhoto(first_, {0, top}, scale);
+    double largest = 0;
+    cv::minMaxLoc(map_, nullptr, &largest);
     cv::Mat colours;
-    map_.convertTo(colours, CV_8U, 255);
+    map_.convertTo(colours, CV_8U, largest > 0 ? 255 / largest : 0);
     cv::applyColorMap(colours, colours, cv::COLORMAP_VIRIDIS);
-    picture.PlacePhoto(colours, {width + 8, kHeadPx}, scale);
-    const double bar_left = 2 * width + 20;
-    picture.PlacePhoto(ColourBar(kSteps), {bar_left, kHeadPx + 20}, 1);
-    picture.Text("largest", {bar_left + 26, kHeadPx + 30}, 13, kInk);
-    picture.Text("none", {bar_left + 26, kHeadPx + 20 + kSteps}, 13, kInk);
+    picture.Text("difference to the second", {width + 12, top - 8}, 13, kInk);
+    picture.PlacePhoto(colours, {width + 8, top}, scale);
+    DrawColourBar(picture, {2 * width + 20, top + 8}, kSteps, 255 * largest);
     return picture;
   }
 

@@ -7,6 +7,7 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -95,13 +96,16 @@ class PrintFinding : public Finding {
   std::optional<Picture> Draw(const Record& record) const override {
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
     const double scale = FitScale(print.straight, 1280);
-    Picture picture(std::max(640, cvRound(print.straight.cols * scale)),
-                    cvRound(print.straight.rows * scale + kHeadPx));
-    picture.Text(
-        Format("Print, in the good one's frame: %zu error areas, correlation %.3f, %s", print.areas.rectangles.size(),
-               record.phase.Find("correlation")->value(), Name(record.outcome())),
-        {12, 28}, 18, kInk);
-    DrawAreas(picture, picture.PlacePhoto(print.straight, {0, kHeadPx}, scale), print.areas);
+    const double width = std::max(640.0, print.straight.cols * scale);
+    const double height = print.straight.rows * scale;
+    const Heading heading(record,
+                          Format("Print, in the good one's frame: %zu error areas, correlation %.3f",
+                                 print.areas.rectangles.size(), record.phase.Find("correlation")->value()),
+                          width);
+    Picture picture(cvRound(width), cvRound(height + heading.height()));
+    heading.Draw(picture);
+    Labels labels({0, heading.height(), width, height});
+    DrawAreas(picture, labels, picture.PlacePhoto(print.straight, {0, heading.height()}, scale), print.areas);
     return picture;
   }
 

@@ -6,9 +6,12 @@
 #include <opencv2/imgproc.hpp>
 
 #include "desk/base/text.h"
+#include "desk/measure/areas.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/robust_map.h"
 #include "desk/measure/run_test.h"
+#include "desk/measure/telling.h"
 
 namespace qv {
 
@@ -50,14 +53,17 @@ Pose Decompose(const cv::Matx23d& m, cv::Size reference) {
           enlargements[0] / enlargements[1]};
 }
 
+// Whether the map explains it.
+bool Agrees(const QVTester::Unwarp& found, const cv::DMatch& match) {
+  const cv::Point2d from = found.reference_keypoints[match.queryIdx].pt;
+  const cv::Point2d to = found.image_keypoints[match.trainIdx].pt;
+  const cv::Vec2d at = cv::Matx23d(found.matrix) * cv::Vec3d(from.x, from.y, 1);
+  return std::hypot(at[0] - to.x, at[1] - to.y) <= kAgreePx;
+}
+
 int CountAgreeing(const QVTester::Unwarp& found) {
-  const cv::Matx23d map(found.matrix);
-  return static_cast<int>(std::count_if(found.good.begin(), found.good.end(), [&](const cv::DMatch& match) {
-    const cv::Point2d from = found.reference_keypoints[match.queryIdx].pt;
-    const cv::Point2d to = found.image_keypoints[match.trainIdx].pt;
-    const cv::Vec2d at = map * cv::Vec3d(from.x, from.y, 1);
-    return std::hypot(at[0] - to.x, at[1] - to.y) <= kAgreePx;
-  }));
+  return static_cast<int>(std::count_if(found.good.begin(), found.good.end(),
+                                        [&](const cv::DMatch& match) { return Agrees(found, match); }));
 }
 
 void AddMatrix(Phase& phase, const char* figure, const cv::Mat& map) {
@@ -132,14 +138,34 @@ class RegistrationFinding : public Finding {
            ReportRobust(record);
   }
 
-  // The good matches between both pictures.
+  // The good matches between both pictures: those that the map explains above those that it does not.
   std::optional<Picture> Draw(const Record& record) const override {
+    constexpr double kKey = 28;
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
-    QVTester painter;
-    painter.kept_->unwarp = unwarp;
-    const cv::Mat& matches = painter.DrawUnwarpMatches();
-    Picture picture(matches.cols, matches.rows);
-    picture.PlacePhoto(matches, {0, 0}, 1);
+    const double scale = std::min(FitScale(unwarp.reference, 1000), FitScale(unwarp.image, 1000));
+    const double middle = unwarp.reference.cols * scale;
+    const double width = std::max(640.0, middle + unwarp.image.cols * scale);
+    const int agreeing = CountAgreeing(unwarp);
+    const Heading heading(
+        record, Format("Registration: %zu good matches, %d agree with the map", unwarp.good.size(), agreeing), width);
+    const double top = heading.height() + kKey;
+    Picture picture(cvRound(width), cvRound(std::max(unwarp.reference.rows, unwarp.image.rows) * scale + top));
+    heading.Draw(picture);
+    DrawKey(picture, {12, top - 10},
+            {{Format("within %.0f px of the map: %d", kAgreePx, agreeing), kGood},
+             {Format("further off: %zu", unwarp.good.size() - agreeing), kPoor}});
+    const PhotoPlace left = picture.PlacePhoto(unwarp.reference, {0, top}, scale);
+    const PhotoPlace right = picture.PlacePhoto(unwarp.image, {middle, top}, scale);
+    for (const bool agrees : {false, true}) {
+      for (const cv::DMatch& match : unwarp.good) {
+        if (Agrees(unwarp, match) != agrees) continue;
+        const cv::Point2d from = left(unwarp.reference_keypoints[match.queryIdx].pt);
+        const cv::Point2d to = right(unwarp.image_keypoints[match.trainIdx].pt);
+        const Colour colour = OnLabel(agrees ? kGood : kPoor);
+        picture.Line({from, to}, colour, 1, false, agrees ? Dash::kSolid : Dash::kDashed);
+        for (const cv::Point2d& end : {from, to}) picture.Circle(end, 3, colour, 1);
+      }
+    }
     return picture;
   }
 

@@ -5,6 +5,7 @@
 
 #include "desk/base/text.h"
 #include "desk/drawing/plot.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/sharpness.h"
 #include "desk/measure/telling.h"
 
@@ -35,34 +36,19 @@ std::vector<double> EdgeProfile(const cv::Mat& pixels) {
   return {profile.begin<float>(), profile.end<float>()};
 }
 
-Colour ColourOf(const Reading& m) { return m.outcome == Outcome::kFail ? kPoor : m.marginal ? kDoubtful : kGood; }
-
-const char* WordOf(const Reading& m) {
-  if (!m.limit.given()) return "";
-  return m.outcome == Outcome::kFail ? ", poor" : m.marginal ? ", marginal" : ", good";
-}
-
 std::string FigureText(double value) { return std::isfinite(value) ? Format("%.3f", value) : "none"; }
 
-// Name and figures stand off the edges: below the one region, above the other.
-void DrawRegion(Picture& picture, const Record& record, const PhotoPlace& place, const SharpnessRegion& region,
-                std::size_t i) {
-  const std::string name = kRegionNames[i];
+// Name, figures and limit stand beside the region.
+void DrawRegion(Picture& picture, Labels& labels, const Record& record, const cv::Rect2d& box,
+                const std::string& name) {
   const Reading& mtf50 = *record.phase.Find("mtf50_" + name);
-  const Colour colour = ColourOf(mtf50);
-  std::vector<cv::Point2d> outline;
-  for (const cv::Point2d& corner : region.outline) outline.push_back(place(corner));
-  picture.Line(outline, colour, 3, true);
-  cv::Point2d label = (outline[0] + outline[2]) / 2;
-  for (const cv::Point2d& corner : outline)
-    label.y = i == 0 ? std::max(label.y, corner.y) : std::min(label.y, corner.y);
-  label.y += i == 0 ? 22 : -54;
-  const double iso = record.phase.Find("mtf50_iso_" + name)->value();
-  for (const std::string& line :
-       {name, "MTF50 " + FigureText(mtf50.value()) + " Nyquist" + WordOf(mtf50), "ISO 12233: " + FigureText(iso)}) {
-    picture.Text(line, label, 16, colour, Align::kCentre, true);
-    label.y += 22;
-  }
+  const Reading& iso = *record.phase.Find("mtf50_iso_" + name);
+  std::vector<std::string> lines = {name, "MTF50 " + FigureText(mtf50.value()) + " Nyquist"};
+  if (mtf50.limit.given()) lines.push_back(LimitText(mtf50).substr(2));
+  lines.push_back("ISO 12233: " + FigureText(iso.value()));
+  if (iso.limit.given()) lines.push_back(LimitText(iso).substr(2));
+  const bool iso_worse = ToneOf(iso) == kPoor || (ToneOf(iso) == kDoubtful && ToneOf(mtf50) == kGood);
+  labels.Add(picture, lines, box, iso_worse ? ToneOf(iso) : ToneOf(mtf50));
 }
 
 Plot ProfilePlot(const SharpnessRegion& region, const std::string& name) {
@@ -74,28 +60,53 @@ Plot ProfilePlot(const SharpnessRegion& region, const std::string& name) {
   plot.y_label = "grey level";
   plot.x_max = static_cast<double>(profile.size());
   plot.y_max = 255;
-  for (std::size_t k = 0; k < profile.size(); ++k) plot.curve.emplace_back(static_cast<double>(k), profile[k]);
+  plot.curves = {{"mean along the edge", {}, kSeries[0]}};
+  plot.curves[0].ends_only = true;
+  for (std::size_t k = 0; k < profile.size(); ++k) {
+    plot.curves[0].points.emplace_back(static_cast<double>(k), profile[k]);
+  }
   return plot;
 }
 
-Plot ResponsePlot(const Reading& curve, const Reading& mtf50, const std::string& name) {
+void AddCurve(Plot& plot, const Phase& phase, const std::string& figure, const char* name) {
+  const Reading* const curve = phase.Find(figure);
+  if (curve == nullptr) return;
+  Plot::Curve drawn = {name, {}, kSeries[plot.curves.size()]};
+  drawn.ends_only = true;
+  for (std::size_t k = 0; k < curve->values.size(); ++k) drawn.points.emplace_back(curve->axis[k], curve->values[k]);
+  plot.curves.push_back(std::move(drawn));
+}
+
+// The test's own response and that by ISO 12233, with MTF50 of each and its limits.
+Plot ResponsePlot(const Phase& phase, const std::string& name) {
   Plot plot;
   plot.title = "SFR, " + name + " region";
   plot.x_label = "frequency, fraction of Nyquist";
   plot.second_x_label = "cycles per pixel";
   plot.second_x_factor = 0.5;
   plot.y_label = "response";
+  plot.levels = {{0.5, "response 0.5"}};
+  AddCurve(plot, phase, "sfr_" + name, "the test's own");
+  AddCurve(plot, phase, "sfr_iso_" + name, "ISO 12233");
   plot.y_max = 1.1;
-  plot.horizontal_lines = {0.5};
-  for (std::size_t k = 0; k < curve.values.size(); ++k) plot.curve.emplace_back(curve.axis[k], curve.values[k]);
-  plot.markers = {{{mtf50.value(), 0.5}, Format("MTF50 %.4f Nyquist", mtf50.value()), ColourOf(mtf50)}};
+  for (const Plot::Curve& curve : plot.curves) {
+    for (const cv::Point2d& p : curve.points) plot.y_max = std::max(plot.y_max, std::isfinite(p.y) ? p.y * 1.05 : 0);
+  }
+  for (const auto& [figure, label] : {std::pair{"mtf50_", "own"}, {"mtf50_iso_", "ISO"}}) {
+    const Reading* const mtf50 = phase.Find(figure + name);
+    if (mtf50 == nullptr) continue;
+    plot.markers.push_back({{mtf50->value(), 0.5}, Format("MTF50 %s %.4f", label, mtf50->value()), ToneOf(*mtf50)});
+    for (const auto& [limit, side] : {std::pair{mtf50->limit.min, "at least"}, {mtf50->limit.max, "at most"}}) {
+      if (limit) plot.levels.push_back({*limit, Format("%s: %s %g", label, side, *limit), true, ToneOf(*mtf50)});
+    }
+  }
   return plot;
 }
 
-std::string Heading(const Record& record, const ChartView& view) {
+std::string TitleOf(const Record& record, const ChartView& view) {
   if (record.phase.code == QV_SUCCESS) {
-    return Format("%s: %s, chart turned by %.1f degrees, threshold %d", record.test_name.c_str(),
-                  Name(record.outcome()), view.turn_deg, view.threshold);
+    return Format("%s: chart turned by %.1f degrees, threshold %d", record.test_name.c_str(), view.turn_deg,
+                  view.threshold);
   }
   return Format("%s: code %d, %zu of 3 marks, threshold %d", record.test_name.c_str(), record.phase.code,
                 view.marks.size(), view.threshold);
@@ -106,25 +117,33 @@ std::string Heading(const Record& record, const ChartView& view) {
 std::optional<Picture> SharpnessFinding::Draw(const Record& record) const {
   if (!ShowsPhoto(record.phase.code)) return std::nullopt;
   constexpr double kPhoto = 1080;
-  constexpr double kLeastWidth = 760;  // that a miss's reasons have room in
+  constexpr double kLeastWidth = 900;  // that a miss's reasons have room in
   const bool measured = record.phase.code == QV_SUCCESS;
   const double scale = FitScale(photo, kPhoto);
   const double width = photo.cols * scale;
   const double height = std::max(photo.rows * scale, measured ? kPlotsHeight : 0);
-  Picture picture(cvRound(measured ? width + 2 * kPlotWidth + 16 : std::max(width, kLeastWidth)),
-                  cvRound(height + kHeadPx));
-  const PhotoPlace place = picture.PlacePhoto(photo, {0, kHeadPx}, scale);
-  picture.Text(Heading(record, view), {12, 28}, 18, kInk);
-  DrawMarks(picture, view, place);
+  const double whole = measured ? width + 2 * kPlotWidth + 16 : std::max(width, kLeastWidth);
+  const Heading heading(record, TitleOf(record, view), whole);
+  const double top = heading.height();
+  Picture picture(cvRound(whole), cvRound(height + top));
+  heading.Draw(picture);
+  const PhotoPlace place = picture.PlacePhoto(photo, {0, top}, scale);
+  Labels labels({0, top, measured ? width : whole, measured ? photo.rows * scale : height});
+  std::vector<cv::Rect2d> boxes;
+  for (std::size_t i = 0; i < regions.size(); ++i) {
+    std::vector<cv::Point2d> outline;
+    for (const cv::Point2d& corner : regions[i].outline) outline.push_back(place(corner));
+    picture.Line(outline, ToneOf(*record.phase.Find(std::string("mtf50_") + kRegionNames[i])), 3, true);
+    boxes.push_back(BoxAbout(outline));
+    labels.Keep(boxes.back());
+  }
+  DrawMarks(picture, labels, view, place);
   for (std::size_t i = 0; i < regions.size(); ++i) {
     const std::string name = kRegionNames[i];
-    DrawRegion(picture, record, place, regions[i], i);
+    DrawRegion(picture, labels, record, boxes[i], name);
     const double left = width + 16 + static_cast<double>(i) * kPlotWidth;
-    DrawPlot(picture, ProfilePlot(regions[i], name), {left, kHeadPx, kPlotWidth, 330});
-    if (const Reading* curve = record.phase.Find("sfr_" + name)) {
-      const Plot response = ResponsePlot(*curve, *record.phase.Find("mtf50_" + name), name);
-      DrawPlot(picture, response, {left, kHeadPx + 340, kPlotWidth, 400});
-    }
+    DrawPlot(picture, ProfilePlot(regions[i], name), {left, top, kPlotWidth, 330});
+    DrawPlot(picture, ResponsePlot(record.phase, name), {left, top + 340, kPlotWidth, 420});
   }
   return picture;
 }

@@ -10,9 +10,6 @@ namespace qv {
 
 // Words and measures that the findings' reports and pictures share.
 
-/// Above the photo of a picture, for its heading.
-inline constexpr double kHeadPx = 44;
-
 /// The scale at which a photo's longer side fits; never enlarges.
 double FitScale(const cv::Mat& photo, double side);
 

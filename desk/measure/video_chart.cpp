@@ -12,8 +12,6 @@ namespace qv {
 
 namespace {
 
-constexpr Colour kBlue = {0.1, 0.35, 0.75};
-
 class ChartFilmFinding : public FilmFinding {
  public:
   using FilmFinding::FilmFinding;
@@ -40,7 +38,8 @@ class ChartFilmFinding : public FilmFinding {
     for (std::size_t i = 1; i < time_.size(); ++i) intervals[i] = time_[i] - time_[i - 1];
     Plot timing =
         OverTime("Interval to the frame before; red where frames are lost", "interval, ms", 1.3 * Highest(intervals));
-    timing.more_curves.push_back({Course(intervals, kBlue).points, kBlue, false});
+    timing.curves.push_back(Course("interval", intervals));
+    AddLimits(timing, *record.phase.Find("longest_gap"), "longest gap");
     for (const FilmGap& gap : gaps_) {
       timing.markers.push_back({{time_[gap.after], intervals[gap.after]}, Format("%d lost", gap.lost), kPoor});
     }
@@ -50,7 +49,7 @@ class ChartFilmFinding : public FilmFinding {
     std::vector<double> angles = record.phase.Find("angle")->values;
     for (double& angle : angles) angle = angle < 0 ? std::numeric_limits<double>::quiet_NaN() : angle;
     Plot turning = OverTime("Angle of the chart, 315 is upright; none where it was not found", "angle, degrees", 360);
-    turning.more_curves.push_back(Course(angles, kBlue));
+    turning.curves.push_back(Course("angle", angles));
     return {timing, turning};
   }
 

@@ -6,6 +6,7 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/film_course.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/telling.h"
 
 namespace qv {
@@ -21,7 +22,6 @@ constexpr Method kWidth = {
     "above the "
     "base.",
     "Moved by an exposure control that answers the flash, by clipping, and by a film that cuts the pulse."};
-constexpr Colour kBlue = {0.1, 0.35, 0.75};
 
 class FlashFilmFinding : public FilmFinding {
  public:
@@ -42,14 +42,18 @@ class FlashFilmFinding : public FilmFinding {
  protected:
   std::vector<Plot> Plots(const Record& record) const override {
     Plot plot = OverTime("Mean of the first channel of each frame; gaps are lost frames", "level", 255);
-    plot.more_curves.push_back(Course(record.phase.Find("mean")->values, kBlue));
+    plot.curves.push_back(Course("mean", record.phase.Find("mean")->values));
     const double peak = record.phase.Find("peak")->value();
     const double base = record.phase.Find("base")->value();
     const double width = record.phase.Find("width")->value();
-    plot.horizontal_lines = {base};
+    plot.levels.push_back({base, "base"});
+    AddLimits(plot, *record.phase.Find("peak"), "peak");
+    AddLimits(plot, *record.phase.Find("base"), "base");
     if (std::isfinite(width)) {
-      plot.horizontal_lines.push_back((peak + base) / 2);
-      plot.markers = {{{PeakTime(record), peak}, Format("%.1f, %.1f ms wide at half height", peak, width), kGood}};
+      plot.levels.push_back({(peak + base) / 2, "half height"});
+      plot.markers = {{{PeakTime(record), peak},
+                       Format("%.1f, %.1f ms wide at half height", peak, width),
+                       ToneOf(*record.phase.Find("peak"))}};
     }
     return {plot};
   }

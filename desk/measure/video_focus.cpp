@@ -6,6 +6,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/chart_view.h"
 #include "desk/measure/film_course.h"
+#include "desk/measure/heading.h"
 #include "desk/measure/sharpness.h"
 #include "desk/measure/telling.h"
 
@@ -17,8 +18,6 @@ constexpr Method kSettling = {
     "running median of five measured frames, within 10 % of the median of the last fifth",
     "Within {film_settling} of the first frame in which the focus has come to stay, at up to 1 % noise.",
     "Moved by the frame rate, by noise, and by a film that ends before the lens has come to rest."};
-constexpr Colour kVertical = {0.1, 0.35, 0.75};
-constexpr Colour kHorizontal = {0.85, 0.45, 0.0};
 
 class FocusFinding : public FilmFinding {
  public:
@@ -43,14 +42,20 @@ class FocusFinding : public FilmFinding {
   std::vector<Plot> Plots(const Record& record) const override {
     const auto& vertical = record.phase.Find("mtf50_vertical")->values;
     const auto& horizontal = record.phase.Find("mtf50_horizontal")->values;
-    Plot plot = OverTime("MTF50 of the vertical region (blue) and the horizontal one (orange); gaps are lost frames",
-                         "MTF50, Nyquist", 1.2 * std::max(Highest(vertical), Highest(horizontal)));
-    plot.more_curves.push_back(Course(vertical, kVertical));
-    plot.more_curves.push_back(Course(horizontal, kHorizontal));
+    Plot plot = OverTime("MTF50 over the film; gaps are lost frames", "MTF50, Nyquist",
+                         1.2 * std::max(Highest(vertical), Highest(horizontal)));
+    plot.curves.push_back(Course("vertical region", vertical));
+    plot.curves.push_back(Course("horizontal region", horizontal, 1));
     const double level = record.phase.Find("final_mtf50")->value();
     const double settle = record.phase.Find("settle_time")->value();
-    plot.horizontal_lines = {level};
-    if (std::isfinite(settle)) plot.markers = {{{settle, level}, Format("settled at %.1f ms", settle), kGood}};
+    plot.levels.push_back({level, "final level"});
+    AddLimits(plot, *record.phase.Find("settle_time"), "settled", true);
+    AddLimits(plot, *record.phase.Find("best_mtf50"), "best");
+    AddLimits(plot, *record.phase.Find("final_mtf50"), "final");
+    if (std::isfinite(settle)) {
+      plot.markers = {
+          {{settle, level}, Format("settled at %.1f ms", settle), ToneOf(*record.phase.Find("settle_time"))}};
+    }
     return {plot};
   }
 };
