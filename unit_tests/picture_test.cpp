@@ -36,8 +36,8 @@ double Luminance(Colour c) {
 }
 
 double Contrast(Colour a, Colour b) {
-  const auto [low, high] = std::minmax(Luminance(a), Luminance(b));
-  return (high + 0.05) / (low + 0.05);
+  const double ratio = (Luminance(a) + 0.05) / (Luminance(b) + 0.05);
+  return std::max(ratio, 1 / ratio);
 }
 
 // As seen without red cones, and without green ones (Vienot, Brettel and Mollon, 1999).
@@ -180,7 +180,7 @@ TEST(Plot, ShowsIntervalsLevelsAndALegend) {
          plot.levels = {{0.6, "at least 0.6", true, kPoor}};
        },
        cv::Rect(kFrame.x + kFrame.width * 6 / 10 - 3, kFrame.y + 10, 6, 60), OnPaper(kPoor)},
-      {"legend", [](Plot& plot) { plot.curves[0].name = "own"; }, cv::Rect(8, 270, 40, 30), series.colour},
+      {"legend", [](Plot& plot) { plot.curves[0].name = "own"; }, cv::Rect(8, 284, 40, 16), series.colour},
       {"bars", [](Plot& plot) { plot.curves[0].bars = true; },
        cv::Rect(kFrame.x + kFrame.width / 5 - 3, middle + 20, 6, 40), series.colour}};
   const auto coloured = [](const Plot& plot, const Part& part) {

@@ -43,7 +43,7 @@ std::vector<Entry> LegendOf(const Plot& plot) {
     if (curve.ends_only && !curve.name.empty()) entries.back().series.shape = PointShape::kNone;
   }
   for (const Plot::Level& level : plot.levels) {
-    entries.push_back({level.name, {OnPaper(level.tone), Dash::kDashed, PointShape::kNone}, false, true});
+    entries.push_back({level.name, {OnPaper(level.tone), level.dash, PointShape::kNone}, false, true});
   }
   return entries;
 }
@@ -175,7 +175,7 @@ void Drawing::Levels() const {
     if (!std::isfinite(level.at) || (level.upright && level.at > plot.x_max)) continue;
     const cv::Point2d from = level.upright ? At({level.at, plot.y_min}) : At({0, level.at});
     const cv::Point2d to = level.upright ? At({level.at, plot.y_max}) : At({plot.x_max, level.at});
-    picture.Line({from, to}, OnPaper(level.tone), 1, false, Dash::kDashed);
+    picture.Line({from, to}, OnPaper(level.tone), 1, false, level.dash);
   }
 }
 

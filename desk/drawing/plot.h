@@ -30,6 +30,7 @@ struct Plot {
     std::string name;  // in the legend
     bool upright = false;
     Tone tone = kInk;
+    Dash dash = Dash::kDashed;
   };
   std::vector<Level> levels;  // lines across the frame: limits and the like
   struct Marker {

@@ -50,7 +50,7 @@ class FlashFilmFinding : public FilmFinding {
     AddLimits(plot, *record.phase.Find("peak"), "peak");
     AddLimits(plot, *record.phase.Find("base"), "base");
     if (std::isfinite(width)) {
-      plot.levels.push_back({(peak + base) / 2, "half height"});
+      plot.levels.push_back({(peak + base) / 2, "half height", false, kInk, Dash::kDotted});
       plot.markers = {{{PeakTime(record), peak},
                        Format("%.1f, %.1f ms wide at half height", peak, width),
                        ToneOf(*record.phase.Find("peak"))}};
