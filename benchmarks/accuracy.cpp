@@ -543,12 +543,12 @@ void PrintDetection() {
     plot.title = std::string("Detection against ") + sweep.name;
     plot.x_label = sweep.axis;
     plot.y_label = "share found";
-    plot.x_max = sweep.values.back();
+    plot.x_max = 1.04 * sweep.values.back();  // room for the last bars
     plot.y_max = 1.05;
     const char* const names[] = {"chart", "QR code", "ArUco marker"};
     for (int k = 0; k < 3; ++k) {
       plot.curves.push_back({names[k], {}, kSeries[k]});
-      plot.curves[k].shift_px = 5 * (k - 1);
+      plot.curves[k].shift_px = 5 * k;
     }
     for (std::size_t i = 0; i < sweep.values.size(); ++i) {
       const auto share = [&](bool Detections::*target) {
