@@ -26,7 +26,8 @@ cv::Rect2d Labels::Add(Picture& picture, const std::vector<std::string>& lines, 
   cv::Rect2d best;
   double best_gap = kNear;
   double least = -1;  // that the best covers
-  for (double gap = kNear; gap < 400 && least != 0; gap *= 1.6) {
+  double gap = kNear;
+  while (gap < 400 && least != 0) {
     const double x[] = {thing.x - gap - block.width, thing.x, middle.x - block.width / 2, thing.br().x - block.width,
                         thing.br().x + gap};
     const double y[] = {thing.y - gap - block.height, thing.y, middle.y - block.height / 2, thing.br().y - block.height,
@@ -44,6 +45,7 @@ cv::Rect2d Labels::Add(Picture& picture, const std::vector<std::string>& lines, 
       least = covered;
       if (covered == 0) break;
     }
+    gap *= 1.6;
   }
   if (best_gap > kTied) {
     const cv::Point2d from(std::clamp(middle.x, best.x, best.br().x), std::clamp(middle.y, best.y, best.br().y));

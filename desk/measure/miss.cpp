@@ -180,8 +180,8 @@ const char* BorderNear(cv::Point2d at, cv::Size size) {
 
 class Explainer {
  public:
-  Explainer(const std::vector<Mark>& found, int threshold, const cv::Mat& photo)
-      : found_(found), threshold_(threshold) {
+  Explainer(std::vector<Mark> found, int threshold, const cv::Mat& photo)
+      : found_(std::move(found)), threshold_(threshold) {
     cv::cvtColor(photo, gray_, cv::COLOR_RGB2GRAY);  // as the tests weigh it: the first channel is taken for red
     const GreyHistogram levels = LookAtLevels(gray_);
     miss_.peaks = levels.peaks;
