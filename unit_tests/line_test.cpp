@@ -33,12 +33,19 @@ void ReplaceAll(std::string& text, const std::string& word, const std::string& b
     text.replace(at, word.size(), by);
 }
 
+int WholeOf(const std::string& text) { return static_cast<int>(std::strtol(text.c_str(), nullptr, 10)); }
+
+std::string Environment(const char* name) {
+  const char* const value = std::getenv(name);  // NOLINT(concurrency-mt-unsafe): nobody sets it
+  return value == nullptr ? "" : value;
+}
+
 class Line : public SimulatedPhotos {
  protected:
   void SetUp() override {
     const char* const server = std::getenv("QV_SERVER");
     if (server == nullptr) GTEST_SKIP() << "runs beside a server: with_postgres.sh";
-    if (const char* const lot = std::getenv("QV_LOT")) photos_ = std::atoi(lot);
+    if (const char* const lot = std::getenv("QV_LOT")) photos_ = WholeOf(lot);
     const std::string name = ::testing::UnitTest::GetInstance()->current_test_info()->name();
     std::string lower = name;
     for (char& c : lower) c = static_cast<char>(std::tolower(c));
@@ -69,7 +76,7 @@ class Line : public SimulatedPhotos {
     return ReadFile(folder_.Path("shell.out"));
   }
 
-  int Stored() const { return std::atoi(Shell("psql -qtA -d " + store_ + " -c 'SELECT count(*) FROM run'").c_str()); }
+  int Stored() const { return WholeOf(Shell("psql -qtA -d " + store_ + " -c 'SELECT count(*) FROM run'")); }
 
   // Waits until more than these are stored; false when that takes long.
   bool MoreThan(int runs) const {
@@ -128,7 +135,7 @@ class Line : public SimulatedPhotos {
 
 TEST_F(Line, GoesOnAfterKillsAndARestartOfTheServer) {
   const std::string batch = "batch camera_autofocus photos -j 2 --quiet -o '" + store_ + "'";
-  const std::string restart = std::string(std::getenv("QV_PG_CTL")) + " restart -m immediate";
+  const std::string restart = Environment("QV_PG_CTL") + " restart -m immediate";
   const pid_t first = Start(batch);
   ASSERT_TRUE(MoreThan(0));
   const std::vector<pid_t> workers = Children(first);
