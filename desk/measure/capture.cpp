@@ -183,7 +183,8 @@ std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
   }
   for (std::size_t i = 0; i < measured.size(); ++i) {
     labels.Add(picture, {std::to_string(i)}, BoxAbout(places[i]), kGood, 13);
-    const cv::Point2d at(static_cast<double>(i / kRows) * kColumn, static_cast<double>(i % kRows) * kRow + kLegend);
+    const std::size_t column = i / kRows;
+    const cv::Point2d at(static_cast<double>(column) * kColumn, static_cast<double>(i % kRows) * kRow + kLegend);
     DrawPatch(picture, record, i, cv::Point2d(swatches, top) + at);
   }
   picture.Text(standard.empty() ? "measured" : "measured, framed by the standard", {swatches, top + 18}, 14, kInk);

@@ -4,6 +4,7 @@
 #include <array>
 #include <cmath>
 #include <opencv2/imgproc.hpp>
+#include <utility>
 
 #include "chart/chart_layout.h"
 #include "chart/points.h"
