@@ -6,6 +6,7 @@
 #include <cstring>
 
 #include "core/property_table.h"
+#include "core/test_table.h"
 #include "qvtester/log.h"
 
 namespace {
@@ -123,9 +124,7 @@ int QVTester::Initialize() {
 int QVTester::Release() {
   for (auto& resource : resources_) resource.reset();
   kept_->image_list = ImageList();
-  for (int test = QV_TEST_PHASE1_0; test <= QV_TEST_TOUCH_PANEL_PRINT; ++test) {
-    ReleaseTestResult(static_cast<QV_TEST_INDEX>(test));
-  }
+  for (const QVTest& test : kTests) ReleaseTestResult(test.index);
   results_.reset();
   return QV_SUCCESS;
 }

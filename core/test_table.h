@@ -82,6 +82,6 @@ constexpr bool TestsAreInOrder() {
   }
   return true;
 }
-static_assert(std::size(kTests) == 30 && TestsAreInOrder(), "row i is test i");
+static_assert(TestsAreInOrder(), "row i is test i");
 
 #endif  // QVTESTER_CORE_TEST_TABLE_H_

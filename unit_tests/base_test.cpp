@@ -22,7 +22,7 @@
 
 // Stands in for the system's: what the written file was called when it was flushed, and whether that works.
 static std::function<int(int)> flush = [](int) { return 0; };
-extern "C" int fsync(int file) { return flush(file); }
+extern "C" int fsync(int fd) { return flush(fd); }  // NOLINT(readability-inconsistent-declaration-parameter-name)
 
 namespace qv {
 
