@@ -250,7 +250,7 @@ TEST(Measure, DustIsJudgedFromLevel126OnAndOutsideTheCorners) {
     EXPECT_THAT(Remarks(record), ::testing::Contains("too_dark").Times(126 - level));
   }
   cv::Mat dusty(300, 400, CV_8UC3, cv::Scalar::all(180));
-  for (const cv::Point& at : {cv::Point(12, 12), {200, 150}}) cv::circle(dusty, at, 4, cv::Scalar::all(60), -1);
+  for (const cv::Point& at : {cv::Point(388, 288), {200, 150}}) cv::circle(dusty, at, 4, cv::Scalar::all(60), -1);
   const Record record = MeasureAnew({"lens_dust", {dusty}});
   EXPECT_EQ(1, record.phase.Find("blob_count")->value());
   EXPECT_THAT(record.phase.Find("blobs")->axis, ::testing::ElementsAre(::testing::DoubleNear(200, 0.5)));

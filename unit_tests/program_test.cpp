@@ -107,6 +107,8 @@ TEST_F(Program, LimitsDecideTheVerdict) {
         {R"({"camera_autofocus_mtf50_vertical": {"min": 2, "max": 1}})", "its min lies above its max"},
         {R"({"camera_autofocus_mtf50_vertical": {"min": 2, "marginal_min": 1}})",
          "its min lies above its marginal_min"},
+        {R"({"camera_autofocus_mtf50_vertical": {"max": 1, "marginal_max": 2}})",
+         "its marginal_max lies above its max"},
         {R"({"camera_autofocus_mtf50_vertical": {}})", "it has no bound"},
         {R"({"camera_autofocus_mtf50_vertical": {"each": {"min": 1}}})", "this is a single value"},
         {R"({"camera_capture_delta_e_2000": {"max": 3}})", R"(as {"patches": {"7": {"max": 2}}})"},

@@ -52,6 +52,7 @@ TEST(Scenes, SignsHaveTwoStrokes) {
 TEST(Scenes, TheTruthOfADustPhotoIsItsOwn) {
   SimulationOptions options;
   options.scene = "dust";
+  options.camera.size = {1000, 800};
   options.specks = 30;
   options.speck_px = 10;
   options.camera.gain = 0.5;

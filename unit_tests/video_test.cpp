@@ -201,6 +201,24 @@ TEST_F(Video, FocusSettlesWhenItStaysNearItsEnd) {
   EXPECT_EQ(before, Values(r.video_af_time_, r.video_af_frame_count_));
 }
 
+TEST_F(Video, TheEndIsTheLastFifthRoundedUpAndATenthOfItTheLimit) {
+  const auto level = [&](double blur) {
+    float v = 0;
+    float h = 0;
+    EXPECT_EQ(1, theTester->GetMTFFromImage(Chart(blur), v, h));
+    return (v + h) / 2;
+  };
+  ASSERT_EQ(1, Run(QV_TEST_VIDEO_AUTOFOCUS, {Chart(1), Chart(1), Chart(1), Chart(1), Chart(1), Chart(1.3)}));
+  EXPECT_FLOAT_EQ((level(1) + level(1.3)) / 2, Results().video_af_final_mtf50_) << "two of six";
+  double blur = 1;
+  while (level(blur) < 1.105 * level(1)) blur -= 0.004;
+  ASSERT_LT(level(blur), 1.118 * level(1));
+  std::vector<cv::Mat> frames(6, Chart(blur));
+  frames.insert(frames.end(), 6, Chart(1));
+  ASSERT_EQ(1, Run(QV_TEST_VIDEO_AUTOFOCUS, frames, kLossless, "settling.mkv"));
+  EXPECT_NEAR(200, Results().video_af_settle_time_, 1) << "the first of which the median of five is low";
+}
+
 TEST_F(Video, PreviewFramesAreThoseOfTheirOwnSlots) {
   Load(28, cv::Mat(2, 3, CV_8UC3, cv::Scalar::all(100)));
   Load(29, cv::Mat(2, 3, CV_8UC3, cv::Scalar::all(151)));
