@@ -3,8 +3,11 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
+#include <opencv2/imgcodecs.hpp>
+#include <opencv2/imgproc.hpp>
 #include <tuple>
 
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/decision.h"
 #include "desk/measure/edge_resampling.h"
 #include "desk/measure/measure.h"
@@ -51,11 +54,45 @@ TEST(Uncertainty, PixelsTellTheirNoiseWhateverTheLight) {
     const double noise = 2.0 * (channel + 1);
     EXPECT_NEAR(noise / std::sqrt(4800.0), std::sqrt(covariance(channel, channel)), 0.1 * noise / std::sqrt(4800.0));
   }
-  cv::Mat green;
-  cv::extractChannel(patch, green, 1);
-  EXPECT_NEAR(4 / std::sqrt(4800.0), OfMeanLevel(green).standard, 0.1 * 4 / std::sqrt(4800.0));
   const auto product = [](const cv::Vec3d& x) { return x[0] * x[1]; };
-  EXPECT_NEAR(5, Propagated(product, {3, 4, 0}, cv::Matx33d::eye(), 0.1), 1e-9);
+  EXPECT_NEAR(5, Propagated<3>(product, {3, 4, 0}, cv::Matx33d::eye(), 0.1), 1e-9);
+}
+
+TEST(Uncertainty, AMeanIsAsGoodAsItsBlocksWhateverStandsInThePhoto) {
+  cv::Mat photo(800, 1200, CV_32F);
+  cv::theRNG().state = 5;
+  cv::randn(photo, cv::Scalar(100), cv::Scalar(4));
+  for (int column = 0; column < photo.cols; ++column) photo.col(column) += column * 0.05;  // falls off
+  cv::rectangle(photo, {300, 200, 300, 300}, cv::Scalar(30), cv::FILLED);
+  photo.convertTo(photo, CV_8U);
+  const double law = 4 / std::sqrt(1.0 * photo.total());
+  EXPECT_NEAR(law, OfMeanLevel(photo).standard, 0.1 * law);
+  EXPECT_DOUBLE_EQ(OfMeanLevel(photo).standard / 255, OfMeanLevel(photo, 1.0 / 255).standard);
+
+  cv::Mat mask(photo.size(), CV_8U);
+  cv::randu(mask, 0, 100);
+  mask = mask < 20;
+  const double of_share = std::sqrt(0.2 * 0.8 / static_cast<double>(mask.total()));  // binomial
+  EXPECT_NEAR(of_share, OfShare(mask).standard, 0.1 * of_share);
+  EXPECT_GT(OfShare(cv::Mat::zeros(80, 80, CV_8U)).expanded, 1 / 6400.0) << "none was seen";
+}
+
+TEST(Uncertainty, AFileTellsByHowMuchItsCodecRounds) {
+  const TemporaryFolder folder;
+  cv::Mat photo(64, 64, CV_8UC3);
+  cv::randu(photo, 0, 255);
+  for (const auto& [quality, luma, chroma] : {std::tuple(75, 8, 9), {50, 16, 17}, {100, 1, 1}}) {  // T.81, Annex K
+    cv::imwrite(folder.Path("photo.jpg"), photo, {cv::IMWRITE_JPEG_QUALITY, quality});
+    for (const CodecSteps& steps : {StepsOf(folder.Path("photo.jpg")), StepsAtQuality(quality)}) {
+      EXPECT_EQ(luma / 8.0, steps.luma);
+      EXPECT_EQ(chroma / 8.0, steps.chroma);
+    }
+  }
+  const std::string whole = ReadFile(folder.Path("photo.jpg"));
+  for (const std::size_t size : {0U, 1U, 3U, 21U, 40U, 90U}) {
+    EXPECT_EQ(0, StepsOf(folder.Write("cut.jpg", whole.substr(0, size))).chroma) << size;
+  }
+  EXPECT_EQ(0, StepsOf(folder.Path("nowhere.jpg")).luma);
 }
 
 TEST(Uncertainty, ResamplingFindsWhatNoiseDoes) {

@@ -8,11 +8,11 @@
 
 #include "chart/chart_layout.h"
 #include "desk/base/text.h"
+#include "desk/measure/capture_trust.h"
 #include "desk/measure/chart_view.h"
 #include "desk/measure/cielab.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/load.h"
-#include "desk/measure/patch_trust.h"
 #include "desk/measure/patch_values.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -86,16 +86,6 @@ void CollectByCie(Phase& phase, const PatchColours& measured, const std::map<int
   phase.Add("delta_e_2000_mean", total / static_cast<double>(differences.size()));
   phase.Add("delta_e_2000_max", *std::max_element(differences.begin(), differences.end()));
   phase.Add("delta_e_2000", compared, differences);
-}
-
-// Of an upright square well within a patch, whatever its turn, channels as the measures weigh them: as they are stored.
-cv::Mat InnerPixels(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
-  constexpr double kInner = 0.45;  // of the patch's side, to each side of its middle
-  const cv::Point2d middle = (outline[0] + outline[2]) / 2;
-  const double half = kInner / std::sqrt(2.0) * cv::norm(outline[1] - outline[0]);
-  const cv::Rect part(cv::Point(cvCeil(middle.x - half), cvCeil(middle.y - half)),
-                      cv::Point(cvFloor(middle.x + half) + 1, cvFloor(middle.y + half) + 1));
-  return photo(part & cv::Rect({}, photo.size()));
 }
 
 void Swatch(Picture& picture, const cv::Rect2d& area, const cv::Point3i& colour) {
@@ -267,7 +257,11 @@ class Capture : public Measurement {
     TakePatches(*finding, tester);
     DoubtEvenness(record, *finding);
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));
-    AddTrust(record.phase, *finding);
+    std::map<int, cv::Vec3d> given;
+    if (request.parameters.contains("reference")) given = PatchValues(request.parameters["reference"]);
+    const Input& photo_file = request.inputs.at(0);
+    TrustPatches(record.phase, {finding->photo, finding->outlines, finding->measured, finding->standard,
+                                std::move(given), photo_file.is_path() ? StepsOf(photo_file.name) : CodecSteps()});
     return finding;
   }
 
@@ -292,45 +286,6 @@ class Capture : public Measurement {
     };
     for (const Figure& figure : ChartFigures()) figures.push_back(figure);
     return figures;
-  }
-
-  // From each patch's own noise; the standard's is taken to be the same.
-  static void AddTrust(Phase& phase, const CaptureFinding& finding) {
-    std::array<std::vector<Uncertainty>, 3> lab;
-    std::vector<Uncertainty> delta;
-    const Reading& numbers = *phase.Find("lab_l");
-    for (const double number : numbers.axis) {
-      const auto i = static_cast<std::size_t>(number);
-      const cv::Mat pixels = i < finding.outlines.size() ? InnerPixels(finding.photo, finding.outlines[i]) : cv::Mat();
-      if (pixels.cols < 3) return;
-      const double area = std::pow(cv::norm(finding.outlines[i][1] - finding.outlines[i][0]), 2);
-      const cv::Point3i& mean = finding.measured[i];
-      const std::vector<cv::Vec3d> draws = DrawPatchColours(pixels, area, mean, i);
-      for (int k = 0; k < 3; ++k) {
-        lab[k].push_back(TrustInColour(mean, draws, [k](const cv::Vec3d& rgb) { return OwnLab(rgb)[k]; }));
-      }
-      if (i >= finding.standard.size()) continue;
-      const cv::Point3i& standard = finding.standard[i];
-      delta.push_back(
-          TrustInPair(mean, draws, standard, DrawPatchColours(pixels, area, standard, 100 + i),
-                      [](const cv::Vec3d& a, const cv::Vec3d& b) { return cv::norm(OwnLab(a) - OwnLab(b)); }));
-    }
-    phase.Find("lab_l")->Trust(lab[0]);
-    phase.Find("lab_a")->Trust(lab[1]);
-    phase.Find("lab_b")->Trust(lab[2]);
-    TrustDifferences(phase, delta);
-  }
-
-  static void TrustDifferences(Phase& phase, const std::vector<Uncertainty>& delta) {
-    Reading* const each = phase.Find("delta_e_76");
-    if (each == nullptr || delta.size() != each->values.size()) return;
-    each->Trust(delta);
-    double squares = 0;
-    for (const Uncertainty& u : delta) squares += u.standard * u.standard;
-    const double mean = std::sqrt(squares) / static_cast<double>(delta.size());
-    phase.Find("delta_e_76_mean")->Trust({Combined(0, 1, mean, kPixelMethod)});
-    const auto largest = std::max_element(each->values.begin(), each->values.end());
-    phase.Find("delta_e_76_max")->Trust({delta[largest - each->values.begin()]});
   }
 
   const QVTester::ColorStandard& StandardOf(const QVTester& tester) const {

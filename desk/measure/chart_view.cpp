@@ -11,6 +11,7 @@
 #include "desk/base/text.h"
 #include "desk/drawing/picture.h"
 #include "desk/measure/doubts.h"
+#include "desk/measure/residual_trust.h"
 
 namespace qv {
 
@@ -131,6 +132,7 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
                "marks_found");
     return view;
   }
+  TrustMarks(record.phase, view, photo);
   if (!view.plausible()) {
     record.Say(Remark::kDoubt, "implausible_marks",
                Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <numeric>
+#include <opencv2/imgproc.hpp>
 
 #include "desk/base/text.h"
 #include "desk/drawing/plot.h"
@@ -191,6 +192,9 @@ class Dust : public Measurement {
     const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase);
     if (results == nullptr) return finding;
     AddHistogram(record.phase, *results, request);
+    cv::Mat grey;
+    cv::cvtColor(finding->photo, grey, cv::COLOR_RGB2GRAY);
+    record.phase.Find("mean_level")->Trust({OfMeanLevel(grey)});
     finding->spots = FindSpots(finding->photo);
     AddSpots(record, finding->spots);
     const double mean = record.phase.Find("mean_level")->value();

@@ -28,9 +28,13 @@ void CollectChannels(Phase& phase, const cv::Mat& photo) {
   for (int i = 0; i < std::min(photo.channels(), 3); ++i) {
     cv::Mat channel;
     cv::extractChannel(photo, channel, i);
-    phase.Add(std::string("mean_") + kChannelNames[i], cv::mean(channel)[0] * 255 / full);
-    phase.Add(std::string("clipped_") + kChannelNames[i],
-              cv::countNonZero(channel >= full) / static_cast<double>(channel.total()));
+    const cv::Mat clipped = channel >= full;
+    phase.Add(std::string("mean_") + kChannelNames[i], cv::mean(channel)[0] * 255 / full)
+        .Trust({OfMeanLevel(channel, 255 / full)});
+    phase
+        .Add(std::string("clipped_") + kChannelNames[i],
+             cv::countNonZero(clipped) / static_cast<double>(clipped.total()))
+        .Trust({OfShare(clipped)});
   }
 }
 
@@ -46,8 +50,8 @@ class FlashFinding : public Finding {
       const Reading* const level = record.phase.Find(std::string("mean_") + channel);
       const Reading* const clipped = record.phase.Find(std::string("clipped_") + channel);
       if (level == nullptr || level->values.empty()) continue;
-      text += Format("%-5s  mean %.2f%s, clipped %.2f %%%s\n", channel, level->value(), LimitText(*level).c_str(),
-                     100 * clipped->value(), LimitText(*clipped).c_str());
+      text += Format("%-5s  mean %s%s, clipped %.2f %%%s\n", channel, ValueText(*level, 2).c_str(),
+                     LimitText(*level).c_str(), 100 * clipped->value(), LimitText(*clipped).c_str());
     }
     return text;
   }

@@ -27,20 +27,41 @@ cv::Matx33d Root(const cv::Matx33d& covariance) {
   return root;
 }
 
+// Half the interval in which a codec's rounding leaves the mean, whose blocks noise spreads over its steps.
+double RoundingOf(double step, double noise) {
+  if (step == 0) return 0;
+  const double spread = noise / step;
+  return step / 2 * std::exp(-2 * CV_PI * CV_PI * spread * spread);
+}
+
+// What the rounding of luma and both chromas may add (ITU-T T.871), in the order of the stored channels: blue first.
+cv::Vec3d RgbOf(double luma, double blue, double red) {
+  return {luma + 1.772 * blue, luma - 0.344136 * blue - 0.714136 * red, luma + 1.402 * red};
+}
+
 }  // namespace
 
-std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean,
-                                        std::uint64_t seed) {
+std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean, std::uint64_t seed,
+                                        const CodecSteps& codec) {
+  constexpr double kBlockPx = 8;
+  constexpr double kChromaBlockPx = 16;  // of halved chroma
+  const double noise = std::sqrt(cv::trace(CovarianceOfMean(pixels, 0)) / 3 * static_cast<double>(pixels.total()));
+  const double luma = RoundingOf(codec.luma, noise / kBlockPx);
+  const double chroma = RoundingOf(codec.chroma, noise / kChromaBlockPx);
   const double share = static_cast<double>(pixels.total()) / area;
   const cv::Matx33d root = Root(CovarianceOfMean(pixels, 0) * share);
   cv::RNG random(seed);
   std::vector<cv::Vec3d> draws;
   for (int i = 0; i < kDraws; ++i) {
-    cv::Vec3d noise;
+    cv::Vec3d normal;
     cv::Vec3d cut;
-    for (int k = 0; k < 3; ++k) noise[k] = random.gaussian(1);
+    for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
     for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
-    draws.push_back(Levels(mean) + cut + root * noise);
+    draws.push_back(Levels(mean) + cut + root * normal);
+    if (codec.luma == 0) continue;
+    cv::Vec3d off;
+    for (int k = 0; k < 3; ++k) off[k] = random.uniform(-1.0, 1.0);
+    draws.back() += RgbOf(luma * off[0], chroma * off[1], chroma * off[2]);
   }
   return draws;
 }

@@ -5,6 +5,7 @@
 #include <opencv2/core.hpp>
 #include <vector>
 
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/uncertainty.h"
 
 namespace qv {
@@ -14,8 +15,9 @@ namespace qv {
 ///
 /// @param pixels  CV_8UC3, channels in the order of `mean`, from within the patch.
 /// @param area    pixels that the mean was taken over.
-std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean,
-                                        std::uint64_t seed);
+/// @param codec   by how much the photo's file rounds the means of its blocks.
+std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean, std::uint64_t seed,
+                                        const CodecSteps& codec = {});
 
 /// Of a figure of one patch, and of a figure of a patch and its standard.
 using ColourFigure = std::function<double(const cv::Vec3d&)>;

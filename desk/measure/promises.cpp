@@ -107,7 +107,7 @@ const std::vector<Promise>& Promises() {
       {"film_settling", kAtMost, 1, " frame interval", "settling time in films with up to 1 % noise, largest error"},
       {"film_pulse", kAtMost, 0.15, " of a frame", "width of pulses of three frames and more, largest error"},
       {"film_lost", kAtLeast, 100, " %", "lost frames counted, and no other"},
-      {"coverage", kAtLeast, 93, " %", "truths within the expanded uncertainty, all rows but JPEG 75 together"},
+      {"coverage", kAtLeast, 93, " %", "truths within the expanded uncertainty, all rows but the known misses together"},
       {"doubts_caught", kAtLeast, 90, " %",
        "own MTF50 off by over 5 % (noise, light, clipping, view) that are doubted"},
       {"doubts_false", kAtMost, 1, " %", "good own MTF50 doubted: noise to 1 %, light falling by 10 % at most"},

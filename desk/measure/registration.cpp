@@ -9,6 +9,7 @@
 #include "desk/measure/areas.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/load.h"
+#include "desk/measure/residual_trust.h"
 #include "desk/measure/robust_map.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
@@ -128,11 +129,14 @@ class RegistrationFinding : public Finding {
  public:
   std::string Report(const Record& record) const override {
     const auto value = [&](const char* figure) { return record.phase.Find(figure)->value(); };
+    const auto text = [&](const char* figure, int decimals) {
+      return ValueText(*record.phase.Find(figure), decimals) + LimitText(*record.phase.Find(figure));
+    };
     const std::vector<double>& m = record.phase.Find("matrix")->values;
     return Format("matches    %.0f good, %.0f agree with the map\n", value("good_matches"), value("agreeing_matches")) +
-           Format("shift      %.2f columns, %.2f rows\n", value("shift_columns"), value("shift_rows")) +
-           Format("turn       %.3f degrees counter-clockwise\n", value("turn")) +
-           Format("scale      %.4f, stretch %.4f\n", value("scale"), value("stretch")) +
+           "shift      " + text("shift_columns", 2) + " columns, " + text("shift_rows", 2) + " rows\n" + "turn       " +
+           text("turn", 3) + " degrees counter-clockwise\n" + "scale      " + text("scale", 4) + ", stretch " +
+           text("stretch", 4) + "\n" +
            Format("matrix     %11.6f %11.6f %11.3f\n           %11.6f %11.6f %11.3f\n", m[0], m[1], m[2], m[3], m[4],
                   m[5]) +
            ReportRobust(record);
@@ -220,6 +224,7 @@ class Registration : public Measurement {
     Collect(record.phase, finding->unwarp);
     const RobustMap robust = FindRobustMap(tester, reference, image);
     CollectRobust(record.phase, finding->unwarp, robust);
+    TrustMaps(record.phase, reference, image, finding->unwarp.matrix, robust);
     if (request.parameters.at("map") == "fixed") {
       LookAtFixed(record, robust);
       return finding;

@@ -14,6 +14,8 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <functional>
+#include <opencv2/core/utility.hpp>
 #include <opencv2/imgproc.hpp>
 
 namespace qv {
@@ -62,22 +64,171 @@ std::vector<float> Sampled(const cv::Mat& map, Value&& value) {
   return values;
 }
 
+// Grey levels as they are stored, read row by row in levels of 255.
+class Photo {
+ public:
+  explicit Photo(const cv::Mat& photo) : unit_(photo.depth() == CV_16U ? 1.0f / 257 : 1.0f) {
+    CV_Assert(!photo.empty() && (photo.depth() == CV_8U || photo.depth() == CV_16U));
+    if (photo.channels() == 1) {
+      grey_ = photo;
+    } else {
+      cv::cvtColor(photo, grey_, photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
+    }
+  }
+
+  int rows() const { return grey_.rows; }
+  int cols() const { return grey_.cols; }
+  cv::Size size() const { return grey_.size(); }
+  double step() const { return unit_; }  // between two levels
+
+  /// The levels from `first` on, as many as `out` has.
+  void Read(int row, int first, std::vector<float>& out) const {
+    if (grey_.depth() == CV_8U) {
+      const auto* const levels = grey_.ptr<std::uint8_t>(row) + first;
+      for (std::size_t i = 0; i < out.size(); ++i) out[i] = levels[i];
+    } else {
+      const auto* const levels = grey_.ptr<std::uint16_t>(row) + first;
+      for (std::size_t i = 0; i < out.size(); ++i) out[i] = unit_ * levels[i];
+    }
+  }
+
+ private:
+  cv::Mat grey_;
+  float unit_;
+};
+
+// Where a line of so many values falls when it is shrunk or enlarged to another number.
+struct Span {
+  int first = 0;
+  double first_share = 1;  // of the first value
+  int last = 0;
+  double last_share = 1;
+};
+
+std::vector<Span> SpansOf(int from, int to) {
+  std::vector<Span> spans(to);
+  const double scale = static_cast<double>(from) / to;
+  for (int i = 0; i < to; ++i) {
+    const double begin = i * scale;
+    const double end = std::min((i + 1) * scale, static_cast<double>(from));
+    spans[i].first = std::min(static_cast<int>(begin), from - 1);
+    spans[i].last = std::max(static_cast<int>(std::ceil(end)) - 1, spans[i].first);
+    spans[i].first_share = spans[i].first + 1 - begin;
+    spans[i].last_share = end - spans[i].last;
+    if (spans[i].first == spans[i].last) spans[i].first_share = end - begin;
+  }
+  return spans;
+}
+
+// Means over blocks that need not be of whole pixels.
+cv::Mat BlockMeans(const Photo& photo, cv::Size size) {
+  const std::vector<Span> across = SpansOf(photo.cols(), size.width);
+  const std::vector<Span> down = SpansOf(photo.rows(), size.height);
+  cv::Mat sums = cv::Mat::zeros(size, CV_64F);
+  std::vector<float> levels(photo.cols());
+  std::vector<double> row_sums(size.width);
+  int done = -1;  // row that row_sums are of: two blocks may share it
+  for (int y = 0; y < size.height; ++y) {
+    auto* const out = sums.ptr<double>(y);
+    for (int row = down[y].first; row <= down[y].last; ++row) {
+      if (row != done) {
+        photo.Read(row, 0, levels);
+        for (int x = 0; x < size.width; ++x) {
+          const Span& span = across[x];
+          float whole = 0;  // of small whole numbers, or near it
+          for (int i = span.first + 1; i < span.last; ++i) whole += levels[i];
+          row_sums[x] = whole + span.first_share * levels[span.first] +
+                        (span.last > span.first ? span.last_share * levels[span.last] : 0.0);
+        }
+        done = row;
+      }
+      const double share = row == down[y].first ? down[y].first_share : row == down[y].last ? down[y].last_share : 1;
+      for (int x = 0; x < size.width; ++x) out[x] += share * row_sums[x];
+    }
+  }
+  cv::Mat means;
+  sums.convertTo(means, CV_32F, 1.0 * size.area() / (1.0 * photo.rows() * photo.cols()));
+  return means;
+}
+
+// A picture enlarged by linear interpolation, row by row in their order: as cv::resize does it, to the bit.
+class Enlarged {
+ public:
+  Enlarged(const cv::Mat& picture, cv::Size size)
+      : picture_(picture), size_(size), near_(size.width), row_(size.width) {
+    const double scale = static_cast<double>(picture.cols) / size.width;
+    for (int x = 0; x < size.width; ++x) {
+      auto at = static_cast<float>((x + 0.5) * scale - 0.5);
+      int left = cvFloor(at);
+      at -= static_cast<float>(left);
+      if (left < 0) at = static_cast<float>(left = 0);
+      if (left >= picture.cols - 1) {
+        left = picture.cols - 1;
+        at = 0;
+      }
+      near_[x] = {left, at};
+    }
+  }
+
+  const std::vector<float>& Row(int y) {
+    auto at = static_cast<float>((y + 0.5) * (static_cast<double>(picture_.rows) / size_.height) - 0.5);
+    const int above = cvFloor(at);
+    at -= static_cast<float>(above);
+    const float rest = 1.0f - at;
+    const std::vector<float>& first = Widened(std::clamp(above, 0, picture_.rows - 1));
+    const std::vector<float>& second = Widened(std::clamp(above + 1, 0, picture_.rows - 1));
+    float* const out = row_.data();
+    for (int x = 0; x < size_.width; ++x) out[x] = first[x] * rest + second[x] * at;
+    return row_;
+  }
+
+ private:
+  const std::vector<float>& Widened(int row) {
+    std::vector<float>& widened = widened_[row % 2];
+    if (held_[row % 2] == row) return widened;
+    held_[row % 2] = row;
+    widened.resize(size_.width);
+    const auto* const values = picture_.ptr<float>(row);
+    for (int x = 0; x < size_.width; ++x) {
+      const auto& [left, share] = near_[x];
+      const float right = left + 1 < picture_.cols ? values[left + 1] : values[left];
+      widened[x] = values[left] * (1.0f - share) + right * share;
+    }
+    return widened;
+  }
+
+  cv::Mat picture_;
+  cv::Size size_;
+  std::vector<std::pair<int, float>> near_;  // by column: the left neighbour, and the right one's share
+  std::vector<float> row_;
+  std::array<std::vector<float>, 2> widened_;
+  std::array<int, 2> held_ = {-1, -1};
+};
+
 // ---- 1. Fall-off and noise ------------------------------------------------------------------------------------------
 
 constexpr int kTerms = 15;  // of x^i y^j, i + j <= 4
 
-std::array<double, kTerms> Terms(double x, double y) {
-  std::array<double, kTerms> terms = {};
+using TermVector = cv::Vec<double, kTerms>;
+
+TermVector Terms(double x, double y) {
+  TermVector terms;
   int k = 0;
+  double of_x = 1;
   for (int i = 0; i <= 4; ++i) {
-    for (int j = 0; i + j <= 4; ++j) terms[k++] = std::pow(x, i) * std::pow(y, j);
+    double both = of_x;
+    for (int j = 0; i + j <= 4; ++j) {
+      terms[k++] = both;
+      both *= y;
+    }
+    of_x *= x;
   }
   return terms;
 }
 
 // A surface over -1 to 1 in both directions.
 struct Surface {
-  cv::Mat factors;  // of the terms
+  TermVector factors;
 
   // Factors of 1, x, ... x^4 along the line at y.
   std::array<float, 5> AtRow(double y) const {
@@ -85,7 +236,11 @@ struct Surface {
     int k = 0;
     for (int i = 0; i <= 4; ++i) {
       double sum = 0;
-      for (int j = 0; i + j <= 4; ++j) sum += factors.at<double>(k++) * std::pow(y, j);
+      double of_y = 1;
+      for (int j = 0; i + j <= 4; ++j) {
+        sum += factors[k++] * of_y;
+        of_y *= y;
+      }
       row[i] = static_cast<float>(sum);
     }
     return row;
@@ -97,70 +252,102 @@ struct Surface {
 
 double Place(int i, int count) { return (2 * i + 1.0) / count - 1; }
 
+// Weighted least squares by the normal equations: the terms are few, and their places alike.
+TermVector FitTerms(const std::vector<TermVector>& terms, const std::vector<double>& levels,
+                    const std::vector<double>& weights) {
+  cv::Matx<double, kTerms, kTerms> products = cv::Matx<double, kTerms, kTerms>::zeros();
+  TermVector sums;
+  for (std::size_t i = 0; i < terms.size(); ++i) {
+    if (weights[i] == 0) continue;
+    const TermVector weighted = terms[i] * weights[i];
+    sums += weighted * levels[i];
+    for (int k = 0; k < kTerms; ++k) {
+      for (int j = 0; j <= k; ++j) products(k, j) += weighted[k] * terms[i][j];
+    }
+  }
+  for (int k = 0; k < kTerms; ++k) {
+    for (int j = k + 1; j < kTerms; ++j) products(k, j) = products(j, k);
+  }
+  return products.solve(sums, cv::DECOMP_SVD);
+}
+
 // A smooth surface through the blocks; those far below or above it are left out in turn.
 Surface FitSurface(const cv::Mat& blocks) {
-  const int count = static_cast<int>(blocks.total());
-  cv::Mat terms(count, kTerms, CV_64F);
-  cv::Mat levels(count, 1, CV_64F);
-  for (int i = 0; i < count; ++i) {
-    const auto at = Terms(Place(i % blocks.cols, blocks.cols), Place(i / blocks.cols, blocks.rows));
-    for (int k = 0; k < kTerms; ++k) terms.at<double>(i, k) = at[k];
-    levels.at<double>(i) = blocks.at<float>(i / blocks.cols, i % blocks.cols);
+  std::vector<TermVector> terms;
+  std::vector<double> levels;
+  for (int i = 0; i < static_cast<int>(blocks.total()); ++i) {
+    terms.push_back(Terms(Place(i % blocks.cols, blocks.cols), Place(i / blocks.cols, blocks.rows)));
+    levels.push_back(blocks.at<float>(i / blocks.cols, i % blocks.cols));
   }
-  cv::Mat weights = cv::Mat::ones(count, 1, CV_64F);
+  std::vector<double> weights(terms.size(), 1);
+  std::vector<double> left(terms.size());
   Surface surface;
   for (int round = 0; round < 8; ++round) {
-    cv::Mat weighted = terms.clone();
-    for (int k = 0; k < kTerms; ++k) weighted.col(k) = weighted.col(k).mul(weights);
-    cv::solve(weighted.t() * terms, weighted.t() * levels, surface.factors, cv::DECOMP_SVD);
-    const cv::Mat left = levels - terms * surface.factors;
+    surface.factors = FitTerms(terms, levels, weights);
     std::vector<float> off;
-    for (int i = 0; i < count; ++i) off.push_back(static_cast<float>(std::abs(left.at<double>(i))));
+    for (std::size_t i = 0; i < terms.size(); ++i) {
+      left[i] = std::abs(levels[i] - terms[i].dot(surface.factors));
+      off.push_back(static_cast<float>(left[i]));
+    }
     const double scale = std::max(4.685 * 1.4826 * MedianOf(off), 1e-6);
-    for (int i = 0; i < count; ++i) {  // Tukey's biweight
-      const double u = std::min(std::abs(left.at<double>(i)) / scale, 1.0);
-      weights.at<double>(i) = (1 - u * u) * (1 - u * u);
+    for (std::size_t i = 0; i < terms.size(); ++i) {  // Tukey's biweight
+      const double u = std::min(left[i] / scale, 1.0);
+      weights[i] = (1 - u * u) * (1 - u * u);
     }
   }
   return surface;
 }
 
 // Standard deviation of a pixel by tiles, from second differences of neighbours: gradients and most edges do not count.
-cv::Mat NoiseByTiles(const cv::Mat& grey) {
-  const cv::Size tiles(std::clamp(grey.cols / 60, 1, 12), std::clamp(grey.rows / 60, 1, 9));
+cv::Mat NoiseByTiles(const Photo& photo) {
+  const cv::Size tiles(std::clamp(photo.cols() / 60, 1, 12), std::clamp(photo.rows() / 60, 1, 9));
   cv::Mat noise(tiles, CV_32F);
   for (int i = 0; i < tiles.area(); ++i) {
     const int x = i % tiles.width;
     const int y = i / tiles.width;
-    const cv::Rect tile(cv::Point(x * grey.cols / tiles.width, y * grey.rows / tiles.height),
-                        cv::Point((x + 1) * grey.cols / tiles.width, (y + 1) * grey.rows / tiles.height));
-    const cv::Mat part = grey(tile);
+    const cv::Rect tile(cv::Point(x * photo.cols() / tiles.width, y * photo.rows() / tiles.height),
+                        cv::Point((x + 1) * photo.cols() / tiles.width, (y + 1) * photo.rows() / tiles.height));
     std::vector<float> off;
-    const int step = std::max(1, part.rows / 48);
-    for (int row = 0; row < part.rows; row += step) {
-      const auto* const v = part.ptr<float>(row);
-      for (int c = 4; c + 4 < part.cols; c += 3) off.push_back(std::abs(v[c] - 0.5f * (v[c - 4] + v[c + 4])));
+    std::vector<float> v(tile.width);
+    const int step = std::max(1, tile.height / 48);
+    for (int row = 0; row < tile.height; row += step) {
+      photo.Read(tile.y + row, tile.x, v);
+      for (int c = 4; c + 4 < tile.width; c += 3) off.push_back(std::abs(v[c] - 0.5f * (v[c - 4] + v[c + 4])));
     }
     noise.at<float>(y, x) = static_cast<float>(1.4826 * MedianOf(off) / std::sqrt(1.5));
   }
   return noise;
 }
 
+// So many rows are worked on together: they stay in the nearest memory, and threads share them out.
+constexpr int kStrip = 64;
+
+void ForEachStrip(int rows, const std::function<void(int first, int end, int strip)>& work) {
+  cv::parallel_for_({0, (rows + kStrip - 1) / kStrip}, [&](const cv::Range& strips) {
+    for (int i = strips.start; i < strips.end; ++i) work(i * kStrip, std::min((i + 1) * kStrip, rows), i);
+  });
+}
+
 // Departures from the surface over the noise there.
-cv::Mat OverNoise(const cv::Mat& grey, const Surface& surface, const cv::Mat& noise) {
-  cv::Mat relative;
-  cv::resize(1 / noise, relative, grey.size(), 0, 0, cv::INTER_LINEAR);
-  const auto step = static_cast<float>(2.0 / grey.cols);
-  const auto first = static_cast<float>(Place(0, grey.cols));
-  for (int row = 0; row < grey.rows; ++row) {
-    const auto factors = surface.AtRow(Place(row, grey.rows));
-    const auto* const levels = grey.ptr<float>(row);
-    auto* const out = relative.ptr<float>(row);
-    for (int column = 0; column < grey.cols; ++column) {
-      const float x = first + step * static_cast<float>(column);
-      out[column] *= levels[column] - Surface::Value(factors, x);
+cv::Mat OverNoise(const Photo& photo, const Surface& surface, const cv::Mat& noise) {
+  const cv::Mat inverse = 1 / noise;
+  cv::Mat relative(photo.size(), CV_32F);
+  const auto step = static_cast<float>(2.0 / photo.cols());
+  const auto first = static_cast<float>(Place(0, photo.cols()));
+  ForEachStrip(photo.rows(), [&](int begin, int end, int) {
+    Enlarged factor(inverse, photo.size());
+    std::vector<float> levels(photo.cols());
+    for (int row = begin; row < end; ++row) {
+      const auto factors = surface.AtRow(Place(row, photo.rows()));
+      photo.Read(row, 0, levels);
+      const float* const scale = factor.Row(row).data();
+      auto* const out = relative.ptr<float>(row);
+      for (int column = 0; column < photo.cols(); ++column) {
+        const float x = first + step * static_cast<float>(column);
+        out[column] = scale[column] * (levels[column] - Surface::Value(factors, x));
+      }
     }
-  }
+  });
   return relative;
 }
 
@@ -197,42 +384,116 @@ Pyramid Build(const cv::Mat& relative) {
   return pyramid;
 }
 
-// The ground about spots of a level's size: from two levels up, where the wide Gaussian is a narrow one.
+// The ground about spots of a level's size, as it is to be enlarged: from two levels up, where the wide Gaussian is a
+// narrow one.
 cv::Mat GroundOf(const Pyramid& pyramid, int level, double sigma) {
   const int up = std::min(level + 2, static_cast<int>(pyramid.levels.size()) - 1);
   cv::Mat ground;
   const double there = kWider * sigma / std::ldexp(1.0, up - level);
   cv::GaussianBlur(pyramid.levels[up], ground, {}, there, there, cv::BORDER_REFLECT);
-  cv::resize(ground, ground, pyramid.levels[level].size(), 0, 0, cv::INTER_LINEAR);
   return ground;
 }
 
-bool IsLeast(const cv::Mat& response, int row, int column) {
-  for (int i = std::max(row - 1, 0); i <= std::min(row + 1, response.rows - 1); ++i) {
-    for (int j = std::max(column - 1, 0); j <= std::min(column + 1, response.cols - 1); ++j) {
-      if (response.at<float>(i, j) < response.at<float>(row, column)) return false;
+// Of some rows of a picture, the row before and the row after besides where there are such.
+bool IsLeast(const cv::Mat& rows, int row, int column) {
+  for (int i = std::max(row - 1, 0); i <= std::min(row + 1, rows.rows - 1); ++i) {
+    for (int j = std::max(column - 1, 0); j <= std::min(column + 1, rows.cols - 1); ++j) {
+      if (rows.at<float>(i, j) < rows.at<float>(row, column)) return false;
     }
   }
   return true;
 }
 
-void AddMinima(const cv::Mat& response, int level, double sigma, double least_depth, std::vector<Minimum>& minima) {
-  const double deviations = DeviationsFor(response.total());
-  std::vector<float> off =
-      Sampled(response, [&](int row, int column) { return std::abs(response.at<float>(row, column)); });
-  const double noise = std::max({1.4826 * MedianOf(off), least_depth / deviations, 1e-9});
-  const auto limit = static_cast<float>(-deviations * noise);
-  const int rim = cvCeil(2 * sigma);
-  for (int row = 0; row < response.rows; ++row) {
-    const auto* const values = response.ptr<float>(row);
-    const double row_noise = noise * (row < rim || row >= response.rows - rim ? std::sqrt(2.0) : 1);
-    for (int column = 0; column < response.cols; ++column) {
-      if (values[column] >= limit) continue;
-      // The picture goes on mirrored: at its rim each noisy pixel counts twice.
-      const double here = row_noise * (column < rim || column >= response.cols - rim ? std::sqrt(2.0) : 1);
-      if (values[column] >= -deviations * here || !IsLeast(response, row, column)) continue;
-      minima.push_back({level, sigma, {column, row}, -values[column], -values[column] / here / deviations});
+// What a strip of a level's response shows.
+struct Strip {
+  std::vector<Minimum> minima;
+  std::vector<float> samples;  // sizes, of every so many-th value
+};
+
+// One size of Gaussian, held against the ground.
+class SizeSearch {
+ public:
+  SizeSearch(const Pyramid& pyramid, int level, double sigma)
+      : picture_(pyramid.levels[level]), level_(level), sigma_(sigma), ground_(GroundOf(pyramid, level, sigma)) {}
+
+  /// Minima of the response that lie below `loose`, and every so many-th value's size, in strips.
+  std::vector<Strip> Look(float loose) const {
+    std::vector<Strip> strips((picture_.rows + kStrip - 1) / kStrip);
+    ForEachStrip(picture_.rows, [&](int begin, int end, int i) { LookAt(begin, end, loose, strips[i]); });
+    return strips;
+  }
+
+  cv::Size size() const { return picture_.size(); }
+
+ private:
+  void LookAt(int begin, int end, float loose, Strip& strip) const {
+    const int top = std::max(begin - 1, 0);
+    const int bottom = std::min(end + 1, picture_.rows);
+    const int side = 2 * cvCeil(2.5 * sigma_) + 1;
+    cv::Mat response;
+    cv::GaussianBlur(picture_.rowRange(top, bottom), response, {side, side}, sigma_, sigma_, cv::BORDER_REFLECT);
+    Enlarged ground(ground_, picture_.size());
+    for (int row = top; row < bottom; ++row) {
+      auto* const values = response.ptr<float>(row - top);
+      const float* const about = ground.Row(row).data();
+      for (int i = 0; i < response.cols; ++i) values[i] -= about[i];
     }
+    const std::size_t step = picture_.total() / 100000 * 2 + 1;  // odd, so that columns change from row to row
+    const auto width = static_cast<std::size_t>(picture_.cols);
+    for (std::size_t i = (begin * width + step - 1) / step * step; i < end * width; i += step) {
+      strip.samples.push_back(
+          std::abs(response.at<float>(static_cast<int>(i / width) - top, static_cast<int>(i % width))));
+    }
+    for (int row = begin; row < end; ++row) {
+      const auto* const values = response.ptr<float>(row - top);
+      for (int first = 0; first < response.cols; first += kRun) {
+        const int last = std::min(first + kRun, response.cols);
+        int any = 0;
+        for (int i = first; i < last; ++i) any |= static_cast<int>(values[i] < loose);
+        for (int i = first; any != 0 && i < last; ++i) {
+          if (values[i] >= loose || !IsLeast(response, row - top, i)) continue;
+          strip.minima.push_back({level_, sigma_, {i, row}, -values[i], 0});
+        }
+      }
+    }
+  }
+
+  static constexpr int kRun = 64;  // of pixels that are looked at one by one only where some is low
+
+  cv::Mat picture_;
+  int level_;
+  double sigma_;
+  cv::Mat ground_;
+};
+
+// Minima deeper than noise makes them. How deep that is only the whole response tells; at first it is guessed from a
+// white picture's, and looked again where that was too deep.
+void AddMinima(const SizeSearch& search, double sigma, double least_depth, double white, std::vector<Minimum>& minima) {
+  const double deviations = DeviationsFor(search.size().area());
+  constexpr double kCautious = 0.6;
+  double loose = -kCautious * std::max(deviations * white, least_depth);
+  for (;;) {
+    const std::vector<Strip> strips = search.Look(static_cast<float>(loose));
+    std::vector<float> off;
+    for (const Strip& strip : strips) off.insert(off.end(), strip.samples.begin(), strip.samples.end());
+    const double noise = std::max({1.4826 * MedianOf(off), least_depth / deviations, 1e-9});
+    if (-deviations * noise > loose) {
+      loose = -kCautious * deviations * noise;
+      continue;
+    }
+    const auto limit = static_cast<float>(-deviations * noise);
+    const int rim = cvCeil(2 * sigma);
+    const auto at_rim = [rim](int at, int count) { return at < rim || at >= count - rim ? std::sqrt(2.0) : 1; };
+    for (const Strip& strip : strips) {
+      for (Minimum m : strip.minima) {
+        // The picture goes on mirrored: at its rim each noisy pixel counts twice.
+        const double here = noise * at_rim(m.at.y, search.size().height) * at_rim(m.at.x, search.size().width);
+        if (-m.response >= limit || -m.response >= -deviations * here) continue;
+        m.score = m.response / here / deviations;
+        minima.push_back(m);
+      }
+    }
+    return;
   }
 }
 
@@ -240,11 +501,9 @@ std::vector<Minimum> FindMinima(const Pyramid& pyramid, double least_depth) {
   std::vector<Minimum> minima;
   for (int level = 0; level < std::min(kLevels, static_cast<int>(pyramid.levels.size())); ++level) {
     for (const double sigma : SigmasAt(level)) {
-      cv::Mat response;
-      const int side = 2 * cvCeil(2.5 * sigma) + 1;
-      cv::GaussianBlur(pyramid.levels[level], response, {side, side}, sigma, sigma, cv::BORDER_REFLECT);
-      response -= GroundOf(pyramid, level, sigma);
-      AddMinima(response, level, sigma, least_depth, minima);
+      // White noise of one a pixel keeps so much under the Gaussian.
+      const double white = pyramid.noise[level] / (2 * sigma * std::sqrt(CV_PI));
+      AddMinima(SizeSearch(pyramid, level, sigma), sigma, least_depth, white, minima);
     }
   }
   std::sort(minima.begin(), minima.end(), [](const Minimum& a, const Minimum& b) { return a.score > b.score; });
@@ -378,16 +637,40 @@ class Regions {
   std::vector<std::pair<cv::Point2d, double>> masses_;  // places, and depths times pixels
 };
 
-cv::Mat GreyLevels(const cv::Mat& photo) {
-  CV_Assert(!photo.empty() && (photo.depth() == CV_8U || photo.depth() == CV_16U));
-  cv::Mat grey;
-  if (photo.channels() == 1) {
-    grey = photo;
-  } else {
-    cv::cvtColor(photo, grey, photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
+// The photo without its light's fall-off.
+struct Target {
+  cv::Mat relative;      // departures over the noise there
+  cv::Mat share;         // the noise over the light, by blocks
+  double shrink = 1;     // blocks to a pixel
+  bool stepped = false;  // noise is less than a step of the levels: rounding makes edges of its own
+
+  float ShareAt(cv::Point2d at) const {
+    return share.at<float>(std::clamp(static_cast<int>(at.y * shrink), 0, share.rows - 1),
+                           std::clamp(static_cast<int>(at.x * shrink), 0, share.cols - 1));
   }
-  grey.convertTo(grey, CV_32F, photo.depth() == CV_16U ? 1.0 / 257 : 1.0);
-  return grey;
+};
+
+Target LookAtTarget(const Photo& photo) {
+  Target target;
+  target.shrink = std::min(1.0, 128.0 / std::max(photo.cols(), photo.rows()));
+  const cv::Mat blocks = BlockMeans(
+      photo, {std::max(cvRound(photo.cols() * target.shrink), 1), std::max(cvRound(photo.rows() * target.shrink), 1)});
+  const Surface surface = FitSurface(blocks);
+  cv::Mat noise = NoiseByTiles(photo);
+  // A spot must then be deeper than the edges that rounding makes.
+  target.stepped = cv::countNonZero(noise < 0.75 * photo.step()) * 2 > noise.size().area();
+  noise = cv::max(noise, 0.5 * photo.step());
+  cv::resize(noise, noise, blocks.size(), 0, 0, cv::INTER_LINEAR);
+  target.relative = OverNoise(photo, surface, noise);
+  target.share = noise;
+  for (int row = 0; row < target.share.rows; ++row) {
+    const auto factors = surface.AtRow(Place(row, target.share.rows));
+    for (int column = 0; column < target.share.cols; ++column) {
+      target.share.at<float>(row, column) /=
+          Surface::Value(factors, static_cast<float>(Place(column, target.share.cols)));
+    }
+  }
+  return target;
 }
 
 }  // namespace
@@ -395,35 +678,14 @@ cv::Mat GreyLevels(const cv::Mat& photo) {
 double Spot::diameter_px() const { return 2 * std::sqrt(area_px / CV_PI); }
 
 SpotFinding FindSpots(const cv::Mat& photo) {
-  const cv::Mat grey = GreyLevels(photo);
-  cv::Mat blocks;
-  const double shrink = std::min(1.0, 128.0 / std::max(grey.cols, grey.rows));
-  cv::resize(grey, blocks, {std::max(cvRound(grey.cols * shrink), 1), std::max(cvRound(grey.rows * shrink), 1)}, 0, 0,
-             cv::INTER_AREA);
-  const Surface surface = FitSurface(blocks);
-  cv::Mat noise = NoiseByTiles(grey);
-  // Where noise is less than a step of the levels, rounding makes edges of its own, and a spot must be deeper than
-  // those.
-  const double step = photo.depth() == CV_16U ? 1.0 / 257 : 1.0;
-  const bool stepped = cv::countNonZero(noise < 0.75 * step) * 2 > noise.size().area();
-  noise = cv::max(noise, 0.5 * step);
-  cv::resize(noise, noise, blocks.size(), 0, 0, cv::INTER_LINEAR);
-  const cv::Mat relative = OverNoise(grey, surface, noise);
-  cv::Mat share = noise.clone();
-  for (int row = 0; row < share.rows; ++row) {
-    const auto factors = surface.AtRow(Place(row, share.rows));
-    for (int column = 0; column < share.cols; ++column) {
-      share.at<float>(row, column) /= Surface::Value(factors, static_cast<float>(Place(column, share.cols)));
-    }
-  }
-
-  SpotFinding found;
-  const Pyramid pyramid = Build(relative);
+  const Target target = LookAtTarget(Photo(photo));
+  const Pyramid pyramid = Build(target.relative);
   Regions regions(pyramid, photo.size());
-  std::vector<Minimum> minima = FindMinima(pyramid, stepped ? 1.5 : 0);
+  std::vector<Minimum> minima = FindMinima(pyramid, target.stepped ? 1.5 : 0);
+  SpotFinding found;
   found.cut_short = minima.size() > kMostMinima;
   if (found.cut_short) minima.resize(kMostMinima);
-  std::vector<float> shares(share.begin<float>(), share.end<float>());
+  std::vector<float> shares(target.share.begin<float>(), target.share.end<float>());
   found.noise = MedianOf(shares);
   for (const Minimum& minimum : minima) {
     if (regions.IsTaken(minimum)) continue;
@@ -432,9 +694,7 @@ SpotFinding FindSpots(const cv::Mat& photo) {
       break;
     }
     Spot spot = regions.Take(minimum);
-    const cv::Point at(std::clamp(static_cast<int>(spot.centre.x * shrink), 0, share.cols - 1),
-                       std::clamp(static_cast<int>(spot.centre.y * shrink), 0, share.rows - 1));
-    spot.contrast *= share.at<float>(at);
+    spot.contrast *= target.ShareAt(spot.centre);
     found.spots.push_back(spot);
     found.largest_area = std::max(found.largest_area, spot.area_px);
     found.dark_share += spot.area_px / static_cast<double>(photo.total());

@@ -29,7 +29,7 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods();
 inline constexpr char kBandsMethod[] = "four bands along the edge, t-interval";
 inline constexpr char kResamplingMethod[] = "the region's own noise, drawn again 50 times";
 inline constexpr char kPixelMethod[] = "variance of the pixels, carried through the formulas";
-inline constexpr char kMeanMethod[] = "variance of the pixels over their number";
+inline constexpr char kMeanMethod[] = "variance of blocks of pixels over their number";
 inline constexpr char kResidualMethod[] = "residuals of the fit";
 inline constexpr char kRepeatMethod[] = "spread of repeated photos, t-interval";
 
@@ -51,17 +51,21 @@ double Spread(const std::vector<double>& readings);
 /// Of a reading of which simulated errors are known: the 95 % quantile of their sizes.
 Uncertainty FromErrors(std::vector<double> errors, const char* method);
 
-/// Mean level of a single-channel picture: noise between neighbours, not the scene, over the number of pixels; rounding
-/// of what is stored is in the noise.
-Uncertainty OfMeanLevel(const cv::Mat& picture);
+/// Mean level of a single-channel picture, in so many units a level: noise between neighbouring blocks, not the scene,
+/// over their number. Rounding of what is stored, and what a codec does within a block, are in it.
+Uncertainty OfMeanLevel(const cv::Mat& picture, double unit = 1);
+
+/// Share of a picture's pixels that are not 0 (CV_8U, 0 or 255): as its mean; a count may be one off.
+Uncertainty OfShare(const cv::Mat& mask);
 
 /// Standard uncertainty of f(x) for a covariance of x, by first order differences of `step`.
-template <typename Function>
-double Propagated(const Function& f, const cv::Vec3d& x, const cv::Matx33d& covariance, double step) {
-  cv::Vec3d gradient;
-  for (int i = 0; i < 3; ++i) {
-    cv::Vec3d high = x;
-    cv::Vec3d low = x;
+template <int N, typename Function>
+double Propagated(const Function& f, const cv::Vec<double, N>& x, const cv::Matx<double, N, N>& covariance,
+                  double step) {
+  cv::Vec<double, N> gradient;
+  for (int i = 0; i < N; ++i) {
+    cv::Vec<double, N> high = x;
+    cv::Vec<double, N> low = x;
     high[i] += step;
     low[i] -= step;
     gradient[i] = (f(high) - f(low)) / (2 * step);

@@ -1,0 +1,156 @@
+#include <algorithm>
+#include <cmath>
+#include <opencv2/imgproc.hpp>
+
+#include "desk/measure/residual_trust.h"
+
+namespace qv {
+
+namespace {
+
+using Places = cv::Vec<double, 6>;  // column and row of the three marks
+
+struct Core {
+  cv::Point2d centre;
+  double noise_px = 0;   // standard uncertainty of the centre by noise
+  double module_px = 0;  // along the square's side
+};
+
+// Of levels as the search weighs them.
+cv::Mat GreyPart(const cv::Mat& photo, const cv::Rect& part) {
+  cv::Mat grey;
+  if (photo.channels() == 1) {
+    photo(part).convertTo(grey, CV_32F);
+    return grey;
+  }
+  cv::cvtColor(photo(part), grey, photo.channels() == 4 ? cv::COLOR_RGBA2GRAY : cv::COLOR_RGB2GRAY);
+  grey.convertTo(grey, CV_32F);
+  return grey;
+}
+
+float LevelAt(std::vector<float> levels, double share) {
+  const auto at = levels.begin() + static_cast<std::ptrdiff_t>(share * static_cast<double>(levels.size() - 1));
+  std::nth_element(levels.begin(), at, levels.end());
+  return *at;
+}
+
+// Of a pixel, from second differences along the rows; few of them cross an edge.
+double NoiseOf(const cv::Mat& grey) {
+  std::vector<float> off;
+  for (int row = 0; row < grey.rows; ++row) {
+    const auto* const v = grey.ptr<float>(row);
+    for (int i = 0; i + 2 < grey.cols; ++i) off.push_back(std::fabs(v[i] - 2 * v[i + 1] + v[i + 2]));
+  }
+  return off.empty() ? 0 : 1.4826 * LevelAt(off, 0.5) / std::sqrt(6.0);
+}
+
+// How dark the levels are within a circle, moved by where.
+cv::Vec3d DarknessWithin(const cv::Mat& grey, cv::Point2d middle, double radius, double light) {
+  cv::Vec3d sum;
+  for (int row = 0; row < grey.rows; ++row) {
+    for (int i = 0; i < grey.cols; ++i) {
+      const cv::Point2d off = cv::Point2d(i, row) - middle;
+      if (off.dot(off) <= radius * radius) sum += (light - grey.at<float>(row, i)) * cv::Vec3d(off.x, off.y, 1);
+    }
+  }
+  return sum;
+}
+
+std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double radius) {
+  std::vector<float> levels;
+  for (int row = 0; row < grey.rows; ++row) {
+    for (int i = 0; i < grey.cols; ++i) {
+      if (cv::norm(cv::Point2d(i, row) - middle) <= radius) levels.push_back(grey.at<float>(row, i));
+    }
+  }
+  return levels;
+}
+
+// The dark inner square, three modules wide, in the light ring about it: centre of gravity and size of what is dark
+// within 2.2 or 2.3 modules, which holds the whole square whatever its turn, and nothing of the dark frame.
+Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module) {
+  constexpr double kReach = 2.2;
+  constexpr double kSizeReach = 2.3;
+  constexpr double kSeen = 4.5;         // the paper about the mark
+  constexpr double kNoiseShare = 0.33;  // of the noise over the contrast: the circle's second moment over its weight
+  const int reach = cvCeil(kSeen * module) + 1;
+  const cv::Rect part =
+      cv::Rect(cvRound(mark.centre.x) - reach, cvRound(mark.centre.y) - reach, 2 * reach + 1, 2 * reach + 1) &
+      cv::Rect({}, photo.size());
+  if (part.width < 9 || part.height < 9) return {};
+  const cv::Mat grey = GreyPart(photo, part);
+  const std::vector<float> levels(grey.begin<float>(), grey.end<float>());
+  const double light = LevelAt(levels, 0.85);
+  const double contrast = light - LevelAt(levels, 0.15);
+  if (!(contrast > 0)) return {};
+  const cv::Point2d corner = part.tl();
+  Core core = {mark.centre, kNoiseShare * NoiseOf(grey) / contrast, 0};
+  for (int round = 0; round < 6; ++round) {
+    const cv::Vec3d dark = DarknessWithin(grey, core.centre - corner, kReach * module, light);
+    if (!(dark[2] > 0)) return {};
+    core.centre += cv::Point2d(dark[0], dark[1]) / dark[2];
+  }
+  const std::vector<float> inside = LevelsWithin(grey, core.centre - corner, kSizeReach * module);
+  if (inside.empty()) return {};
+  const double ring = LevelAt(inside, 0.85);
+  const double square = LevelAt(inside, 0.25);
+  const double dark = DarknessWithin(grey, core.centre - corner, kSizeReach * module, ring)[2];
+  core.module_px = ring > square ? std::sqrt(std::max(dark, 0.0) / (ring - square)) / 3 : 0;
+  return core;
+}
+
+cv::Point2d Right(const Places& p) { return {p[2] - p[0], p[3] - p[1]}; }
+cv::Point2d Down(const Places& p) { return {p[4] - p[0], p[5] - p[1]}; }
+
+double LegsRatio(const Places& p) { return cv::norm(Right(p)) / cv::norm(Down(p)); }
+double LegsAngle(const Places& p) {
+  return std::acos(Right(p).dot(Down(p)) / cv::norm(Right(p)) / cv::norm(Down(p))) * 180 / CV_PI;
+}
+double Turn(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 180 / CV_PI; }
+
+}  // namespace
+
+// Only one side counts: the true value lies beyond the error by 1.645 standard deviations in 5 of 100.
+Uncertainty FromKnownError(double error, double standard) {
+  constexpr double kOneSided = 1.645;
+  const double all = std::hypot(error, standard);
+  const double expanded = std::fabs(error) + kOneSided * standard;
+  return {all, expanded, all == 0 ? 1 : expanded / all, kResidualMethod};
+}
+
+void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
+  constexpr double kCorePx = 0.009;       // type B: what pixels and light leave of a centre
+  constexpr double kApartPx = 0.002;      // and of two centres' distance
+  constexpr double kCoreModulePx = 0.01;  // and of the squares' sizes
+  if (!view.complete()) return;
+  const double turn = view.turn_deg * CV_PI / 180;
+  const double upright = std::max(std::fabs(std::cos(turn)), std::fabs(std::sin(turn)));  // of a row's way through
+  Places found;
+  Places cores;
+  auto covariance = cv::Matx<double, 6, 6>::zeros();
+  double module_off = 0;
+  std::vector<Uncertainty> rows;
+  for (int i = 0; i < 3; ++i) {
+    const Mark& mark = view.marks[i];
+    const Core core = LookAtCore(photo, mark, mark.module_px * upright);
+    if (core.module_px == 0) return;
+    found[2 * i] = mark.centre.x;
+    found[2 * i + 1] = mark.centre.y;
+    cores[2 * i] = core.centre.x;
+    cores[2 * i + 1] = core.centre.y;
+    const double apart = std::hypot(kApartPx, core.noise_px);
+    covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = apart * apart;
+    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, std::hypot(kCorePx, core.noise_px)));
+    module_off += (mark.module_px - core.module_px / upright) / 3;
+  }
+  phase.Find("marks")->Trust(std::move(rows));
+  const auto trust = [&](const char* figure, double (*f)(const Places&)) {
+    phase.Find(figure)->Trust({FromKnownError(f(found) - f(cores), Propagated<6>(f, cores, covariance, 0.01))});
+  };
+  trust("legs_ratio", LegsRatio);
+  trust("legs_angle", LegsAngle);
+  trust("chart_turn", Turn);
+  phase.Find("module_size")->Trust({FromKnownError(module_off, kCoreModulePx)});
+}
+
+}  // namespace qv

@@ -1,0 +1,29 @@
+#ifndef QVTESTER_DESK_MEASURE_RESIDUAL_TRUST_H_
+#define QVTESTER_DESK_MEASURE_RESIDUAL_TRUST_H_
+
+#include <opencv2/core.hpp>
+
+#include "desk/measure/chart_view.h"
+#include "desk/measure/robust_map.h"
+
+namespace qv {
+
+// How far places and maps may be trusted, from what their fits leave over.
+
+/// Of a figure whose error is known but for this standard uncertainty, and left in it.
+Uncertainty FromKnownError(double error, double standard);
+
+/// The marks' places, module size, the legs' ratio and angle, the chart's turn: from how far the search's places lie
+/// from the centres of gravity of the marks' inner squares. Says nothing unless there are three marks. `photo` is the
+/// one that was searched, CV_8U or CV_16U.
+void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo);
+
+/// Both maps of a registration. The map of all matches: from the grey levels' residuals under it, by 64 parts of the
+/// picture. The fixed one: from how far it lies from that. Says nothing where the map of all is doubtful. Pictures are
+/// CV_8U, the maps 2 x 3, CV_64F.
+void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, const cv::Mat& fixed,
+               const RobustMap& robust);
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_RESIDUAL_TRUST_H_
