@@ -66,8 +66,7 @@ double Departure(double reading, const Json& edge) {
 void PrintMtf50() {
   const std::vector<double> blurs = Trials(1, 0) == 1 ? std::vector<double>{0.3, 0.5, 0.8, 1.2, 1.6, 2.0, 2.5, 3.0}
                                                       : std::vector<double>{0.3, 0.8, 1.2, 3.0};
-  const std::vector<double> slopes =
-      Trials(1, 0) == 1 ? std::vector<double>{3, 4, 5, 6, 7, 8} : std::vector<double>{3, 5, 7};
+  const std::vector<double> slopes = {3, 4, 5, 6, 7, 8};
   std::printf(
       "\nMTF50 without noise, upright, edges at 3 to 8 degrees, even and odd regions; units of Nyquist, 12 readings a "
       "row\n\n");
@@ -277,7 +276,7 @@ void PrintPatches() {
 void PrintLeastLight() {
   for (int level = 100; level < 200; ++level) {
     cv::Mat photo(300, 400, CV_8UC3, cv::Scalar::all(level + 1));
-    cv::circle(photo, {200, 150}, 5, cv::Scalar::all(level / 3), cv::FILLED);
+    cv::circle(photo, {200, 150}, 5, cv::Scalar::all(level / 3.0), cv::FILLED);
     cv::Mat gray;
     cv::cvtColor(photo, gray, cv::COLOR_BGR2GRAY);
     const Reading* count = nullptr;
@@ -285,7 +284,7 @@ void PrintLeastLight() {
     if (record.phase.code == QV_SUCCESS) count = record.phase.Find("blob_count");
     if (count == nullptr || count->value() < 1) continue;
     std::printf("\nBlobs are found from a mean level of %.1f on.\n", cv::mean(gray)[0]);
-    Hold("dust_light", std::round(cv::mean(gray)[0]));
+    Hold("dust_light", std::floor(cv::mean(gray)[0]));
     return;
   }
 }

@@ -69,6 +69,7 @@ struct Count {
 Count Try(const Setting& setting, double diameter, double times, bool soft, int photos) {
   Count count;
   const bool large = diameter > 100;
+  if (large && Trials(1, 0) == 0) return count;
   const cv::Size size = large ? cv::Size(4000, 3000) : cv::Size(1600, 1200);
   for (int i = 0; i < (large ? std::max(photos / 2, 1) : photos); ++i, ++count.photos) {
     cv::RNG random(i + 1);
