@@ -253,7 +253,7 @@ class Capture : public Measurement {
                                     missed_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
     }
     if (code != QV_SUCCESS) return finding;
-    DoubtView(record, finding->view, "patches");
+    DoubtView(record, finding->view, "patches", 0.015);
     TakePatches(*finding, tester);
     DoubtEvenness(record, *finding);
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));

@@ -156,10 +156,11 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
   return view;
 }
 
-void DoubtView(Record& record, const ChartView& view, const char* parts) {
-  constexpr double kMostOblique = 0.015;
-  constexpr double kMostSkewDeg = 0.9;
-  if (std::fabs(view.legs_ratio - 1) <= kMostOblique && std::fabs(view.legs_angle_deg - 90) <= kMostSkewDeg) return;
+void DoubtView(Record& record, const ChartView& view, const char* parts, double most_oblique) {
+  constexpr double kSkewDeg = 60;  // of the legs' angle that goes with so much of their ratio
+  const bool straight =
+      std::fabs(view.legs_ratio - 1) <= most_oblique && std::fabs(view.legs_angle_deg - 90) <= kSkewDeg * most_oblique;
+  if (straight) return;
   record.Say(Remark::kDoubt, "oblique",
              Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; %s may lie beside "
                     "their places",

@@ -47,8 +47,9 @@ extern const Method kScanMethod;
 
 /// A doubt where the chart is seen obliquely: what is looked for on a square lies beside its place then.
 ///
-/// @param parts  of the chart that are measured: "patches".
-void DoubtView(Record& record, const ChartView& view, const char* parts);
+/// @param parts         of the chart that are measured: "patches".
+/// @param most_oblique  how far the legs' ratio may be from 1.
+void DoubtView(Record& record, const ChartView& view, const char* parts, double most_oblique);
 
 /// The figures that DescribeChart adds.
 const std::vector<Figure>& ChartFigures();
