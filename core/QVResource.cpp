@@ -11,7 +11,9 @@
 
 namespace {
 
-// By FFmpeg alone, and under a name that is no protocol and no pattern of file names.
+// By FFmpeg alone, and under a name that is no protocol and no pattern of file names; opened files then lead to no
+// protocol but the file's. OpenCV also takes options from the environment (OPENCV_FFMPEG_CAPTURE_OPTIONS), by which its
+// owner may allow more: a host that runs for others clears it, as the program does.
 cv::VideoCapture OpenFilm(const std::string& path) {
   const RegularFile file(path.c_str());
   cv::VideoCapture video;

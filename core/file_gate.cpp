@@ -298,6 +298,8 @@ const char* RefusePicture(const Bytes& bytes, std::int64_t most) {
 
 bool StartsAsFilm(const Bytes& bytes) {
   const Header h(bytes);
+  // XML whose first comment hides a film's mark is a manifest to FFmpeg, which opens what it names.
+  if (h.Has(0, "<!") || h.Has(0, "<?")) return false;
   if (StartsAsStream(h) || h.Has(0, "\x1A\x45\xDF\xA3") || (h.Has(0, "RIFF") && h.Has(8, "AVI "))) return true;
   for (const char* box : {"ftyp", "moov", "mdat", "free", "wide", "skip", "pnot"}) {
     if (h.Has(4, box)) return true;

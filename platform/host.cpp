@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cstring>
 #include <string>
 
@@ -23,6 +24,8 @@ std::string& PreviewDirectory() {
   static std::string directory;
   return directory;
 }
+
+std::atomic<int> written{0};
 
 using platform::Descriptor;
 
@@ -81,7 +84,9 @@ int property_set(const char* key, const char* value) {
   const std::size_t length = std::strlen(value);
   if (!IsKey(key) || length >= kPropertyValueMax) return -1;
   const Descriptor store = OpenStore();
-  return store.valid() && ReplaceFile(store, key, value, length, S_IRUSR | S_IWUSR) ? 0 : -1;
+  if (!store.valid() || !ReplaceFile(store, key, value, length, S_IRUSR | S_IWUSR)) return -1;
+  ++written;
+  return 0;
 }
 
 std::string PreviewFolder() { return PreviewDirectory().empty() ? "/data/ozrlog" : PreviewDirectory(); }
@@ -91,3 +96,5 @@ std::string PreviewFolder() { return PreviewDirectory().empty() ? "/data/ozrlog"
 int SetHostPropertyStore(const char* directory) { return Put(StoreDirectory(), directory); }
 
 int SetHostPreviewFolder(const char* directory) { return Put(PreviewDirectory(), directory); }
+
+int CountHostPropertyWrites() { return written; }

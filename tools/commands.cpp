@@ -93,8 +93,9 @@ const std::vector<Command> kCommands = {
 };
 
 constexpr char kFooter[] =
-    "Exit status: 0 measured, within all limits; 1 measured, a limit broken; 2 wrong usage; 3 could not measure;\n"
-    "4 internal fault; 130 interrupted. `qvtester COMMAND --help` shows a command's options.";
+    "Exit status: 0 measured, within all limits; 1 measured, a limit broken; 2 wrong usage;\n"
+    "3 could not measure, or not to be trusted; 4 internal fault or a full disk; 130 interrupted.\n"
+    "`qvtester COMMAND --help` shows a command's options.";
 
 // Options and their values as words of their own: "--json=FILE" and "-oFILE" taken apart.
 std::vector<std::string> Separate(const std::vector<std::string>& words) {

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <filesystem>
 #include <fstream>
 #include <iostream>
 #include <memory>
@@ -23,6 +24,8 @@ Imported ImportFile(const std::string& path, Store& store) {
   if (LowerExtension(path) == ".json") {  // a record as a command wrote it
     return {1, store.Put(ParseRun(ReadWholeFile(path, kWrongUsage), Printable(path)))};
   }
+  if (!std::filesystem::is_regular_file(path))
+    throw Failure(kWrongUsage, Printable(path) + ": no such file, or none of lines");
   std::ifstream lines(path);
   if (!lines || lines.peek() == EOF) throw Failure(kWrongUsage, Printable(path) + ": can't be read, or holds no run");
   return ImportLines(lines, Printable(path), store);

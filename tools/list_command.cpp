@@ -80,9 +80,7 @@ void ListMeasurements() {
       std::cout << Format("  %-9s  %-12s  %s\n", input.optional ? "parameter" : "input", input.name, input.help);
     }
     for (const Parameter& parameter : spec.parameters) {
-      const Json initial = InitialValue(parameter);
-      std::cout << Format("  parameter  %-12s  %s%s\n", parameter.name, parameter.help,
-                          initial.is_null() ? "" : (" [" + initial.dump() + "]").c_str());
+      std::cout << Format("  parameter  %-12s  %s\n", parameter.name, HelpOf(parameter).c_str());
     }
   }
 }
@@ -99,7 +97,7 @@ CommandBody DeclareList(Options& command) {
   auto what = std::make_shared<std::string>();
   std::vector<std::string> names;
   for (const auto& [name, print] : kLists) names.push_back(name);
-  command.ChoiceArgument("WHAT", *what, names, "tests, slots, properties, codes or measurements");
+  command.ChoiceArgument("WHAT", *what, names, "What to list");
   return [what] {
     kLists.at (*what)();
     return static_cast<int>(kExitWithinLimits);

@@ -5,6 +5,9 @@
 
 int main(int argc, char** argv) {
   qv::WatchForInterrupts();
-  setenv("OPENCV_IO_ENABLE_OPENEXR", "1", 0);  // NOLINT(concurrency-mt-unsafe): no other thread reads it yet
+  // NOLINTBEGIN(concurrency-mt-unsafe): no other thread reads them yet
+  setenv("OPENCV_IO_ENABLE_OPENEXR", "1", 0);
+  unsetenv("OPENCV_FFMPEG_CAPTURE_OPTIONS");  // may let a film open other files, and the network
+  // NOLINTEND(concurrency-mt-unsafe)
   return qv::RunProgram({argv + 1, argv + argc});
 }

@@ -16,6 +16,7 @@
 #include "desk/measure/measure.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
+#include "qvtester/host_properties.h"
 #include "tools/film_progress.h"
 #include "tools/program.h"
 
@@ -42,15 +43,8 @@ std::string OptionOf(std::string name) {
   return "--" + name;
 }
 
-std::string HelpOf(const Parameter& parameter) {
-  const Json initial = InitialValue(parameter);
-  std::string help = parameter.help;
-  for (std::size_t i = 0; parameter.type == Parameter::kWord && i < parameter.words.size(); ++i) {
-    help += (i == 0 ? ": " : i + 1 < parameter.words.size() ? ", " : " or ") + parameter.words[i];
-  }
-  if (initial.is_null()) return help;
-  return help + " [" + (initial.is_string() ? initial.get<std::string>() : initial.dump()) + "]";
-}
+// Read by the test frame by frame from its file, from the start for every run.
+bool IsFilm(const InputSpec& input) { return KindOfSlot(input.slot) == SlotKind::kVideo; }
 
 void DeclareInputs(Options& command, const Spec& spec, MeasureOptions& options) {
   options.inputs.resize(spec.inputs.size());
@@ -62,7 +56,7 @@ void DeclareInputs(Options& command, const Spec& spec, MeasureOptions& options) 
       command.Text(OptionOf(input.name).c_str(), options.inputs[i], input.help, "DIR", true);
     } else {
       command.Argument(Capitals(input.name).c_str(), options.inputs[i],
-                       i == 0 ? std::string(input.help) + "; - is standard input" : input.help);
+                       i == 0 && !IsFilm(input) ? std::string(input.help) + "; - is standard input" : input.help);
     }
   }
 }
@@ -80,7 +74,11 @@ void DeclareOutputs(Options& command, const MeasuringCommand& row, MeasureOption
 Request RequestOf(const Spec& spec, const MeasureOptions& options, const CommandExtra* extra) {
   Request request;
   request.measurement = spec.name;
-  for (const std::string& input : options.inputs) {
+  for (std::size_t i = 0; i < options.inputs.size(); ++i) {
+    const std::string& input = options.inputs[i];
+    if (input == "-" && IsFilm(spec.inputs[i])) {
+      throw Failure(kWrongUsage, "-: a film is read from its file, again from the start by each run: give a path");
+    }
     if (input == "-") {
       request.inputs.emplace_back("standard input", std::string(std::istreambuf_iterator<char>(std::cin), {}));
     } else if (!input.empty()) {
@@ -133,7 +131,8 @@ std::string Verdict(const Record& record) {
                 static_cast<long long>(record.phase.end_millis - record.phase.start_millis));
 }
 
-void Tell(const Record& record, const MeasureOptions& options, const CommandExtra* extra) {
+// Why there is no result, or what to know of it.
+void Warn(const Record& record, const MeasureOptions& options) {
   if (options.verbose) {
     for (const std::string& line : record.chatter) std::cerr << Printable(line) << '\n';
   }
@@ -144,7 +143,10 @@ void Tell(const Record& record, const MeasureOptions& options, const CommandExtr
   for (const Remark& remark : record.remarks) {
     std::cerr << (remark.weight == Remark::kDoubt ? "doubt: " : "warning: ") << Printable(remark.sentence) << '\n';
   }
-  if (options.quiet) return;
+}
+
+std::string Told(const Record& record, const MeasureOptions& options, const CommandExtra* extra) {
+  if (!record.measured() || options.quiet) return "";
   std::string text;
   for (const RecordedInput& input : record.inputs) {
     text += Format("%s  %d x %d\n", Printable(input.path).c_str(), input.width, input.height);
@@ -152,11 +154,15 @@ void Tell(const Record& record, const MeasureOptions& options, const CommandExtr
   if (!options.repeats.empty()) text += Format("medians of %zu photos\n", options.repeats.size() + 1);
   text += record.finding->Report(record);
   if (extra != nullptr) text += extra->Report(record);
+  return text + Verdict(record);
+}
+
+bool TakesStandardOutput(const MeasureOptions& options, const CommandExtra* extra) {
   bool taken = options.json == "-" || options.annotate == "-";
   for (const NamedFile& output : extra == nullptr ? std::vector<NamedFile>() : extra->Outputs()) {
     taken = taken || output.path == "-";
   }
-  (taken ? std::cerr : std::cout) << text << Verdict(record);
+  return taken;
 }
 
 std::string DrawInto(Record& record, const std::string& path) {
@@ -187,23 +193,42 @@ int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* 
   const Limits limits = options.limits.empty() ? Limits() : ReadLimits(options.limits);
   if (options.verbose) ShowLogLines();
   QVTester tester;
+  const int published = CountHostPropertyWrites();
   Record record = [&] {
     const FilmProgress progress(tester, options.quiet);
     return Measure(tester, RequestOf(spec, options, extra), limits);
   }();
+  if (options.publish && record.measured() && CountHostPropertyWrites() == published) {
+    throw Failure(kWrongUsage, "--publish: nothing was written: the property store is not this user's own, or full");
+  }
   record.dut_id = options.dut;
   record.station_id = options.station;
   record.command = CommandLine();
-  Tell(record, options, extra);
+  Warn(record, options);
+  const std::string told = Told(record, options, extra);
   const std::string picture = options.annotate.empty() ? "" : DrawInto(record, options.annotate);
   // What was asked for by name comes last: one that can't be written loses none of the others.
   if (!options.json.empty()) WriteOutput(options.json, record.ToText());
   if (!picture.empty()) WriteOutput(options.annotate, picture);
   if (extra != nullptr) extra->Write(record);
+  (TakesStandardOutput(options, extra) ? std::cerr : std::cout) << told;  // a verdict is of what is on disk
   return StatusOf(record);
 }
 
 }  // namespace
+
+std::string HelpOf(const Parameter& parameter) {
+  const Json initial = InitialValue(parameter);
+  const bool number = parameter.type == Parameter::kWhole || parameter.type == Parameter::kReal;
+  if (parameter.type == Parameter::kFlag) return parameter.help;
+  return InBrackets(parameter.help,
+                    initial.is_string()   ? initial.get<std::string>()
+                    : initial.is_number() ? Format("%.6g", initial.get<double>())
+                                          : "",
+                    !parameter.words.empty() ? Listed(parameter.words)
+                    : number                 ? RangeText(parameter.low, parameter.high)
+                                             : "");
+}
 
 CommandBody MeasuringCommand::operator()(Options& command) const {
   const Spec& spec = FindMeasurement(measurement)->spec();
@@ -213,7 +238,7 @@ CommandBody MeasuringCommand::operator()(Options& command) const {
   if (flag != nullptr) command.Flag(flag, options->flag, flag_help);
   for (const Parameter& parameter : spec.parameters) {
     if (parameter.type == Parameter::kFlag) {
-      command.Flag(OptionOf(parameter.name).c_str(), options->flags[parameter.name], parameter.help);
+      command.Flag(OptionOf(parameter.name).c_str(), options->flags[parameter.name], HelpOf(parameter));
       continue;
     }
     command.Text(OptionOf(parameter.name).c_str(), options->words[parameter.name], HelpOf(parameter), parameter.value);

@@ -12,6 +12,10 @@
 namespace qv {
 
 struct MeasureOptions;
+struct Parameter;
+
+/// What help says of a parameter: meaning, words, default and range.
+std::string HelpOf(const Parameter& parameter);
 
 /// What one command adds to what all measuring commands do.
 class CommandExtra {

@@ -3,7 +3,6 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <array>
-#include <climits>
 #include <cmath>
 #include <sstream>
 
@@ -15,18 +14,58 @@ namespace qv {
 
 namespace {
 
-std::string WithDefault(const std::string& help, const std::string& value) {
-  return value.empty() ? help : help + " [" + value + "]";
-}
+using Check = std::function<std::string(const std::string&)>;
 
-std::function<std::string(const std::string&)> Within(double low, double high) {
+Check Within(double low, double high) {
   return [low, high](const std::string& text) {
     double number = NAN;
     const bool read = CLI::detail::lexical_cast(text, number);
-    return read && number >= low && number <= high ? std::string()
-                                                   : Format("%s is no number from %g to %g", text.c_str(), low, high);
+    return read && number >= low && number <= high ? "" : text + " is no number from " + RangeText(low, high);
   };
 }
+
+Check WholeWithin(int low, int high) {
+  return [low, high](const std::string& text) {
+    int number = 0;
+    const bool read = CLI::detail::lexical_cast(text, number);
+    return read && number >= low && number <= high ? "" : text + " is no whole number from " + RangeText(low, high);
+  };
+}
+
+Check OneOf(const std::vector<std::string>& words) {
+  return [words](const std::string& text) {
+    const bool known = std::find(words.begin(), words.end(), text) != words.end();
+    return known ? "" : "\"" + text + "\" is none of " + Listed(words) + DidYouMean(text, words);
+  };
+}
+
+// The parser's help, with lines that a terminal shows whole.
+class Help : public CLI::Formatter {
+ public:
+  Help() {
+    column_width(kColumn);
+    label("Positionals", "Arguments");
+    label("SUBCOMMAND", "COMMAND");
+  }
+
+  std::string make_subcommand(const CLI::App* command) const override {
+    std::ostringstream out;
+    CLI::detail::format_help(out, command->get_name(), Wrapped(command->get_description(), kWidth - kColumn), kColumn);
+    return out.str();
+  }
+  std::string make_option_opts(const CLI::Option* option) const override {
+    const bool flag = option->get_type_size() == 0;
+    return (flag || option->get_positional() ? "" : " " + option->get_type_name()) +
+           (option->get_expected_max() > 1 ? " ..." : "");
+  }
+  std::string make_option_desc(const CLI::Option* option) const override {
+    const bool told = option->get_required() && !option->get_positional();
+    return Wrapped(option->get_description() + (told ? " (required)" : ""), kWidth - kColumn);
+  }
+
+ private:
+  static constexpr std::size_t kColumn = 32, kWidth = 99;
+};
 
 bool NamesFile(const std::string& type) {
   constexpr std::array<const char*, 9> kTypes = {"FILE", "PNG", "OUT", "STORE", "DIR", "HTML", "XML", "SVG", "PHOTO"};
@@ -76,6 +115,21 @@ std::string Complaint(const CLI::App& app, const CLI::ParseError& e) {
 
 }  // namespace
 
+std::string RangeText(double low, double high) { return Format("%.7g to %.7g", low, high); }
+
+std::string Listed(const std::vector<std::string>& words) {
+  std::string list;
+  for (std::size_t i = 0; i < words.size(); ++i) {
+    list += (i == 0 ? "" : i + 1 < words.size() ? ", " : " or ") + words[i];
+  }
+  return list;
+}
+
+std::string InBrackets(const std::string& help, const std::string& initial, const std::string& range) {
+  if (initial.empty() && range.empty()) return help;
+  return help + " [" + initial + (initial.empty() || range.empty() ? "" : "; ") + range + "]";
+}
+
 void Options::Argument(const char* name, std::string& value, const std::string& help) {
   RefuseEmptyName(*command_->add_option(name, value, help)->required());
 }
@@ -88,7 +142,7 @@ void Options::Arguments(const char* name, std::vector<std::string>& values, cons
 void Options::Flag(const char* name, bool& value, const std::string& help) { command_->add_flag(name, value, help); }
 
 void Options::Text(const char* name, std::string& value, const std::string& help, const char* type, bool required) {
-  RefuseEmptyName(*command_->add_option(name, value, WithDefault(help, value))->required(required)->type_name(type),
+  RefuseEmptyName(*command_->add_option(name, value, InBrackets(help, value))->required(required)->type_name(type),
                   type);
 }
 
@@ -110,43 +164,44 @@ void Options::List(const char* name, std::vector<std::string>& values, const std
 
 void Options::Choice(const char* name, std::string& value, const std::vector<std::string>& choices,
                      const std::string& help, const char* type) {
-  command_->add_option(name, value, WithDefault(help, value))->check(CLI::IsMember(choices))->type_name(type);
+  command_->add_option(name, value, InBrackets(help, value, Listed(choices)))
+      ->check(OneOf(choices), "")
+      ->type_name(type);
 }
 
 void Options::Choice(const char* name, int& value, const std::vector<int>& choices, const std::string& help,
                      const char* type) {
-  command_->add_option(name, value, WithDefault(help, std::to_string(value)))
-      ->check(CLI::IsMember(choices))
+  std::vector<std::string> words;
+  for (const int choice : choices) words.push_back(std::to_string(choice));
+  command_->add_option(name, value, InBrackets(help, std::to_string(value), Listed(words)))
+      ->check(OneOf(words), "")
       ->type_name(type);
 }
 
 void Options::ChoiceArgument(const char* name, std::string& value, const std::vector<std::string>& choices,
                              const std::string& help) {
-  command_->add_option(name, value, help)->required()->check(CLI::IsMember(choices));
+  command_->add_option(name, value, InBrackets(help, "", Listed(choices)))->required()->check(OneOf(choices), "");
 }
 
 void Options::Number(const char* name, double& value, double low, double high, const std::string& help,
                      const char* type) {
   const std::string initial = value < low ? "" : Format("%g", value);
-  command_->add_option(name, value, WithDefault(help, initial))
-      ->check(Within(low, high), "", "finite")
+  command_->add_option(name, value, InBrackets(help, initial, RangeText(low, high)))
+      ->check(Within(low, high), "")
       ->type_name(type);
 }
 
-void Options::Number(const char* name, std::optional<double>& value, double low, double high, const std::string& help,
-                     const char* type) {
-  command_->add_option(name, value, help)->check(Within(low, high), "", "finite")->type_name(type);
+void Options::Number(const char* name, std::optional<double>& value, double low, double high,
+                     const std::string& initial, const std::string& help, const char* type) {
+  command_->add_option(name, value, InBrackets(help, initial, RangeText(low, high)))
+      ->check(Within(low, high), "")
+      ->type_name(type);
 }
 
 void Options::Whole(const char* name, int& value, int low, int high, const std::string& help, const char* type) {
-  CLI::Option* const option = command_->add_option(name, value, WithDefault(help, std::to_string(value)));
-  if (low > INT_MIN || high < INT_MAX) option->check(CLI::Range(low, high));
-  option->type_name(type);
-}
-
-void Options::Whole(const char* name, std::optional<int>& value, int low, int high, const std::string& help,
-                    const char* type) {
-  command_->add_option(name, value, help)->check(CLI::Range(low, high))->type_name(type);
+  command_->add_option(name, value, InBrackets(help, std::to_string(value), RangeText(low, high)))
+      ->check(WholeWithin(low, high), "")
+      ->type_name(type);
 }
 
 void Options::Seed(const char* name, std::uint64_t& value, const std::string& help) {
@@ -154,7 +209,7 @@ void Options::Seed(const char* name, std::uint64_t& value, const std::string& he
     const bool digits = !text.empty() && text.size() < 19 && text.find_first_not_of("0123456789") == std::string::npos;
     return digits ? std::string() : text + " is no whole number of up to 18 digits";
   };
-  command_->add_option(name, value, WithDefault(help, std::to_string(value)))->check(whole)->type_name("N");
+  command_->add_option(name, value, InBrackets(help, std::to_string(value)))->check(whole)->type_name("N");
 }
 
 CommandBody Parse(const ProgramText& text, const std::vector<Command>& commands,
@@ -164,7 +219,7 @@ CommandBody Parse(const ProgramText& text, const std::vector<Command>& commands,
   app.require_subcommand(1);
   app.footer(text.footer);
   app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::TakeLast);
-  app.get_formatter()->column_width(32);
+  app.formatter(std::make_shared<Help>());
 
   CommandBody body;
   for (const Command& row : commands) {

@@ -45,16 +45,22 @@ class Options {
                       const std::string& help);
   /// A finite number from low to high.
   void Number(const char* name, double& value, double low, double high, const std::string& help, const char* type);
-  /// Help tells its default, which stands elsewhere.
-  void Number(const char* name, std::optional<double>& value, double low, double high, const std::string& help,
-              const char* type);
+  /// Its default stands elsewhere; help tells it in these words.
+  void Number(const char* name, std::optional<double>& value, double low, double high, const std::string& initial,
+              const std::string& help, const char* type);
   void Whole(const char* name, int& value, int low, int high, const std::string& help, const char* type);
-  void Whole(const char* name, std::optional<int>& value, int low, int high, const std::string& help, const char* type);
   void Seed(const char* name, std::uint64_t& value, const std::string& help);
 
  private:
   CLI::App* command_;
 };
+
+/// "a, b or c".
+std::string Listed(const std::vector<std::string>& words);
+/// "0 to 255".
+std::string RangeText(double low, double high);
+/// "Grey level [125; 0 to 255]": help, what counts where nothing is given, and what may be given; either may be empty.
+std::string InBrackets(const std::string& help, const std::string& initial, const std::string& range = "");
 
 struct Command {
   const char* name;  // "video record" stands below "video"

@@ -7,6 +7,7 @@
 #include <set>
 #include <sstream>
 
+#include "desk/base/digest.h"
 #include "desk/base/failure.h"
 #include "desk/base/files.h"
 #include "desk/base/text.h"
@@ -64,16 +65,16 @@ void MakeFolders(const std::string& path, const Simulation& simulation) {
 
 // The camera's numbers are made of their table; those of --pipeline phone say so.
 void DeclareCamera(Options& command, SimulateOptions& o) {
-  command.Text("--size", o.size, "Pixels of the photo, 4000x3000; of a film, 1280x720", "WxH");
+  command.Text("--size", o.size, "Pixels of the photo, 4000x3000; of a film, 1280x720; 16 to 30000 each", "WxH");
   for (std::size_t i = 0; i < o.numbers.size(); ++i) {
     const CameraNumber& row = kCameraNumbers[i];
     const std::string phone = row.phone ? Format("; phone: %g", *row.phone) : "";
-    command.Number(row.option, o.numbers[i], row.low, row.high,
-                   Format("%s [%g%s]", row.help, CameraModel().*row.member, phone.c_str()), row.unit);
+    command.Number(row.option, o.numbers[i], row.low, row.high, Format("%g", CameraModel().*row.member) + phone,
+                   row.help, row.unit);
   }
   command.Seed("--seed", o.camera.seed, "Seed of the noise");
-  command.Text("--smear", o.smear, "Straight motion during the exposure", "DX,DY");
-  command.Text("--cast", o.cast, "Colour cast: factors on red, green and blue", "R,G,B");
+  command.Text("--smear", o.smear, "Straight motion during the exposure; -100 to 100 each", "DX,DY");
+  command.Text("--cast", o.cast, "Colour cast: factors on red, green and blue; 0 to 16 each", "R,G,B");
 }
 
 void DeclareDevelopment(Options& command, SimulateOptions& o) {
@@ -90,8 +91,8 @@ void DeclareDevelopment(Options& command, SimulateOptions& o) {
                  "bayer: each pixel sees one colour, the others come from its neighbours; auto: as the pipeline",
                  "NAME");
   command.Text("--saturation", o.saturation,
-               Format("Levels over 255 at which the sensor's red, green and blue are full, 0 for never; auto: as the "
-                      "pipeline, phone: %s",
+               Format("Levels over 255 at which the sensor's red, green and blue are full, 0 for never, up to 64 each; "
+                      "auto: as the pipeline, phone: %s",
                       kPhoneSaturation),
                "R,G,B");
 }
@@ -104,7 +105,7 @@ void DeclareChart(Options& command, SimulateOptions& o) {
                  "chart: size of the finder marks; auto suits the photo's size", "SIZE");
   command.Text("--motion", o.motion,
                "preview, pair: way of the scene to the second photo, p.second.png beside p.png; print: way from the "
-               "good ones to the photo",
+               "good ones to the photo; -30000 to 30000 each",
                "DX,DY");
   command.Number("--second-turn", o.second_turn_deg, -180, 180,
                  "pair, print: turn of the second photo, counter-clockwise", "DEG");
@@ -127,7 +128,7 @@ void DeclareDisplay(Options& command, SimulateOptions& o) {
   command.Choice("--pattern", o.display.pattern, kDisplayPatterns, "display: what it shows", "PATTERN");
   command.Number("--surround", o.display.surround, 0, 255, "display: level of what lies around it", "LEVEL");
   command.Number("--bezel", o.display.bezel, 0, 400, "display: its dark rim, of a width of 1600", "UNITS");
-  command.Text("--tint", o.tint, "display: factors on the red, green and blue that it shows", "R,G,B");
+  command.Text("--tint", o.tint, "display: factors on the red, green and blue that it shows; 0 to 4 each", "R,G,B");
   command.Number("--dim-corner", o.dim_corner, 0, 1, "display: share of the light that its first corner lacks",
                  "SHARE");
   command.Whole("--defects", o.defects, 0, 1000, "display: black points, or white ones in black", "N");
@@ -135,7 +136,7 @@ void DeclareDisplay(Options& command, SimulateOptions& o) {
 }
 
 void DeclareLightsAndPrint(Options& command, SimulateOptions& o) {
-  command.Text("--light", o.light, "lights: red, green and blue of each, as stored levels", "R,G,B");
+  command.Text("--light", o.light, "lights: red, green and blue of each, as stored levels; 0 to 255 each", "R,G,B");
   command.Whole("--spots", o.spots, 0, 1000, "lights: number of dark squares", "N");
   command.Number("--spot-size", o.spot_px, 1, 500, "lights: side of a dark square", "PX");
   command.Number("--spot-darkness", o.lights.spot_darkness, 0, 1, "lights: share of the light that they lack", "SHARE");
@@ -149,7 +150,7 @@ void DeclareLightsAndPrint(Options& command, SimulateOptions& o) {
 }
 
 void DeclareFile(Options& command, SimulateOptions& o) {
-  command.Choice("--bits", o.file.bits, {8, 16}, "Bits a channel, 8 or 16", "N");
+  command.Choice("--bits", o.file.bits, {8, 16}, "Bits a channel", "N");
   command.Whole("--quality", o.file.jpeg_quality, 1, 100, "Quality of a JPEG file", "N");
   command.Choice("--chroma", o.file.chroma, {"420", "422", "444"},
                  "Chroma of a JPEG file: for 2 x 2 pixels, for 2 x 1, for each", "NAME");
@@ -206,6 +207,17 @@ void Complete(SimulateOptions& o) {
   o.lights.colour = ParseTriple("--light", o.light, 255);
 }
 
+void WriteWithDigest(const std::string& path, const std::string& content, Json& truth) {
+  WriteOutput(path, content);
+  truth["sha256"][std::filesystem::path(path).filename().string()] = HexDigest(content, "SHA256");
+}
+
+void WriteTruth(const SimulateOptions& o, const Json& truth) {
+  const std::string path = std::filesystem::path(o.file.path).replace_extension(".truth.json");
+  WriteOutput(path, truth.dump(2, ' ', false, Json::error_handler_t::replace) + "\n");
+  if (!o.quiet) std::cout << Printable(path) << '\n';
+}
+
 // The film, and its truth beside it.
 int WriteFilm(const SimulateOptions& o) {
   FilmStyle style = o.film;
@@ -213,14 +225,13 @@ int WriteFilm(const SimulateOptions& o) {
   for (std::string word; std::getline(words, word, ',');) {
     style.lost.push_back(static_cast<int>(ParseNumbers("--lost", word, 1, 0, 100'000)[0]));
   }
-  const Film film = SimulateFilm(o, style);
-  WriteOutput(o.file.path, EncodeFilm(film, style, o.file.path));
-  const std::string truth = std::filesystem::path(o.file.path).replace_extension(".truth.json");
-  WriteOutput(truth, film.truth.dump(2) + "\n");
+  Film film = SimulateFilm(o, style);
+  WriteWithDigest(o.file.path, EncodeFilm(film, style, o.file.path), film.truth);
   if (!o.quiet) {
-    std::cout << Format("%s  %zu frames of %d x %d\n%s\n", Printable(o.file.path).c_str(), film.kept.size(),
-                        o.camera.size.width, o.camera.size.height, truth.c_str());
+    std::cout << Format("%s  %s of %d x %d\n", Printable(o.file.path).c_str(), Count(film.kept.size(), "frame").c_str(),
+                        o.camera.size.width, o.camera.size.height);
   }
+  WriteTruth(o, film.truth);
   return kExitWithinLimits;
 }
 
@@ -241,14 +252,12 @@ int Run(SimulateOptions& o) {
   for (std::size_t i = 0; i < simulation.levels.size(); ++i) {
     const cv::Mat photo = simulation.is_hdr ? simulation.levels[i] : Sense(sensor, simulation.levels[i], o.file.bits);
     const std::string path = NumberedPath(o.file.path, simulation, i);
-    WriteOutput(path, EncodePhoto(photo, o.file));
+    WriteWithDigest(path, EncodePhoto(photo, o.file), simulation.truth);
     if (!o.quiet && path != "-") std::cout << Format("%s  %d x %d\n", Printable(path).c_str(), photo.cols, photo.rows);
     sensor.seed += 0x9E3779B97F4A7C15;  // the next photo has noise of its own
   }
   if (o.file.path == "-") return kExitWithinLimits;
-  const std::string truth = std::filesystem::path(o.file.path).replace_extension(".truth.json");
-  WriteOutput(truth, simulation.truth.dump(2) + "\n");
-  if (!o.quiet) std::cout << Printable(truth) << '\n';
+  WriteTruth(o, simulation.truth);
   return kExitWithinLimits;
 }
 

@@ -1,8 +1,12 @@
 // --truth of the sharpness commands: true figure, what this method makes of it, and what was measured, side by side.
 
+#include <algorithm>
+#include <filesystem>
 #include <opencv2/core.hpp>
 
+#include "desk/base/digest.h"
 #include "desk/base/failure.h"
+#include "desk/base/files.h"
 #include "desk/base/json.h"
 #include "desk/base/text.h"
 #include "desk/measure/sharpness.h"
@@ -51,6 +55,18 @@ std::string Compare(const Record& record, const Json& truth) {
                 npix, straightened_by);
 }
 
+// Earlier versions kept no digests; whether the photo can be read at all is told when it is measured.
+void RefuseOtherPhoto(const Json& truth, const Input& photo, const std::string& path) {
+  if (!truth.is_object() || !truth.contains("sha256") || !truth["sha256"].is_object()) return;
+  const Json& digests = truth["sha256"];
+  std::error_code ignored;
+  if (!photo.content && !std::filesystem::is_regular_file(photo.name, ignored)) return;
+  const std::string digest =
+      HexDigest(photo.content ? *photo.content : ReadWholeFile(photo.name, kCouldNotMeasure), "SHA256");
+  if (std::any_of(digests.begin(), digests.end(), [&](const Json& one) { return one == digest; })) return;
+  throw Failure(kWrongUsage, Printable(path) + ": the truth of another photo than " + Printable(photo.name));
+}
+
 // NOLINTNEXTLINE(bugprone-exception-escape): letting go of JSON throws nothing
 class TruthComparison : public CommandExtra {
  public:
@@ -64,7 +80,9 @@ class TruthComparison : public CommandExtra {
 
   // A simulated photo's levels stand for light as its truth says; before version 0.6 they were the light itself.
   void Complete(Request& request) const override {
-    if (path_.empty() || request.parameters.contains("transfer")) return;
+    if (path_.empty()) return;
+    RefuseOtherPhoto(truth_, request.inputs.at(0), path_);
+    if (request.parameters.contains("transfer")) return;
     const auto place = Json::json_pointer("/parameters/transfer");
     const bool srgb = truth_.contains(place) && truth_[place] == "srgb";
     request.parameters["transfer"] = srgb ? "srgb" : "linear";

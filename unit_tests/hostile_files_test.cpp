@@ -104,6 +104,13 @@ TEST_F(Files, WhatIsNoPictureOrFilmReachesNoDecoder) {
   std::string raster = R"(<VRTDataset rasterXSize="9" rasterYSize="9"><!--)";
   raster.resize(140, ' ');
   raster += "DTED--><VRTRasterBand><SimpleSource><SourceFilename>/etc/passwd</SourceFilename></SimpleSource>";
+  const std::vector<cv::Mat> frames(3, cv::Mat(48, 64, CV_8UC3, cv::Scalar::all(90)));
+  // What FFmpeg's own probing takes for a manifest before it takes it for a film.
+  const std::string manifest =
+      R"(profiles="urn:mpeg:dash:profile:isoff-on-demand:2011" type="static"><Period><AdaptationSet mimeType="video/mp4">)"
+      R"(<Representation id="1" bandwidth="1"><BaseURL>)" +
+      WriteFilm(folder_.Path("other.mp4"), frames, kH264) +
+      "</BaseURL></Representation></AdaptationSet></Period></MPD>";
   std::string tagged = ReadFile(folder_.Write("a.bmp", cv::Mat(9, 20, CV_8UC3, cv::Scalar(3))));
   tagged.replace(140, 4, "DTED");
   std::string huge = ReadFile(folder_.Write("a.png", cv::Mat(9, 9, CV_8UC3)));
@@ -116,6 +123,9 @@ TEST_F(Files, WhatIsNoPictureOrFilmReachesNoDecoder) {
       {"list.mp4", "ffconcat version 1.0\nfile '/etc/passwd'\n"},
       {"session.mp4", "v=0\nm=video 5000 RTP/AVP 96\n"},
       {"manifest.mp4", R"(<?xml version="1.0"?><MPD xmlns="urn:mpeg:dash:schema:mpd:2011"/>)"},
+      {"hidden.mp4", "<!--free--><MPD xmlns=\"urn:mpeg:dash:schema:mpd:2011\" " + manifest},
+      {"hidden.m2ts", "<!--G" + std::string(191, ' ') + "G" + std::string(191, ' ') +
+                          "G--><MPD xmlns=\"urn:mpeg:dash:schema:mpd:2011\" " + manifest},
       {"drawing.png", R"(<svg xmlns="http://www.w3.org/2000/svg"><image href="/etc/passwd"/></svg>)"},
       {"none.tif", std::string("II*\0\x08\0\0\0\0\0", 10)},
       {"loop.jp2", std::string("\0\0\0\x0CjP  \r\n\x87\n\0\0\0\0junk", 20)},

@@ -309,7 +309,7 @@ TEST_F(Program, TablesAreListedAsTheyWere) {
     EXPECT_EQ(ReadFile(file), listed) << table;
   }
   EXPECT_THAT(Run("list measurements").out,
-              AllOf(HasSubstr("camera_capture_front  (QV_TEST_CAMERA_CAPTURE_2)"), HasSubstr("light [125]")));
+              AllOf(HasSubstr("camera_capture_front  (QV_TEST_CAMERA_CAPTURE_2)"), HasSubstr("light [125; 0 to 255]")));
 }
 
 }  // namespace

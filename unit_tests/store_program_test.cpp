@@ -80,7 +80,7 @@ TEST_F(StoreProgram, RefusesWrongUseInASentence) {
       {"report store.db -o store.db", "store.db"},
       {"report store.db --lot L9 -o page.html", "no run is chosen"},
       {"export store.db -o all.txt", "name a .jsonl file"},
-      {"import broken.jsonl -o other.db", "broken.jsonl line 1"},
+      {"import broken.jsonl -o other.db", "broken.jsonl: line 1: "},
       {"import none.jsonl -o other.db", "none.jsonl"},
       {"import record.json -o none/there.db", "none/there.db"},
   };

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 
@@ -73,7 +74,10 @@ TEST_F(Verify, TheNumberThatMovedIsNamed) {
   Simulate("--seed 2 --noise 1");
   EXPECT_THAT(verify_with(mtf50_name, mtf50).out, HasSubstr("the photo itself has changed"));
   std::filesystem::remove(folder_.Path("photo.png"));
-  EXPECT_EQ(1, Run("verify golden.json").status) << "no longer measured";
+  const ProgramRun lost = Run("verify golden.json");
+  EXPECT_EQ(3, lost.status);
+  EXPECT_THAT(lost.err, HasSubstr("photo.png: no such file any more"));
+  EXPECT_EQ(1, std::count(lost.err.begin(), lost.err.end(), '\n'));
   EXPECT_EQ(2, Run("verify photo.truth.json").status);
   folder_.Write("golden.json", std::string(R"({"schema": "qvtester-record-1", "metadata": {}})"));
   EXPECT_EQ(3, Run("verify golden.json").status);
@@ -87,12 +91,41 @@ TEST_F(Verify, AnotherPhotoOfTheSameNameIsPassedOver) {
   EXPECT_THAT(Run("verify station").out, HasSubstr("record.json  as stored"));
 }
 
+TEST_F(Verify, FoldersAreSearchedAndWhatCannotBeReadCounts) {
+  const std::string record = Record("flash " + Simulate("--size 640x480")).dump();
+  std::filesystem::create_directories(folder_.Path("golden/deep\x1b[2J"));
+  folder_.Write("golden/deep\x1b[2J/flash.json", record);
+  EXPECT_THAT(Run("verify golden").out, AllOf(HasSubstr("golden/deep\\x1b[2J/flash.json  as stored"),
+                                              HasSubstr("1 record, "), Not(HasSubstr("\x1b"))));
+  folder_.Write("golden/torn.json", record.substr(0, record.size() / 2));
+  const ProgramRun run = Run("verify golden");
+  EXPECT_EQ(3, run.status);
+  EXPECT_THAT(run.err, HasSubstr("golden/torn.json: line 1: ends before"));
+  EXPECT_THAT(run.out, HasSubstr("2 records, "));
+  EXPECT_THAT(run.out, HasSubstr("0 moved, 1 record could not be verified"));
+}
+
+TEST_F(Verify, OutcomesAreHeldAgainstTheRecordsLimitsAndDecodersAreTold) {
+  folder_.Write("limits.json", R"({"limits": {"camera_flash_mean": {"min": 10}}})");
+  const json golden = Record("flash " + Simulate("--size 640x480") + " --limits limits.json");
+  ASSERT_EQ("PASS", golden["outcome"]);
+  json stricter = golden;
+  stricter["phases"][0]["measurements"]["camera_flash_mean"]["limits"]["min"] = 254;
+  stricter["inputs"][0]["pixels_hash"] = std::string(32, '0');
+  folder_.Write("golden.json", stricter.dump());
+  const ProgramRun run = Run("verify golden.json");
+  EXPECT_EQ(1, run.status);
+  EXPECT_THAT(run.out, AllOf(HasSubstr("the outcome was \"PASS\", is \"FAIL\""),
+                             HasSubstr("the outcome of camera_flash_mean was"), HasSubstr("another decoder: ")));
+}
+
 TEST_F(Explain, EveryFigureOfARecordIsExplained) {
-  EXPECT_THAT(Run("explain").out, HasSubstr("lens_dust_blob_count\n"));
+  EXPECT_THAT(Run("explain").out, HasSubstr("\n  lens_dust_blob_count "));
   const ProgramRun one = Run("explain camera_autofocus_mtf50_vertical");
   EXPECT_EQ(0, one.status);
   EXPECT_THAT(one.out, AllOf(HasSubstr("fraction of Nyquist"), HasSubstr("slanted edge"), HasSubstr("known law"),
-                             HasSubstr("0.0001 from one machine"), Not(HasSubstr("horizontal"))));
+                             HasSubstr("0.0001 more or less on another"), Not(HasSubstr("horizontal"))));
+  EXPECT_THAT(Run("explain camera_flash").out, AllOf(HasSubstr("test 15"), Not(HasSubstr("camera_flash_vt"))));
   EXPECT_THAT(Run("explain dots").out, AllOf(HasSubstr("hdr_dots_dot_count"), HasSubstr("hdr_dots_areas")));
 }
 

@@ -59,6 +59,12 @@ TEST_F(VideoProgram, LostFramesAndTheTurnAreSeen) {
   EXPECT_EQ(1, Measured(blank, "video_play_frames_lost")) << "what was lost is known without a chart";
 }
 
+TEST_F(VideoProgram, TheEnvironmentLetsNoFilmElsewhere) {
+  Simulate("--scene film-flash --size 64x64 --frames 5", "film.mp4");
+  EXPECT_EQ(0, Run("video flash film.mp4", "OPENCV_FFMPEG_CAPTURE_OPTIONS='protocol_whitelist;http' ").status)
+      << "its options would have shut the file out";
+}
+
 TEST_F(VideoProgram, WhatIsNoFilmIsToldInASentence) {
   Simulate("--size 64x64");
   ExpectComplaint("video flash photo.png", 3, "photo.png: not a film that can be decoded");

@@ -10,6 +10,7 @@
 #include <iostream>
 #include <sstream>
 
+#include "qvtester/host_properties.h"
 #include "unit_tests/drawing.h"
 
 // The program lies above its tests; this is all that they call of it, since a process a row would take minutes.
@@ -78,6 +79,7 @@ class WrongUses : public ::testing::Test {
     std::filesystem::create_symlink("nowhere", folder_.Path("astray.png"));
     mkfifo(folder_.Path("pipe.png").c_str(), 0600);
     ASSERT_EQ(0, Run({"simulate", "-o", "chart.png", "--size", "640x480", "--marks", "coarse"})) << Said();
+    folder_.Write("other.png", ReadFile(folder_.Path("chart.png")) + "x");  // the same picture, another file
     folder_.Write("cut.png", ReadFile(folder_.Path("chart.png")).substr(0, 30));
     ASSERT_EQ(0, Run({"batch", "camera_flash", "photos.csv", "-o", "store", "--quiet", "-j", "1"})) << Said();
   }
@@ -92,6 +94,7 @@ class WrongUses : public ::testing::Test {
       dup2(said, 1);
       dup2(said, 2);
       alarm(20);
+      SetHostPropertyStore("/dev/null/nowhere");
       const bool there = chdir(folder_.Path("").c_str()) == 0;
       const int status = there ? qv::RunProgram(words) : -1;
       std::cout.flush();
@@ -123,6 +126,33 @@ TEST_F(WrongUses, EachEndsWithItsStatusAndASentence) {
     }
   }
   EXPECT_GE(count, 400);
+}
+
+TEST_F(WrongUses, HelpFitsATerminalAndTellsRanges) {
+  std::vector<std::vector<std::string>> commands = {{}};
+  for (std::size_t i = 0; i < commands.size(); ++i) {
+    std::vector<std::string> words = commands[i];
+    words.emplace_back("--help");
+    ASSERT_EQ(0, Run(words));
+    bool listed = false;
+    std::istringstream lines(Said());
+    for (std::string line; std::getline(lines, line);) {
+      EXPECT_LT(line.size(), 100U) << line;
+      if (line == "Subcommands:") {
+        listed = true;
+      } else if (line.empty()) {
+        listed = false;
+      } else if (listed && line[2] != ' ') {
+        words.back() = line.substr(2, line.find(' ', 2) - 2);
+        commands.push_back(words);
+      }
+    }
+  }
+  EXPECT_GT(commands.size(), 30U);
+  ASSERT_EQ(0, Run({"autofocus", "--help"}));
+  EXPECT_THAT(Said(), HasSubstr("[125; 0 to 255]"));
+  ASSERT_EQ(0, Run({"simulate", "--help"}));
+  EXPECT_THAT(Said(), AllOf(HasSubstr("phone: 0.8; 0 to 0.99]"), HasSubstr("; auto, none or srgb]")));
 }
 
 }  // namespace

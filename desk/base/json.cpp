@@ -20,7 +20,7 @@ long LineOf(const std::string& text, std::size_t byte) {
 }
 
 // The levels are counted before anything is built: a parsed tree is torn down level by level, on the stack.
-void RefuseDepth(const std::string& text, const std::string& where) {
+void RefuseDepth(const std::string& text, const std::string& where, long first_line) {
   int level = 0;
   bool quoted = false;
   for (std::size_t i = 0; i < text.size(); ++i) {
@@ -33,8 +33,8 @@ void RefuseDepth(const std::string& text, const std::string& where) {
     if (c == '[' || c == '{') ++level;
     if (c == ']' || c == '}') --level;
     if (level > kMostJsonLevels) {
-      throw Failure(kWrongUsage, Format("%s: line %ld: nested deeper than %d levels", where.c_str(), LineOf(text, i),
-                                        kMostJsonLevels));
+      throw Failure(kWrongUsage, Format("%s: line %ld: nested deeper than %d levels", where.c_str(),
+                                        first_line - 1 + LineOf(text, i), kMostJsonLevels));
     }
   }
 }
@@ -66,15 +66,16 @@ std::string Shown(const Json& value) {
 
 }  // namespace
 
-Json ParseJson(const std::string& text, const std::string& where) {
-  RefuseDepth(text, where);
+Json ParseJson(const std::string& text, const std::string& where, long first_line) {
+  RefuseDepth(text, where, first_line);
   try {
     NamesOnce names(where);
     return Json::parse(text, std::ref(names));
   } catch (const Json::parse_error& e) {
     const bool cut = e.byte > text.size();
-    throw Failure(kWrongUsage, Format("%s: line %ld: %s", where.c_str(), LineOf(text, e.byte == 0 ? 0 : e.byte - 1),
-                                      cut ? "ends before the document does" : "this is no JSON"));
+    throw Failure(kWrongUsage,
+                  Format("%s: line %ld: %s", where.c_str(), first_line - 1 + LineOf(text, e.byte == 0 ? 0 : e.byte - 1),
+                         cut ? "ends before the document does" : "this is no JSON"));
   } catch (const Json::exception&) {
     throw Failure(kWrongUsage, where + ": holds a number that no double can take");
   }

@@ -4,6 +4,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <numeric>
+#include <sstream>
 
 namespace qv {
 
@@ -99,6 +100,19 @@ std::string DidYouMean(const std::string& word, const std::vector<std::string>& 
     }
   }
   return nearest == nullptr ? "" : "; did you mean \"" + *nearest + "\"?";
+}
+
+std::string Wrapped(const std::string& text, std::size_t width, std::size_t indent) {
+  std::string lines;
+  std::size_t length = 0;
+  std::istringstream words(text);
+  for (std::string word; words >> word;) {
+    const std::size_t more = TextWidth(word);
+    const bool fits = length + 1 + more <= width;
+    lines += (lines.empty() ? "" : fits ? " " : "\n" + std::string(indent, ' ')) + word;
+    length = fits && length > 0 ? length + 1 + more : more;
+  }
+  return lines;
 }
 
 std::size_t TextWidth(const std::string& text) {

@@ -18,6 +18,10 @@ std::string Shortened(const std::string& text, std::size_t most);
 /// "; did you mean \"limits\"?" with the known name that is nearest by edits, or nothing when none is near.
 std::string DidYouMean(const std::string& word, const std::vector<std::string>& known);
 
+/// In lines of at most that width, broken between words; the second and further ones begin with so many blanks, which
+/// don't count.
+std::string Wrapped(const std::string& text, std::size_t width, std::size_t indent = 0);
+
 /// Characters of a UTF-8 text: how wide it stands in a table.
 std::size_t TextWidth(const std::string& text);
 

@@ -109,7 +109,7 @@ std::vector<Job> JobsOfJsonl(const std::string& text, const std::string& name, c
     ++number;
     if (line.find_first_not_of(" \t\r") == std::string::npos) continue;
     const std::string where = Format("%s: row %d", name.c_str(), number);
-    const Json json = ParseJson(line, where);
+    const Json json = ParseJson(line, name, number);
     std::vector<std::pair<std::string, std::string>> row;
     for (const auto& [column, value] : JsonView(json, where).Members()) {
       const bool text_value = value.value().is_string();

@@ -33,7 +33,7 @@ std::vector<Parameter> AreaParameters() {
            "Smaller areas are dropped",
            nullptr,
            0,
-           1'000'000'000,
+           1'000'000,
            {},
            QV_PROPERTY_AREA_LEAST_PIXELS}};
 }

@@ -106,18 +106,30 @@ class CaptureFinding : public Finding {
   void DrawPatch(Picture& picture, const Record& record, std::size_t i, cv::Point2d swatches) const;
 };
 
+// A difference of the patch of this number; blank where there is none.
+std::string DifferenceText(const Reading* differences, double number) {
+  if (differences == nullptr) return "";
+  for (std::size_t i = 0; i < differences->values.size(); ++i) {
+    if (differences->axis[i] == number) return Format("  %12.2f", differences->values[i]);
+  }
+  return std::string(14, ' ');
+}
+
 std::string CaptureFinding::Report(const Record& record) const {
   const Phase& phase = record.phase;
   std::string text = ReportChart(view);
   const Reading* const delta = phase.Find("delta_e_76");
-  text += delta != nullptr ? "patch  drawn as        L*      a*      b*   delta E 76\n"
-                           : "patch  drawn as        L*      a*      b*   (no standard photo to compare with)\n";
+  const Reading* const cie = phase.Find("delta_e_2000");
+  text += "patch  drawn as        L*      a*      b*";
+  text += delta != nullptr ? "    delta E 76" : "";
+  text += cie != nullptr ? "     CIEDE2000" : "";
+  text += delta == nullptr && cie == nullptr ? "   (no standard to compare with)\n" : "\n";
   const Reading& l = *phase.Find("lab_l");
   for (std::size_t i = 0; i < l.values.size(); ++i) {
     const auto number = static_cast<std::size_t>(l.axis[i]);
     text += Format("%5zu  %-11s  %6.2f  %6.2f  %6.2f", number, kPatches[number].name, l.values[i],
                    phase.Find("lab_a")->values[i], phase.Find("lab_b")->values[i]);
-    text += delta != nullptr && i < delta->values.size() ? Format("       %6.2f\n", delta->values[i]) : "\n";
+    text += DifferenceText(delta, l.axis[i]) + DifferenceText(cie, l.axis[i]) + "\n";
   }
   for (const char* figure : {"delta_e_76_mean", "delta_e_76_max", "delta_e_2000_mean", "delta_e_2000_max"}) {
     const Reading* m = phase.Find(figure);

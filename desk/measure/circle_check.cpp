@@ -71,7 +71,7 @@ class CircleCheck : public Measurement {
     spec_.routine = "CheckPatternCircles";
     spec_.inputs = {{"frame", QV_RESOURCE_CHART_PHOTO, "Preview frame that shows the chart"}};
     spec_.parameters = {
-        {"camera", Parameter::kWhole, "N", "0: main camera, 2: second rear camera", 0, 0, 2, {"0", "2"}},
+        {"camera", Parameter::kWhole, "N", "Whose frame: 0 is the main camera's, 2 the second rear camera's", 0, 0, 2, {"0", "2"}},
         ThresholdParameter(),
         RawParameter()};
     std::vector<Figure> figures = ChartFigures();

@@ -178,7 +178,7 @@ class Dust : public Measurement {
                          {},
                          front ? QV_PROPERTY_FRONT_DUST_HISTOGRAM : QV_PROPERTY_DUST_HISTOGRAM},
                         {"step", Parameter::kWhole, "N", "Step number, which names the property that is published", 0,
-                         INT32_MIN, INT32_MAX}};
+                         0, 9999}};
     spec_.figures = Figures();
     spec_.publishes = true;
   }

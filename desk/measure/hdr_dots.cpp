@@ -252,7 +252,7 @@ class HdrDots : public Measurement {
                      "LogLuv) and PFM (lossless)"}};
     spec_.parameters = {
         {"threshold", Parameter::kReal, "SHARE", "Departure from the local mean that makes a dot, a share", 0.1, 0,
-         1e9},
+         1000},
         {"radius", Parameter::kWhole, "PX", "Half the side of the window of the local mean", 10, 1, 10'000},
         {"distance", Parameter::kWhole, "PX", "Areas closer than this are merged", 8, 0, 100'000},
         {"channel", Parameter::kWord, "NAME", "Channel that is searched", "red", 0, 0, {"red", "green", "blue"}}};

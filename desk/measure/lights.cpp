@@ -287,15 +287,14 @@ class Lights : public Measurement {
     spec_.inputs = {test.input};
     spec_.parameters = {{"regions", Parameter::kRegions, "REGIONS",
                          "Where the lights are: left,top,width,height,label;... in pixels, or a JSON file of them; "
-                         "without it the whole "
-                         "photo is one region"},
+                         "without it the whole photo is one region"},
                         {"threshold",
                          Parameter::kReal,
                          "SHARE",
                          "Departure from the local mean that makes a dot, a share",
                          nullptr,
                          0,
-                         1e9,
+                         1000,
                          {},
                          QV_PROPERTY_DOT_THRESHOLD},
                         {"radius",

@@ -6,6 +6,7 @@
 #include <map>
 
 #include "desk/base/failure.h"
+#include "desk/base/text.h"
 #include "desk/measure/library_tables.h"
 
 namespace qv {
@@ -81,7 +82,10 @@ Json CheckedValue(const QVProperty& row, const Json& value) {
 const QVProperty& Known(const std::string& index_or_name) {
   const QVProperty* const row = Find(index_or_name);
   if (row == nullptr) {
-    throw Failure(kWrongUsage, index_or_name + ": no such property; `qvtester list properties` shows them");
+    std::vector<std::string> names;
+    for (const QVProperty& known : kProperties) names.emplace_back(known.name);
+    throw Failure(kWrongUsage, Printable(index_or_name) + ": no such property; `qvtester list properties` shows them" +
+                                   DidYouMean(index_or_name, names));
   }
   return *row;
 }

@@ -167,6 +167,10 @@ Json JsonOf(const Limits& limits) {
   if (!limits.given() && limits.accept_doubts.empty()) return json;
   Json content = {{"limits", Json::object()}, {"accept_doubts", limits.accept_doubts}};
   for (const auto& [name, limit] : limits.by_name) content["limits"][name] = JsonOf(limit, *FindFigure(name)->figure);
+  if (limits.rule.kind != DecisionRule::Kind::kSimple) {
+    json["decision"] = content["decision"] = {{"rule", limits.rule.Name()}, {"factor", limits.rule.factor}};
+  }
+  if (!limits.accept_doubts.empty()) json["accept_doubts"] = limits.accept_doubts;
   json["sha256"] = HexDigest(content.dump(), "SHA256");
   return json;
 }

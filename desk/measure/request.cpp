@@ -17,7 +17,10 @@ namespace {
 const Spec& SpecOf(const Request& request) {
   const Measurement* const measurement = FindMeasurement(request.measurement);
   if (measurement == nullptr) {
-    Refuse(request.measurement + ": no such measurement; `qvtester list measurements` shows them");
+    std::vector<std::string> names;
+    for (const Measurement* known : Measurements()) names.emplace_back(known->spec().name);
+    Refuse(Printable(request.measurement) + ": no such measurement; `qvtester list measurements` shows them" +
+           DidYouMean(request.measurement, names));
   }
   return measurement->spec();
 }
@@ -26,6 +29,15 @@ const Parameter* FindParameter(const Spec& spec, const std::string& name) {
   const auto found = std::find_if(spec.parameters.begin(), spec.parameters.end(),
                                   [&](const Parameter& parameter) { return name == parameter.name; });
   return found == spec.parameters.end() ? nullptr : &*found;
+}
+
+[[noreturn]] void RefuseParameter(const Spec& spec, const std::string& name) {
+  std::vector<std::string> names;
+  for (const Parameter& parameter : spec.parameters) names.emplace_back(parameter.name);
+  for (const InputSpec& input : spec.inputs) {
+    if (input.optional) names.emplace_back(input.name);
+  }
+  Refuse(std::string(spec.name) + " has no parameter " + Printable(name) + DidYouMean(name, names));
 }
 
 void TakeOptionalInputs(const Spec& spec, Request& request) {
@@ -109,7 +121,7 @@ Request Resolved(const Request& request) {
   ExpandFolders(spec, full);
   CheckInputs(spec, full);
   for (const auto& [name, value] : full.parameters.items()) {
-    if (FindParameter(spec, name) == nullptr) Refuse(std::string(spec.name) + " has no parameter " + name);
+    if (FindParameter(spec, name) == nullptr) RefuseParameter(spec, name);
   }
   full.properties = CheckedProperties(full.properties);
   Json values = Json::object();

@@ -74,6 +74,30 @@ Request StoredRequest(const Json& stored) {
   return RequestFromJson(stored);
 }
 
+// The record's own: bounds stand beside the figures, the rest with the limits' name.
+Limits LimitsOfRecord(const Json& record) {
+  const Json& about = record.at("metadata").at("limits");
+  Json file = {{"limits", Json::object()}};
+  for (const char* const key : {"name", "revision", "accept_doubts", "decision"}) {
+    if (about.contains(key)) file[key] = about[key];
+  }
+  for (const auto& [name, m] : record.at("phases").at(0).at("measurements").items()) {
+    if (m.contains("limits")) file["limits"][name] = m["limits"];
+  }
+  return file["limits"].empty() ? Limits() : LimitsFromJson(file, "its limits");
+}
+
+// Those that the record holds as loaded must still be there.
+void RefuseLostFiles(const Json& record, const Request& request) {
+  std::vector<Input> files = request.inputs;
+  files.insert(files.end(), request.repeats.begin(), request.repeats.end());
+  for (std::size_t i = 0; i < std::min(files.size(), record.at("inputs").size()); ++i) {
+    std::error_code error;
+    if (fs::is_regular_file(files[i].name, error)) continue;
+    throw Failure(kCouldNotMeasure, files[i].name + ": no such file any more, nor one of its name beside the record");
+  }
+}
+
 // The largest difference between two measured values, single or lists of pairs; infinity when they can't be compared.
 double Difference(const Json& was, const Json& is) {
   if (was == is) return 0;
@@ -84,40 +108,72 @@ double Difference(const Json& was, const Json& is) {
   return largest;
 }
 
+std::string Moved(const std::string& what, const Json& was, const Json& is) {
+  return what + " was " + was.dump() + ", is " + is.dump();
+}
+
+void CompareFigure(Verification& result, const std::string& name, const Json& was, const Json& is) {
+  const FigureInfo* const info = FindFigure(name);
+  const double allowed = info == nullptr ? 0 : Repeatability(*info->figure);
+  const Json& value = is.at("measured_value");
+  const double difference = Difference(was.at("measured_value"), value);
+  if (difference > allowed) {
+    const std::string what = value.is_array() ? name + Format(": its values differ by up to %g", difference)
+                                              : Moved(name, was.at("measured_value"), value);
+    result.moved.push_back(what + Format("; the same photo may differ by %g", allowed));
+  }
+}
+
 void CompareFigures(Verification& result, const Json& stored, const Json& measured) {
   for (const auto& [name, m] : stored.get_ref<const Json::object_t&>()) {
     if (!m.contains("measured_value")) continue;
     ++result.numbers;
-    if (!measured.contains(name) || !measured[name].contains("measured_value")) {
+    if (measured.contains(name) && measured[name].contains("measured_value")) {
+      CompareFigure(result, name, m, measured[name]);
+    } else {
       result.moved.push_back(name + " is no longer measured");
-      continue;
     }
-    const FigureInfo* const info = FindFigure(name);
-    const double allowed = info == nullptr ? 0 : Repeatability(*info->figure);
-    const Json& value = measured[name].at("measured_value");
-    const double difference = Difference(m.at("measured_value"), value);
-    if (difference <= allowed) continue;
-    const std::string what = value.is_array() ? Format(": its values differ by up to %g", difference)
-                                              : " was " + m.at("measured_value").dump() + ", is " + value.dump();
-    result.moved.push_back(name + what + Format("; the same photo may differ by %g", allowed));
   }
 }
 
-Verification Compare(const Json& was, const Json& is) {
-  Verification result;
-  const Json& stored = was.at("phases").at(0);
-  const Json& measured = is.at("phases").at(0);
-  for (std::size_t i = 0; i < was.at("inputs").size(); ++i) {
-    if (i < is.at("inputs").size() && HashOf(was, i) != HashOf(is, i)) {
-      result.moved.push_back("the photo itself has changed: " + is.at("inputs")[i].at("path").get<std::string>());
+// Earlier versions passed what no limit was set for.
+void CompareOutcomes(Verification& result, const Json& was, const Json& is) {
+  if (!was.contains("request")) return;
+  if (was.at("outcome") != is.at("outcome"))
+    result.moved.push_back(Moved("the outcome", was["outcome"], is["outcome"]));
+  const Json& measured = is.at("phases").at(0).at("measurements");
+  for (const auto& [name, m] : was.at("phases").at(0).at("measurements").items()) {
+    if (measured.contains(name) && m.at("outcome") != measured[name].at("outcome"))
+      result.moved.push_back(Moved("the outcome of " + name, m["outcome"], measured[name]["outcome"]));
+  }
+}
+
+void ComparePhotos(Verification& result, const Json& was, const Json& is) {
+  for (std::size_t i = 0; i < std::min(was.size(), is.size()); ++i) {
+    const std::string path = is[i].at("path");
+    const Json pixels = was[i].value("pixels_hash", Json());
+    if (was[i].at("sha256") != is[i].at("sha256")) {
+      result.moved.push_back("the photo itself has changed: " + path);
+    } else if (pixels.is_string() && pixels != is[i].at("pixels_hash")) {
+      result.notes.push_back("another decoder: it makes other pixels of " + path + " than the record's");
     }
   }
+}
+
+Verification Compare(const Json& was, const Record& again) {
+  Verification result;
+  const Json is = again.ToJson();
+  ComparePhotos(result, was.at("inputs"), is.at("inputs"));
   if (!result.moved.empty()) return result;  // figures of another photo say nothing
+  const Json& stored = was.at("phases").at(0);
+  const Json& measured = is.at("phases").at(0);
   if (stored.at("result_code") != measured.at("result_code")) {
-    result.moved.push_back("the result code was " + stored.at("result_code").dump() + ", is " +
-                           measured.at("result_code").dump());
+    const std::string why = again.measured() ? "" : ": " + again.MissSentence();
+    result.moved.push_back(Moved("the result code", stored["result_code"], measured["result_code"]) + why);
+    return result;
   }
   CompareFigures(result, stored.at("measurements"), measured.at("measurements"));
+  CompareOutcomes(result, was, is);
   return result;
 }
 
@@ -148,12 +204,16 @@ Request RequestOfRecord(const Json& record, const std::string& folder) {
 }
 
 Verification Verify(const Json& record, const std::string& folder) {
-  QVTester tester;
-  const Json again = Measure(tester, RequestOfRecord(record, folder)).ToJson();
+  const Request request = RequestOfRecord(record, folder);
   try {
-    return Compare(record, again);
+    RefuseLostFiles(record, request);
+    QVTester tester;
+    return Compare(record, Measure(tester, request, LimitsOfRecord(record)));
   } catch (const Json::exception& e) {
     throw Failure(kCouldNotMeasure, "not a whole record: " + SentenceOf(e));
+  } catch (const Failure& e) {
+    if (e.kind != kWrongUsage) throw;
+    CannotRunAgain(e.what());
   }
 }
 

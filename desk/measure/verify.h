@@ -13,6 +13,7 @@ namespace qv {
 struct Verification {
   int numbers = 0;                 // that were compared
   std::vector<std::string> moved;  // a sentence each
+  std::vector<std::string> notes;  // what may be the reason
 };
 
 /// The request by which a record can be measured again. Files are looked for seen from the record's folder, as named,
@@ -20,7 +21,8 @@ struct Verification {
 /// tells all that matters. Throws Failure (could not measure) with the reason where it does not.
 Request RequestOfRecord(const Json& record, const std::string& folder);
 
-/// Measures it and compares every number. Writes nothing. Throws Failure (could not measure) as above.
+/// Measures it, judges it by the record's limits, and compares every number and outcome. Writes nothing. Throws Failure
+/// (could not measure) as above, and where a file that was measured is gone.
 Verification Verify(const Json& record, const std::string& folder);
 
 }  // namespace qv

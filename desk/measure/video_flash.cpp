@@ -80,7 +80,7 @@ class VideoFlash : public Measurement {
           "Frames to read; 0 reads all",
           nullptr,
           0,
-          INT_MAX,
+          1'000'000,
           {},
           QV_PROPERTY_VIDEO_FLASH_FRAME_COUNT}},
         {{"frame_count", kOne, kWhole, nullptr, kStampMethod, "Frames that were read."},

@@ -1,5 +1,6 @@
 #include "desk/results/archive.h"
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
 #include <map>
@@ -106,9 +107,10 @@ void ExportTable(Store& store, const Selection& selection, const Sink& sink) {
   flush(std::numeric_limits<std::int64_t>::max());
 }
 
-StoredRun ParseRun(const std::string& text, const std::string& where) {
+StoredRun ParseRun(const std::string& text, const std::string& file, long number) {
   StoredRun run;
-  const Json line = ParseJson(text, where);
+  const Json line = ParseJson(text, file, std::max(number, 1L));
+  const std::string where = number == 0 ? file : file + ": line " + std::to_string(number);
   const JsonView view(line, where);
   if (view.At("schema").Text() != kSchema) {
     run.record = line;
@@ -141,9 +143,9 @@ Imported ImportLines(std::istream& lines, const std::string& where, Store& store
   };
   std::string line;
   try {
-    for (std::size_t number = 1; std::getline(lines, line); ++number) {
+    for (long number = 1; std::getline(lines, line); ++number) {
       if (line.find_first_not_of(" \t\r") == std::string::npos) continue;
-      runs.push_back(ParseRun(line, where + " line " + std::to_string(number)));
+      runs.push_back(ParseRun(line, where, number));
       ++result.read;
       if (runs.size() == kRunsAtOnce) put();
     }

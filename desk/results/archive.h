@@ -16,8 +16,9 @@ void ExportLines(Store& store, const Selection& selection, bool with_pictures, c
 /// is empty.
 void ExportTable(Store& store, const Selection& selection, const Sink& sink);
 
-/// A line of ExportLines, or a record as it stands; throws Failure (wrong usage) naming `where`.
-StoredRun ParseRun(const std::string& text, const std::string& where);
+/// A line of ExportLines, or a record as it stands; throws Failure (wrong usage) naming the file and, unless 0, the
+/// line's number.
+StoredRun ParseRun(const std::string& text, const std::string& file, long number = 0);
 
 struct Imported {
   std::size_t read = 0, added = 0;

@@ -57,10 +57,18 @@ bool HasColumn(soci::session& session, const std::string& name) {
   return found > 0;
 }
 
-[[noreturn]] void NoSuchColumn(const std::string& name) {
+[[noreturn]] void NoSuchColumn(soci::session& session, const std::string& name) {
   std::string known;
-  for (const RunColumn& column : kRunColumns) known += std::string(known.empty() ? "" : ", ") + column.name;
-  throw Failure(kWrongUsage, "no run has a column or a figure named \"" + name + "\"; every run has " + known);
+  std::vector<std::string> names;
+  for (const RunColumn& column : kRunColumns) {
+    known += std::string(known.empty() ? "" : ", ") + column.name;
+    names.emplace_back(column.name);
+  }
+  const soci::rowset<std::string> others =
+      (session.prepare << "SELECT name FROM quantity UNION SELECT name FROM run_column");
+  names.insert(names.end(), others.begin(), others.end());
+  throw Failure(kWrongUsage, "no run has a column or a figure named \"" + name + "\"; every run has " + known +
+                                 DidYouMean(name, names));
 }
 
 // Conditions as SQL; every word of the caller's is bound. (The comparison is one of six that ParseCondition lets pass.)
@@ -116,7 +124,7 @@ class Where {
           name + " AND f.value" + comparison + Bind(NumberOf(condition)) + ")";
       return;
     }
-    if (!HasColumn(session, condition.name)) NoSuchColumn(condition.name);
+    if (!HasColumn(session, condition.name)) NoSuchColumn(session, condition.name);
     const std::string name = Bind(condition.name);
     sql_ += " AND EXISTS (SELECT 1 FROM run_column c WHERE c.run = r.id AND c.name = " + name + " AND c.value" +
             comparison + Bind(condition.value) + ")";
@@ -393,7 +401,7 @@ void Store::EachValue(const std::string& column,
                                                all, [&] { visit(run, value); });
       return;
     }
-    if (!HasColumn(session, column)) NoSuchColumn(column);
+    if (!HasColumn(session, column)) NoSuchColumn(session, column);
     soci::statement statement = (session.prepare << "SELECT run, value FROM run_column WHERE name = :n ORDER BY run",
                                  soci::use(column), soci::into(run), soci::into(value));
     statement.execute();
