@@ -2,6 +2,7 @@
 
 #include <cstdio>
 #include <exception>
+#include <filesystem>
 #include <iostream>
 
 #include "desk/base/failure.h"
@@ -131,6 +132,9 @@ int RunProgram(const std::vector<std::string>& words) {
   } catch (const Failure& e) {
     std::fprintf(stderr, "qvtester: %s\n", Printable(e.what()).c_str());
     return StatusOf(e.kind);
+  } catch (const std::filesystem::filesystem_error& e) {
+    std::fprintf(stderr, "qvtester: %s: %s\n", Printable(e.path1().string()).c_str(), e.code().message().c_str());
+    return kExitWrongUsage;
   } catch (const std::exception& e) {
     std::fprintf(stderr, "qvtester: internal fault: %s\n", Printable(e.what()).c_str());
     return kExitInternalFault;

@@ -121,6 +121,8 @@ CommandBody DeclareExplain(Options& command) {
         ExplainUncertainty();
       } else if (const Measurement* const measurement = FindMeasurement(name)) {
         std::cout << Explain(measurement->spec());
+      } else if (name.empty()) {
+        throw Failure(kWrongUsage, "\"\": an empty name; `qvtester explain` lists what there is");
       } else {
         ExplainFigures(name);
       }

@@ -71,6 +71,9 @@ int MakeReport(const ReportOptions& options) {
   if (options.output.empty() && options.junit.empty() && options.plot.empty()) {
     throw Failure(kWrongUsage, "nothing to write: name a page (-o), --junit or --plot");
   }
+  if (!options.plot.empty() && options.plot != "-" && LowerExtension(options.plot) != ".svg") {
+    throw Failure(kWrongUsage, Printable(options.plot) + ": the plot is an SVG: name a .svg file");
+  }
   CheckOutputs({{"the store", options.store.store}},
                {{"the page", options.output}, {"the test results", options.junit}, {"the plot", options.plot}});
   Report report(TitleOf(options), options.pictures == "all"        ? Report::Pictures::kAll

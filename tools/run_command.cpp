@@ -124,11 +124,15 @@ class PlanRun {
       for (const Input& input : RequestFor(plan_, step, wanted_.unit).inputs)
         inputs.push_back({"an input", input.name});
     }
+    inputs.push_back({"the store", wanted_.store});
     std::vector<NamedFile> outputs = {{"the records", wanted_.records}, {"the test results", wanted_.junit}};
     for (const PlanStep& step : plan_.steps) {
       if (!wanted_.pictures.empty()) outputs.push_back({"a picture", wanted_.pictures + "/" + FileName(step.name)});
     }
-    if (!wanted_.pictures.empty()) fs::create_directories(wanted_.pictures);
+    std::error_code failed;
+    if (!wanted_.pictures.empty()) fs::create_directories(wanted_.pictures, failed);
+    if (failed)
+      throw Failure(kWrongUsage, Printable(wanted_.pictures) + ": can't be made a folder: " + failed.message());
     CheckOutputs(inputs, outputs);
   }
 
@@ -203,7 +207,10 @@ CommandBody DeclareRun(Options& command) {
   command.Text("--annotate", wanted->pictures, "Write a picture of each step into this folder", "DIR");
   command.Text("--junit", wanted->junit, "Write the verdicts as JUnit XML, for a CI server", "XML");
   command.Flag("--quiet", wanted->quiet, "Print nothing but errors");
-  return [wanted] { return PlanRun(*wanted).Go(); };
+  return [wanted] {
+    if (wanted->unit.empty()) throw Failure(kWrongUsage, "--unit: an empty serial number");
+    return PlanRun(*wanted).Go();
+  };
 }
 
 }  // namespace qv

@@ -188,6 +188,10 @@ void Complete(SimulateOptions& o) {
   CameraModel& camera = o.camera;
   if (o.size.empty()) o.size = o.is_film() ? "1280x720" : "4000x3000";
   camera.size = ParseSize("--size", o.size);
+  constexpr std::int64_t kMostPixels = 200'000'000;  // larger photos are refused wherever they are read
+  if (std::int64_t{camera.size.width} * camera.size.height > kMostPixels) {
+    throw Failure(kWrongUsage, "--size " + o.size + ": more than 200 megapixels, which nothing would read");
+  }
   for (std::size_t i = 0; i < o.numbers.size(); ++i) {
     const CameraNumber& row = kCameraNumbers[i];
     if (o.numbers[i]) {
@@ -218,6 +222,13 @@ void WriteTruth(const SimulateOptions& o, const Json& truth) {
   if (!o.quiet) std::cout << Printable(path) << '\n';
 }
 
+// Told before minutes of work: a name of no format, a place that can't be written.
+void CheckPhotoFile(const SimulateOptions& o) {
+  const int type = o.scene == "hdr" ? CV_32FC3 : o.file.bits == 16 ? CV_16UC3 : CV_8UC3;
+  EncodePhoto(cv::Mat(16, 16, type, cv::Scalar::all(0)), o.file);
+  CheckOutputs({}, {{"the photo", o.file.path}});
+}
+
 // The film, and its truth beside it.
 int WriteFilm(const SimulateOptions& o) {
   FilmStyle style = o.film;
@@ -238,6 +249,7 @@ int WriteFilm(const SimulateOptions& o) {
 int Run(SimulateOptions& o) {
   Complete(o);
   if (o.is_film()) return WriteFilm(o);
+  CheckPhotoFile(o);
   Simulation simulation = Simulate(o);
   simulation.truth["parameters"]["bits"] = o.file.bits;
   if (LowerExtension(o.file.path) == ".jpg") {

@@ -214,6 +214,9 @@ int RunStudy(const StudyOptions& options) {
     throw Failure(kWrongUsage, "--plot draws what --labels finds: give both");
   if (!options.output.empty() && options.propose <= 0)
     throw Failure(kWrongUsage, "-o takes the limits of --propose: give both");
+  if (!options.plot.empty() && options.plot != "-" && LowerExtension(options.plot) != ".svg") {
+    throw Failure(kWrongUsage, Printable(options.plot) + ": the plot is an SVG: name a .svg file");
+  }
   CheckOutputs({{"the store", options.store.store}, {"the limits", options.limits}},
                {{"the proposed limits", options.output}, {"the plot", options.plot}});
   Store store(options.store.store, Store::Use::kRead);

@@ -31,7 +31,8 @@ bool IsOneOf(const std::vector<std::string>& words, const std::string& word) {
 [[noreturn]] void RefuseWord(const Parameter& parameter, const Json& value) {
   std::string list;
   for (const std::string& word : parameter.words) list += (list.empty() ? "" : ", ") + word;
-  Refuse(parameter, value.dump(), "none of " + list);
+  const std::string given = value.is_string() ? value.get<std::string>() : value.dump();
+  Refuse(parameter, value.dump(), "none of " + list + DidYouMean(given, parameter.words));
 }
 
 Json CheckedNumber(const Parameter& parameter, const Json& value) {
@@ -44,7 +45,7 @@ Json CheckedNumber(const Parameter& parameter, const Json& value) {
   const double real = number ? value.get<double>() : NAN;
   if (real >= parameter.low && real <= parameter.high) return value;
   Refuse(parameter, value.dump(),
-         Format("no %s from %g to %g", whole ? "whole number" : "number", parameter.low, parameter.high));
+         Format("no %s from %.7g to %.7g", whole ? "whole number" : "number", parameter.low, parameter.high));
 }
 
 Json CheckedWord(const Parameter& parameter, const Json& value) {

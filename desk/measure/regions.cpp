@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <filesystem>
 #include <sstream>
 #include <utility>
 
@@ -53,7 +54,11 @@ Json CheckedRegions(const Json& value) {
   Json regions = value;
   if (value.is_string()) {
     const auto text = value.get<std::string>();
-    regions = text.find_first_not_of("0123456789,;- ") == std::string::npos ? FromWords(text) : FromFile(text);
+    const bool words = text.find_first_not_of("0123456789,;- ") == std::string::npos;
+    if (!words && text.find(',') != std::string::npos && !std::filesystem::exists(text)) {
+      Refuse(text, "is neither left,top,width,height,label;... in whole numbers nor a file");
+    }
+    regions = words ? FromWords(text) : FromFile(text);
   }
   if (!regions.is_array() || regions.empty() || regions.size() > kMost) {
     Refuse("one to " + std::to_string(kMost), "are needed");

@@ -30,9 +30,13 @@ std::string WithoutPassword(const std::string& name) {
   return at == std::string::npos || colon > at ? name : name.substr(0, colon) + name.substr(at);
 }
 
-// What the database said, without its hints and the statement it said it of.
+// What the database said, without its hints, the call that it was told by and the statement it said it of.
 std::string OneLine(std::string text) {
-  text.erase(std::min(text.find(" while executing"), text.size()));
+  for (const char* const end : {" while executing", " while preparing"}) {
+    text.erase(std::min(text.find(end), text.size()));
+  }
+  const std::size_t said = text.find(": ");
+  if (text.find("_backend::") < said && said != std::string::npos) text.erase(0, said + 2);
   text.erase(std::min(text.find('\n', text.find_first_not_of('\n')), text.size()));
   text.erase(text.find_last_not_of(' ') + 1);
   return text;
