@@ -74,7 +74,7 @@ TEST_F(Archive, ComesBackAsItWentAndHoldsItsSchema) {
 
   std::istringstream broken(lines.substr(0, lines.size() - 20));  // cut in the last line
   Store third = Open("third.db");
-  EXPECT_THAT([&] { ImportLines(broken, "x", third); }, ThrowsMessage<Failure>(HasSubstr("x line 5")));
+  EXPECT_THAT([&] { ImportLines(broken, "x", third); }, ThrowsMessage<Failure>(HasSubstr("x: line 5")));
   EXPECT_EQ(4, third.Count());
 }
 
