@@ -4,7 +4,6 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <cstring>
 #include <string>
 
@@ -24,8 +23,6 @@ std::string& PreviewDirectory() {
   static std::string directory;
   return directory;
 }
-
-std::atomic<int> written{0};
 
 using platform::Descriptor;
 
@@ -84,9 +81,7 @@ int property_set(const char* key, const char* value) {
   const std::size_t length = std::strlen(value);
   if (!IsKey(key) || length >= kPropertyValueMax) return -1;
   const Descriptor store = OpenStore();
-  if (!store.valid() || !ReplaceFile(store, key, value, length, S_IRUSR | S_IWUSR)) return -1;
-  ++written;
-  return 0;
+  return store.valid() && ReplaceFile(store, key, value, length, S_IRUSR | S_IWUSR) ? 0 : -1;
 }
 
 std::string PreviewFolder() { return PreviewDirectory().empty() ? "/data/ozrlog" : PreviewDirectory(); }
@@ -96,5 +91,3 @@ std::string PreviewFolder() { return PreviewDirectory().empty() ? "/data/ozrlog"
 int SetHostPropertyStore(const char* directory) { return Put(StoreDirectory(), directory); }
 
 int SetHostPreviewFolder(const char* directory) { return Put(PreviewDirectory(), directory); }
-
-int CountHostPropertyWrites() { return written; }

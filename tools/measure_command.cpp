@@ -193,12 +193,11 @@ int RunMeasuring(const Spec& spec, const MeasureOptions& options, CommandExtra* 
   const Limits limits = options.limits.empty() ? Limits() : ReadLimits(options.limits);
   if (options.verbose) ShowLogLines();
   QVTester tester;
-  const int published = CountHostPropertyWrites();
   Record record = [&] {
     const FilmProgress progress(tester, options.quiet);
     return Measure(tester, RequestOf(spec, options, extra), limits);
   }();
-  if (options.publish && record.measured() && CountHostPropertyWrites() == published) {
+  if (options.publish && record.measured() && tester.kept_->published == 0) {
     throw Failure(kWrongUsage, "--publish: nothing was written: the property store is not this user's own, or full");
   }
   record.dut_id = options.dut;
