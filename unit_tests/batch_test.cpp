@@ -85,7 +85,7 @@ TEST(Manifests, RowsBecomeJobs) {
   EXPECT_EQ(7U, std::stoul(JobsOfManifest(R"({"path": "a", "n": 7})", "m", "").at(0).columns.at("n")));
   EXPECT_EQ("m: row 2: 1 values for 2 columns", Sentence([] { JobsOfManifest("path,unit\na,b\nc\n", "m", ""); }));
   EXPECT_THAT(Sentence([] { JobsOfManifest("path\n\"a", "m", ""); }), HasSubstr("a quote stays open"));
-  EXPECT_THAT(Sentence([] { JobsOfManifest("{\"unit\": \"a\"}\n{\"unit\"", "m", ""); }), HasSubstr("m: row 2"));
+  EXPECT_THAT(Sentence([] { JobsOfManifest("{\"unit\": \"a\"}\n{\"unit\"", "m", ""); }), HasSubstr("m: line 2"));
   for (const char* shard : {"0/2", "3/2", "1", "1/0", "-1/2", "1/2x"})
     EXPECT_THROW(ParseShard(shard), Failure) << shard;
 }
