@@ -1,6 +1,7 @@
 #include "desk/measure/chart_view.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <numeric>
 #include <opencv2/imgproc.hpp>
@@ -198,11 +199,11 @@ struct Ring {
 };
 
 std::vector<Ring> RingsOf(const ChartView& view) {
-  constexpr const char* kNames[] = {"1 corner", "2", "3"};
+  constexpr std::array<const char*, 3> kNames = {"1 corner", "2", "3"};
   std::vector<Ring> rings;
   if (view.complete()) {
     for (std::size_t i = 0; i < view.marks.size(); ++i) {
-      rings.push_back({view.marks[i], std::string(kNames[i]) + (view.plausible() ? "" : " doubtful"),
+      rings.push_back({view.marks[i], std::string(kNames.at(i)) + (view.plausible() ? "" : " doubtful"),
                        view.plausible() ? kGood : kDoubtful});
     }
     return rings;

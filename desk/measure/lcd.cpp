@@ -101,7 +101,8 @@ std::optional<Picture> LcdFinding::Draw(const Record& record) const {
     levels.Keep(cv::Rect2d(at(middle) - cv::Point2d(radius, radius), at(middle) + cv::Point2d(radius, radius)));
   }
   for (int i = 0; i < 9; ++i) {
-    const cv::Point2d point((2 * (i % 3) + 1) * screen.cols / 6.0, (2 * (i / 3) + 1) * screen.rows / 6.0);
+    const int row = i / 3;
+    const cv::Point2d point((2 * (i % 3) + 1) * screen.cols / 6.0, (2 * row + 1) * screen.rows / 6.0);
     levels.Add(picture, {Format("%.0f", result.levels_[i])}, {at(point), cv::Size2d(1, 1)}, kGood, 14);
   }
   DrawKey(picture, {width + 20, top + screen.rows * at.scale + 26},
