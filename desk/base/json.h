@@ -20,8 +20,8 @@ using Json = nlohmann::ordered_json;
 inline constexpr int kMostJsonLevels = 64;
 
 /// Parses a document; `where` names it in sentences. Throws Failure (wrong usage) with the line of what is wrong: no
-/// JSON, a name given twice in one object, more than 64 levels, a number beyond double, text that is not UTF-8. A part of
-/// a file begins with another line of it than the first.
+/// JSON, a name given twice in one object, more than 64 levels, a number beyond double, text that is not UTF-8. A part
+/// of a file begins with another line of it than the first.
 Json ParseJson(const std::string& text, const std::string& where, long first_line = 1);
 
 /// The same from a file; `kind` is that of the failure when the file itself can't be read (over 256 MB among others).

@@ -70,10 +70,16 @@ class CircleCheck : public Measurement {
     spec_.name = "circle_check";
     spec_.routine = "CheckPatternCircles";
     spec_.inputs = {{"frame", QV_RESOURCE_CHART_PHOTO, "Preview frame that shows the chart"}};
-    spec_.parameters = {
-        {"camera", Parameter::kWhole, "N", "Whose frame: 0 is the main camera's, 2 the second rear camera's", 0, 0, 2, {"0", "2"}},
-        ThresholdParameter(),
-        RawParameter()};
+    spec_.parameters = {{"camera",
+                         Parameter::kWhole,
+                         "N",
+                         "Whose frame: 0 is the main camera's, 2 the second rear camera's",
+                         0,
+                         0,
+                         2,
+                         {"0", "2"}},
+                        ThresholdParameter(),
+                        RawParameter()};
     std::vector<Figure> figures = ChartFigures();
     figures.push_back({"centre", kPixel, Number::kReal, &kColumnAxis, kScanMethod,
                        "The chart's centre, column and row: the middle of the longest side between the three marks."});

@@ -168,17 +168,17 @@ class Dust : public Measurement {
     spec_.test = front ? QV_TEST_LENS_DUST_2 : QV_TEST_LENS_DUST;
     spec_.inputs = {{"photo", front ? QV_RESOURCE_FRONT_DUST_PHOTO : QV_RESOURCE_DUST_PHOTO,
                      "Photo of a plain, evenly lit target"}};
-    spec_.parameters = {{"reference",
-                         Parameter::kHistogram,
-                         "FILE",
-                         "Histogram to compare with: an earlier dust record, or 256 numbers",
-                         nullptr,
-                         0,
-                         0,
-                         {},
-                         front ? QV_PROPERTY_FRONT_DUST_HISTOGRAM : QV_PROPERTY_DUST_HISTOGRAM},
-                        {"step", Parameter::kWhole, "N", "Step number, which names the property that is published", 0,
-                         0, 9999}};
+    spec_.parameters = {
+        {"reference",
+         Parameter::kHistogram,
+         "FILE",
+         "Histogram to compare with: an earlier dust record, or 256 numbers",
+         nullptr,
+         0,
+         0,
+         {},
+         front ? QV_PROPERTY_FRONT_DUST_HISTOGRAM : QV_PROPERTY_DUST_HISTOGRAM},
+        {"step", Parameter::kWhole, "N", "Step number, which names the property that is published", 0, 0, 9999}};
     spec_.figures = Figures();
     spec_.publishes = true;
   }

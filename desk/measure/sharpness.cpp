@@ -123,7 +123,8 @@ std::vector<Parameter> SharpnessParameters() {
       ThresholdParameter(),
       {"pixel_pitch", Parameter::kReal, "UM", "Pixel pitch of the sensor, for figures in lp/mm", nullptr, 0.01, 1000},
       {"transfer", Parameter::kTransfer, "T",
-       "How levels stand for light, for the figures of ISO 12233: srgb, linear, or gamma:G with G from 0.1 to 10", "srgb"},
+       "How levels stand for light, for the figures of ISO 12233: srgb, linear, or gamma:G with G from 0.1 to 10",
+       "srgb"},
       {"uncertainty", Parameter::kFlag, "",
        "Tell how far the test's own MTF50 may be trusted, too: 50 more readings of each region", false}};
 }
