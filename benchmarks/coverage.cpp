@@ -15,6 +15,7 @@
 #include <string>
 #include <vector>
 
+#include "benchmarks/pairs.h"
 #include "benchmarks/trials.h"
 #include "desk/measure/cielab.h"
 #include "desk/measure/edge_resampling.h"
@@ -22,6 +23,7 @@
 #include "desk/measure/measure.h"
 #include "desk/measure/patch_trust.h"
 #include "desk/measure/robust_map.h"
+#include "desk/measure/sharpness.h"
 #include "desk/measure/uncertainty.h"
 #include "desk/simulation/method_law.h"
 #include "desk/simulation/simulation.h"
@@ -142,13 +144,7 @@ cv::Mat Region(const Condition& condition, const cv::Mat& photo) {
 
 double ReadOwn(const cv::Mat& region) {
   thread_local QVTester tester;
-  std::vector<float> freq;
-  std::vector<float> sfr;
-  float mtf50 = 0;
-  cv::Mat levels;
-  region.convertTo(levels, CV_32F);
-  tester.CalculateSFR(levels, freq, sfr, mtf50);
-  return mtf50;
+  return ReadOwnMtf50(tester, region);
 }
 
 Trial TryOwn(const Condition& condition, cv::RNG& random) {
@@ -282,28 +278,16 @@ std::vector<Trial> TryMarks(const Condition& condition, cv::RNG& random) {
 
 // A pair of textured photos; the fixed map's shift and turn, the map of all matches, and what lies between both.
 std::vector<Trial> TryMaps(const Condition& condition, cv::RNG& random) {
-  SimulationOptions options;
-  options.scene = "pair";
-  options.camera.size = {640, 480};
-  options.camera.blur_px = condition.blur;
-  options.camera.noise_percent = condition.noise_percent;
-  options.camera.gain = 0.75;
-  options.camera.seed = random.next();
-  options.motion_px = {random.uniform(-40.0, 40.0), random.uniform(-40.0, 40.0)};
-  options.second_turn_deg = random.uniform(-10.0, 10.0);
-  options.second_scale = random.uniform(0.9, 1.1);
-  const Simulation simulation = Simulate(options);
-  CameraModel other = options.camera;
-  other.seed += 1000;
-  cv::Mat photos[] = {Sense(options.camera, simulation.levels[0], 8), Sense(other, simulation.levels[1], 8)};
-  for (cv::Mat& photo : photos) {
-    if (condition.jpeg != 0) photo = ThroughJpeg(photo, condition.jpeg);
+  const std::uint64_t seed = random.next();
+  const SimulationOptions options = DrawPair(condition.blur, condition.noise_percent, seed, random);
+  PhotoPair pair = ShootPair(options);
+  for (cv::Mat* photo : {&pair.reference, &pair.image}) {
+    if (condition.jpeg != 0) *photo = ThroughJpeg(*photo, condition.jpeg);
   }
   QVTester tester;
-  const Record record = Measure(tester, {"registration", {photos[0], photos[1]}});
+  const Record record = Measure(tester, {"registration", {pair.reference, pair.image}});
   const Reading* const robust = record.phase.Find("robust_matrix");
   if (robust == nullptr || robust->uncertainties.empty()) return std::vector<Trial>(5, {NAN, NAN, 1});
-  const cv::Mat truth = cv::Mat(simulation.truth.at("matrix").get<std::vector<double>>(), true).reshape(1, 2);
   const auto trial = [&](const char* figure, double is) {
     const Reading& reading = *record.phase.Find(figure);
     return Trial{reading.value() - is, reading.uncertainty().expanded, 100};
@@ -311,9 +295,9 @@ std::vector<Trial> TryMaps(const Condition& condition, cv::RNG& random) {
   const cv::Mat fixed = cv::Mat(record.phase.Find("matrix")->values, true).reshape(1, 2);
   return {trial("shift_columns", options.motion_px.x),
           trial("turn", options.second_turn_deg),
-          {robust->values[0] - truth.at<double>(0, 0), robust->uncertainties[0].expanded, 1},
-          {robust->values[2] - truth.at<double>(0, 2), robust->uncertainties[2].expanded, 100},
-          trial("map_distance", MapDistance(fixed, truth, options.camera.size))};
+          {robust->values[0] - pair.truth.at<double>(0, 0), robust->uncertainties[0].expanded, 1},
+          {robust->values[2] - pair.truth.at<double>(0, 2), robust->uncertainties[2].expanded, 100},
+          trial("map_distance", MapDistance(fixed, pair.truth, options.camera.size))};
 }
 
 // One run gives a reading of each figure.

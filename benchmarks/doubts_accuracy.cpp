@@ -14,6 +14,7 @@
 #include <string>
 #include <vector>
 
+#include "benchmarks/pairs.h"
 #include "benchmarks/trials.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/robust_map.h"
@@ -37,6 +38,16 @@ struct Count {
     ++readings;
     ++(is_off ? off : good);
     if (is_doubted) ++(is_off ? caught : doubted);
+  }
+  // How far each is off, NaN where there is none, and whether it was doubted.
+  void Add(const std::vector<std::pair<double, bool>>& tried, double most_off) {
+    for (const auto& [off, is_doubted] : tried) {
+      if (std::isnan(off)) {
+        ++none;
+      } else {
+        Add(off > most_off, is_doubted);
+      }
+    }
   }
   void Add(const Count& other) {
     for (int Count::*part :
@@ -326,13 +337,7 @@ void PrintPatches() {
     std::vector<std::pair<double, bool>> tried(photos);
     ForEachTrial(photos, [&](int trial) { tried[trial] = TryPatches(oblique, trial); });
     Count count;
-    for (const auto& [furthest, doubted] : tried) {
-      if (std::isnan(furthest)) {
-        ++count.none;
-      } else {
-        count.Add(furthest > kPatchOff, doubted);
-      }
-    }
+    count.Add(tried, kPatchOff);
     char name[64];
     std::snprintf(name, sizeof name, "%g degrees off straight on, any direction", oblique);
     PrintRow(name, count);
@@ -348,37 +353,17 @@ void PrintMaps() {
   std::vector<std::pair<double, bool>> tried(pairs, {NAN, false});
   ForEachTrial(pairs, [&](int trial) {
     cv::RNG random(trial + 5001);
-    SimulationOptions options;
-    options.scene = "pair";
-    options.camera.size = {640, 480};
-    options.camera.blur_px = 0.8;
-    options.camera.noise_percent = random.uniform(0.0, 3.0);
-    options.camera.gain = 0.75;
-    options.camera.seed = static_cast<std::uint64_t>(trial) + 5001;
-    const double x = random.uniform(-40.0, 40.0);
-    options.motion_px = {x, random.uniform(-40.0, 40.0)};
-    options.second_turn_deg = random.uniform(-10.0, 10.0);
-    options.second_scale = random.uniform(0.9, 1.1);
+    const double noise_percent = random.uniform(0.0, 3.0);
+    SimulationOptions options = DrawPair(0.8, noise_percent, static_cast<std::uint64_t>(trial) + 5001, random);
     options.second_gain = random.uniform(0.7, 1.3);
-    const Simulation simulation = Simulate(options);
-    CameraModel other = options.camera;
-    other.seed += 1000;
-    const Record record = MeasureAnew(
-        {"registration", {Sense(options.camera, simulation.levels[0], 8), Sense(other, simulation.levels[1], 8)}});
+    const PhotoPair pair = ShootPair(options);
+    const Record record = MeasureAnew({"registration", {pair.reference, pair.image}});
     if (record.phase.code != QV_SUCCESS) return;
-    const auto matrix = [](const std::vector<double>& values) { return cv::Mat(values, true).reshape(1, 2); };
-    const cv::Mat truth = matrix(simulation.truth.at("matrix").get<std::vector<double>>());
-    tried[trial] = {MapDistance(matrix(record.phase.Find("matrix")->values), truth, options.camera.size),
-                    record.doubtful()};
+    const cv::Mat map = cv::Mat(record.phase.Find("matrix")->values, true).reshape(1, 2);
+    tried[trial] = {MapDistance(map, pair.truth, options.camera.size), record.doubtful()};
   });
   Count count;
-  for (const auto& [off_px, doubted] : tried) {
-    if (std::isnan(off_px)) {
-      ++count.none;
-    } else {
-      count.Add(off_px > kMapOff, doubted);
-    }
-  }
+  count.Add(tried, kMapOff);
   std::printf(
       "\nRegistration by three matches, pairs of 640 x 480 with noise to 3 %%: off is a map further than 3 px from "
       "the truth\n\n%s",

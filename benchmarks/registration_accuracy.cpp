@@ -4,40 +4,21 @@
 #include <cstdio>
 #include <string>
 
+#include "benchmarks/pairs.h"
 #include "benchmarks/trials.h"
 #include "desk/measure/robust_map.h"
-#include "desk/simulation/simulation.h"
 #include "qvtester/tester.h"
 
 namespace {
 
 using namespace qv;
 
-struct Pair {
-  cv::Mat reference, image;  // CV_8UC1
-  cv::Mat truth;             // 2 x 3, CV_64F
-};
-
-Pair DrawPair(int trial) {
+PhotoPair DrawGrayPair(int trial) {
   cv::RNG random(trial + 1);
-  SimulationOptions options;
-  options.scene = "pair";
-  options.camera.size = {640, 480};
-  options.camera.blur_px = 0.8;
-  options.camera.noise_percent = 3;
-  options.camera.gain = 0.75;
-  options.camera.seed = trial + 1;
-  options.motion_px = {random.uniform(-40.0, 40.0), random.uniform(-40.0, 40.0)};
-  options.second_turn_deg = random.uniform(-10.0, 10.0);
-  options.second_scale = random.uniform(0.9, 1.1);
+  SimulationOptions options = DrawPair(0.8, 3, trial + 1, random);
   options.second_gain = random.uniform(0.7, 1.3);
-  const Simulation simulation = Simulate(options);
-  CameraModel other = options.camera;
-  other.seed += 1000;
-  Pair pair;
-  cv::extractChannel(Sense(options.camera, simulation.levels[0], 8), pair.reference, 0);
-  cv::extractChannel(Sense(other, simulation.levels[1], 8), pair.image, 0);
-  pair.truth = cv::Mat(simulation.truth.at("matrix").get<std::vector<double>>(), true).reshape(1, 2);
+  PhotoPair pair = ShootPair(options);
+  for (cv::Mat* photo : {&pair.reference, &pair.image}) cv::extractChannel(*photo, *photo, 0);
   return pair;
 }
 
@@ -55,7 +36,7 @@ void PrintRegistration() {
   std::vector<double> robust(kPairs, 1e9);
   std::vector<std::string> doubts(kPairs);
   ForEachTrial(kPairs, [&](int trial) {
-    const Pair pair = DrawPair(trial);
+    const PhotoPair pair = DrawGrayPair(trial);
     QVTester tester;
     cv::Mat unwarped;
     if (tester.GetUnwarpedImage(pair.reference, pair.image, unwarped) == QV_SUCCESS) {

@@ -15,6 +15,7 @@
 #include "desk/simulation/film.h"
 #include "desk/simulation/photo_file.h"
 #include "desk/simulation/simulation.h"
+#include "qvtester/resource.h"
 #include "tools/commands.h"
 #include "tools/options.h"
 #include "tools/program.h"
@@ -188,9 +189,9 @@ void Complete(SimulateOptions& o) {
   CameraModel& camera = o.camera;
   if (o.size.empty()) o.size = o.is_film() ? "1280x720" : "4000x3000";
   camera.size = ParseSize("--size", o.size);
-  constexpr std::int64_t kMostPixels = 200'000'000;  // larger photos are refused wherever they are read
-  if (std::int64_t{camera.size.width} * camera.size.height > kMostPixels) {
-    throw Failure(kWrongUsage, "--size " + o.size + ": more than 200 megapixels, which nothing would read");
+  if (std::int64_t{camera.size.width} * camera.size.height > QVResource::most_pixels_) {
+    throw Failure(kWrongUsage, Format("--size %s: more than %lld megapixels, which nothing would read", o.size.c_str(),
+                                      static_cast<long long>(QVResource::most_pixels_ / 1'000'000)));
   }
   for (std::size_t i = 0; i < o.numbers.size(); ++i) {
     const CameraNumber& row = kCameraNumbers[i];

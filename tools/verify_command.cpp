@@ -93,8 +93,7 @@ CommandBody DeclareVerify(Options& command) {
   auto paths = std::make_shared<std::vector<std::string>>();
   command.Arguments("RECORD", *paths,
                     "Records of golden photos, as --json wrote them, or folders that hold them at any depth; a photo "
-                    "is looked for where the "
-                    "record says and beside the record, by its content",
+                    "is looked for where the record says and beside the record, by its content",
                     "PATH", true);
   return [paths] {
     Counts counts;

@@ -30,8 +30,7 @@ bool FallsTo(const Shard& shard, const Job& job);
 std::vector<Job> ShareOf(const Shard& shard, std::vector<Job> jobs);
 
 /// A job for every picture file of a folder (not of its subfolders; none whose name starts with a dot, which is still
-/// being written), in the order of their names; the unit is the
-/// file's name without its ending.
+/// being written), in the order of their names; the unit is the file's name without its ending.
 std::vector<Job> JobsOfPhotos(const std::string& folder);
 
 /// A job for every subfolder, whose name is the unit's.

@@ -209,7 +209,7 @@ cv::Scalar MeanInside(const cv::Mat& photo, const std::array<cv::Point2d, 4>& ou
 // A patch whose middle is of another colour than the whole has a neighbour in it.
 void DoubtEvenness(Record& record, const CaptureFinding& finding) {
   constexpr double kInner = 0.5;
-  constexpr double kMostOff = 8;  // CIE 1976 difference; the mean is then off by some 3
+  constexpr double kMostOff = 8;  // levels of a channel; the mean colour is then off by some 3 (CIE 1976)
   double worst = 0;
   std::size_t which = 0;
   for (std::size_t i = 0; i < finding.outlines.size(); ++i) {
@@ -223,10 +223,9 @@ void DoubtEvenness(Record& record, const CaptureFinding& finding) {
   if (worst <= kMostOff) return;
   record.Say(
       Remark::kDoubt, "uneven_patches",
-      Format(
-          "%s: patch %zu is not of one colour: its middle differs from its mean by %.1f (CIE 1976); is the chart seen "
-          "straight on, and clean?",
-          record.inputs[0].path.c_str(), which, worst),
+      Format("%s: patch %zu is not of one colour: its middle differs from its mean by %.1f levels in a channel; is the "
+             "chart seen straight on, and clean?",
+             record.inputs[0].path.c_str(), which, worst),
       "lab_l");
 }
 

@@ -45,8 +45,7 @@ ChartView LookAtChart(const FoundChart& found) {
   if (!view.complete()) return view;
   const cv::Point2d right = view.marks[1].centre - view.marks[0].centre;
   const cv::Point2d down = view.marks[2].centre - view.marks[0].centre;
-  view.legs_ratio = cv::norm(right) / cv::norm(down);
-  view.legs_angle_deg = std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI;
+  view.legs = {right, down};
   view.turn_deg = std::atan2(0.0 - right.y, right.x) * 180 / CV_PI;  // never -0
   view.straightened_by_deg = cvRound(std::remainder(found.angle_deg - static_cast<double>(kUprightAngle), 360.0));
   return view;
@@ -94,10 +93,6 @@ Parameter ThresholdParameter() {
           QV_PROPERTY_BINARY_THR_WORKING};
 }
 
-bool ChartView::plausible() const {
-  return legs_ratio >= 0.9 && legs_ratio <= 1.1 && std::fabs(legs_angle_deg - 90) <= 5;
-}
-
 void AddChartFigures(Phase& phase, const ChartView& view) {
   phase.Add("marks_found", static_cast<double>(view.marks.size()));
   phase.Add("mark_candidates", view.candidates);
@@ -114,8 +109,8 @@ void AddChartFigures(Phase& phase, const ChartView& view) {
                              return sum + mark.module_px;
                            }) / static_cast<double>(view.marks.size()));
   if (!view.complete()) return;
-  phase.Add("legs_ratio", view.legs_ratio);
-  phase.Add("legs_angle", view.legs_angle_deg);
+  phase.Add("legs_ratio", view.legs.ratio());
+  phase.Add("legs_angle", view.legs.angle_deg());
   phase.Add("chart_turn", view.turn_deg);
   phase.Add("straightened_by", view.straightened_by_deg);
 }
@@ -138,7 +133,7 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
     record.Say(Remark::kDoubt, "implausible_marks",
                Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "
                       "not as 1 to 1 at 90; is the chart seen straight on, and nothing else like a mark?",
-                      photo_path.c_str(), view.legs_ratio, view.legs_angle_deg),
+                      photo_path.c_str(), view.legs.ratio(), view.legs.angle_deg()),
                "legs_ratio");
   }
   if (LooksMirrored(found)) {
@@ -159,13 +154,14 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
 
 void DoubtView(Record& record, const ChartView& view, const char* parts, double most_oblique) {
   constexpr double kSkewDeg = 60;  // of the legs' angle that goes with so much of their ratio
-  const bool straight =
-      std::fabs(view.legs_ratio - 1) <= most_oblique && std::fabs(view.legs_angle_deg - 90) <= kSkewDeg * most_oblique;
+  const double ratio = view.legs.ratio();
+  const double angle_deg = view.legs.angle_deg();
+  const bool straight = std::fabs(ratio - 1) <= most_oblique && std::fabs(angle_deg - 90) <= kSkewDeg * most_oblique;
   if (straight) return;
   record.Say(Remark::kDoubt, "oblique",
              Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; %s may lie beside "
                     "their places",
-                    record.inputs[0].path.c_str(), view.legs_ratio, view.legs_angle_deg, parts),
+                    record.inputs[0].path.c_str(), ratio, angle_deg, parts),
              "legs_ratio");
 }
 
@@ -173,7 +169,7 @@ std::string ReportChart(const ChartView& view) {
   double module = 0;
   for (const Mark& mark : view.marks) module += mark.module_px / static_cast<double>(view.marks.size());
   return Format("marks      %zu found, %.1f px a module; legs %.3f : 1 at %.1f degrees; threshold %d\n",
-                view.marks.size(), module, view.legs_ratio, view.legs_angle_deg, view.threshold) +
+                view.marks.size(), module, view.legs.ratio(), view.legs.angle_deg(), view.threshold) +
          Format("chart      turned by %.1f degrees counter-clockwise, straightened by %d\n", view.turn_deg,
                 view.straightened_by_deg);
 }

@@ -9,6 +9,7 @@
 
 #include "desk/drawing/labels.h"
 #include "desk/drawing/picture.h"
+#include "desk/measure/legs.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/miss.h"
 #include "desk/measure/record.h"
@@ -19,18 +20,15 @@ namespace qv {
 // What a search for finder marks saw of a chart photo, told to people.
 
 struct ChartView {
-  std::vector<Mark> marks;   // with three: corner, second, third; otherwise the candidates, in the order found
-  int candidates = 0;        // before the best three were chosen
-  int threshold = 0;         // grey level
-  std::optional<Miss> miss;  // after DescribeChart, without three marks
-  double legs_ratio = 0;     // the rest only with three marks
-  double legs_angle_deg = 0;
+  std::vector<Mark> marks;      // with three: corner, second, third; otherwise the candidates, in the order found
+  int candidates = 0;           // before the best three were chosen
+  int threshold = 0;            // grey level
+  std::optional<Miss> miss;     // after DescribeChart, without three marks
+  Legs legs;                    // the rest only with three marks
   double turn_deg = 0;          // of the first leg, counter-clockwise
   int straightened_by_deg = 0;  // clockwise, whole degrees, as the measures turn the photo
 
-  /// Whether the three marks look like a chart's: legs of one length, at a right angle.
-  bool plausible() const;
-
+  bool plausible() const { return legs.plausible(); }
   bool complete() const { return marks.size() == 3; }
 };
 

@@ -201,46 +201,72 @@ Check FirstFailure(const cv::Mat& binary, cv::Point core, double module_px) {
   return {};
 }
 
-std::vector<Candidate> NearestCandidates(const cv::Mat& binary, const std::vector<Mark>& found) {
-  constexpr double kLoose = 0.95;
-  constexpr std::size_t kMost = 3;
-  struct Place {
-    Candidate candidate;
-    double departure;
-  };
-  std::vector<Place> places;
-  const auto near = [](const Mark& a, const Mark& b) {
-    return cv::norm(a.centre - b.centre) < 3.5 * std::max(a.module_px, b.module_px);
-  };
-  const auto consider = [&](cv::Point core) {
-    const std::optional<Bands> row = BandsThrough(binary, core, {1, 0});
+namespace {
+
+struct Place {
+  Candidate candidate;
+  double departure;
+};
+
+// Collects what resembles a mark and is none, each place once, at its least departure.
+class Search {
+ public:
+  Search(const cv::Mat& binary, const std::vector<Mark>& found) : binary_(binary), found_(found) {}
+
+  const std::vector<Place>& places() const { return places_; }
+
+  void Consider(cv::Point core) {
+    constexpr double kLoose = 0.95;
+    const std::optional<Bands> row = BandsThrough(binary_, core, {1, 0});
     if (!row || !(row->cut ? row->counts[2] >= 2 : row->total() >= 7 && row->departure() <= kLoose)) return;
-    const std::optional<Bands> column = BandsThrough(binary, core, {0, 1});
+    const std::optional<Bands> column = BandsThrough(binary_, core, {0, 1});
     if (!column || !(row->cut ? column->fit() : column->cut ? row->fit() : column->departure() <= kLoose)) return;
     const Bands& whole = row->cut ? *column : *row;
     const Bands& other = row->cut ? *row : *column;
     if (other.counts[2] > 3 * whole.counts[2] || whole.counts[2] > 3 * other.counts[2]) return;
     const Mark mark = {cv::Point2d(core), other.cut ? whole.total() / 7.0 : (row->total() + column->total()) / 14.0};
-    if (std::any_of(found.begin(), found.end(), [&](const Mark& known) { return near(mark, known); })) return;
-    Check failed = FirstFailure(binary, core);
+    if (std::any_of(found_.begin(), found_.end(), [&](const Mark& known) { return Near(mark, known); })) return;
+    Check failed = FirstFailure(binary_, core);
     if (failed.kind == Check::kFits) return;
-    const double departure = other.cut ? whole.departure() : std::max(row->departure(), column->departure());
-    const auto same =
-        std::find_if(places.begin(), places.end(), [&](const Place& p) { return near(p.candidate.mark, mark); });
-    if (same == places.end()) {
-      places.push_back({{mark, std::move(failed)}, departure});
-    } else if (departure < same->departure) {
-      *same = {{mark, std::move(failed)}, departure};
+    Keep({{mark, std::move(failed)}, other.cut ? whole.departure() : std::max(row->departure(), column->departure())});
+  }
+
+ private:
+  static bool Near(const Mark& a, const Mark& b) {
+    return cv::norm(a.centre - b.centre) < 3.5 * std::max(a.module_px, b.module_px);
+  }
+
+  void Keep(Place place) {
+    const auto same = std::find_if(places_.begin(), places_.end(), [&](const Place& known) {
+      return Near(known.candidate.mark, place.candidate.mark);
+    });
+    if (same == places_.end()) {
+      places_.push_back(std::move(place));
+    } else if (place.departure < same->departure) {
+      *same = std::move(place);
     }
-  };
-  for (int i = 1; i < binary.rows && places.size() < 2000; i += 2) {
+  }
+
+  const cv::Mat& binary_;
+  const std::vector<Mark>& found_;
+  std::vector<Place> places_;
+};
+
+}  // namespace
+
+std::vector<Candidate> NearestCandidates(const cv::Mat& binary, const std::vector<Mark>& found) {
+  constexpr std::size_t kMost = 3;
+  constexpr std::size_t kEnough = 2000;  // places; noise makes more
+  Search search(binary, found);
+  for (int i = 1; i < binary.rows && search.places().size() < kEnough; i += 2) {
     const auto* const row = binary.ptr<uchar>(i);
     for (int j = 0; j < binary.cols;) {  // the middle of each dark run
       const int first = j;
       while (j < binary.cols && (row[j] == 0) == (row[first] == 0)) ++j;
-      if (row[first] == 0 && j - first >= 3) consider({(first + j - 1) / 2, i});
+      if (row[first] == 0 && j - first >= 3) search.Consider({(first + j - 1) / 2, i});
     }
   }
+  std::vector<Place> places = search.places();
   std::sort(places.begin(), places.end(), [](const Place& a, const Place& b) { return a.departure < b.departure; });
   std::vector<Candidate> nearest;
   for (std::size_t i = 0; i < std::min(places.size(), kMost); ++i) nearest.push_back(places[i].candidate);

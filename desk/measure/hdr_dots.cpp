@@ -21,8 +21,7 @@ namespace {
 constexpr Method kDots = {
     "relative difference to the mean of a square window, single precision",
     "Of 1,000 dots of contrast 0.2 {dots_found} are found at a threshold of 0.1 and 0.5 % noise, corners included; the "
-    "means "
-    "are single precision, whose rounding counts on large pictures with small windows.",
+    "means are single precision, whose rounding counts on large pictures with small windows.",
     "Moved by the picture's noise, by neighbouring dots in the same window, by formats that round."};
 constexpr Method kAreas = {"connected dots, then rectangles closer than the distance, merged until none are",
                            "Exact for the dots that were found.", "Moved by the dots and by the distance."};

@@ -2,6 +2,7 @@
 #include <opencv2/imgproc.hpp>
 #include <vector>
 
+#include "desk/measure/grey.h"
 #include "desk/measure/residual_trust.h"
 
 namespace qv {
@@ -36,11 +37,8 @@ struct Frame {
 };
 
 cv::Mat Smoothed(const cv::Mat& picture) {
-  cv::Mat grey = picture;
-  if (picture.channels() != 1) {
-    cv::cvtColor(picture, grey, picture.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
-  }
-  grey.convertTo(grey, CV_32F);
+  cv::Mat grey;
+  GreyOf(picture).convertTo(grey, CV_32F);
   cv::GaussianBlur(grey, grey, {5, 5}, 0);  // as the refinement sees it
   return grey;
 }
@@ -85,19 +83,24 @@ struct Part {
     products += other.products;
     return *this;
   }
+  // Sums of products and squares, each about its mean.
+  double Both() const { return products - reference * image / count; }
+  double OfImage() const { return image_squares - image * image / count; }
   double Correlation() const {
-    const double both = products - reference * image / count;
-    return both /
-           std::sqrt((reference_squares - reference * reference / count) * (image_squares - image * image / count));
+    return Both() / std::sqrt((reference_squares - reference * reference / count) * OfImage());
   }
 };
+
+Part& PartAt(std::vector<Part>& parts, const Seen& seen, int row, int column) {
+  return parts[row * kParts / seen.both.rows * kParts + column * kParts / seen.both.cols];
+}
 
 std::vector<Part> LevelsByParts(const Seen& seen) {
   std::vector<Part> parts(kParts * kParts);
   for (int row = 0; row < seen.both.rows; ++row) {
     for (int i = 0; i < seen.both.cols; ++i) {
       if (seen.both.at<uchar>(row, i) == 0) continue;
-      Part& part = parts[row * kParts / seen.both.rows * kParts + i * kParts / seen.both.cols];
+      Part& part = PartAt(parts, seen, row, i);
       const double r = seen.reference.at<float>(row, i);
       const double v = seen.image.at<float>(row, i);
       ++part.count;
@@ -113,8 +116,7 @@ std::vector<Part> LevelsByParts(const Seen& seen) {
 
 // Each pixel's slope by the parameters, and its residual under gain and offset of the levels.
 void AddSlopes(const Seen& seen, const Frame& frame, const Part& all, std::vector<Part>& parts) {
-  const double gain =
-      (all.products - all.reference * all.image / all.count) / (all.image_squares - all.image * all.image / all.count);
+  const double gain = all.Both() / all.OfImage();
   const double offset = (all.reference - gain * all.image) / all.count;
   for (int row = 0; row < seen.both.rows; ++row) {
     const double y = (row - frame.middle.y) / frame.half;
@@ -125,7 +127,7 @@ void AddSlopes(const Seen& seen, const Frame& frame, const Part& all, std::vecto
       const double r = gain * seen.by_row.at<float>(row, i);
       const Parameters slope(c * x, c * y, c, r * x, r * y, r);
       const double left = seen.reference.at<float>(row, i) - offset - gain * seen.image.at<float>(row, i);
-      Part& part = parts[row * kParts / seen.both.rows * kParts + i * kParts / seen.both.cols];
+      Part& part = PartAt(parts, seen, row, i);
       part.score += slope * left;
       for (int k = 0; k < 6; ++k) {
         for (int j = 0; j < 6; ++j) part.information(k, j) += slope[k] * slope[j];

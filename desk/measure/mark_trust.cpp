@@ -2,6 +2,7 @@
 #include <cmath>
 #include <opencv2/imgproc.hpp>
 
+#include "desk/measure/legs.h"
 #include "desk/measure/residual_trust.h"
 
 namespace qv {
@@ -102,10 +103,8 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module) {
 cv::Point2d Right(const Places& p) { return {p[2] - p[0], p[3] - p[1]}; }
 cv::Point2d Down(const Places& p) { return {p[4] - p[0], p[5] - p[1]}; }
 
-double LegsRatio(const Places& p) { return cv::norm(Right(p)) / cv::norm(Down(p)); }
-double LegsAngle(const Places& p) {
-  return std::acos(Right(p).dot(Down(p)) / cv::norm(Right(p)) / cv::norm(Down(p))) * 180 / CV_PI;
-}
+double LegsRatio(const Places& p) { return Legs{Right(p), Down(p)}.ratio(); }
+double LegsAngle(const Places& p) { return Legs{Right(p), Down(p)}.angle_deg(); }
 double Turn(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 180 / CV_PI; }
 
 }  // namespace

@@ -11,6 +11,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/finder_trials.h"
 #include "desk/measure/histogram.h"
+#include "desk/measure/legs.h"
 
 namespace qv {
 
@@ -403,13 +404,10 @@ class Explainer {
 bool LieAsOnChart(const std::vector<Mark>& marks) {
   if (marks.size() != kMarks) return false;
   const std::array<Mark, 3> order = InChartOrder(marks);
-  const cv::Point2d right = order[1].centre - order[0].centre;
-  const cv::Point2d down = order[2].centre - order[0].centre;
-  const double ratio = cv::norm(right) / cv::norm(down);
-  const double angle = std::acos(right.dot(down) / cv::norm(right) / cv::norm(down)) * 180 / CV_PI;
-  if (!(ratio >= 0.9 && ratio <= 1.1 && std::fabs(angle - 90) <= 5)) return false;
+  const Legs legs = {order[1].centre - order[0].centre, order[2].centre - order[0].centre};
+  if (!legs.plausible()) return false;
   const double module = (marks[0].module_px + marks[1].module_px + marks[2].module_px) / 3;
-  return FitsLegs(module, right);
+  return FitsLegs(module, legs.right);
 }
 
 Miss ExplainMiss(const std::vector<Mark>& found, int threshold, const cv::Mat& photo) {

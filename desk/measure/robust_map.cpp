@@ -8,6 +8,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "desk/base/text.h"
+#include "desk/measure/grey.h"
 #include "qvtester/tester.h"
 
 namespace qv {
@@ -27,13 +28,6 @@ struct Features {
   std::vector<cv::KeyPoint> points;  // in the picture's own coordinates
   cv::Mat descriptors;
 };
-
-cv::Mat Gray(const cv::Mat& picture) {
-  if (picture.channels() == 1) return picture;
-  cv::Mat gray;
-  cv::cvtColor(picture, gray, picture.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
-  return gray;
-}
 
 Features FindFeatures(const cv::Mat& gray, double scale) {
   cv::Mat searched = gray;
@@ -104,8 +98,8 @@ double MapDistance(const cv::Mat& a, const cv::Mat& b, cv::Size reference) {
 RobustMap FindRobustMap(QVTester& tester, const cv::Mat& reference, const cv::Mat& image) {
   RobustMap result;
   result.correlation = std::numeric_limits<double>::quiet_NaN();
-  const cv::Mat from = Gray(reference);
-  const cv::Mat to = Gray(image);
+  const cv::Mat from = GreyOf(reference);
+  const cv::Mat to = GreyOf(image);
   const double pixels = static_cast<double>(std::max(from.total(), to.total()));
   const double scale = std::min(1.0, std::sqrt(kMostPixels / pixels));
   const Matches matches = Match(FindFeatures(from, scale), FindFeatures(to, scale));

@@ -14,10 +14,8 @@ namespace qv {
 const Method kSfrMethod = {
     "slanted edge, oversampling 1, real part",
     "Reads low by a known law, {own_low_0.3} at a blur of 0.3 px, {own_low_0.8} at 0.8 px, {own_low_3.0} at 3 px, and "
-    "lies "
-    "within that law by {own_law} without noise; with 1 to 2 % noise single readings jump, up or down: those are "
-    "doubted; a "
-    "turned chart reads up to {own_turned} lower for being straightened.",
+    "lies within that law by {own_law} without noise; with 1 to 2 % noise single readings jump, up or down: those are "
+    "doubted; a turned chart reads up to {own_turned} lower for being straightened.",
     "Moved by focus, motion, sharpening and denoising; by the turn of the chart, which is straightened; "
     "by the parity of the region's width, hence by the distance."};
 
@@ -26,10 +24,8 @@ namespace {
 constexpr Method kIso = {
     "slanted edge (ISO 12233:2014) in linear light, oversampling 4, magnitude, derivative and bin width corrected",
     "Mean error within {iso_plain} without noise, {iso_noisy} with 2 % noise, {iso_very_noisy} with 5 % noise, "
-    "{iso_srgb} on "
-    "edges bowed by 1 px, {iso_uneven} in light that falls by 40 % across the region, and {iso_jpeg} after JPEG of "
-    "quality 75 "
-    "from a blur of 0.5 px on.",
+    "{iso_srgb} on edges bowed by 1 px, {iso_uneven} in light that falls by 40 % across the region, and {iso_jpeg} "
+    "after JPEG of quality 75 from a blur of 0.5 px on.",
     "Moved by focus, motion, sharpening and denoising; by a transfer that is not the photo's (--transfer); reads far "
     "too high where the paper is clipped; there is none where the edge lies along the pixel grid."};
 
@@ -102,19 +98,21 @@ void AddIsoFigures(Record& record, const cv::Mat& gray, const SharpnessRegion& r
 // Of the test's own figure, by the region's own noise.
 void AddOwnUncertainty(Record& record, const SharpnessRegion& region, std::size_t i) {
   QVTester tester;
-  const auto read = [&](const cv::Mat& pixels) {
-    std::vector<float> freq;
-    std::vector<float> sfr;
-    float mtf50 = 0;
-    cv::Mat levels;
-    pixels.convertTo(levels, CV_32F);
-    tester.CalculateSFR(levels, freq, sfr, mtf50);
-    return static_cast<double>(mtf50);
-  };
+  const auto read = [&](const cv::Mat& pixels) { return ReadOwnMtf50(tester, pixels); };
   record.phase.Find(std::string("mtf50_") + kRegionNames[i])->Trust({ResampleEdge(region.pixels, read)});
 }
 
 }  // namespace
+
+double ReadOwnMtf50(QVTester& tester, const cv::Mat& pixels) {
+  std::vector<float> freq;
+  std::vector<float> sfr;
+  float mtf50 = 0;
+  cv::Mat levels;
+  pixels.convertTo(levels, CV_32F);
+  tester.CalculateSFR(levels, freq, sfr, mtf50);
+  return mtf50;
+}
 
 InputSpec SharpnessInput() { return {"photo", QV_RESOURCE_CHART_PHOTO, "Photo of the sharpness chart"}; }
 

@@ -43,6 +43,9 @@ std::vector<Parameter> SharpnessParameters();
 /// MTF50 by the test and by ISO 12233, then `more`, then what was seen of the chart.
 std::vector<Figure> SharpnessFigures(const std::vector<Figure>& more = {});
 
+/// The test's own MTF50 of a region as it is, CV_8UC1 or CV_32FC1 in grey levels; NaN where the test has none.
+double ReadOwnMtf50(QVTester& tester, const cv::Mat& pixels);
+
 /// What the test's own figures would be of good light and without noise.
 std::vector<Figure> DoubtFigures();
 /// Adds these figures, and a doubt for each of the test's own figures that something in the photo has made wrong.

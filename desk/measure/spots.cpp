@@ -1,13 +1,11 @@
 // Spots on a photo of a plain target, at any size.
 //
-// 1. The light's fall-off: a smooth surface of fourth degree, fitted to means of blocks without those that lie below
-// it.
-//    What is left is held relative to it, and to the noise at each place, measured between neighbours.
+// 1. The light's fall-off: a smooth surface of fourth degree, fitted to means of blocks without those below it. What
+//    is left is held relative to it, and to the noise at each place, measured between neighbours.
 // 2. A pyramid of halves. At each level two sizes of Gaussian are held against one four times as wide, which takes out
 //    what the surface left; that is a matched filter for discs and soft spots alike (89 % of the best for a disc).
-// 3. Minima deeper than that level's own noise makes by itself, the surest first; each takes its connected dark region
-// and
-//    with it all fainter minima there, so that a large spot's rim makes no spots of its own.
+// 3. Minima deeper than that level's own noise makes by itself, the surest first; each takes its connected dark
+//    region and with it all fainter minima there, so that a large spot's rim makes no spots of its own.
 
 #include "desk/measure/spots.h"
 
@@ -17,6 +15,8 @@
 #include <functional>
 #include <opencv2/core/utility.hpp>
 #include <opencv2/imgproc.hpp>
+
+#include "desk/measure/grey.h"
 
 namespace qv {
 
@@ -53,10 +53,12 @@ double MedianOf(std::vector<float>& values) {
   return *middle;
 }
 
-// Every so many-th value, at most about 100000.
+// Every so many-th value is sampled, about 100000 in all; odd, so that columns change from row to row.
+std::size_t SampleStep(const cv::Mat& map) { return map.total() / 100000 * 2 + 1; }
+
 template <typename Value>
 std::vector<float> Sampled(const cv::Mat& map, Value&& value) {
-  const std::size_t step = map.total() / 100000 * 2 + 1;  // odd, so that columns change from row to row
+  const std::size_t step = SampleStep(map);
   std::vector<float> values;
   for (std::size_t i = 0; i < map.total(); i += step) {
     values.push_back(value(static_cast<int>(i / map.cols), static_cast<int>(i % map.cols)));
@@ -69,11 +71,7 @@ class Photo {
  public:
   explicit Photo(const cv::Mat& photo) : unit_(photo.depth() == CV_16U ? 1.0f / 257 : 1.0f) {
     CV_Assert(!photo.empty() && (photo.depth() == CV_8U || photo.depth() == CV_16U));
-    if (photo.channels() == 1) {
-      grey_ = photo;
-    } else {
-      cv::cvtColor(photo, grey_, photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
-    }
+    grey_ = GreyOf(photo);
   }
 
   int rows() const { return grey_.rows; }
@@ -438,7 +436,7 @@ class SizeSearch {
       const float* const about = ground.Row(row).data();
       for (int i = 0; i < response.cols; ++i) values[i] -= about[i];
     }
-    const std::size_t step = picture_.total() / 100000 * 2 + 1;  // odd, so that columns change from row to row
+    const std::size_t step = SampleStep(picture_);
     const auto width = static_cast<std::size_t>(picture_.cols);
     for (std::size_t i = (begin * width + step - 1) / step * step; i < end * width; i += step) {
       strip.samples.push_back(

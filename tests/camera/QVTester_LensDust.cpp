@@ -151,12 +151,10 @@ void QVTester::save_mung_location(cv::Point2f p, int index) {
   char joined[128];
   // An item that does not fit is cut here, and the store then refuses the whole: what it held stays as it was.
   if (std::snprintf(joined, sizeof(joined), "%s%s", held, item) < 0) return;
-  kept_->published += static_cast<int>(platform::property_set(key.data(), joined) == 0);
+  platform::Publish(kept_->published, key.data(), joined);
 }
 
-void QVTester::remove_mung_location(int index) {
-  kept_->published += static_cast<int>(platform::property_set(MungKey(index).data(), "") == 0);
-}
+void QVTester::remove_mung_location(int index) { platform::Publish(kept_->published, MungKey(index).data(), ""); }
 
 // The detector takes what touches the picture's border for a blob unless the border itself is dark; dust that reaches
 // into the frame is one with it, and is not seen. One pixel is enough, and costs the least.

@@ -29,7 +29,7 @@ std::array<char, 32> Short(const char* format, Arguments... arguments) {
 }
 
 void Publish(int& published, const std::array<char, 32>& key, const std::array<char, 32>& value) {
-  published += static_cast<int>(platform::property_set(key.data(), value.data()) == 0);
+  platform::Publish(published, key.data(), value.data());
 }
 
 int Middle(int a, int b) { return static_cast<int>((static_cast<std::int64_t>(a) + b) / 2); }
