@@ -4,6 +4,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/measure/doubt_names.h"
 #include "desk/measure/figures.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/uncertainty.h"
@@ -72,7 +73,7 @@ void ListFigures() {
   }
   std::cout
       << "\n`qvtester explain NAME` tells more of one, or of all of a measurement; `qvtester explain uncertainty`\n"
-         "how far figures may be trusted.\n";
+         "how far figures may be trusted, `qvtester explain doubts` what makes a run an ERROR although it measured.\n";
 }
 
 // How far figures may be trusted is told by method: many figures share one.
@@ -89,11 +90,24 @@ void ExplainUncertainty() {
   }
 }
 
-// All figures of that name, or those whose names hold it.
+void ExplainDoubts() {
+  std::cout
+      << Wrapped(
+             "A doubt makes a run an ERROR: it was measured, and its figures are not to be trusted. A plant whose "
+             "limits were found in spite of one may accept it in its limits file "
+             "(\"accept_doubts\": [\"uneven_light\"]), and the record says that it did.",
+             kWidth)
+      << "\n\n";
+  for (const DoubtInfo& info : Doubts()) std::cout << Format("  %-27s  %s\n", info.name, info.meaning);
+}
+
+// The doubt of that name, and all figures of it, or those whose names hold it.
 void ExplainFigures(const std::string& name) {
   const bool exact = FindFigure(name) != nullptr;
-  std::vector<std::string> known = {"uncertainty"};
-  bool found = false;
+  std::vector<std::string> known = {"uncertainty", "doubts"};
+  const DoubtInfo* const doubt = FindDoubt(name);
+  if (doubt != nullptr) std::cout << doubt->name << "\n" << Line("a doubt", doubt->meaning);
+  bool found = doubt != nullptr;
   for (const FigureInfo& info : AllFigures()) {
     known.push_back(info.name);
     if (exact ? info.name != name : info.name.find(name) == std::string::npos) continue;
@@ -112,13 +126,15 @@ CommandBody DeclareExplain(Options& command) {
   auto names = std::make_shared<std::vector<std::string>>();
   command.Arguments("NAME", *names,
                     "A measurement, a figure as records name it, or a part of such names; \"uncertainty\": how far "
-                    "figures may be trusted; without any, all are listed",
+                    "figures may be trusted; \"doubts\", or a doubt's name; without any, figures are listed",
                     "NAME", false);
   return [names] {
     if (names->empty()) ListFigures();
     for (const std::string& name : *names) {
       if (name == "uncertainty") {
         ExplainUncertainty();
+      } else if (name == "doubts") {
+        ExplainDoubts();
       } else if (const Measurement* const measurement = FindMeasurement(name)) {
         std::cout << Explain(measurement->spec());
       } else if (name.empty()) {

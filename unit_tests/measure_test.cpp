@@ -10,6 +10,7 @@
 #include "chart/chart_layout.h"
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/measure/doubt_names.h"
 #include "desk/measure/measurement.h"
 #include "desk/measure/promises.h"
 #include "desk/measure/sharpness.h"
@@ -328,6 +329,11 @@ TEST(Measure, OutlinesLieOnTheChart) {
     }
     EXPECT_TRUE(finding.Draw(record).has_value());
   }
+}
+
+TEST(Doubts, DocumentsListThemAndNoneLacksAName) {
+  EXPECT_THAT(ReadFile(std::string(QVTESTER_SOURCE) + "/docs/results.md"), HasSubstr(DoubtTable()));
+  for (int i = 0; i <= static_cast<int>(Doubt::kPrintCutOff); ++i) EXPECT_NO_THROW(Info(static_cast<Doubt>(i))) << i;
 }
 
 // Made by `scripts/accuracy --promises`.

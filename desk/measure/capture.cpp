@@ -222,7 +222,7 @@ void DoubtEvenness(Record& record, const CaptureFinding& finding) {
   }
   if (worst <= kMostOff) return;
   record.Say(
-      Remark::kDoubt, "uneven_patches",
+      Doubt::kUnevenPatches,
       Format("%s: patch %zu is not of one colour: its middle differs from its mean by %.1f levels in a channel; is the "
              "chart seen straight on, and clean?",
              record.inputs[0].path.c_str(), which, worst),

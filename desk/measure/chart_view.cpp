@@ -130,14 +130,14 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
   }
   TrustMarks(record.phase, view, photo);
   if (!view.plausible()) {
-    record.Say(Remark::kDoubt, "implausible_marks",
+    record.Say(Doubt::kImplausibleMarks,
                Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "
                       "not as 1 to 1 at 90; is the chart seen straight on, and nothing else like a mark?",
                       photo_path.c_str(), view.legs.ratio(), view.legs.angle_deg()),
                "legs_ratio");
   }
   if (LooksMirrored(found)) {
-    record.Say(Remark::kDoubt, "mirrored",
+    record.Say(Doubt::kMirrored,
                photo_path +
                    ": the chart is mirrored: its dark rectangle lies on the other side of its marks; regions and "
                    "patches are not where they are looked for",
@@ -158,7 +158,7 @@ void DoubtView(Record& record, const ChartView& view, const char* parts, double 
   const double angle_deg = view.legs.angle_deg();
   const bool straight = std::fabs(ratio - 1) <= most_oblique && std::fabs(angle_deg - 90) <= kSkewDeg * most_oblique;
   if (straight) return;
-  record.Say(Remark::kDoubt, "oblique",
+  record.Say(Doubt::kOblique,
              Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; %s may lie beside "
                     "their places",
                     record.inputs[0].path.c_str(), ratio, angle_deg, parts),

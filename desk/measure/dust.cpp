@@ -265,7 +265,7 @@ class Dust : public Measurement {
     phase.Add("spot_contrasts", numbers, contrasts);
     phase.Add("noise", found.noise);
     if (!found.cut_short) return;
-    record.Say(Remark::kDoubt, "too_many_spots",
+    record.Say(Doubt::kTooManySpots,
                record.inputs[0].path + ": more spots than a plain target has dust; is the target plain?", "spot_count");
   }
 
@@ -281,14 +281,14 @@ class Dust : public Measurement {
     };
     const char* const path = record.inputs[0].path.c_str();
     if (counts.back() > kMostClipped * pixels) {
-      record.Say(Remark::kDoubt, "clipped",
+      record.Say(Doubt::kClipped,
                  Format("%s: %.0f %% of the photo is clipped at level 255, where no speck shows; use less light", path,
                         100 * counts.back() / pixels),
                  "histogram");
     }
     if (finding.spots.cut_short || level_of(0.03) < kDarkestOfTarget * level_of(0.5)) {
       record.Say(
-          Remark::kDoubt, "no_plain_target",
+          Doubt::kNoPlainTarget,
           Format("%s: this is no plain, evenly lit target: 3 in 100 of its pixels lie below level %d, half below %d",
                  path, level_of(0.03), level_of(0.5)),
           "histogram");
@@ -297,7 +297,7 @@ class Dust : public Measurement {
                                      [](const Spot& spot) { return spot.diameter_px() > kLargestBlobPx; });
     if (large > 0) {
       record.Say(
-          Remark::kDoubt, "large_dark_areas",
+          Doubt::kLargeDarkAreas,
           Format("%s: %s larger than the discs of 4 to %.0f px that blobs are counted by: see the spots", path,
                  Count(static_cast<std::size_t>(large), "dark area is", "dark areas are").c_str(), kLargestBlobPx),
           "spot_largest_area");

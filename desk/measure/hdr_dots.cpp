@@ -149,7 +149,7 @@ void Look(Record& record, const Dots& dots) {
   const int count = cv::countNonZero(dots.mask);
   if (dots.by_noise > kMostByNoise && count > 0 && dots.spots <= kMostSpots) {
     record.Say(
-        Remark::kDoubt, "dots_in_noise",
+        Doubt::kDotsInNoise,
         Format("%s: doubtful: noise as strong as this picture's alone would give %.*f dots, and %d are seen; use a "
                "higher --threshold or a longer exposure",
                path, dots.by_noise < 10 ? 1 : 0, dots.by_noise, count),

@@ -172,7 +172,7 @@ void Look(Record& record, const Regions& regions, const Areas& areas) {
   for (const QVLightRegion& region : regions) {
     const std::string which = regions.size() == 1 ? path : Format("%s: region with label %d", path, region.label_);
     if (region.clipped_share_ > kClipped) {
-      record.Say(Remark::kDoubt, "clipped",
+      record.Say(Doubt::kClipped,
                  Format("%s: doubtful: %.0f %% of its pixels are clipped, and its colour is another one; expose less",
                         which.c_str(), 100 * region.clipped_share_),
                  "clipped_share_max");
@@ -183,7 +183,7 @@ void Look(Record& record, const Regions& regions, const Areas& areas) {
                  "mean_grey_min");
     }
     if (region.width_ < window || region.height_ < window) {
-      record.Say(Remark::kDoubt, "region_smaller_than_window",
+      record.Say(Doubt::kSmallRegion,
                  Format("%s: doubtful: smaller than the dots' window, %d x %d pixels: no dots were looked for; use a "
                         "smaller --radius",
                         which.c_str(), window, window),
@@ -191,7 +191,7 @@ void Look(Record& record, const Regions& regions, const Areas& areas) {
     }
   }
   if (areas.rectangles.size() > kMostSpots) {
-    record.Say(Remark::kDoubt, "too_many_dots",
+    record.Say(Doubt::kTooManyDots,
                Format("%s: doubtful: %zu separate dots are noise, not defects; use a higher --threshold", path,
                       areas.rectangles.size()),
                "area_count");

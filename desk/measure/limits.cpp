@@ -6,6 +6,7 @@
 #include "chart/chart_layout.h"
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "desk/measure/doubt_names.h"
 #include "desk/measure/figures.h"
 
 namespace qv {
@@ -108,6 +109,21 @@ DecisionRule ReadRule(const JsonView& view) {
   return rule;
 }
 
+std::set<std::string> ReadAccepted(const JsonView& view) {
+  std::vector<std::string> known;
+  for (const DoubtInfo& info : Doubts()) known.emplace_back(info.name);
+  std::set<std::string> accepted;
+  for (const JsonView& doubt : view.Elements()) {
+    const std::string name = doubt.Text();
+    if (FindDoubt(name) == nullptr) {
+      doubt.Refuse("\"" + Printable(name) + "\" is no doubt; `qvtester explain doubts` lists them" +
+                   DidYouMean(name, known));
+    }
+    accepted.insert(name);
+  }
+  return accepted;
+}
+
 }  // namespace
 
 const Limit& FigureLimit::Of(double number) const {
@@ -131,9 +147,7 @@ Limits LimitsFromJson(const Json& json, const std::string& where) {
   if (view.Has("name")) limits.name = view.At("name").Text();
   if (view.Has("revision")) limits.revision = view.At("revision").Text();
   if (view.Has("decision")) limits.rule = ReadRule(view.At("decision"));
-  if (view.Has("accept_doubts")) {
-    for (const JsonView& doubt : view.At("accept_doubts").Elements()) limits.accept_doubts.insert(doubt.Text());
-  }
+  if (view.Has("accept_doubts")) limits.accept_doubts = ReadAccepted(view.At("accept_doubts"));
   const JsonView all = view.At("limits");
   for (const auto& [name, limit] : all.Members()) limits.by_name[name] = ReadLimit(FigureOf(all, name), limit);
   if (limits.by_name.empty()) all.Refuse("is empty; nothing would be judged");

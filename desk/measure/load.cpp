@@ -193,7 +193,7 @@ class Loader {
 
   void DoubtEnd(const std::string& name, const std::string& content) {
     if (content.compare(0, 3, "\xFF\xD8\xFF") != 0 || EndsAsJpeg(content)) return;
-    record_.Say(Remark::kDoubt, "decoder_complaint", name + ": the file ends before its picture does; it was cut");
+    record_.Say(Doubt::kDecoderComplaint, name + ": the file ends before its picture does; it was cut");
   }
 
   // The library's line names the file.
@@ -301,7 +301,7 @@ void SayComplaint(Record& record, const std::string& name, const std::vector<std
   };
   const auto complaint = std::find_if_not(lines.begin(), lines.end(), is_warning);
   if (complaint != lines.end()) {
-    record.Say(Remark::kDoubt, "decoder_complaint",
+    record.Say(Doubt::kDecoderComplaint,
                name + ": the decoder says \"" + *complaint + "\", and fills up what it can't read; is the file whole?");
   } else if (!lines.empty()) {
     record.Say(Remark::kWarning, "decoder_warning", name + ": the decoder says \"" + lines.front() + "\"");

@@ -69,12 +69,12 @@ void Look(Record& record, const Print& print) {
     const std::string how = std::isnan(correlation)
                                 ? "the registration did not converge"
                                 : Format("it correlates with the good print by %.2f only", correlation);
-    record.Say(Remark::kDoubt, "not_registered",
+    record.Say(Doubt::kNotRegistered,
                Format("%s: doubtful: %s: is it the same print, upright, sharp and in even light?", path, how.c_str()),
                "correlation");
   }
   if (print.unseen_share > kMostUnseen) {
-    record.Say(Remark::kDoubt, "print_cut_off",
+    record.Say(Doubt::kPrintCutOff,
                Format("%s: doubtful: %.1f %% of the good print's strokes lie outside this photo and were not judged",
                       path, 100 * print.unseen_share),
                "unseen_share");

@@ -11,6 +11,7 @@
 #include "desk/base/json.h"
 #include "desk/base/log_lines.h"
 #include "desk/measure/decision.h"
+#include "desk/measure/doubt_names.h"
 #include "desk/measure/figures.h"
 #include "desk/measure/limits.h"
 #include "desk/measure/request.h"
@@ -97,7 +98,7 @@ struct Remark {
   enum Weight {
     kWarning,      // worth knowing
     kMiss,         // why there is no result
-    kDoubt,        // measured, but not to be trusted: an ERROR
+    kDoubt,        // measured, but not to be trusted: an ERROR; one of Doubts()
     kAccepted,     // a doubt that the limits file accepts
     kNoJudgement,  // the test ran, but its figures say nothing about the unit
   };
@@ -127,6 +128,9 @@ struct Record {
 
   void Say(Remark::Weight weight, std::string name, std::string sentence, std::string figure = {}) {
     remarks.push_back({weight, std::move(name), std::move(sentence), std::move(figure)});
+  }
+  void Say(Doubt doubt, std::string sentence, std::string figure = {}) {
+    Say(Remark::kDoubt, Info(doubt).name, std::move(sentence), std::move(figure));
   }
 
   /// Holds every figure against its limit. Call once, when all figures are in.

@@ -104,7 +104,7 @@ void LookAtFixed(Record& record, const RobustMap& robust) {
   if (agreeing >= kLeastAgreeing * good && agreeing > 3 && stretch <= kMostStretch) {
     const Reading* apart = record.phase.Find("map_distance");
     if (robust.doubt.empty() && apart != nullptr && apart->value() > kMostApart) {
-      record.Say(Remark::kDoubt, "maps_differ",
+      record.Say(Doubt::kMapsDiffer,
                  Format("%s: doubtful: the map of all matches lies %.1f px away; --map robust takes that one",
                         record.inputs[1].path.c_str(), apart->value()),
                  "map_distance");
@@ -112,7 +112,7 @@ void LookAtFixed(Record& record, const RobustMap& robust) {
     return;
   }
   const std::string shape = stretch < 1000 ? Format("stretches the picture by %.2f", stretch) : "folds it to a line";
-  record.Say(Remark::kDoubt, "map_not_agreed",
+  record.Say(Doubt::kMapNotAgreed,
              Format("%s: doubtful: %.0f of %.0f good matches agree with the map, which %s; one of the "
                     "three matches that make it may be false",
                     record.inputs[1].path.c_str(), agreeing, good, shape.c_str()),
@@ -121,8 +121,8 @@ void LookAtFixed(Record& record, const RobustMap& robust) {
 
 void LookAtRobust(Record& record, const RobustMap& robust) {
   if (robust.doubt.empty()) return;
-  record.Say(Remark::kDoubt, "robust_map_doubtful",
-             Format("%s: doubtful: %s", record.inputs[1].path.c_str(), robust.doubt.c_str()), "robust_matches");
+  record.Say(Doubt::kRobustMap, Format("%s: doubtful: %s", record.inputs[1].path.c_str(), robust.doubt.c_str()),
+             "robust_matches");
 }
 
 class RegistrationFinding : public Finding {

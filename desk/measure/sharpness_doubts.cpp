@@ -25,7 +25,7 @@ void DoubtLevels(Record& record, const cv::Mat& photo, const SharpnessRegion& re
   if (!pile) return;
   constexpr const char* kChannels[] = {"blue", "green", "red"};
   record.Say(
-      Remark::kDoubt, "clipped",
+      Doubt::kClipped,
       Format("%s: the %s region is clipped: %.0f %% of its %s side lies at level %d of %s, so the edge looks sharper "
              "than it is; use %s",
              record.inputs[0].path.c_str(), name, 100 * pile->share, pile->top ? "light" : "dark", pile->level,
@@ -49,14 +49,14 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
   const char* const path = record.inputs[0].path.c_str();
   if (value <= 0) {
     record.Say(
-        Remark::kDoubt, "impossible_figure",
+        Doubt::kImpossibleFigure,
         Format("%s: an MTF50 of %.4f of the %s region is none: the curve starts below one half", path, value, name),
         figure);
     return;
   }
   if (!std::isfinite(noiseless.low) || !std::isfinite(noiseless.high)) {
     record.Say(
-        Remark::kDoubt, "no_plain_edge",
+        Doubt::kNoPlainEdge,
         Format("%s: the %s region does not show one edge with room to both sides, and its MTF50 of %.4f can't be "
                "vouched for; is the chart seen straight on, and sharp?",
                path, name, value),
@@ -65,7 +65,7 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
   }
   if (value >= noiseless.low * (1 - kMostOff) && value <= noiseless.high * (1 + kMostOff)) return;
   const bool uneven = noiseless.unevenness > kUnevenLight;
-  record.Say(Remark::kDoubt, uneven ? "uneven_light" : "noise",
+  record.Say(uneven ? Doubt::kUnevenLight : Doubt::kNoise,
              Format("%s: the %s region reads %.4f Nyquist, and its edge without noise and in even light %.4f: %s", path,
                     name, value, noiseless.value,
                     uneven ? "the light falls across it; light the chart evenly"

@@ -8,6 +8,7 @@
 #include "desk/base/failure.h"
 #include "desk/base/files.h"
 #include "desk/base/text.h"
+#include "desk/measure/doubt_names.h"
 #include "desk/measure/figures.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/measurement.h"
@@ -80,6 +81,13 @@ Limits LimitsOfRecord(const Json& record) {
   Json file = {{"limits", Json::object()}};
   for (const char* const key : {"name", "revision", "accept_doubts", "decision"}) {
     if (about.contains(key)) file[key] = about[key];
+  }
+  if (file.contains("accept_doubts")) {  // once a name that is no doubt's was taken; it accepts nothing
+    Json& names = file["accept_doubts"];
+    const auto unknown = [](const Json& name) {
+      return name.is_string() && FindDoubt(name.get<std::string>()) == nullptr;
+    };
+    names.erase(std::remove_if(names.begin(), names.end(), unknown), names.end());
   }
   for (const auto& [name, m] : record.at("phases").at(0).at("measurements").items()) {
     if (m.contains("limits")) file["limits"][name] = m["limits"];
