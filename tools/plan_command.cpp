@@ -1,12 +1,26 @@
+#include <filesystem>
 #include <iostream>
 #include <memory>
 
 #include "desk/base/files.h"
+#include "desk/base/text.h"
 #include "desk/batch/plan.h"
 #include "tools/commands.h"
 #include "tools/program.h"
 
 namespace qv {
+
+namespace {
+
+// Other outputs are made anew each time; a plan is written once, and then a person's work.
+void RefuseToReplace(const std::string& path) {
+  if (std::filesystem::is_regular_file(path)) {
+    throw Failure(kWrongUsage,
+                  Printable(path) + ": is there already, and a new plan would take its place; name another");
+  }
+}
+
+}  // namespace
 
 CommandBody DeclarePlan(Options& command) {
   struct Wanted {
@@ -23,7 +37,10 @@ CommandBody DeclarePlan(Options& command) {
       throw Failure(kWrongUsage, "plan takes one file to check, or --new");
     }
     if (wanted->make) {
-      if (wanted->output != "-") CheckOutputs({}, {{"the plan", wanted->output}});
+      if (wanted->output != "-") {
+        CheckOutputs({}, {{"the plan", wanted->output}});
+        RefuseToReplace(wanted->output);
+      }
       WriteOutput(wanted->output, NewPlan());
     } else {
       std::cout << Describe(ReadPlan(wanted->files[0]));

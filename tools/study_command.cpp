@@ -206,6 +206,33 @@ void StudyLabelled(const Study& study, const Columns& labels, const std::string&
   if (!plot.empty()) WriteOutput(plot, SvgDocument(panels));
 }
 
+// The whole words that a name holds, one after another: "a_b" holds "a", "b" and "a_b".
+void AddParts(const std::string& name, std::vector<std::string>& parts) {
+  std::vector<std::size_t> begins = {0};
+  for (std::size_t at = name.find('_'); at != std::string::npos; at = name.find('_', at + 1)) begins.push_back(at + 1);
+  begins.push_back(name.size() + 1);
+  for (std::size_t i = 0; i < begins.size(); ++i) {
+    for (std::size_t k = i + 1; k < begins.size(); ++k) {
+      parts.push_back(name.substr(begins[i], begins[k] - 1 - begins[i]));
+    }
+  }
+}
+
+// A name that no stored figure's holds would drop out of the table without a word.
+void RefuseUnknown(Store& store, const std::vector<std::string>& asked) {
+  const std::vector<Quantity> quantities = store.Quantities();
+  for (const std::string& part : asked) {
+    const bool held = std::any_of(quantities.begin(), quantities.end(), [&](const Quantity& quantity) {
+      return quantity.name.find(part) != std::string::npos;
+    });
+    if (held) continue;
+    std::vector<std::string> known;
+    for (const Quantity& quantity : quantities) AddParts(quantity.name, known);
+    throw Failure(kWrongUsage, "--figure " + Printable(part) + ": " + store.name() +
+                                   " has no figure whose name holds it" + DidYouMean(part, known));
+  }
+}
+
 int RunStudy(const StudyOptions& options) {
   if (options.parts.empty() != options.operators.empty()) {
     throw Failure(kWrongUsage, "--parts and --operators belong together: give both");
@@ -220,6 +247,7 @@ int RunStudy(const StudyOptions& options) {
   CheckOutputs({{"the store", options.store.store}, {"the limits", options.limits}},
                {{"the proposed limits", options.output}, {"the plot", options.plot}});
   Store store(options.store.store, Store::Use::kRead);
+  RefuseUnknown(store, options.figures);
   const std::map<std::string, Bounds> limits =
       options.limits.empty() ? std::map<std::string, Bounds>() : ReadArchiveLimits(options.limits).by_name;
   const bool keep = !options.parts.empty() || !options.labels.empty() || options.propose > 0;
