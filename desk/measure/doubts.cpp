@@ -1,7 +1,9 @@
 #include "desk/measure/doubts.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
+#include <cstdint>
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 #include <vector>
@@ -23,35 +25,61 @@ constexpr double kNoiseElsewhere = 2;
 constexpr double kShareFlat = 0.9;
 constexpr int kTail = 3;  // levels from the pile to the far end of its side
 
-struct Pixels {
-  std::vector<int> levels;
-  std::vector<int> steps;  // to the right neighbour, where that is one of them
+using Histogram = std::array<std::int64_t, kLevels>;
+
+struct Side {
+  Histogram levels = {};
+  Histogram steps = {};  // to the right neighbour, where that is of the same side
 };
 
-// Of one channel inside the outline, and above, or below, the middle of its levels.
-Pixels SideOf(const cv::Mat& channel, const cv::Mat& inside, int middle, bool top) {
-  Pixels side;
+std::int64_t CountOf(const Histogram& histogram) {
+  return std::accumulate(histogram.begin(), histogram.end(), std::int64_t{0});
+}
+
+// Of one channel inside the outline: what lies up to the middle of its levels, and what above.
+std::array<Side, 2> SidesOf(const cv::Mat& channel, const cv::Mat& inside, int middle) {
+  std::array<Side, 2> sides;
   for (int i = 0; i < channel.rows; ++i) {
     const auto* level = channel.ptr<uchar>(i);
     const auto* in = inside.ptr<uchar>(i);
-    const auto belongs = [&](int j) { return in[j] != 0 && (level[j] > middle) == top; };
+    int left_side = -1;  // of the pixel to the left; -1 outside
     for (int j = 0; j < channel.cols; ++j) {
-      if (!belongs(j)) continue;
-      side.levels.push_back(level[j]);
-      if (j + 1 < channel.cols && belongs(j + 1)) side.steps.push_back(std::abs(level[j + 1] - level[j]));
+      const int own = in[j] == 0 ? -1 : static_cast<int>(level[j] > middle);
+      if (own >= 0) {
+        ++sides[own].levels[level[j]];
+        if (own == left_side) ++sides[own].steps[std::abs(level[j] - level[j - 1])];
+      }
+      left_side = own;
     }
   }
-  return side;
+  return sides;
 }
 
 // Standard deviation of independent noise, from the mean of the smallest three quarters of the steps between
 // neighbours: those across the edge are none of it. Of |a - b| of two normal values that mean is 0.728 sigma.
-double NoiseOf(const Pixels& side) {
-  std::vector<int> steps = side.steps;
-  const auto end = steps.begin() + static_cast<std::ptrdiff_t>(steps.size() / 4 * 3);
-  if (end == steps.begin()) return 0;
-  std::nth_element(steps.begin(), end, steps.end());
-  return std::accumulate(steps.begin(), end, 0.0) / static_cast<double>(end - steps.begin()) / 0.728;
+double NoiseOf(const Side& side) {
+  const std::int64_t count = CountOf(side.steps) / 4 * 3;
+  if (count == 0) return 0;
+  std::int64_t sum = 0;
+  std::int64_t left = count;
+  for (int step = 0; left > 0; ++step) {
+    const std::int64_t taken = std::min(left, side.steps[step]);
+    sum += taken * step;
+    left -= taken;
+  }
+  return static_cast<double>(sum) / static_cast<double>(count) / 0.728;
+}
+
+// How far from `level`, an end of the side's levels, the farthest lie when a fiftieth of them is left out.
+int ReachOf(const Side& side, int level) {
+  std::int64_t beyond = CountOf(side.levels) / 50;
+  for (int reach = kLevels - 1; reach > 0; --reach) {
+    for (const int at : {level - reach, level + reach}) {
+      if (at >= 0 && at < kLevels) beyond -= side.levels[at];
+    }
+    if (beyond < 0) return reach;
+  }
+  return 0;
 }
 
 // Of so many of a side's pixels at its outermost level it depends on the edge's shape whether they were cut off.
@@ -62,17 +90,14 @@ struct Candidate {
   bool sure;
 };
 
-std::optional<Candidate> PileOf(Pixels side, double noise_elsewhere, bool top, int channel) {
-  if (side.levels.size() < kFewestPixels) return std::nullopt;
-  const auto [lowest, highest] = std::minmax_element(side.levels.begin(), side.levels.end());
-  const int level = top ? *highest : *lowest;
-  const double share = static_cast<double>(std::count(side.levels.begin(), side.levels.end(), level)) /
-                       static_cast<double>(side.levels.size());
+std::optional<Candidate> PileOf(const Side& side, double noise_elsewhere, bool top, int channel) {
+  const std::int64_t count = CountOf(side.levels);
+  if (count < kFewestPixels) return std::nullopt;
+  int level = top ? kLevels - 1 : 0;
+  while (side.levels[level] == 0) level += top ? -1 : 1;
+  const double share = static_cast<double>(side.levels[level]) / static_cast<double>(count);
   const bool at_end = top ? level == kLevels - 1 : level == 0;
-  const auto far = side.levels.begin() + static_cast<std::ptrdiff_t>(side.levels.size() / 50);
-  std::nth_element(side.levels.begin(), far, side.levels.end(),
-                   [=](int a, int b) { return std::abs(a - level) > std::abs(b - level); });
-  const bool one_sided = std::abs(*far - level) >= kTail || share > kShareFlat;
+  const bool one_sided = ReachOf(side, level) >= kTail || share > kShareFlat;
   const bool noisy = NoiseOf(side) >= kLeastNoise || (noise_elsewhere >= kNoiseElsewhere && one_sided);
   const bool piled = at_end ? share > kShareAtEnd : share > kShareInside && noisy;
   return piled || share > kShareToLookAt ? std::optional<Candidate>({{level, top, channel, share}, piled})
@@ -144,8 +169,7 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
     double highest = 0;
     cv::minMaxLoc(channels[channel], &lowest, &highest, nullptr, nullptr, inside);
     const int middle = cvFloor((lowest + highest) / 2);
-    const Pixels light = SideOf(channels[channel], inside, middle, true);
-    const Pixels dark = SideOf(channels[channel], inside, middle, false);
+    const auto [dark, light] = SidesOf(channels[channel], inside, middle);
     for (const bool top : {true, false}) {
       const std::optional<Candidate> found = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
       if (!found || (worst && found->pile.share <= worst->share)) continue;

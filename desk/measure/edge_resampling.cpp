@@ -88,7 +88,8 @@ SlantedEdge EdgeOf(const cv::Mat& region) {
 
 }  // namespace
 
-NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
+NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read, double found,
+                               double tolerance) {
   SlantedEdge edge = EdgeOf(region);
   if (edge.reason != nullptr) return {kNone, kNone, kNone, kNone};
   const double fall = std::max(std::fabs(edge.left.by_distance), std::fabs(edge.right.by_distance));
@@ -104,6 +105,7 @@ NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double
   };
   if (spread.levels.empty()) return {kNone, kNone, kNone, uneven};
   const double value = moved(0);
+  if (std::fabs(found - value) <= tolerance * value) return {value, value, value, uneven};
   const auto [low, high] = std::minmax({value, moved(-kMoved), moved(kMoved)});
   return {value, low, high, uneven};
 }

@@ -2,6 +2,7 @@
 #define QVTESTER_DESK_MEASURE_EDGE_RESAMPLING_H_
 
 #include <functional>
+#include <limits>
 #include <opencv2/core.hpp>
 #include <vector>
 
@@ -27,8 +28,10 @@ struct NoiselessReading {
 };
 
 /// The figure of the region as it would be without noise, and in even light: what `read` gives of the edge spread
-/// alone.
-NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read);
+/// alone. Where a figure that was found lies within `tolerance` of it (a share), no moved edges are read, and low and
+/// high are the value.
+NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read,
+                               double found = std::numeric_limits<double>::quiet_NaN(), double tolerance = 0);
 
 }  // namespace qv
 

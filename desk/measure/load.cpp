@@ -60,7 +60,10 @@ bool EndsAsJpeg(const std::string& file) {
     i += 2 + std::size_t{at(i + 2)} * 256 + at(i + 3);
     if (marker != kScan) continue;
     // The scan's own bytes: an 0xFF of theirs is followed by 0, or by the mark of a restart.
-    while (i + 1 < file.size() && (at(i) != 0xFF || at(i + 1) == 0 || (at(i + 1) & 0xF8) == 0xD0)) ++i;
+    i = std::min(file.find('\xFF', i), file.size());
+    while (i + 1 < file.size() && (at(i + 1) == 0 || (at(i + 1) & 0xF8) == 0xD0)) {
+      i = std::min(file.find('\xFF', i + 1), file.size());
+    }
     if (i + 1 < file.size() && at(i + 1) == kEnd) return true;
   }
   return false;

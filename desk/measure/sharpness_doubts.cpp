@@ -44,7 +44,7 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
   };
   const std::string figure = std::string("mtf50_") + name;
   const double value = record.phase.Find(figure)->value();
-  const NoiselessReading noiseless = ReadNoiseless(region.pixels, read);
+  const NoiselessReading noiseless = ReadNoiseless(region.pixels, read, value, kMostOff);
   record.phase.Add(std::string("mtf50_noiseless_") + name, noiseless.value);
   const char* const path = record.inputs[0].path.c_str();
   if (value <= 0) {
