@@ -11,6 +11,7 @@
 #include "desk/measure/decision.h"
 #include "desk/measure/edge_resampling.h"
 #include "desk/measure/measure.h"
+#include "desk/measure/patch_trust.h"
 #include "unit_tests/drawing.h"
 
 namespace qv {
@@ -93,6 +94,29 @@ TEST(Uncertainty, AFileTellsByHowMuchItsCodecRounds) {
     EXPECT_EQ(0, StepsOf(folder.Write("cut.jpg", whole.substr(0, size))).chroma) << size;
   }
   EXPECT_EQ(0, StepsOf(folder.Path("nowhere.jpg")).luma);
+}
+
+TEST(Uncertainty, HoldsWhatACodecDoesToAPatch) {
+  const auto blue_to_yellow = [](const cv::Vec3d& rgb) { return OwnLab(rgb)[2]; };
+  for (const int quality : {95, 90, 75, 50}) {
+    constexpr int kPatches = 150;
+    int within = 0;
+    cv::RNG random(quality);
+    for (int i = 0; i < kPatches; ++i) {
+      const cv::Vec3d truth(random.uniform(60.0, 200.0), random.uniform(60.0, 200.0), random.uniform(60.0, 200.0));
+      cv::Mat patch(64, 64, CV_32FC3);
+      random.fill(patch, cv::RNG::NORMAL, cv::Scalar(truth[0], truth[1], truth[2]), cv::Scalar::all(2.5));
+      patch.convertTo(patch, CV_8U);
+      std::vector<uchar> file;
+      cv::imencode(".jpg", patch, file, {cv::IMWRITE_JPEG_QUALITY, quality});
+      const cv::Scalar mean = cv::mean(patch = cv::imdecode(file, cv::IMREAD_COLOR));
+      const cv::Point3i cut(cvFloor(mean[0]), cvFloor(mean[1]), cvFloor(mean[2]));
+      const auto draws = DrawPatchColours(patch, 4096, cut, random.next(), StepsAtQuality(quality));
+      const double error = blue_to_yellow(cv::Vec3d(cut.x, cut.y, cut.z)) - blue_to_yellow(truth);
+      within += std::fabs(error) <= TrustInColour(cut, draws, blue_to_yellow).expanded ? 1 : 0;
+    }
+    EXPECT_GT(within, 0.88 * kPatches) << quality;  // 95 in 100 are meant; four deviations off
+  }
 }
 
 TEST(Uncertainty, ResamplingFindsWhatNoiseDoes) {

@@ -270,9 +270,8 @@ class Capture : public Measurement {
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));
     std::map<int, cv::Vec3d> given;
     if (request.parameters.contains("reference")) given = PatchValues(request.parameters["reference"]);
-    const Input& photo_file = request.inputs.at(0);
     TrustPatches(record.phase, {finding->photo, finding->outlines, finding->measured, finding->standard,
-                                std::move(given), photo_file.is_path() ? StepsOf(photo_file.name) : CodecSteps()});
+                                std::move(given), StepsOf(request.inputs.at(0))});
     return finding;
   }
 

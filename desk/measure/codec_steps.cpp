@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <fstream>
+#include <sstream>
 #include <vector>
 
 namespace qv {
@@ -24,15 +25,12 @@ void TakeTables(const std::vector<unsigned char>& tables, CodecSteps& steps) {
   }
 }
 
-}  // namespace
-
-CodecSteps StepsOf(const std::string& path) {
+CodecSteps StepsOfStream(std::istream& file) {
   constexpr int kStart = 0xD8;
   constexpr int kTables = 0xDB;
   constexpr int kScan = 0xDA;
   constexpr int kMostSegments = 1000;
   CodecSteps steps;
-  std::ifstream file(path, std::ios::binary);
   if (file.get() != 0xFF || file.get() != kStart) return steps;
   for (int i = 0; i < kMostSegments; ++i) {
     int marker = file.get();
@@ -52,6 +50,19 @@ CodecSteps StepsOf(const std::string& path) {
     if (file.get() != 0xFF) return steps;
   }
   return steps;
+}
+
+}  // namespace
+
+CodecSteps StepsOf(const std::string& path) {
+  std::ifstream file(path, std::ios::binary);
+  return StepsOfStream(file);
+}
+
+CodecSteps StepsOf(const Input& input) {
+  if (input.is_path()) return StepsOf(input.name);
+  std::istringstream file(input.content.value_or(""));
+  return StepsOfStream(file);
 }
 
 CodecSteps StepsAtQuality(int quality) {

@@ -3,6 +3,8 @@
 
 #include <string>
 
+#include "desk/measure/request.h"
+
 namespace qv {
 
 /// By how many levels a codec rounds the mean of a block: 0 where it keeps it.
@@ -13,9 +15,15 @@ struct CodecSteps {
 /// Of a JPEG file's quantisation tables (ITU-T T.81, B.2.4.1); none for a file of another kind, or one that can't be
 /// read.
 CodecSteps StepsOf(const std::string& path);
+/// The same of an input: none for a picture from memory.
+CodecSteps StepsOf(const Input& input);
 
 /// Of what cv::imencode and others with the standard tables (T.81, Annex K) write at this quality.
 CodecSteps StepsAtQuality(int quality);
+
+/// By how many levels the mean of a whole picture may lie off: blocks half-way between two steps, one in eight times
+/// the first table entry, are all rounded away from middle grey, by half a step. The entry cancels.
+inline double MeanShift(const CodecSteps& codec) { return codec.luma == 0 ? 0 : 1.0 / 128; }
 
 }  // namespace qv
 

@@ -7,6 +7,7 @@
 #include "desk/base/text.h"
 #include "desk/drawing/plot.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/histogram.h"
 #include "desk/measure/load.h"
@@ -194,7 +195,7 @@ class Dust : public Measurement {
     AddHistogram(record.phase, *results, request);
     cv::Mat grey;
     cv::cvtColor(finding->photo, grey, cv::COLOR_RGB2GRAY);
-    record.phase.Find("mean_level")->Trust({OfMeanLevel(grey)});
+    record.phase.Find("mean_level")->Trust({OfMeanLevel(grey, 1, MeanShift(StepsOf(request.inputs.at(0))))});
     finding->spots = FindSpots(finding->photo);
     AddSpots(record, finding->spots);
     const double mean = record.phase.Find("mean_level")->value();

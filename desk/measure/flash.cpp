@@ -5,6 +5,7 @@
 #include <opencv2/core.hpp>
 
 #include "desk/base/text.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
@@ -23,14 +24,14 @@ constexpr Method kChannels = {"mean and counts over all pixels of each channel",
 constexpr std::array<const char*, 3> kChannelNames = {"blue", "green", "red"};  // in the order of a decoded photo
 
 // A clipped pixel has the channel at its largest level.
-void CollectChannels(Phase& phase, const cv::Mat& photo) {
+void CollectChannels(Phase& phase, const cv::Mat& photo, double shift) {
   const double full = photo.depth() == CV_16U ? 65535 : 255;
   for (int i = 0; i < std::min(photo.channels(), 3); ++i) {
     cv::Mat channel;
     cv::extractChannel(photo, channel, i);
     const cv::Mat clipped = channel >= full;
     phase.Add(std::string("mean_") + kChannelNames[i], cv::mean(channel)[0] * 255 / full)
-        .Trust({OfMeanLevel(channel, 255 / full)});
+        .Trust({OfMeanLevel(channel, 255 / full, shift)});
     phase
         .Add(std::string("clipped_") + kChannelNames[i],
              cv::countNonZero(clipped) / static_cast<double>(clipped.total()))
@@ -97,8 +98,10 @@ class Flash : public Measurement {
       const bool vt = spec_.test == QV_TEST_CAMERA_FLASH_VT;
       cv::Mat first;
       cv::extractChannel(SlotPhoto(tester, spec_.inputs[0].slot), first, 0);
-      record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_).Trust({OfMeanLevel(first)});
-      CollectChannels(record.phase, SlotPhoto(tester, spec_.inputs[0].slot));
+      const double shift = MeanShift(StepsOf(request.inputs.at(0)));
+      record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_)
+          .Trust({OfMeanLevel(first, 1, shift)});
+      CollectChannels(record.phase, SlotPhoto(tester, spec_.inputs[0].slot), shift);
     }
     return std::make_unique<FlashFinding>(SlotPhoto(tester, spec_.inputs[0].slot));
   }

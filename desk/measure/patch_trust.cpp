@@ -1,5 +1,7 @@
 #include "desk/measure/patch_trust.h"
 
+#include <opencv2/imgproc.hpp>
+
 #include "desk/measure/cielab.h"
 
 namespace qv {
@@ -27,11 +29,73 @@ cv::Matx33d Root(const cv::Matx33d& covariance) {
   return root;
 }
 
-// Half the interval in which a codec's rounding leaves the mean, whose blocks noise spreads over its steps.
-double RoundingOf(double step, double noise) {
+// Half the interval in which rounding leaves a mean; a spread of the step's size takes the error away.
+double HalfInterval(double step, double spread) {
   if (step == 0) return 0;
-  const double spread = noise / step;
-  return step / 2 * std::exp(-2 * CV_PI * CV_PI * spread * spread);
+  const double share = spread / step;
+  return step / 2 * std::exp(-2 * CV_PI * CV_PI * share * share);
+}
+
+// Of a JPEG file's decoded pixels: half the intervals in which their means lie off.
+struct DecodedRounding {
+  double luma, chroma_block, chroma_sample, channel;
+};
+
+constexpr double kLumaShare = 0.67;  // of a channel's noise: the root of the weights' squares
+constexpr double kChromaShare = 0.62;
+constexpr int kBlockPx = 8;
+constexpr int kChromaBlockPx = 16;  // of halved chroma
+
+// Of a pixel, as the blocks' means tell it; the codec takes most of the pixels' own away.
+double NoiseBeforeCodec(const cv::Mat& pixels, const CodecSteps& codec) {
+  const double left = std::sqrt(cv::trace(CovarianceOfMean(pixels, 0)) / 3 * static_cast<double>(pixels.total()));
+  const cv::Size blocks(pixels.cols / kBlockPx, pixels.rows / kBlockPx);
+  if (blocks.width < 3 || blocks.height < 1) return left;
+  cv::Mat means;
+  cv::cvtColor(pixels(cv::Rect({}, blocks * kBlockPx)), means, cv::COLOR_BGR2GRAY);
+  means.convertTo(means, CV_32F);
+  cv::resize(means, means, blocks, 0, 0, cv::INTER_AREA);
+  const cv::Matx13f second(1, -2, 1);
+  cv::filter2D(means, means, CV_32F, second);
+  const cv::Mat inner = means.colRange(1, blocks.width - 1);
+  const double variance = inner.dot(inner) / (6.0 * static_cast<double>(inner.total()));
+  return std::max(left, kBlockPx / kLumaShare * std::sqrt(std::max(variance - codec.luma * codec.luma / 12, 0.0)));
+}
+
+// How far decoded chroma differs between pixels: red and blue are luma and a function of it, to the level.
+double ChromaSpread(const cv::Mat& pixels) {
+  constexpr double kOfDifferences = 2.2;  // of red or blue less green, a level of one chroma and the other's part in it
+  double squares = 0;
+  for (const int k : {0, 2}) {
+    cv::Mat channel;
+    cv::Mat green;
+    cv::Mat difference;
+    cv::extractChannel(pixels, channel, k);
+    cv::extractChannel(pixels, green, 1);
+    cv::subtract(channel, green, difference, cv::noArray(), CV_32F);
+    cv::Scalar mean;
+    cv::Scalar deviation;
+    cv::meanStdDev(difference, mean, deviation);
+    squares += deviation[0] * deviation[0] / 2;
+  }
+  return std::sqrt(squares) / kOfDifferences;
+}
+
+// Blocks are rounded to the codec's steps; then samples of chroma to levels, and with them the channels. Where few
+// different values come in, all pixels of a patch are off alike. Multiples of a step differ in their rounding by what
+// the step departs from a whole number; multiples of chroma's weights in the channels by some 0.3.
+DecodedRounding RoundingOf(const cv::Mat& pixels, const CodecSteps& codec) {
+  constexpr double kWeightsApart = 0.3;
+  constexpr double kRoundingsVariance = 0.09;  // a twelfth of the samples, and some of the channels
+  if (codec.luma == 0) return {};
+  const double noise = NoiseBeforeCodec(pixels, codec);
+  const double seen = ChromaSpread(pixels);
+  const double unrounded = std::sqrt(std::max(seen * seen - kRoundingsVariance, 0.0));
+  const bool whole = codec.chroma == std::round(codec.chroma);
+  const double steps_apart = whole ? 0 : std::fabs(1 - std::round(codec.chroma) / codec.chroma);
+  return {HalfInterval(codec.luma, kLumaShare * noise / kBlockPx),
+          HalfInterval(codec.chroma, kChromaShare * noise / kChromaBlockPx),
+          whole ? 0 : HalfInterval(1, unrounded * steps_apart), HalfInterval(1, seen * kWeightsApart)};
 }
 
 // What the rounding of luma and both chromas may add (ITU-T T.871), in the order of the stored channels: blue first.
@@ -43,11 +107,7 @@ cv::Vec3d RgbOf(double luma, double blue, double red) {
 
 std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean, std::uint64_t seed,
                                         const CodecSteps& codec) {
-  constexpr double kBlockPx = 8;
-  constexpr double kChromaBlockPx = 16;  // of halved chroma
-  const double noise = std::sqrt(cv::trace(CovarianceOfMean(pixels, 0)) / 3 * static_cast<double>(pixels.total()));
-  const double luma = RoundingOf(codec.luma, noise / kBlockPx);
-  const double chroma = RoundingOf(codec.chroma, noise / kChromaBlockPx);
+  const DecodedRounding half = RoundingOf(pixels, codec);
   const double share = static_cast<double>(pixels.total()) / area;
   const cv::Matx33d root = Root(CovarianceOfMean(pixels, 0) * share);
   cv::RNG random(seed);
@@ -59,9 +119,11 @@ std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, cons
     for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
     draws.push_back(Levels(mean) + cut + root * normal);
     if (codec.luma == 0) continue;
-    cv::Vec3d off;
-    for (int k = 0; k < 3; ++k) off[k] = random.uniform(-1.0, 1.0);
-    draws.back() += RgbOf(luma * off[0], chroma * off[1], chroma * off[2]);
+    const auto within = [&random](double bound) { return bound * random.uniform(-1.0, 1.0); };
+    const double blue = within(half.chroma_block) + within(half.chroma_sample);
+    const double red = within(half.chroma_block) + within(half.chroma_sample);
+    draws.back() += RgbOf(within(half.luma), blue, red);
+    for (int k = 0; k < 3; ++k) draws.back()[k] += within(half.channel);
   }
   return draws;
 }

@@ -52,7 +52,21 @@ struct Parts {
   double Independent() const { return 18.0 / 35 * static_cast<double>(differences.size()); }  // they overlap
 };
 constexpr double kSquaredWeights = 6;  // of 1, -2, 1
-constexpr double kDeviationsOfMedian = 1.4826;
+
+// The smaller differences tell the noise where the scene's edges take less than three in ten; a median would stand on
+// whole levels where a codec leaves blocks on these.
+constexpr double kSmaller = 0.7;
+constexpr double kTheirSquares = 0.3097;  // mean of a normal variable's squares among the smaller
+constexpr double kWorth = 0.37;           // they tell as much as so many of all, at least
+
+double NoiseOf(const Parts& parts) {
+  std::vector<double> squares;
+  for (const double difference : parts.differences) squares.push_back(difference * difference);
+  const auto count = static_cast<std::ptrdiff_t>(std::ceil(kSmaller * static_cast<double>(squares.size())));
+  std::nth_element(squares.begin(), squares.begin() + count - 1, squares.end());
+  const double sum = std::accumulate(squares.begin(), squares.begin() + count, 0.0);
+  return std::sqrt(sum / static_cast<double>(count) / kTheirSquares / kSquaredWeights);
+}
 
 Parts PartsOf(const cv::Mat& picture) {
   constexpr int kBlock = 8;  // pixels a side: a codec's
@@ -94,8 +108,12 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "standard photo's noise is taken to be the same."},
       {kMeanMethod,
        "The variance of blocks of 8 x 8 pixels, from differences between neighbours, over their number; of single "
-       "pixels where there are fewer than 60 blocks. A share of pixels is a mean of ones and noughts. Type B: of a "
-       "share, one pixel. What light and exposure do from photo to photo is not in it (take several photos)."},
+       "pixels where there are fewer than 60 blocks. A share of pixels is a mean of ones and noughts, of the photo as "
+       "it is "
+       "stored: a JPEG file has fewer clipped pixels than the camera saw. Type B: of a share, one pixel; of a JPEG "
+       "file's "
+       "mean, a 128th of a level, by which its blocks' means are rounded one way. What light and exposure do from "
+       "photo to photo is not in it (take several photos)."},
       {kResidualMethod,
        "Marks: how far the search's places lie from the centres of gravity of the marks' inner squares, which are good "
        "to 0.009 px (type B) but for what noise moves them, carried to the legs and the turn; a module is good to 0.01 "
@@ -181,16 +199,11 @@ Uncertainty FromErrors(std::vector<double> errors, const char* method) {
   return {standard, expanded, standard == 0 ? 1 : expanded / standard, method};
 }
 
-Uncertainty OfMeanLevel(const cv::Mat& picture, double unit) {
+Uncertainty OfMeanLevel(const cv::Mat& picture, double unit, double type_b) {
   const Parts parts = PartsOf(picture);
   if (parts.differences.empty()) return {kNone, kNone, kNone, kMeanMethod};
-  std::vector<double> sizes;
-  for (const double difference : parts.differences) sizes.push_back(std::fabs(difference));
-  // A median tells the noise where the scene's edges take less than half; it is as good as 37 in 100 of the values.
-  constexpr double kMedianWorth = 0.37;
-  const double noise = kDeviationsOfMedian * Median(std::move(sizes)) / std::sqrt(kSquaredWeights);
-  return Combined(unit * noise / std::sqrt(parts.count), std::max(kMedianWorth * parts.Independent(), 1.0), 0,
-                  kMeanMethod);
+  return Combined(unit * NoiseOf(parts) / std::sqrt(parts.count), std::max(kWorth * parts.Independent(), 1.0),
+                  unit * type_b, kMeanMethod);
 }
 
 Uncertainty OfShare(const cv::Mat& mask) {

@@ -52,8 +52,9 @@ double Spread(const std::vector<double>& readings);
 Uncertainty FromErrors(std::vector<double> errors, const char* method);
 
 /// Mean level of a single-channel picture, in so many units a level: noise between neighbouring blocks, not the scene,
-/// over their number. Rounding of what is stored, and what a codec does within a block, are in it.
-Uncertainty OfMeanLevel(const cv::Mat& picture, double unit = 1);
+/// over their number. Rounding of what is stored, and what a codec does within a block, are in it; a type B part, in
+/// levels, is what it does to all blocks alike (MeanShift).
+Uncertainty OfMeanLevel(const cv::Mat& picture, double unit = 1, double type_b = 0);
 
 /// Share of a picture's pixels that are not 0 (CV_8U, 0 or 255): as its mean; a count may be one off.
 Uncertainty OfShare(const cv::Mat& mask);
