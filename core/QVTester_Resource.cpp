@@ -7,6 +7,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "core/slots.h"
+#include "platform/properties.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
 
@@ -41,6 +42,11 @@ int FetchImage(const QVTester& tester, int slot, cv::Mat& image) {
   resource->GetImage(&image);
   if (image.empty()) CV_Error_(cv::Error::StsBadArg, ("slot %d holds no image", slot));
   return QV_SUCCESS;
+}
+
+void Publish(QVTester& tester, const char* key, const char* value) {
+  QVTester::Kept& kept = *tester.kept_;
+  if (kept.publishes) kept.published += static_cast<int>(platform::property_set(key, value) == 0);
 }
 
 QVResultData& Results(const QVTester& tester) {

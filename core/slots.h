@@ -47,6 +47,9 @@ void ConvertPreviewFrame(void* data, int width, int height, cv::Mat& converted);
 /// Shares the image of a slot. -98 when the slot is empty; throws cv::Exception when it holds no image.
 int FetchImage(const QVTester& tester, int slot, cv::Mat& image);
 
+/// Sets a system property, if the tester publishes any, and counts it where the store took it.
+void Publish(QVTester& tester, const char* key, const char* value);
+
 /// The block that a test writes into. Throws cv::Exception when Initialize has not been called.
 QVResultData& Results(const QVTester& tester);
 

@@ -28,11 +28,6 @@ int property_get(const char* key, char* value, const char* default_value);
 /// Sets a key; below 0 when the value is too long or the store can't be written. The former value then stays.
 int property_set(const char* key, const char* value);
 
-/// Sets a key and counts it where the store took it.
-inline void Publish(int& published, const char* key, const char* value) {
-  published += static_cast<int>(property_set(key, value) == 0);
-}
-
 }  // namespace platform
 
 #endif  // QVTESTER_PLATFORM_PROPERTIES_H_

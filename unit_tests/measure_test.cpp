@@ -173,7 +173,6 @@ TEST(Measure, OnlyARequestToPublishReachesTheStore) {
   MeasureAnew(request);
   EXPECT_EQ(nullptr, std::fopen(place.c_str(), "r"));
   request.publish = true;
-  SetHostPropertyStore(store.c_str());
   const Record record = MeasureAnew(request);
   SetHostPropertyStore(nullptr);
   std::string places;

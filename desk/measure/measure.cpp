@@ -1,8 +1,6 @@
 #include "desk/measure/measure.h"
 
 #include <algorithm>
-#include <mutex>
-#include <optional>
 
 #include "desk/base/clock.h"
 #include "desk/base/failure.h"
@@ -12,36 +10,21 @@
 #include "desk/measure/measurement.h"
 #include "desk/measure/properties.h"
 #include "desk/measure/repeats.h"
-#include "qvtester/host_properties.h"
 
 namespace qv {
 
 namespace {
 
-// While one lives, system properties go nowhere. The store is one for all threads: the first sets it, the last takes it
-// back.
-class Unpublished {
+// While one lives, the tester writes system properties, or none.
+class Publishing {
  public:
-  Unpublished() {
-    const std::lock_guard<std::mutex> lock(Mutex());
-    if (Count()++ == 0) SetHostPropertyStore("/dev/null/nowhere");
-  }
-  ~Unpublished() {
-    const std::lock_guard<std::mutex> lock(Mutex());
-    if (--Count() == 0) SetHostPropertyStore(nullptr);
-  }
-  Unpublished(const Unpublished&) = delete;
-  Unpublished& operator=(const Unpublished&) = delete;
+  Publishing(QVTester& tester, bool publishes) : tester_(tester) { tester_.kept_->publishes = publishes; }
+  ~Publishing() { tester_.kept_->publishes = true; }
+  Publishing(const Publishing&) = delete;
+  Publishing& operator=(const Publishing&) = delete;
 
  private:
-  static std::mutex& Mutex() {
-    static std::mutex mutex;
-    return mutex;
-  }
-  static int& Count() {
-    static int count = 0;
-    return count;
-  }
+  QVTester& tester_;
 };
 
 std::string NamesOf(const std::vector<RecordedInput>& inputs) {
@@ -97,8 +80,7 @@ Record MeasureOnce(QVTester& tester, const Request& resolved, const Limits& limi
   RefuseForeignLimits(spec, limits);
   Record record = NewRecord(resolved, spec, limits);
   LogCollector log;
-  std::optional<Unpublished> unpublished;
-  if (spec.publishes && !resolved.publish) unpublished.emplace();
+  const Publishing publishing(tester, resolved.publish);
 
   tester.Initialize();
   const SetProperties properties(tester, PropertiesOf(spec, resolved));

@@ -143,6 +143,7 @@ bool QVTester::isValidLocation(int width, int height, cv::Point2f p) {
 }
 
 void QVTester::save_mung_location(cv::Point2f p, int index) {
+  if (!kept_->publishes) return;  // the store is not read either
   char item[128];
   std::snprintf(item, sizeof(item), "[%.0f,%.0f]", p.x, p.y);
   const std::array<char, 32> key = MungKey(index);
@@ -151,10 +152,10 @@ void QVTester::save_mung_location(cv::Point2f p, int index) {
   char joined[128];
   // An item that does not fit is cut here, and the store then refuses the whole: what it held stays as it was.
   if (std::snprintf(joined, sizeof(joined), "%s%s", held, item) < 0) return;
-  platform::Publish(kept_->published, key.data(), joined);
+  Publish(*this, key.data(), joined);
 }
 
-void QVTester::remove_mung_location(int index) { platform::Publish(kept_->published, MungKey(index).data(), ""); }
+void QVTester::remove_mung_location(int index) { Publish(*this, MungKey(index).data(), ""); }
 
 // The detector takes what touches the picture's border for a blob unless the border itself is dark; dust that reaches
 // into the frame is one with it, and is not seen. One pixel is enough, and costs the least.

@@ -10,7 +10,6 @@
 #include "chart/points.h"
 #include "core/slots.h"
 #include "platform/files.h"
-#include "platform/properties.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
 #include "tests/camera/preview_measure.h"
@@ -28,8 +27,8 @@ std::array<char, 32> Short(const char* format, Arguments... arguments) {
   return text;
 }
 
-void Publish(int& published, const std::array<char, 32>& key, const std::array<char, 32>& value) {
-  platform::Publish(published, key.data(), value.data());
+void Publish(QVTester& tester, const std::array<char, 32>& key, const std::array<char, 32>& value) {
+  Publish(tester, key.data(), value.data());
 }
 
 int Middle(int a, int b) { return static_cast<int>((static_cast<std::int64_t>(a) + b) / 2); }
@@ -88,8 +87,8 @@ int QVTester::CheckPatternCircles(int cam_id) {
   QVDEBUGP("[%s] binary_image.rows :%d binary_image.cols : %d", name, chart.gray.rows, chart.gray.cols);
 
   const std::array<char, 32> count = Short("%d", static_cast<int>(chart.points.size()));
-  if (cam_id == kSecondRearCamera) Publish(kept_->published, Short("%s", "t82.vi_c_num_mw"), count);
-  if (cam_id == kMainCamera) Publish(kept_->published, Short("%s", "t82.vi_c_num_main"), count);
+  if (cam_id == kSecondRearCamera) Publish(*this, Short("%s", "t82.vi_c_num_mw"), count);
+  if (cam_id == kMainCamera) Publish(*this, Short("%s", "t82.vi_c_num_main"), count);
   if (cam_id == kMainCamera || cam_id == kSecondRearCamera) GetImageCenter(chart.points, cam_id);
 
   const bool found = chart.points.size() == kMarks;
@@ -113,10 +112,10 @@ int QVTester::GetImageCenter(std::vector<cv::Point>& points, int cam_id) {
     }
     QVDEBUGP("[%s] %dth temp_length : %f, cal_length : %f, x : %d, y : %d, final x : %d, final y : %d", name, i,
              longest, length, a.x, a.y, centre.x, centre.y);
-    Publish(kept_->published, Short("t82.vi_circle_loc_%d_%d", cam_id, i), Short("%d,%d", a.x, a.y));
+    Publish(*this, Short("t82.vi_circle_loc_%d_%d", cam_id, i), Short("%d,%d", a.x, a.y));
   }
   if (n != 3) centre = {0, 0};
-  Publish(kept_->published, Short("t82.vi_center_loc_%d", cam_id), Short("%d,%d", centre.x, centre.y));
+  Publish(*this, Short("t82.vi_center_loc_%d", cam_id), Short("%d,%d", centre.x, centre.y));
   return 0;
 }
 
