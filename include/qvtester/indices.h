@@ -5,39 +5,64 @@
 
 #define QV_API __attribute__((visibility("default")))
 
-/// A test, with the slots that it needs. 0 to 12 are validated and released but have no routine.
-enum QV_TEST_INDEX : int {
-  QV_TEST_PHASE1_0 = 0,            // slots 0 and 1
-  QV_TEST_PHASE1_1 = 1,            // slot 2; releases 0, 2 and 3
-  QV_TEST_PHASE1_2 = 2,            // slot 4
-  QV_TEST_PHASE1_3 = 3,            // no slot: refused by validation
-  QV_TEST_PHASE1_4 = 4,            // slot 4
-  QV_TEST_PHASE1_5 = 5,            // slot 13
-  QV_TEST_PHASE1_6 = 6,            // slot 4
-  QV_TEST_PHASE1_7 = 7,            // slot 4
-  QV_TEST_PHASE1_8 = 8,            // slot 9
-  QV_TEST_PHASE1_9 = 9,            // slot 10
-  QV_TEST_PHASE1_10 = 10,          // slot 11
-  QV_TEST_PHASE1_11 = 11,          // slot 12
-  QV_TEST_PHASE1_12 = 12,          // slots 7 and 8
-  QV_TEST_CAMERA_PREVIEW = 13,     // slots 14 and 15: motion between two preview frames, main camera
-  QV_TEST_CAMERA_AUTOFOCUS = 14,   // slot 17: sharpness of a chart photo
-  QV_TEST_CAMERA_FLASH = 15,       // slot 16: brightness of a photo taken with the flash
-  QV_TEST_CAMERA_CAPTURE = 16,     // slot 17, and 18 for a comparison: colour patches, main camera
-  QV_TEST_LENS_DUST = 17,          // slot 19: dark blobs and grey levels of a plain target, main camera
-  QV_TEST_CAMERA_FLASH_VT = 18,    // slot 23: as 15, for the camera of video calls
-  QV_TEST_CAMERA_PREVIEW_2 = 19,   // slots 21 and 22: as 13, front camera
-  QV_TEST_CAMERA_CAPTURE_2 = 20,   // slot 24, and 25 for a comparison: as 16, front camera
-  QV_TEST_LENS_DUST_2 = 21,        // slot 26: as 17, front camera
-  QV_TEST_VIDEO_PREVIEW = 22,      // slots 28 and 29: two frames of a video preview
-  QV_TEST_VIDEO_AUTOFOCUS = 23,    // slot 34: sharpness in a film
-  QV_TEST_VIDEO_FLASH = 24,        // slot 34: the light in a film
-  QV_TEST_VIDEO_RECORD = 25,       // slot 35: a film that the phone recorded
-  QV_TEST_VIDEO_PLAY = 26,         // slot 34: a film of the phone playing one
-  QV_TEST_LED_LIGHT = 27,          // slot 30: the indicator light
-  QV_TEST_TOUCH_PANEL_LED = 28,    // slot 31: lights of the touch panel
-  QV_TEST_TOUCH_PANEL_PRINT = 29,  // slots 32 and 36: print of the touch panel, beside good ones
-};
+/// The tests, each in one row: its name and number, the slots that it needs, those that ReleaseDataForTest empties,
+/// what of QVResultData `r` ReleaseTestResult frees, the member of QVTester that runs it. 0 to 12 are validated and
+/// released but have no routine.
+#define QV_TESTS(ROW)                                                                                              \
+  ROW(QV_TEST_PHASE1_0, 0, NEEDS(0, 1), RELEASES(0, 1), FREES(r.phase1_[0]), NO_ROUTINE)                           \
+  ROW(QV_TEST_PHASE1_1, 1, NEEDS(2), RELEASES(0, 2, 3), FREES(r.phase1_[1]), NO_ROUTINE)                           \
+  ROW(QV_TEST_PHASE1_2, 2, NEEDS(4), RELEASES(4), FREES(r.phase1_[2]), NO_ROUTINE)                                 \
+  ROW(QV_TEST_PHASE1_3, 3, NEEDS(), RELEASES(), FREES(r.phase1_[3]), NO_ROUTINE) /* refused by validation */       \
+  ROW(QV_TEST_PHASE1_4, 4, NEEDS(4), RELEASES(4), FREES(r.phase1_[4]), NO_ROUTINE)                                 \
+  ROW(QV_TEST_PHASE1_5, 5, NEEDS(13), RELEASES(13), FREES(r.phase1_[5]), NO_ROUTINE)                               \
+  ROW(QV_TEST_PHASE1_6, 6, NEEDS(4), RELEASES(4), FREES(r.phase1_[6]), NO_ROUTINE)                                 \
+  ROW(QV_TEST_PHASE1_7, 7, NEEDS(4), RELEASES(4), FREES(r.phase1_[7]), NO_ROUTINE)                                 \
+  ROW(QV_TEST_PHASE1_8, 8, NEEDS(9), RELEASES(9), FREES(r.phase1_[8]), NO_ROUTINE)                                 \
+  ROW(QV_TEST_PHASE1_9, 9, NEEDS(10), RELEASES(10), FREES(r.phase1_[9]), NO_ROUTINE)                               \
+  ROW(QV_TEST_PHASE1_10, 10, NEEDS(11), RELEASES(11), FREES(r.phase1_[10]), NO_ROUTINE)                            \
+  ROW(QV_TEST_PHASE1_11, 11, NEEDS(12), RELEASES(12), FREES(r.phase1_[11]), NO_ROUTINE)                            \
+  ROW(QV_TEST_PHASE1_12, 12, NEEDS(7, 8), RELEASES(7, 8), FREES(r.phase1_[12]), NO_ROUTINE)                        \
+  ROW(QV_TEST_CAMERA_PREVIEW, 13, NEEDS(14, 15), RELEASES(), FREES(r.preview_main_),                               \
+      RUNS_QUIETLY(TestCameraPreview(false))) /* motion between two preview frames, main camera */                 \
+  ROW(QV_TEST_CAMERA_AUTOFOCUS, 14, NEEDS(17), RELEASES(),                                                         \
+      FREES(r.af_sfr_count_, r.af_sfr_first_, r.af_sfr_second_, r.af_sfr_third_),                                  \
+      RUNS(TestCameraAutofocus())) /* sharpness of a chart photo */                                                \
+  ROW(QV_TEST_CAMERA_FLASH, 15, NEEDS(16), RELEASES(), NO_ARRAYS,                                                  \
+      RUNS(TestCameraFlash())) /* brightness of a photo taken with the flash */                                    \
+  ROW(QV_TEST_CAMERA_CAPTURE, 16, NEEDS(17), RELEASES(), FREES(r.capture_main_),                                   \
+      RUNS(TestCameraCapture(false))) /* colour patches, main camera; slot 18 for a comparison */                  \
+  ROW(QV_TEST_LENS_DUST, 17, NEEDS(19), RELEASES(), FREES(r.dust_hist_main_),                                      \
+      RUNS(TestLensDust(false, fake_mode))) /* dark blobs and grey levels of a plain target, main camera */        \
+  ROW(QV_TEST_CAMERA_FLASH_VT, 18, NEEDS(23), RELEASES(), NO_ARRAYS,                                               \
+      RUNS(TestCameraFlashVT())) /* as 15, for the camera of video calls */                                        \
+  ROW(QV_TEST_CAMERA_PREVIEW_2, 19, NEEDS(21, 22), RELEASES(), FREES(r.preview_front_),                            \
+      RUNS_QUIETLY(TestCameraPreview(true))) /* as 13, front camera */                                             \
+  ROW(QV_TEST_CAMERA_CAPTURE_2, 20, NEEDS(24), RELEASES(), FREES(r.capture_front_),                                \
+      RUNS(TestCameraCapture(true))) /* as 16, front camera; slot 25 for a comparison */                           \
+  ROW(QV_TEST_LENS_DUST_2, 21, NEEDS(26), RELEASES(), FREES(r.dust_hist_front_),                                   \
+      RUNS(TestLensDust(true, fake_mode))) /* as 17, front camera */                                               \
+  ROW(QV_TEST_VIDEO_PREVIEW, 22, NEEDS(28, 29), RELEASES(), FREES(r.preview_video_),                               \
+      RUNS(TestVideoPreview())) /* two frames of a video preview */                                                \
+  ROW(QV_TEST_VIDEO_AUTOFOCUS, 23, NEEDS(34), RELEASES(),                                                          \
+      FREES(r.video_af_frame_count_, r.video_af_time_, r.video_af_mtf50_vertical_, r.video_af_mtf50_horizontal_),  \
+      RUNS(TestVideoAutofocus())) /* sharpness in a film */                                                        \
+  ROW(QV_TEST_VIDEO_FLASH, 24, NEEDS(34), RELEASES(),                                                              \
+      FREES(r.video_flash_frame_count_, r.video_flash_time_, r.video_flash_mean_),                                 \
+      RUNS(TestVideoFlash())) /* the light in a film */                                                            \
+  ROW(QV_TEST_VIDEO_RECORD, 25, NEEDS(35), RELEASES(), FREES(r.video_record_),                                     \
+      RUNS(TestVideoRecord())) /* a film that the phone recorded */                                                \
+  ROW(QV_TEST_VIDEO_PLAY, 26, NEEDS(34), RELEASES(), FREES(r.video_play_),                                         \
+      RUNS(TestVideoPlay())) /* a film of the phone playing one */                                                 \
+  ROW(QV_TEST_LED_LIGHT, 27, NEEDS(30), RELEASES(), FREES(r.led_), RUNS(TestLEDLight())) /* the indicator light */ \
+  ROW(QV_TEST_TOUCH_PANEL_LED, 28, NEEDS(31), RELEASES(), FREES(r.touch_led_),                                     \
+      RUNS(TestTouchPanelLED())) /* lights of the touch panel */                                                   \
+  ROW(QV_TEST_TOUCH_PANEL_PRINT, 29, NEEDS(32, 36), RELEASES(),                                                    \
+      FREES(r.print_error_count_, r.print_error_areas_, r.print_error_pixels_),                                    \
+      RUNS(TestTouchPanelPrint())) /* print of the touch panel, beside good ones */
+
+#define QV_TEST_NUMBER(name, number, ...) name = number,
+enum QV_TEST_INDEX : int { QV_TESTS(QV_TEST_NUMBER) };
+#undef QV_TEST_NUMBER
 
 /// An input slot, 0 to 36. 0-13 take float HDR buffers, 14-33 images, 34-35 video files, 36 a list of image files.
 /// The slots that a test reads have names; any other number is cast.
