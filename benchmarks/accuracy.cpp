@@ -63,6 +63,21 @@ double Departure(double reading, const Json& edge) {
   return 100 * std::max({0.0, reading / high - 1, 1 - reading / low});
 }
 
+// Readings of one blur held against what the law says of their edges.
+struct LawRow {
+  double truth = 0, low = 1, high = 0, departure = 0;
+  std::vector<double> values, errors;
+
+  void Add(double reading, const Json& edge) {
+    truth = edge.at("mtf50_nyquist");
+    low = std::min<double>(low, edge.at("expected_low_nyquist"));
+    high = std::max<double>(high, edge.at("expected_high_nyquist"));
+    values.push_back(reading);
+    errors.push_back(100 * (reading / truth - 1));
+    departure = std::max(departure, Departure(reading, edge));
+  }
+};
+
 void PrintMtf50() {
   const std::vector<double> blurs = Trials(1, 0) == 1 ? std::vector<double>{0.3, 0.5, 0.8, 1.2, 1.6, 2.0, 2.5, 3.0}
                                                       : std::vector<double>{0.3, 0.8, 1.2, 3.0};
@@ -86,30 +101,17 @@ void PrintMtf50() {
   });
   double worst = 0;
   for (std::size_t b = 0; b < blurs.size(); ++b) {
-    std::vector<double> values;
-    std::vector<double> errors;
-    double low = 1;
-    double high = 0;
-    double truth = 0;
-    double departure = 0;
+    LawRow row;
     for (std::size_t s = 0; s < slopes.size(); ++s) {
-      for (const bool vertical : {true, false}) {
-        const Json& edge = truths[b][s].at("mtf50").at(vertical ? "vertical" : "horizontal");
-        const double reading = vertical ? readings[b][s].vertical : readings[b][s].horizontal;
-        truth = edge.at("mtf50_nyquist");
-        low = std::min<double>(low, edge.at("expected_low_nyquist"));
-        high = std::max<double>(high, edge.at("expected_high_nyquist"));
-        values.push_back(reading);
-        errors.push_back(100 * (reading / truth - 1));
-        departure = std::max(departure, Departure(reading, edge));
-      }
+      row.Add(readings[b][s].vertical, truths[b][s].at("mtf50").at("vertical"));
+      row.Add(readings[b][s].horizontal, truths[b][s].at("mtf50").at("horizontal"));
     }
-    worst = std::max(worst, departure);
-    std::printf("| %.1f | %.4f | %.4f | %.4f | %.4f | %.4f | %+.1f %% | %.2f %% |\n", blurs[b], truth, low, high,
-                Quantile(values, 0), Quantile(values, 1), Mean(errors), departure);
+    worst = std::max(worst, row.departure);
+    std::printf("| %.1f | %.4f | %.4f | %.4f | %.4f | %.4f | %+.1f %% | %.2f %% |\n", blurs[b], row.truth, row.low,
+                row.high, Quantile(row.values, 0), Quantile(row.values, 1), Mean(row.errors), row.departure);
     for (const auto& [blur, promise] :
          {std::pair(0.3, "own_low_0.3"), {0.8, "own_low_0.8"}, {1.2, "own_low_1.2"}, {3.0, "own_low_3.0"}}) {
-      if (blur == blurs[b]) Hold(promise, -Mean(errors));
+      if (blur == blurs[b]) Hold(promise, -Mean(row.errors));
     }
   }
   std::printf("\nFurthest beyond the law's bounds: %.2f %%\n", worst);
@@ -289,9 +291,35 @@ void PrintLeastLight() {
   }
 }
 
+constexpr int kSpecks = 3;
+
+// How many of them lie within 2 px of a blob.
+int SpecksFound(int trial, double diameter, double darkness) {
+  SimulationOptions options;
+  options.scene = "dust";
+  options.camera.size = {800, 600};
+  options.camera.blur_px = 0.7;
+  options.camera.noise_percent = 0.5;
+  options.camera.seed = trial + 1;
+  options.specks = kSpecks;
+  options.speck_px = diameter;
+  options.speck_darkness = darkness;
+  const Simulation simulation = Simulate(options);
+  const Record record = MeasureAnew({"lens_dust", {Sense(options.camera, simulation.levels[0], 8)}});
+  const Reading& blobs = *record.phase.Find("blobs");
+  const Json& specks = simulation.truth.at("specks");
+  return static_cast<int>(std::count_if(specks.begin(), specks.end(), [&](const Json& speck) {
+    for (std::size_t i = 0; i < blobs.values.size(); ++i) {
+      if (std::hypot(blobs.axis[i] - speck.at("x").get<double>(), blobs.values[i] - speck.at("y").get<double>()) < 2) {
+        return true;
+      }
+    }
+    return false;
+  }));
+}
+
 void PrintDust() {
   const int kPhotos = Trials(10, 1);
-  constexpr int kSpecks = 3;
   int found_of_4_to_16 = 0;
   int drawn_of_4_to_16 = 0;
   int found_of_20 = 0;
@@ -303,29 +331,7 @@ void PrintDust() {
     std::printf("| %.0f |", diameter);
     for (const double darkness : {0.6, 0.3, 0.15}) {
       std::vector<int> found(kPhotos, 0);
-      ForEachTrial(kPhotos, [&](int trial) {
-        SimulationOptions options;
-        options.scene = "dust";
-        options.camera.size = {800, 600};
-        options.camera.blur_px = 0.7;
-        options.camera.noise_percent = 0.5;
-        options.camera.seed = trial + 1;
-        options.specks = kSpecks;
-        options.speck_px = diameter;
-        options.speck_darkness = darkness;
-        const Simulation simulation = Simulate(options);
-        const Record record = MeasureAnew({"lens_dust", {Sense(options.camera, simulation.levels[0], 8)}});
-        const Reading& blobs = *record.phase.Find("blobs");
-        for (const Json& speck : simulation.truth.at("specks")) {
-          for (std::size_t i = 0; i < blobs.values.size(); ++i) {
-            const double off =
-                std::hypot(blobs.axis[i] - speck.at("x").get<double>(), blobs.values[i] - speck.at("y").get<double>());
-            if (off >= 2) continue;
-            ++found[trial];
-            break;
-          }
-        }
-      });
+      ForEachTrial(kPhotos, [&](int trial) { found[trial] = SpecksFound(trial, diameter, darkness); });
       int sum = 0;
       for (const int count : found) sum += count;
       std::printf(" %d |", sum);
@@ -341,6 +347,38 @@ void PrintDust() {
   Hold("dust_hollow", found_of_20);
 }
 
+struct DotCount {
+  int found = 0, drawn = 0;
+};
+
+// By where the dots lie; as "false" those that were found where none is.
+std::map<std::string, DotCount> CountDots(int trial, int radius) {
+  SimulationOptions options;
+  options.scene = "hdr";
+  options.camera.size = {1200, 900};
+  options.camera.noise_percent = 0.5;
+  options.camera.shading_percent = 20;
+  options.camera.seed = trial + 1;
+  options.dot_contrast = 0.2;
+  const Simulation simulation = Simulate(options);
+  cv::Mat picture = simulation.levels[0].clone();
+  cv::Mat mask = cv::Mat::zeros(picture.size(), CV_8U);
+  QVTester tester;
+  tester.DetectDot(picture.ptr<float>(), picture.rows, picture.cols, 0.1f, radius, mask.data);
+  std::map<std::string, DotCount> counts;
+  for (const Json& dot : simulation.truth.at("dots")) {
+    const cv::Point at(dot.at("column"), dot.at("row"));
+    const bool side = at.x == 0 || at.x == picture.cols - 1;
+    const bool end = at.y == 0 || at.y == picture.rows - 1;
+    DotCount& count = counts[side && end ? "corners" : side || end ? "edges" : "elsewhere"];
+    ++count.drawn;
+    count.found += mask.at<uchar>(at);
+    mask.at<uchar>(at) = 0;
+  }
+  counts["false"].found = cv::countNonZero(mask);
+  return counts;
+}
+
 void PrintDots() {
   const int kPictures = Trials(10, 1);
   int missed = 0;
@@ -349,36 +387,10 @@ void PrintDots() {
       "\nHDR dots: 1,000 of contrast 0.2 (bright and dark) at threshold 0.1, noise 0.5 %%, shading 20 %%, 1200 x "
       "900\n\n");
   std::printf("| radius px | corners | edges | elsewhere | false dots |\n|---|---|---|---|---|\n");
-  struct Count {
-    int found = 0, drawn = 0;
-  };
   for (const int radius : {1, 2, 5, 10, 20, 50, 100}) {
-    std::vector<std::map<std::string, Count>> counts(kPictures);
-    ForEachTrial(kPictures, [&](int trial) {
-      SimulationOptions options;
-      options.scene = "hdr";
-      options.camera.size = {1200, 900};
-      options.camera.noise_percent = 0.5;
-      options.camera.shading_percent = 20;
-      options.camera.seed = trial + 1;
-      options.dot_contrast = 0.2;
-      const Simulation simulation = Simulate(options);
-      cv::Mat picture = simulation.levels[0].clone();
-      cv::Mat mask = cv::Mat::zeros(picture.size(), CV_8U);
-      QVTester tester;
-      tester.DetectDot(picture.ptr<float>(), picture.rows, picture.cols, 0.1f, radius, mask.data);
-      for (const Json& dot : simulation.truth.at("dots")) {
-        const cv::Point at(dot.at("column"), dot.at("row"));
-        const bool side = at.x == 0 || at.x == picture.cols - 1;
-        const bool end = at.y == 0 || at.y == picture.rows - 1;
-        Count& count = counts[trial][side && end ? "corners" : side || end ? "edges" : "elsewhere"];
-        ++count.drawn;
-        count.found += mask.at<uchar>(at);
-        mask.at<uchar>(at) = 0;
-      }
-      counts[trial]["false"].found = cv::countNonZero(mask);
-    });
-    std::map<std::string, Count> sum;
+    std::vector<std::map<std::string, DotCount>> counts(kPictures);
+    ForEachTrial(kPictures, [&](int trial) { counts[trial] = CountDots(trial, radius); });
+    std::map<std::string, DotCount> sum;
     for (const auto& picture : counts) {
       for (const auto& [place, count] : picture) {
         sum[place].found += count.found;
@@ -509,62 +521,78 @@ cv::Vec2d IntervalOf(double share, int trials) {
   return {middle - half, middle + half};
 }
 
+constexpr int kSweepPhotos = 12;  // a value
+
+// Of each value, one photo after the other.
+std::vector<Detections> DetectOver(const Sweep& sweep) {
+  std::vector<Detections> found(sweep.values.size() * kSweepPhotos);
+  ForEachTrial(static_cast<int>(found.size()), [&](int trial) {
+    cv::RNG random(trial % kSweepPhotos + 1);
+    SimulationOptions options = ChartOptions({960, 720}, 0.8);
+    options.camera.fill = 0.85;
+    options.camera.turn_deg = random.uniform(0.0, 360.0);
+    options.camera.noise_percent = 1;
+    options.camera.seed = trial % kSweepPhotos + 1;
+    sweep.apply(options, sweep.values[trial / kSweepPhotos]);
+    found[trial] = Detect(options);
+  });
+  return found;
+}
+
+Plot EmptyPlotOf(const Sweep& sweep) {
+  Plot plot;
+  plot.title = std::string("Detection against ") + sweep.name;
+  plot.x_label = sweep.axis;
+  plot.y_label = "share found";
+  plot.x_max = 1.04 * sweep.values.back();  // room for the last bars
+  plot.y_max = 1.05;
+  const char* const names[] = {"chart", "QR code", "ArUco marker"};
+  for (int k = 0; k < 3; ++k) {
+    plot.curves.push_back({names[k], {}, kSeries[k]});
+    plot.curves[k].shift_px = 5 * k;
+  }
+  return plot;
+}
+
+// The rows of its table; and its plot.
+Plot PrintSweep(const Sweep& sweep) {
+  std::printf("\n| %s | chart | QR code | ArUco |\n|---|---|---|---|\n", sweep.axis);
+  const std::vector<Detections> found = DetectOver(sweep);
+  Plot plot = EmptyPlotOf(sweep);
+  for (std::size_t i = 0; i < sweep.values.size(); ++i) {
+    const auto share = [&](bool Detections::*target) {
+      const auto first = found.begin() + static_cast<std::ptrdiff_t>(i * kSweepPhotos);
+      return std::count_if(first, first + kSweepPhotos, [=](const Detections& d) { return d.*target; }) /
+             static_cast<double>(kSweepPhotos);
+    };
+    const std::array<double, 3> shares = {share(&Detections::chart), share(&Detections::qr), share(&Detections::aruco)};
+    std::printf("| %g | %.0f %% | %.0f %% | %.0f %% |\n", sweep.values[i], 100 * shares[0], 100 * shares[1],
+                100 * shares[2]);
+    for (int k = 0; k < 3; ++k) {
+      plot.curves[k].points.emplace_back(sweep.values[i], shares[k]);
+      plot.curves[k].spans.push_back(IntervalOf(shares[k], kSweepPhotos));
+    }
+  }
+  return plot;
+}
+
 std::string curves_file;
 
 void PrintDetection() {
-  constexpr int kPhotos = 12;
   std::printf(
       "\nDetection, share of %d photos: 960 x 720, any turn, blur 0.8 px, noise 1 %% where not varied. QR code "
       "(version 1) "
       "and ArUco\nmarker (4 x 4) stand at the chart's middle with cells as large as the marks' modules; OpenCV %s's "
       "detectors\n",
-      kPhotos, CV_VERSION);
+      kSweepPhotos, CV_VERSION);
   constexpr double kWidth = 420;
   constexpr double kHeight = 330;
   Picture picture(static_cast<int>(3 * kWidth), static_cast<int>(2 * kHeight + 40));
-  picture.Text(Format("Share of %d photos in which each was found; bars: its 95 %% interval", kPhotos), {12, 26}, 16,
-               kInk);
+  picture.Text(Format("Share of %d photos in which each was found; bars: its 95 %% interval", kSweepPhotos), {12, 26},
+               16, kInk);
   cv::Rect2d place(0, 40, kWidth, kHeight);
   for (const Sweep& sweep : Sweeps()) {
-    std::printf("\n| %s | chart | QR code | ArUco |\n|---|---|---|---|\n", sweep.axis);
-    std::vector<Detections> found(sweep.values.size() * kPhotos);
-    ForEachTrial(static_cast<int>(found.size()), [&](int trial) {
-      cv::RNG random(trial % kPhotos + 1);
-      SimulationOptions options = ChartOptions({960, 720}, 0.8);
-      options.camera.fill = 0.85;
-      options.camera.turn_deg = random.uniform(0.0, 360.0);
-      options.camera.noise_percent = 1;
-      options.camera.seed = trial % kPhotos + 1;
-      sweep.apply(options, sweep.values[trial / kPhotos]);
-      found[trial] = Detect(options);
-    });
-    Plot plot;
-    plot.title = std::string("Detection against ") + sweep.name;
-    plot.x_label = sweep.axis;
-    plot.y_label = "share found";
-    plot.x_max = 1.04 * sweep.values.back();  // room for the last bars
-    plot.y_max = 1.05;
-    const char* const names[] = {"chart", "QR code", "ArUco marker"};
-    for (int k = 0; k < 3; ++k) {
-      plot.curves.push_back({names[k], {}, kSeries[k]});
-      plot.curves[k].shift_px = 5 * k;
-    }
-    for (std::size_t i = 0; i < sweep.values.size(); ++i) {
-      const auto share = [&](bool Detections::*target) {
-        const auto first = found.begin() + static_cast<std::ptrdiff_t>(i * kPhotos);
-        return std::count_if(first, first + kPhotos, [=](const Detections& d) { return d.*target; }) /
-               static_cast<double>(kPhotos);
-      };
-      const std::array<double, 3> shares = {share(&Detections::chart), share(&Detections::qr),
-                                            share(&Detections::aruco)};
-      std::printf("| %g | %.0f %% | %.0f %% | %.0f %% |\n", sweep.values[i], 100 * shares[0], 100 * shares[1],
-                  100 * shares[2]);
-      for (int k = 0; k < 3; ++k) {
-        plot.curves[k].points.emplace_back(sweep.values[i], shares[k]);
-        plot.curves[k].spans.push_back(IntervalOf(shares[k], kPhotos));
-      }
-    }
-    DrawPlot(picture, plot, place);
+    DrawPlot(picture, PrintSweep(sweep), place);
     place.x += kWidth;
     if (place.br().x > picture.width()) place = {0, place.y + kHeight, kWidth, kHeight};
   }

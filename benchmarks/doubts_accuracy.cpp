@@ -205,13 +205,7 @@ Count TryFault(const std::vector<ChartScene>& scenes, const Fault& fault, int re
   return sum;
 }
 
-std::vector<Fault> Faults() {
-  std::vector<Fault> faults;
-  for (const double noise : {0.0, 0.5, 1.0, 1.5, 2.0, 3.0, 5.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "noise %g %%", noise);
-    faults.push_back({name, noise, noise <= 1});
-  }
+void AddUnevenLight(std::vector<Fault>& faults) {
   for (const double shading : {10.0, 20.0, 40.0, 60.0}) {
     char name[64];
     std::snprintf(name, sizeof name, "shading %g %%", shading);
@@ -232,6 +226,9 @@ std::vector<Fault> Faults() {
                         }});
     }
   }
+}
+
+void AddClipping(std::vector<Fault>& faults) {
   const auto clipped = [](double gain, double top, int only) {
     return [=](double level, int k) { return only < 0 || only == k ? std::min(gain * level, top) : level; };
   };
@@ -250,6 +247,17 @@ std::vector<Fault> Faults() {
   faults.push_back({"blacks cut off, noise 0.3 %", 0.3, false, 0, 0, nullptr,
                     [](double level, int) { return std::max(level, 60.0); }});
   faults.push_back({"green cut off by 10 %, noise 0.3 %", 0.3, false, 0, 0, nullptr, clipped(1, 0.92 * 255 / 1.1, 1)});
+}
+
+std::vector<Fault> Faults() {
+  std::vector<Fault> faults;
+  for (const double noise : {0.0, 0.5, 1.0, 1.5, 2.0, 3.0, 5.0}) {
+    char name[64];
+    std::snprintf(name, sizeof name, "noise %g %%", noise);
+    faults.push_back({name, noise, noise <= 1});
+  }
+  AddUnevenLight(faults);
+  AddClipping(faults);
   for (const double angle : {5.0, 10.0, 15.0}) {
     char name[64];
     std::snprintf(name, sizeof name, "pan %g degrees", angle);

@@ -200,7 +200,7 @@ struct PrintTrial {
   Defects defects;
 };
 
-PrintTrial MeasurePrint(int trial, double side, double contrast, const std::string& folder) {
+SimulationOptions PrintOptions(int trial, double side, double contrast) {
   cv::RNG random(trial + 1);
   SimulationOptions options;
   options.scene = "print";
@@ -219,8 +219,12 @@ PrintTrial MeasurePrint(int trial, double side, double contrast, const std::stri
   options.motion_px = {x, y};
   options.second_turn_deg = random.uniform(-5.0, 5.0);
   options.second_scale = random.uniform(0.95, 1.05);
-  const Simulation simulation = Simulate(options);
+  return options;
+}
 
+PrintTrial MeasurePrint(int trial, double side, double contrast, const std::string& folder) {
+  const SimulationOptions options = PrintOptions(trial, side, contrast);
+  const Simulation simulation = Simulate(options);
   PrintTrial result;
   result.side = side;
   result.contrast = contrast;
@@ -250,6 +254,34 @@ PrintTrial MeasurePrint(int trial, double side, double contrast, const std::stri
   return result;
 }
 
+constexpr std::array<double, 5> kPrintSides = {3, 4, 6, 8, 12};
+constexpr std::array<double, 4> kPrintContrasts = {0.4, 0.6, 0.8, 1};
+
+// Defects by side and contrast; answers those of which a promise is made.
+Defects PrintDefects(std::map<std::pair<double, double>, Defects>& sums) {
+  std::printf("| side px | ink |");
+  for (const double contrast : kPrintContrasts) std::printf(" contrast %.1f |", contrast);
+  std::printf("\n|---|---|---|---|---|---|\n");
+  Defects sure;
+  for (const double side : kPrintSides) {
+    for (int kind : {0, 1}) {
+      std::printf("| %.0f | %s |", side, kind == 0 ? "too much" : "missing");
+      for (const double contrast : kPrintContrasts) {
+        const Defects& sum = sums[{side, contrast}];
+        const bool promised = kind == 0 ? side >= 4 : side >= 8 && contrast == 1;
+        if (promised) sure.drawn[kind] += sum.drawn[kind];
+        if (promised) sure.found[kind] += sum.found[kind];
+        std::printf(" %d of %d |", sum.found[kind], sum.drawn[kind]);
+      }
+      std::printf("\n");
+    }
+    std::printf("| %.0f | false areas |", side);
+    for (const double contrast : kPrintContrasts) std::printf(" %d |", sums[{side, contrast}].wrong);
+    std::printf("\n");
+  }
+  return sure;
+}
+
 }  // namespace
 
 void PrintLights() {
@@ -259,14 +291,12 @@ void PrintLights() {
 
 void PrintPrints() {
   const int kPrints = Trials(200, 20);
-  const std::array<double, 5> sides = {3, 4, 6, 8, 12};
-  const std::array<double, 4> contrasts = {0.4, 0.6, 0.8, 1};
   ScratchFolder scratch;
   const std::string folder = scratch.path();
   std::vector<PrintTrial> trials(kPrints);
   ForEachTrial(kPrints, [&](int trial) {
-    trials[trial] =
-        MeasurePrint(trial, sides[trial % sides.size()], contrasts[trial / sides.size() % contrasts.size()], folder);
+    trials[trial] = MeasurePrint(trial, kPrintSides[trial % kPrintSides.size()],
+                                 kPrintContrasts[trial / kPrintSides.size() % kPrintContrasts.size()], folder);
   });
   int measured = 0;
   int trusted = 0;
@@ -293,26 +323,7 @@ void PrintPrints() {
       "%d were measured, %d with a correlation above 0.8, of which %d are registered off by over 1 px; the median is "
       "%.3f px.\n\n",
       measured, trusted, untold, Quantile(off, 0.5));
-  std::printf("| side px | ink |");
-  for (const double contrast : contrasts) std::printf(" contrast %.1f |", contrast);
-  std::printf("\n|---|---|---|---|---|---|\n");
-  Defects sure;
-  for (const double side : sides) {
-    for (int kind : {0, 1}) {
-      std::printf("| %.0f | %s |", side, kind == 0 ? "too much" : "missing");
-      for (const double contrast : contrasts) {
-        const Defects& sum = sums[{side, contrast}];
-        const bool promised = kind == 0 ? side >= 4 : side >= 8 && contrast == 1;
-        if (promised) sure.drawn[kind] += sum.drawn[kind];
-        if (promised) sure.found[kind] += sum.found[kind];
-        std::printf(" %d of %d |", sum.found[kind], sum.drawn[kind]);
-      }
-      std::printf("\n");
-    }
-    std::printf("| %.0f | false areas |", side);
-    for (const double contrast : contrasts) std::printf(" %d |", sums[{side, contrast}].wrong);
-    std::printf("\n");
-  }
+  const Defects sure = PrintDefects(sums);
   std::printf("\nFalse areas: %.2f a print.\n", static_cast<double>(all.wrong) / trusted);
   Hold("prints_extra", 100.0 * sure.found[0] / sure.drawn[0]);
   Hold("prints_missing", 100.0 * sure.found[1] / sure.drawn[1]);
