@@ -11,9 +11,11 @@
 #include <map>
 #include <string>
 #include <thread>
+#include <unordered_map>
 
 #include "desk/base/files.h"
 #include "desk/batch/batch.h"
+#include "desk/batch/worker.h"
 #include "unit_tests/drawing.h"
 
 namespace qv {
@@ -21,6 +23,7 @@ namespace qv {
 namespace {
 
 using ::testing::ElementsAre;
+using ::testing::EndsWith;
 using ::testing::HasSubstr;
 
 std::string Sentence(const std::function<void()>& call) {
@@ -252,6 +255,32 @@ TEST_F(Batches, WhatComesBehindAHungStepIsMeasured) {
           {"a", "MEASURED 0"}, {"hung", "ERROR 0"}, {"b", "MEASURED 0"}, {"c", "MEASURED 0"}, {"focus", "ERROR 1"}}),
       outcomes)
       << "the picture of a miss is kept with the failures'";
+}
+
+// Each step has the whole time; of a picture that does not fit into the line's buffer the first part comes alone.
+TEST_F(Batches, StepsHaveTheirOwnTimeAndComeInPieces) {
+  cv::Mat noise(700, 900, CV_8UC3);
+  cv::randu(noise, 0, 256);
+  Plan plan;
+  for (const char* const name : {"first", "second"}) {
+    plan.steps.push_back({name, {"camera_autofocus", {folder_.Write("noise.png", noise)}}, {}});
+  }
+  BatchOptions options;
+  options.pictures = KeepPictures::kFailures;
+  const std::unordered_map<std::string, std::string> none;
+  Worker worker({plan, options, none});
+  worker.Give(0, Job{}, 0);
+  const auto begun = worker.since();
+  std::vector<StepDone> done;
+  bool finished = false;
+  while (!finished) {
+    usleep(20'000);  // the line's buffer fills
+    ASSERT_TRUE(worker.Receive(done, finished));
+    EXPECT_EQ(done.size(), worker.next_step());
+    EXPECT_EQ(!done.empty(), worker.since() > begun);
+  }
+  ASSERT_EQ(2U, done.size());
+  for (const StepDone& step : done) EXPECT_THAT(step.run->pictures.at(0).content, EndsWith("IEND\xae\x42\x60\x82"));
 }
 
 TEST_F(Batches, FilesThatAreStillHiddenHaveNotArrived) {

@@ -8,6 +8,7 @@
 
 #include <filesystem>
 #include <iostream>
+#include <opencv2/core.hpp>
 #include <sstream>
 
 #include "qvtester/host_properties.h"
@@ -109,6 +110,29 @@ class WrongUses : public ::testing::Test {
 
   TemporaryFolder folder_, said_;
 };
+
+// Gives no memory to a grey picture.
+class NoMemoryForGrey : public cv::MatAllocator {
+ public:
+  cv::UMatData* allocate(int dims, const int* sizes, int type, void* data, std::size_t* step, cv::AccessFlag flags,
+                         cv::UMatUsageFlags usage) const override {
+    if (type == CV_8UC1 && sizes[0] > 100) CV_Error(cv::Error::StsNoMem, "no memory for a grey picture");
+    return cv::Mat::getStdAllocator()->allocate(dims, sizes, type, data, step, flags, usage);
+  }
+  bool allocate(cv::UMatData* data, cv::AccessFlag flags, cv::UMatUsageFlags usage) const override {
+    return cv::Mat::getStdAllocator()->allocate(data, flags, usage);
+  }
+  void deallocate(cv::UMatData* data) const override { cv::Mat::getStdAllocator()->deallocate(data); }
+};
+
+TEST_F(WrongUses, ExhaustedMemoryIsNoFaultOfThePhoto) {
+  NoMemoryForGrey allocator;
+  cv::Mat::setDefaultAllocator(&allocator);
+  const int status = Run({"autofocus", "chart.png"});
+  cv::Mat::setDefaultAllocator(nullptr);
+  EXPECT_EQ(4, status);
+  EXPECT_THAT(Said(), AllOf(HasSubstr("code -99"), HasSubstr("no memory for a grey picture")));
+}
 
 TEST_F(WrongUses, EachEndsWithItsStatusAndASentence) {
   std::istringstream table(ReadFile(QVTESTER_WRONG_USES));
