@@ -8,7 +8,7 @@
 
 #include "unit_tests/drawing.h"
 
-// The installed-like program, run as a user would.
+// The program, run as a user would: in a fork of the test, or by a shell where the words need one.
 
 struct ProgramRun {
   int status = -1;  // exit status; 1000 + signal when killed
@@ -21,6 +21,8 @@ nlohmann::json Measured(const nlohmann::json& record, const std::string& name);
 /// Tests that run the program in a folder of their own, on photos of its own simulator.
 class SimulatedPhotos : public ::testing::Test {
  protected:
+  SimulatedPhotos();
+
   /// Runs `qvtester` in the folder with these arguments, as a shell reads them, after what stands before.
   ProgramRun Run(const std::string& arguments, const std::string& before = "") const;
   void ExpectComplaint(const std::string& arguments, int status, const std::string& complaint) const;
@@ -34,6 +36,9 @@ class SimulatedPhotos : public ::testing::Test {
 
   TemporaryFolder folder_;
   std::string err_;
+
+ private:
+  int RunForked(const std::string& arguments, const TemporaryFolder& streams) const;
 };
 
 #endif  // QVTESTER_UNIT_TESTS_PROGRAM_H_
