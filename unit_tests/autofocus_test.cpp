@@ -4,6 +4,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "desk/simulation/method_law.h"
+#include "unit_tests/golden.h"
 #include "unit_tests/module_test.h"
 #include "unit_tests/plain/chart_mtf.h"
 
@@ -33,8 +34,7 @@ class Autofocus : public ModuleTest {
 
 TEST_F(Autofocus, AChartPhotoGivesCurvesAndFigures) {
   ASSERT_EQ(1, Measure(DrawChart()));
-  EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] RunTest, testindex: 14, fake_mode: 0, step: 0",
-                                             "[GetSFRFromImage] prop_binary_thr_working_: 125"));
+  ExpectGolden("log_autofocus", LogLines::Text());
   const QVResultData& results = Results();
   EXPECT_EQ(75 / 2 + 1, results.af_sfr_count_);  // 750 chart units at a tenth of a pixel
   EXPECT_EQ(1.0f, results.af_sfr_second_[0]);
@@ -52,11 +52,7 @@ TEST_F(Autofocus, PhotosThatCanNotBeMeasuredChangeNothing) {
   const LogLines log;
   EXPECT_EQ(-91, Measure(DrawChart({2})));
   EXPECT_EQ(before, Held());
-  EXPECT_THAT(LogLines::Texts(),
-              ElementsAre("[OKAPI] RunTest, testindex: 14, fake_mode: 0, step: 0",
-                          "[GetSFRFromImage] prop_binary_thr_working_: 125", "[OKAPI] startSize : 2",
-                          "[GetSFRFromImage] GetSFRFromImage, finder point : 2 \n return PATTERN NOT FOUND!",
-                          "TestCameraAutofocus Fail to get SFR data (Result:-91)"));
+  ExpectGolden("log_autofocus_miss", LogLines::Text());
   float vertical = 5;
   float horizontal = 6;
   EXPECT_EQ(-91, CheckMTF(&vertical, &horizontal));
@@ -80,25 +76,13 @@ TEST_F(Autofocus, TheMtfMeasuresAgree) {
   ASSERT_EQ(1, theTester->GetMTFFromImage(DrawChart(), vertical, horizontal));
   EXPECT_EQ(Held()[0], vertical);
   EXPECT_EQ(Held()[1], horizontal);
-  // The marks' middles in a picture of 1000 x 1000: 151.5 and 848.5.
-  EXPECT_THAT(
-      LogLines::Texts(),
-      ElementsAre(
-          "[GetMTFFromImage] prop_binary_thr_working_: 125",
-          "GetMTFFromImage 3 circle is detected using finder_point algorithm!",
-          "GetMTFFromImage distance between Topleft(x:151,y:151) to Topright(x:151,y:848) : 697.000000",
-          "GetMTFFromImage distance between Topleft(x:151,y:151) to bottomleft(x:848,y:151) : 697.000000",
-          "GetMTFFromImage distance between Bottomleft(x:848,y:151) to Topright(x:151,y:848) : 985.706853",
-          "GetMTFFromImage vertical roi region x : 539, y : 477, width : 216, height : 75, row : 75, col : 216",
-          "GetMTFFromImage horizontal roi region x : 474, y : 245, width : 75, height : 216, row : 216, col : 75"));
+  ExpectGolden("log_mtf", LogLines::Text());  // the marks' middles in a picture of 1000 x 1000: 151.5 and 848.5
   ASSERT_EQ(1, CheckMTF(&vertical, &horizontal));
   EXPECT_EQ(Held()[0], vertical);
 
   const LogLines miss;
   EXPECT_EQ(-91, theTester->GetMTFFromImage(cv::Mat(50, 50, CV_8UC3, cv::Scalar::all(255)), vertical, horizontal));
-  EXPECT_THAT(LogLines::Texts(), ElementsAre("[GetMTFFromImage] prop_binary_thr_working_: 125", "[OKAPI] startSize : 0",
-                                             "GetMTFFromImage 0 circle is detected using finder_point algorithm!",
-                                             "[GetMTFFromImage] finder point : 0 \n return PATTERN NOT FOUND!"));
+  ExpectGolden("log_mtf_miss", LogLines::Text());
 }
 
 // The code and all figures of a measure.

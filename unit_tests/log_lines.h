@@ -20,6 +20,13 @@ class LogLines {
 
   static const std::vector<std::string>& All() { return lines_; }
 
+  // The lines' texts, one after the other.
+  static std::string Text() {
+    std::string text;
+    for (const std::string& line : Texts()) text += line + "\n";
+    return text;
+  }
+
   // The lines' texts, without tag and line end.
   static std::vector<std::string> Texts() {
     std::vector<std::string> texts;
