@@ -266,8 +266,11 @@ TEST(Measure, MarksAreToldWhereTheyLieAndUnequalLegsDoubted) {
     EXPECT_NEAR(truth[i].y, marks.values.at(i), 0.4) << i;
   }
   EXPECT_THAT(Remarks(straight), Not(::testing::Contains("oblique")));
-  cv::resize(photo, photo, {}, 1.03, 1);
-  EXPECT_THAT(Remarks(MeasureAnew({"camera_capture", {photo}})), ::testing::Contains("oblique"));
+  cv::Mat oblique;
+  cv::resize(photo, oblique, {}, 1.03, 1);
+  EXPECT_THAT(Remarks(MeasureAnew({"camera_capture", {oblique}})), ::testing::Contains("oblique"));
+  EXPECT_THAT(Remarks(MeasureAnew({"camera_capture", {photo, oblique}})), ::testing::Contains("oblique")) << "standard";
+  EXPECT_THAT(Remarks(MeasureAnew({"camera_capture", {photo, photo}})), ::testing::IsEmpty());
 }
 
 TEST(Measure, TheReasonsOfAMissStandAboveThePicture) {

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <map>
+#include <memory>
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
@@ -206,15 +207,17 @@ cv::Scalar MeanInside(const cv::Mat& photo, const std::array<cv::Point2d, 4>& ou
   return cv::mean(photo(bounds), inside);
 }
 
+constexpr double kMostOblique = 0.015;  // of the legs' ratio from 1
+
 // A patch whose middle is of another colour than the whole has a neighbour in it.
-void DoubtEvenness(Record& record, const CaptureFinding& finding) {
+void DoubtEvenness(Record& record, const cv::Mat& photo, const std::vector<std::array<cv::Point2d, 4>>& outlines,
+                   const std::string& photo_path) {
   constexpr double kInner = 0.5;
   constexpr double kMostOff = 8;  // levels of a channel; the mean colour is then off by some 3 (CIE 1976)
   double worst = 0;
   std::size_t which = 0;
-  for (std::size_t i = 0; i < finding.outlines.size(); ++i) {
-    const cv::Scalar off =
-        MeanInside(finding.photo, finding.outlines[i], kInner) - MeanInside(finding.photo, finding.outlines[i], 1);
+  for (std::size_t i = 0; i < outlines.size(); ++i) {
+    const cv::Scalar off = MeanInside(photo, outlines[i], kInner) - MeanInside(photo, outlines[i], 1);
     const double most = std::max({std::fabs(off[0]), std::fabs(off[1]), std::fabs(off[2])});
     if (most <= worst) continue;
     worst = most;
@@ -225,8 +228,36 @@ void DoubtEvenness(Record& record, const CaptureFinding& finding) {
       Doubt::kUnevenPatches,
       Format("%s: patch %zu is not of one colour: its middle differs from its mean by %.1f levels in a channel; is the "
              "chart seen straight on, and clean?",
-             record.inputs[0].path.c_str(), which, worst),
+             photo_path.c_str(), which, worst),
       "lab_l");
+}
+
+std::vector<std::array<cv::Point2d, 4>> PatchOutlines(const FoundChart& found) {
+  std::vector<std::array<cv::Point2d, 4>> outlines;
+  const PatchGrid grid = PlacePatches(found.corner, found.second, found.third);
+  for (const cv::Point& centre : grid.centres) {
+    outlines.push_back(
+        OnPhoto(found, cv::Rect(centre.y - grid.half, centre.x - grid.half, 2 * grid.half, 2 * grid.half)));
+  }
+  return outlines;
+}
+
+// A patch beside its place in the standard photo makes the difference as wrong as one in the other. The test keeps the
+// standard's colours and not where they lay: it runs once more, on the standard as its photo.
+void DoubtStandard(Record& record, const cv::Mat& standard, int threshold) {
+  QVTester beside;
+  beside.Initialize();
+  auto photo = std::make_unique<QVResource>();
+  if (photo->SetImage(standard) != QV_SUCCESS) return;
+  beside.resources_[QV_RESOURCE_CHART_PHOTO] = std::move(photo);
+  beside.prop_binary_thr_working_ = threshold;
+  if (beside.RunTest(QV_TEST_CAMERA_CAPTURE, false) != QV_SUCCESS) return;
+  const FoundChart& found = beside.kept_->chart;
+  const ChartView view = LookAtChart(found);
+  const std::string& path = record.inputs[1].path;
+  DoubtMarks(record, found, view, path);
+  DoubtView(record, view, path, "patches", kMostOblique);
+  DoubtEvenness(record, standard, PatchOutlines(found), path);
 }
 
 class Capture : public Measurement {
@@ -264,9 +295,12 @@ class Capture : public Measurement {
                                     missed_standard ? QV_PROPERTY_STANDARD_BINARY_THR : QV_PROPERTY_BINARY_THR_WORKING);
     }
     if (code != QV_SUCCESS) return finding;
-    DoubtView(record, finding->view, "patches", 0.015);
+    DoubtView(record, finding->view, record.inputs[0].path, "patches", kMostOblique);
     TakePatches(*finding, tester);
-    DoubtEvenness(record, *finding);
+    DoubtEvenness(record, finding->photo, finding->outlines, record.inputs[0].path);
+    if (record.inputs.size() > 1) {
+      DoubtStandard(record, SlotPhoto(tester, spec_.inputs[1].slot), tester.prop_param_86_);
+    }
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));
     std::map<int, cv::Vec3d> given;
     if (request.parameters.contains("reference")) given = PatchValues(request.parameters["reference"]);
@@ -320,11 +354,8 @@ class Capture : public Measurement {
     const FoundChart& found = tester.kept_->chart;
     finding.measured = found.patches;
     finding.standard = StandardOf(tester).patches;
-    const PatchGrid grid = PlacePatches(found.corner, found.second, found.third);
-    for (std::size_t i = 0; i < found.patches.size(); ++i) {
-      finding.outlines.push_back(OnPhoto(
-          found, cv::Rect(grid.centres[i].y - grid.half, grid.centres[i].x - grid.half, 2 * grid.half, 2 * grid.half)));
-    }
+    finding.outlines = PatchOutlines(found);
+    finding.outlines.resize(std::min(finding.outlines.size(), found.patches.size()));
   }
 
   bool front_;

@@ -115,20 +115,7 @@ void AddChartFigures(Phase& phase, const ChartView& view) {
   phase.Add("straightened_by", view.straightened_by_deg);
 }
 
-ChartView DescribeChart(Record& record, const FoundChart& found, const std::string& photo_path, const cv::Mat& photo,
-                        QV_PROPERTY_INDEX threshold_property) {
-  ChartView view = LookAtChart(found);
-  AddChartFigures(record.phase, view);
-  if (!view.complete()) {
-    view.miss = ExplainMiss(view.marks, view.threshold, photo);
-    record.phase.Add("grey_peak_dark", view.miss->peaks.dark);
-    record.phase.Add("grey_peak_light", view.miss->peaks.light);
-    if (view.miss->threshold) record.phase.Add("suggested_threshold", *view.miss->threshold);
-    record.Say(Remark::kMiss, "marks_not_found", MissSentence(*view.miss, photo_path, threshold_property),
-               "marks_found");
-    return view;
-  }
-  TrustMarks(record.phase, view, photo);
+void DoubtMarks(Record& record, const FoundChart& found, const ChartView& view, const std::string& photo_path) {
   if (!view.plausible()) {
     record.Say(Doubt::kImplausibleMarks,
                Format("%s: the find is doubtful: the legs between the marks are as %.3f to 1 at %.1f degrees, "
@@ -143,6 +130,23 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
                    "patches are not where they are looked for",
                "marks");
   }
+}
+
+ChartView DescribeChart(Record& record, const FoundChart& found, const std::string& photo_path, const cv::Mat& photo,
+                        QV_PROPERTY_INDEX threshold_property) {
+  ChartView view = LookAtChart(found);
+  AddChartFigures(record.phase, view);
+  if (!view.complete()) {
+    view.miss = ExplainMiss(view.marks, view.threshold, photo);
+    record.phase.Add("grey_peak_dark", view.miss->peaks.dark);
+    record.phase.Add("grey_peak_light", view.miss->peaks.light);
+    if (view.miss->threshold) record.phase.Add("suggested_threshold", *view.miss->threshold);
+    record.Say(Remark::kMiss, "marks_not_found", MissSentence(*view.miss, photo_path, threshold_property),
+               "marks_found");
+    return view;
+  }
+  TrustMarks(record.phase, view, photo);
+  DoubtMarks(record, found, view, photo_path);
   if (view.candidates > static_cast<int>(kMarks)) {
     record.Say(Remark::kWarning, "more_candidates",
                Format("%s: %d places passed as finder marks; the three most alike were used", photo_path.c_str(),
@@ -152,7 +156,8 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
   return view;
 }
 
-void DoubtView(Record& record, const ChartView& view, const char* parts, double most_oblique) {
+void DoubtView(Record& record, const ChartView& view, const std::string& photo_path, const char* parts,
+               double most_oblique) {
   constexpr double kSkewDeg = 60;  // of the legs' angle that goes with so much of their ratio
   const double ratio = view.legs.ratio();
   const double angle_deg = view.legs.angle_deg();
@@ -161,7 +166,7 @@ void DoubtView(Record& record, const ChartView& view, const char* parts, double 
   record.Say(Doubt::kOblique,
              Format("%s: the chart is seen obliquely: its legs are as %.3f to 1 at %.1f degrees; %s may lie beside "
                     "their places",
-                    record.inputs[0].path.c_str(), ratio, angle_deg, parts),
+                    photo_path.c_str(), ratio, angle_deg, parts),
              "legs_ratio");
 }
 

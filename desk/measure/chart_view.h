@@ -47,7 +47,11 @@ extern const Method kScanMethod;
 ///
 /// @param parts         of the chart that are measured: "patches".
 /// @param most_oblique  how far the legs' ratio may be from 1.
-void DoubtView(Record& record, const ChartView& view, const char* parts, double most_oblique);
+void DoubtView(Record& record, const ChartView& view, const std::string& photo_path, const char* parts,
+               double most_oblique);
+
+/// Doubts where three marks don't lie as a chart's, or the chart is seen in a mirror.
+void DoubtMarks(Record& record, const FoundChart& found, const ChartView& view, const std::string& photo_path);
 
 /// The figures that DescribeChart adds.
 const std::vector<Figure>& ChartFigures();

@@ -155,7 +155,7 @@ std::unique_ptr<Finding> LookAtSharpness(const QVTester& tester, Record& record)
   finding->view = DescribeChart(record, found, record.inputs[0].path, finding->photo);
   if (record.phase.code != QV_SUCCESS) return finding;
   finding->regions = RegionsOf(found);
-  DoubtView(record, finding->view, "regions", 0.025);
+  DoubtView(record, finding->view, record.inputs[0].path, "regions", 0.025);
   for (std::size_t i = 0; i < kRegionNames.size(); ++i) {
     AddIsoFigures(record, found.gray, finding->regions[i], i);
     if (record.request.parameters.value("uncertainty", false)) AddOwnUncertainty(record, finding->regions[i], i);
