@@ -31,7 +31,7 @@ Selection StoreOptions::selection() const {
 
 ArchiveLimits ReadArchiveLimits(const std::string& path) {
   const Limits read = ReadLimits(path);
-  ArchiveLimits limits = {{}, read.accept_doubts};
+  ArchiveLimits limits = {{}, read.accept_doubts, {}, read.rule};
   const auto bounds_of = [](const Limit& limit) {
     return Bounds{limit.min, limit.max, limit.marginal_min, limit.marginal_max};
   };

@@ -126,6 +126,61 @@ TEST_F(Archive, IsJudgedAgainByOtherLimits) {
   }
 }
 
+struct RuleCase {
+  const char* rule;
+  double factor, flash_min;
+  const char* outcome;  // of the run
+};
+
+// As ALimitNearTheReadingFollowsTheRule has it of measuring.
+TEST_F(Archive, IsJudgedAgainByTheRuleOfTheLimits) {
+  Store store = Open("store.db");
+  StoredRun run = RunOf("x", 1);
+  run.record["request"]["measurement"] = run.record["phases"][0]["name"] = "camera_flash";
+  Json figure = run.record["phases"][0]["measurements"]["flash_mean"];
+  figure["uncertainty"] = {{"standard", 0.2}, {"expanded", 0.5}};
+  Json unknown = figure;
+  unknown.erase("uncertainty");
+  const Json list = {{"outcome", "MEASURED"},
+                     {"measured_value", {{0, 1.5}, {7, 2.5}}},
+                     {"uncertainty", {{"standard", {0.2, 0.1}}, {"expanded", {0.4, 0.2}}}}};
+  run.record["phases"][0]["measurements"] = {{"camera_flash_mean", figure}, {"camera_flash_mean_red", unknown}};
+  run.record["outcome_details"] = Json::array({{{"name", "no_uncertainty"}, {"weight", "no judgement"}}});
+  store.Put(run);
+  StoredRun patches = RunOf("y", 1);
+  patches.record["request"]["measurement"] = patches.record["phases"][0]["name"] = "camera_capture";
+  patches.record["phases"][0]["measurements"] = {{"camera_capture_delta_e_76", list}};
+  store.Put(patches);
+  const auto limits = [](const RuleCase& test, const std::string& figure_name) {
+    return ArchiveLimits{
+        {{figure_name, {test.flash_min, {}, {}, {}}}}, {}, {}, {*ParseDecisionRule(test.rule), test.factor}};
+  };
+  for (const RuleCase& test : std::vector<RuleCase>{{"simple", 1, 0.9, "PASS"},
+                                                    {"guarded", 1, 0.51, "FAIL"},
+                                                    {"guarded", 1, 0.49, "PASS"},
+                                                    {"guarded", 0.5, 0.74, "PASS"},
+                                                    {"guarded", 0.5, 0.76, "FAIL"},
+                                                    {"guarded_rejection", 1, 1.49, "PASS"},
+                                                    {"guarded_rejection", 1, 1.51, "FAIL"}}) {
+    const Selection flash = {{"measurement", "=", "camera_flash"}};
+    const Judgement judged = JudgeAgain(store, flash, limits(test, "camera_flash_mean"), nullptr);
+    EXPECT_EQ(1, judged.runs_after.of(test.outcome)) << test.rule << test.flash_min;
+    EXPECT_EQ(1, JudgeAgain(store, flash, limits(test, "camera_flash_mean_red"), nullptr)
+                     .runs_after.of(test.rule == std::string("simple") ? "PASS" : "ERROR"))
+        << "without an uncertainty no guard band is known";
+    const ArchiveLimits before = limits(test, "camera_flash_mean");
+    EXPECT_EQ(1, JudgeAgain(store, flash, limits({"simple", 1, 0, ""}, "camera_flash_mean"), &before)
+                     .runs_before.of(test.outcome))
+        << test.rule << test.flash_min;
+  }
+  for (const auto& [rule, max, outcome] :
+       {std::tuple("guarded", 2.71, "PASS"), {"guarded", 2.69, "FAIL"}, {"guarded_rejection", 2.31, "PASS"}}) {
+    const ArchiveLimits own = {
+        {}, {}, {{"camera_capture_delta_e_76", {{{}, max, {}, {}}, {}}}}, {*ParseDecisionRule(rule), 1}};
+    EXPECT_EQ(1, JudgeAgain(store, {}, own, nullptr).runs_after.of(outcome)) << rule << max;
+  }
+}
+
 TEST_F(Archive, ListsAreJudgedAgainByTheirEntries) {
   Store store = Open("lists.db");
   StoredRun run = RunOf("x", 1);

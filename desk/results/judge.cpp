@@ -7,7 +7,7 @@
 #include <unordered_map>
 
 #include "desk/measure/figures.h"
-#include "desk/results/list_verdicts.h"
+#include "desk/results/record_verdicts.h"
 
 namespace qv {
 
@@ -75,13 +75,19 @@ class Judge {
 struct RunFigures {
   const RunRow* row;
   std::vector<FigureRow> figures;  // single values
-  const std::vector<ListVerdict>* lists;
+  const std::vector<RecordVerdicts>* read;
+
+  const RecordVerdicts* Read(const std::string& name) const {
+    const auto own = [&](const RecordVerdicts& verdicts) { return verdicts.name == name; };
+    const auto found = std::find_if(read->begin(), read->end(), own);
+    return found == read->end() ? nullptr : &*found;
+  }
 };
 
 // A run's verdict, figure by figure, and of those that a limit asks for in vain.
 struct RunVerdict {
   std::string outcome;
-  std::vector<const char*> figures;
+  std::vector<std::string> figures;
   std::vector<std::string> missing;
 };
 
@@ -89,29 +95,33 @@ bool Has(const RunFigures& run, const std::string& name, const std::vector<std::
   return std::any_of(
              run.figures.begin(), run.figures.end(),
              [&](const FigureRow& figure) { return names[static_cast<std::size_t>(figure.quantity)] == name; }) ||
-         std::any_of(run.lists->begin(), run.lists->end(), [&](const ListVerdict& list) { return list.name == name; });
+         run.Read(name) != nullptr;
 }
 
 RunVerdict Verdict(Judge& judge, const RunFigures& run, const std::vector<std::string>& names,
-                   std::string ListVerdict::*of_lists) {
+                   RecordVerdict RecordVerdicts::*read) {
   RunVerdict verdict;
   Tally tally;
+  bool unknown_band = false;
   for (const FigureRow& figure : run.figures) {
-    const char* const outcome = judge.Of(figure);
-    verdict.figures.push_back(outcome);
-    if (judge.Limits(figure.quantity)) tally.Add(outcome);
+    const RecordVerdicts* const own = run.Read(names[static_cast<std::size_t>(figure.quantity)]);
+    verdict.figures.push_back(own != nullptr ? (own->*read).outcome : judge.Of(figure));
+    if (judge.Limits(figure.quantity)) tally.Add(verdict.figures.back());
   }
-  for (const ListVerdict& list : *run.lists) tally.Add(list.*of_lists);
+  for (const RecordVerdicts& own : *run.read) {
+    if (own.list) tally.Add((own.*read).outcome);
+    unknown_band = unknown_band || (own.*read).unknown_band;
+  }
   for (const std::string& name : judge.Asked(run.row->measurement)) {
     if (!Has(run, name, names)) verdict.missing.push_back(name);
   }
   const bool doubted = !judge.Accepts(run.row->doubts);
   const bool whole = run.row->result_code == 1 && verdict.missing.empty() && tally.of("UNSET") == 0;
-  verdict.outcome = run.row->outcome == "ABORTED" ? "ABORTED"
-                    : !whole || doubted           ? "ERROR"
-                    : tally.of("FAIL") > 0        ? "FAIL"
-                    : tally.of("PASS") > 0        ? "PASS"
-                                                  : "MEASURED";
+  verdict.outcome = run.row->outcome == "ABORTED"       ? "ABORTED"
+                    : !whole || doubted || unknown_band ? "ERROR"
+                    : tally.of("FAIL") > 0              ? "FAIL"
+                    : tally.of("PASS") > 0              ? "PASS"
+                                                        : "MEASURED";
   return verdict;
 }
 
@@ -164,7 +174,7 @@ class Session {
   Session(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against)
       : quantities_(store.Quantities()),
         now_(now, quantities_),
-        lists_(VerdictsOnLists(store, selection, now, against)) {
+        read_(VerdictsOnRecords(store, selection, now, against)) {
     if (against != nullptr) before_.emplace(*against, quantities_);
     for (const Quantity& quantity : quantities_) {
       names_.resize(std::max(names_.size(), static_cast<std::size_t>(quantity.id) + 1));
@@ -176,8 +186,8 @@ class Session {
       if (std::find(names_.begin(), names_.end(), name) == names_.end()) result.idle_limits.push_back(name);
     }
     std::set<std::string> listed;
-    for (const auto& [run, lists] : lists_) {
-      for (const ListVerdict& list : lists) listed.insert(list.name);
+    for (const auto& [run, verdicts] : read_) {
+      for (const RecordVerdicts& own : verdicts) listed.insert(own.name);
     }
     for (const auto& [name, bounds] : now.lists) {
       if (listed.count(name) == 0) result.idle_limits.push_back(name);
@@ -187,9 +197,9 @@ class Session {
   void Take(RunFigures& run) {
     TakeLists(run);
     const RunRow& row = *run.row;
-    const RunVerdict after = Verdict(now_, run, names_, &ListVerdict::after);
+    const RunVerdict after = Verdict(now_, run, names_, &RecordVerdicts::after);
     const RunVerdict before =
-        before_ ? Verdict(*before_, run, names_, &ListVerdict::before) : RunVerdict{row.outcome, {}, {}};
+        before_ ? Verdict(*before_, run, names_, &RecordVerdicts::before) : RunVerdict{row.outcome, {}, {}};
     for (std::size_t i = 0; i < run.figures.size(); ++i) {
       const FigureRow& figure = run.figures[i];
       const auto quantity = static_cast<std::size_t>(figure.quantity);
@@ -226,21 +236,22 @@ class Session {
 
   // Judged lists leave the rows, where they have no value.
   void TakeLists(RunFigures& run) {
-    static const std::vector<ListVerdict> none;
-    const auto found = lists_.find(run.row->id);
-    run.lists = found == lists_.end() ? &none : &found->second;
-    for (const ListVerdict& list : *run.lists) {
+    static const std::vector<RecordVerdicts> none;
+    const auto found = read_.find(run.row->id);
+    run.read = found == read_.end() ? &none : &found->second;
+    for (const RecordVerdicts& list : *run.read) {
+      if (!list.list) continue;
       const auto own = [&](const FigureRow& row) {
         return names_[static_cast<std::size_t>(row.quantity)] == list.name;
       };
       run.figures.erase(std::remove_if(run.figures.begin(), run.figures.end(), own), run.figures.end());
-      Count(*run.row, QuantityOf(list), list.before, list.after);
-      Changed(*run.row, list.name, kNone, list.before, list.after);
+      Count(*run.row, QuantityOf(list), list.before.outcome, list.after.outcome);
+      Changed(*run.row, list.name, kNone, list.before.outcome, list.after.outcome);
     }
   }
 
   // A list that was never judged before is none of the store's quantities.
-  std::size_t QuantityOf(const ListVerdict& list) {
+  std::size_t QuantityOf(const RecordVerdicts& list) {
     const auto found = std::find(names_.begin(), names_.end(), list.name);
     const auto at = static_cast<std::size_t>(found - names_.begin());
     if (found != names_.end()) return at;
@@ -263,8 +274,8 @@ class Session {
   std::vector<Quantity> quantities_;
   Judge now_;
   std::optional<Judge> before_;
-  std::map<std::int64_t, std::vector<ListVerdict>> lists_;  // by run
-  std::vector<std::string> names_, units_;                  // by quantity
+  std::map<std::int64_t, std::vector<RecordVerdicts>> read_;  // by run
+  std::vector<std::string> names_, units_;                    // by quantity
   std::map<std::pair<std::string, std::size_t>, JudgedFigure> figures_;
   UnitVerdicts units_before_, units_after_;
 };

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "desk/measure/decision.h"
 #include "desk/results/store.h"
 
 // An archive judged again, without measuring.
@@ -24,12 +25,11 @@ struct ArchiveLimits {
   std::map<std::string, Bounds> by_name;
   std::set<std::string> accepted_doubts;
   std::map<std::string, ListBounds> lists = {};
+  DecisionRule rule = {};  // by which each value is held against its bounds; guard bands are the records' own
 };
 
 /// "PASS" or "FAIL"; what is not finite fails.
 const char* VerdictOf(double value, const Bounds& bounds);
-/// The same of a list, [number, value] each; UNSET where it lacks an entry that has bounds of its own, or is none.
-const char* VerdictOf(const Json& points, const ListBounds& bounds);
 
 /// How many of each.
 struct Tally {
@@ -62,7 +62,9 @@ struct Judgement {
   std::vector<std::string> idle_limits;  // limits on what no run of the archive measures
 };
 
-/// Judges by `now`; before is what the store holds, or what `against` would say. Throws Failure (wrong usage) where no
+/// Judges by `now` as a measurement would: a list that lacks an entry with bounds of its own is UNSET, and a run is an
+/// ERROR where the rule asks for an uncertainty that its record does not hold. Before is what the store holds, or what
+/// `against` would say. Throws Failure (wrong usage) where no
 /// run measures anything that `now` limits.
 Judgement JudgeAgain(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against);
 

@@ -106,6 +106,7 @@ std::set<std::string> DoubtsOf(const Json& record) {
   for (const Json& detail : details) {
     const std::string weight = TextAt(detail, "weight");
     const std::string name = TextAt(detail, "name");
+    if (name == "no_uncertainty") continue;  // that is asked for by the limits of then
     const bool doubt = weight == "doubt" || weight == "accepted doubt";
     if (doubt || weight == "no judgement") doubts.insert(doubt && !name.empty() ? name : "?");
   }
