@@ -1,5 +1,5 @@
-// A batch beside what no form of it can do without, its gain from more workers, and its workers' memory. CPU time where
-// a ratio is asked for, since the machine may be shared; scaling by the clock on the wall.   batch_benchmark
+// A batch beside what no form of it can do without, its gain from more workers, and its workers' memory. By CPU time
+// and by the time that workers wait for something to do, since the machine may be shared.   batch_benchmark
 #include <malloc.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
@@ -26,7 +26,7 @@
 namespace qv {
 namespace {
 
-constexpr int kPhotos = 12, kUnits = 96, kRounds = 2, kManyPhotos = 10000;
+constexpr int kPhotos = 12, kUnits = 96, kRounds = 5, kManyPhotos = 10000;
 
 double Seconds(const rusage& usage) {
   const auto of = [](const timeval& time) { return static_cast<double>(time.tv_sec) + 1e-6 * time.tv_usec; };
@@ -54,6 +54,12 @@ double CpuOf(const std::function<void()>& work) {
   }
   waitpid(process, nullptr, 0);
   return CpuSeconds() - before;
+}
+
+double Median(std::vector<double> values) {
+  const auto middle = values.begin() + static_cast<std::ptrdiff_t>(values.size() / 2);
+  std::nth_element(values.begin(), middle, values.end());
+  return *middle;
 }
 
 double Least(const std::vector<double>& values) { return *std::min_element(values.begin(), values.end()); }
@@ -96,45 +102,93 @@ std::vector<Job> TakePhotos(const TemporaryFolder& folder) {
   return jobs;
 }
 
+void MeasureByTheLibrary(const std::vector<Job>& jobs) {
+  for (const Job& job : jobs) {
+    QVTester tester;
+    tester.Initialize();
+    if (tester.SetResource(QV_RESOURCE_CHART_PHOTO, std::string(job.inputs[0]).data()) != 1 ||
+        tester.RunTest(QV_TEST_CAMERA_AUTOFOCUS, false) != 1)
+      std::fprintf(stderr, "%s is not measured\n", job.inputs[0].c_str());
+  }
+}
+
+void MeasureByTheDesk(const std::vector<Job>& jobs) {
+  for (const Job& job : jobs) {
+    QVTester tester;
+    Measure(tester, RequestOf("camera_autofocus", job.inputs[0]), {});
+  }
+}
+
+// The three in turn, and the median of each round's ratios.
 void CompareWithItsParts(const std::vector<Job>& jobs) {
-  std::vector<double> library, measured, batch;
+  std::vector<double> library, measured, batch, over_measured, over_library;
   for (int round = 0; round < kRounds; ++round) {
-    library.push_back(CpuOf([&] {
-      for (const Job& job : jobs) {
-        QVTester tester;
-        tester.Initialize();
-        if (tester.SetResource(QV_RESOURCE_CHART_PHOTO, std::string(job.inputs[0]).data()) != 1 ||
-            tester.RunTest(QV_TEST_CAMERA_AUTOFOCUS, false) != 1)
-          std::fprintf(stderr, "%s is not measured\n", job.inputs[0].c_str());
-      }
-    }));
-    measured.push_back(CpuOf([&] {
-      for (const Job& job : jobs) {
-        QVTester tester;
-        Measure(tester, RequestOf("camera_autofocus", job.inputs[0]), {});
-      }
-    }));
+    library.push_back(CpuOf([&] { MeasureByTheLibrary(jobs); }));
+    measured.push_back(CpuOf([&] { MeasureByTheDesk(jobs); }));
     batch.push_back(CpuOf([&] { Batch("camera_autofocus", jobs, 1); }));
+    over_measured.push_back(batch.back() / measured.back());
+    over_library.push_back(batch.back() / library.back());
   }
   const double own = 1000 / static_cast<double>(jobs.size());
-  std::printf("%-62s %7.1f ms a photo\n", "loading and the test's own routine", own * Least(library));
+  std::printf("%-62s %7.1f ms a photo\n", "loading and the test's own routine", own * Median(library));
   std::printf("%-62s %7.1f ms a photo\n", "measuring: that, the input's hash, all figures, doubts",
-              own * Least(measured));
-  std::printf("%-62s %7.1f ms a photo, %.3f of measuring (target 1.05)\n", "a batch of one worker, with its store",
-              own * Least(batch), Least(batch) / Least(measured));
+              own * Median(measured));
+  std::printf("%-62s %7.1f ms a photo, %.3f of measuring (target 1.05), %.2f of the test's own\n",
+              "a batch of one worker, with its store", own * Median(batch), Median(over_measured),
+              Median(over_library));
   std::fflush(stdout);  // before workers are forked
 }
 
+std::vector<pid_t> Children() {
+  std::vector<pid_t> pids;
+  std::ifstream children("/proc/self/task/" + std::to_string(getpid()) + "/children");
+  for (pid_t child = 0; children >> child;) pids.push_back(child);
+  return pids;
+}
+
+// Seconds that this process's children were at work, or would have been had nobody else had the machine's cores.
+double ChildrensWork() {
+  double seconds = 0;
+  for (const pid_t child : Children()) {
+    double running = 0, kept_waiting = 0;
+    std::ifstream("/proc/" + std::to_string(child) + "/schedstat") >> running >> kept_waiting;
+    seconds += 1e-9 * (running + kept_waiting);
+  }
+  return seconds;
+}
+
+struct Scaling {
+  double cpu_seconds, seconds, busy;  // busy: share of its time that a worker had something to do
+};
+
+Scaling RunWorkers(const std::vector<Job>& jobs, int workers) {
+  Scaling scaling = {};
+  const std::size_t last = jobs.size() - static_cast<std::size_t>(workers);  // from here on they run out of photos
+  const double before = CpuSeconds();
+  scaling.seconds = Batch("camera_autofocus", jobs, workers, [&](const BatchProgress& progress) {
+                      if (progress.jobs_done == last) scaling.busy = ChildrensWork() / (workers * progress.seconds);
+                    }).seconds;
+  scaling.cpu_seconds = CpuSeconds() - before;
+  return scaling;
+}
+
 void CompareWorkers(const std::vector<Job>& jobs) {
-  double alone = 0;
+  std::vector<double> alone;
   const auto cores = static_cast<int>(std::thread::hardware_concurrency());
   for (int workers = 1; workers <= cores; workers *= 2) {
-    std::vector<double> seconds;
-    for (int round = 0; round < kRounds; ++round) seconds.push_back(Batch("camera_autofocus", jobs, workers).seconds);
-    const double fastest = Least(seconds);
-    if (workers == 1) alone = fastest;
-    std::printf("%-62s %7.2f s, %.2f of %d times as fast (target 0.9)\n", Format("%d worker(s)", workers).c_str(),
-                fastest, alone / fastest / workers, workers);
+    std::vector<double> cpu, seconds, busy;
+    for (int round = 0; round < kRounds; ++round) {
+      const Scaling scaling = RunWorkers(jobs, workers);
+      cpu.push_back(scaling.cpu_seconds);
+      seconds.push_back(scaling.seconds);
+      busy.push_back(scaling.busy);
+    }
+    if (workers == 1) alone = cpu;
+    const double dearer = Median(cpu) / Median(alone);
+    std::printf(
+        "%-62s %7.2f s; %.3f of the CPU time, busy for %.3f: on cores of its own %.2f of %d times as fast "
+        "(target 0.9)\n",
+        Format("%d worker(s)", workers).c_str(), Least(seconds), dearer, Median(busy), Median(busy) / dearer, workers);
     std::fflush(stdout);
   }
 }
@@ -142,8 +196,7 @@ void CompareWorkers(const std::vector<Job>& jobs) {
 // Resident memory of this process's children, the most that one has, MB.
 double ChildrensMemory() {
   double most = 0;
-  std::ifstream children("/proc/self/task/" + std::to_string(getpid()) + "/children");
-  for (pid_t child = 0; children >> child;) {
+  for (const pid_t child : Children()) {
     double size = 0, resident = 0;
     std::ifstream("/proc/" + std::to_string(child) + "/statm") >> size >> resident;
     most = std::max(most, resident * static_cast<double>(sysconf(_SC_PAGESIZE)) / 1e6);

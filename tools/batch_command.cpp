@@ -17,6 +17,7 @@
 #include "desk/results/report.h"
 #include "tools/commands.h"
 #include "tools/program.h"
+#include "tools/store_options.h"
 
 namespace qv {
 
@@ -28,6 +29,7 @@ struct BatchWanted {
   std::string what, inputs, store, limits, junit, pictures = "failures", shard = "1/1";
   std::vector<std::string> parameters, properties;
   bool watch = false, quiet = false;
+  WaitOption wait;
   int workers = static_cast<int>(std::max(1U, std::thread::hardware_concurrency()));
   BatchOptions options;
 };
@@ -156,8 +158,7 @@ int RunIt(BatchWanted& wanted) {
                 {"the test results", wanted.junit}});
   wanted.options.workers = wanted.workers;
   wanted.options.pictures = PicturesOf(wanted);
-  Store store(wanted.store, Store::Use::kWrite);
-  store.TellOfWaiting([](const std::string& sentence) { std::cerr << sentence << '\n'; });
+  Store store(wanted.store, Store::Use::kWrite, wanted.wait.patience());
   FinishWhenInterrupted();
   const bool terminal = isatty(STDERR_FILENO) != 0 && !wanted.quiet;
   const auto show = [&](const BatchProgress& progress) {
@@ -187,6 +188,7 @@ CommandBody DeclareBatch(Options& command) {
                  "WHICH");
   command.Number("--timeout", wanted->options.timeout_seconds, 0.1, 86400, "Give up a measurement after this long",
                  "SECONDS");
+  wanted->wait.DeclareOn(command);
   command.Text("--shard", wanted->shard, "Take the K-th of N shares of the inputs", "K/N");
   command.Flag("--watch", wanted->watch, "Go on with photos as they arrive, until interrupted");
   command.Text("--station", wanted->options.station, "Name of the station", "ID");

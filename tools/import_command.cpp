@@ -9,6 +9,7 @@
 #include "desk/results/archive.h"
 #include "tools/commands.h"
 #include "tools/program.h"
+#include "tools/store_options.h"
 
 namespace qv {
 
@@ -17,6 +18,7 @@ namespace {
 struct ImportOptions {
   std::vector<std::string> files;
   std::string store;
+  WaitOption wait;
 };
 
 Imported ImportFile(const std::string& path, Store& store) {
@@ -32,10 +34,11 @@ Imported ImportFile(const std::string& path, Store& store) {
 }
 
 int Import(const ImportOptions& options) {
+  const std::string file = options.store.find("://") == std::string::npos ? options.store : "";
   for (const std::string& path : options.files) {
-    if (path != "-") CheckOutputs({{"the archive", path}}, {{"the store", options.store}});
+    if (path != "-") CheckOutputs({{"the archive", path}}, {{"the store", file}});
   }
-  Store store(options.store, Store::Use::kWrite);
+  Store store(options.store, Store::Use::kWrite, options.wait.patience());
   Imported all;
   for (const std::string& path : options.files) {
     const Imported one = ImportFile(path, store);
@@ -53,6 +56,7 @@ CommandBody DeclareImport(Options& command) {
   command.Arguments("ARCHIVE", options->files, "Archives (.jsonl) or records (.json); - is standard input", "FILE",
                     true);
   command.Text("-o,--output", options->store, "The store: a file, or postgresql://user@host/database", "STORE", true);
+  options->wait.DeclareOn(command);
   return [options] { return Import(*options); };
 }
 

@@ -14,6 +14,7 @@
 #include "desk/results/store.h"
 #include "tools/commands.h"
 #include "tools/program.h"
+#include "tools/store_options.h"
 
 namespace qv {
 
@@ -23,6 +24,7 @@ namespace fs = std::filesystem;
 
 struct RunWanted {
   std::string plan, unit, station, operator_name, lot, store, records, pictures, junit;
+  WaitOption wait;
   bool quiet = false;
 };
 
@@ -106,7 +108,8 @@ class PlanRun {
   int Go() {
     Check();
     // Opened first: a store that can't be written is known before anything is measured.
-    if (!wanted_.store.empty()) store_ = std::make_unique<Store>(wanted_.store, Store::Use::kWrite);
+    if (!wanted_.store.empty())
+      store_ = std::make_unique<Store>(wanted_.store, Store::Use::kWrite, wanted_.wait.patience());
     for (const PlanStep& step : plan_.steps) {
       if (ended_) {
         std::cerr << Printable(step.name) << ": not run, since an earlier step could not measure\n";
@@ -203,6 +206,7 @@ CommandBody DeclareRun(Options& command) {
   command.Text("--lot", wanted->lot, "What the unit belongs to", "NAME");
   command.Text("-o,--output", wanted->store, "Keep the runs in this store: a SQLite file, or postgresql://...",
                "STORE");
+  wanted->wait.DeclareOn(command);
   command.Text("--json", wanted->records, "Write the records, one a line; - is standard output", "FILE");
   command.Text("--annotate", wanted->pictures, "Write a picture of each step into this folder", "DIR");
   command.Text("--junit", wanted->junit, "Write the verdicts as JUnit XML, for a CI server", "XML");

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iostream>
 
 #include "desk/base/text.h"
 #include "desk/measure/figures.h"
@@ -27,6 +28,16 @@ Selection StoreOptions::selection() const {
   Selection selection;
   for (const std::string& word : where) selection.push_back(ParseCondition(word));
   return selection;
+}
+
+void WaitOption::DeclareOn(Options& command) {
+  command.Number("--wait", seconds, 0, 86400, "Wait so long for a store that is away or locked, at the start or later",
+                 "SECONDS");
+}
+
+Patience WaitOption::patience() const {
+  return {std::chrono::milliseconds(std::llround(1000 * seconds)),
+          [](const std::string& sentence) { std::cerr << sentence << '\n'; }};
 }
 
 ArchiveLimits ReadArchiveLimits(const std::string& path) {

@@ -19,6 +19,14 @@ struct StoreOptions {
   Selection selection() const;
 };
 
+/// What commands share that write one.
+struct WaitOption {
+  double seconds = 30;
+
+  void DeclareOn(Options& command);
+  Patience patience() const;  // which tells of waiting on standard error
+};
+
 ArchiveLimits ReadArchiveLimits(const std::string& path);
 
 /// "0.4213 ± 0.002 Nyquist", the uncertainty expanded by 2.

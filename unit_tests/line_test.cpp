@@ -136,7 +136,12 @@ class Line : public SimulatedPhotos {
 TEST_F(Line, GoesOnAfterKillsAndARestartOfTheServer) {
   const std::string batch = "batch camera_autofocus photos -j 2 --quiet -o '" + store_ + "'";
   const std::string restart = Environment("QV_PG_CTL") + " restart -m immediate";
-  const pid_t first = Start(batch);
+  Shell(Environment("QV_PG_CTL") + " stop -m immediate");
+  ExpectComplaint(batch + " --wait 0.3", 4, "trying again for 0.3 s");
+  const pid_t first = Start(batch);  // before its server
+  std::this_thread::sleep_for(1s);
+  Shell(restart);
+  ExpectComplaint(batch + "_none", 2, "does not exist");
   ASSERT_TRUE(MoreThan(0));
   const std::vector<pid_t> workers = Children(first);
   ASSERT_FALSE(workers.empty());
@@ -157,6 +162,7 @@ TEST_F(Line, GoesOnAfterKillsAndARestartOfTheServer) {
   EXPECT_THAT(Run(batch.substr(0, batch.find(" --quiet")) + " -o '" + store_ + "'").out,
               HasSubstr("0 runs stored, " + std::to_string(photos_) + " there before"));
   ExpectTheWholeLot();
+  EXPECT_THAT(Run("import lot.jsonl -o '" + store_ + "'").out, HasSubstr("read, 0 new"));
 }
 
 // The commands that docs/plans.md gives for each scheduler, with the lot's own places in them.

@@ -138,6 +138,14 @@ TEST_F(StoreProgram, PlansCarryNothingOverAndStopWhereTheySay) {
   EXPECT_EQ("MEASURED", all[1]["outcome"]);
   EXPECT_EQ("FAIL", all[2]["outcome"]);
   EXPECT_THAT(Read("p.xml"), HasSubstr(R"(tests="3" failures="1" errors="1")"));
+  // In fake mode blobs are not looked for, and a limit on them can't pass.
+  Simulate("--scene dust --specks 2", "SN1/plain.png");
+  Write("f.json", R"({"name": "f", "limits": {"limits": {"lens_dust_blob_count": {"max": 0}}}, "steps": [
+      {"measurement": "lens_dust", "inputs": ["{unit}/plain.png"], "fake": true}]})");
+  EXPECT_THAT(Run("plan f.json").out, HasSubstr("in fake mode"));
+  EXPECT_EQ(3, Run("run f.json --unit SN1 --quiet").status);
+  Write("f.json", Read("f.json").replace(Read("f.json").find("true"), 4, "false"));
+  EXPECT_EQ(1, Run("run f.json --unit SN1 --quiet").status);
   // A batch over the folder that holds the unit stores the same runs; a standard is seen from the plan's folder.
   EXPECT_THAT(Run("batch p.json . -o false.db -j 1 --junit b.xml").out, HasSubstr("0 runs stored, 3 there before"));
   EXPECT_THAT(Read("b.xml"), HasSubstr(R"(tests="3" failures="1" errors="1")"));

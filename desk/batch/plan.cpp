@@ -182,6 +182,7 @@ std::string Describe(const Plan& plan) {
       text += "   " + name + " = " + Printable(value.dump()) + "\n";
     for (const auto& [name, value] : request.properties.items())
       text += "   property " + name + " = " + Printable(value.dump()) + "\n";
+    if (request.fake) text += "   in fake mode\n";
     if (step.limits.by_name.empty()) text += "   no limits: figures are only measured\n";
     for (const auto& [name, limit] : step.limits.by_name) text += "   judges " + name + "\n";
   }

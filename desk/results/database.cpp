@@ -1,5 +1,6 @@
 #include "desk/results/database.h"
 
+#include <libpq-fe.h>
 #include <soci/postgresql/soci-postgresql.h>
 #include <soci/sqlite3/soci-sqlite3.h>
 
@@ -15,8 +16,6 @@
 namespace qv {
 
 namespace {
-
-constexpr std::chrono::seconds kPatience(30);
 
 bool IsServer(const std::string& name) {
   return name.rfind("postgresql://", 0) == 0 || name.rfind("postgres://", 0) == 0;
@@ -48,8 +47,30 @@ std::string Address(const std::string& name) {
   if (name.find_first_of(" '\"\t\n") != std::string::npos) {
     throw Failure(kWrongUsage, WithoutPassword(name) + ": an address holds no blanks or quotes; write %20 for a blank");
   }
-  if (name.find("application_name=") != std::string::npos) return name;
-  return name + (name.find('?') == std::string::npos ? "?" : "&") + "application_name=qvtester";
+  // A cable that is pulled is noticed, too.
+  std::string address = name;
+  for (const auto& [option, value] :
+       {std::pair("application_name", "qvtester"), {"connect_timeout", "10"}, {"tcp_user_timeout", "30000"}}) {
+    if (name.find(std::string(option) + "=") != std::string::npos) continue;
+    address += (address.find('?') == std::string::npos ? "?" : "&") + std::string(option) + "=" + value;
+  }
+  return address;
+}
+
+// Why a session could not be had. What a server refuses once it is there, it refuses for good.
+struct NoSession {
+  bool away;  // nobody answers, or the server is just starting
+  std::string why;
+};
+
+NoSession AskServer(const std::string& name, const soci::soci_error& e) {
+  const std::string address = Address(name);
+  const PGPing answer = PQping(address.c_str());
+  if (answer == PQPING_NO_RESPONSE) return {true, "no server answers there"};
+  if (answer == PQPING_REJECT) return {true, "the server takes no connections yet"};
+  const std::unique_ptr<PGconn, void (*)(PGconn*)> connection(PQconnectdb(address.c_str()), PQfinish);
+  const std::string said = connection ? PQerrorMessage(connection.get()) : "";
+  return {false, OneLine(said.empty() ? e.what() : said)};
 }
 
 void ReplaceAll(std::string& text, const std::string& word, const std::string& by) {
@@ -59,8 +80,35 @@ void ReplaceAll(std::string& text, const std::string& word, const std::string& b
 
 }  // namespace
 
-Store::Database::Database(const std::string& name, Use use)
-    : name_(name), shown_(IsServer(name) ? WithoutPassword(name) : name), server_(IsServer(name)) {
+// One spell of waiting.
+class Store::Database::Wait {
+ public:
+  explicit Wait(const Database& database) : database_(database) {}
+
+  /// Sleeps a little; false when the patience is at its end.
+  bool Again(const std::string& why) {
+    const Patience& patience = database_.patience_;
+    if (std::chrono::steady_clock::now() - start_ > patience.longest) return false;
+    if (!told_ && patience.told) {
+      patience.told(database_.shown_ + ": " + why +
+                    Format("; trying again for %.3g s", std::chrono::duration<double>(patience.longest).count()));
+    }
+    told_ = true;
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));
+    return true;
+  }
+
+ private:
+  const Database& database_;
+  std::chrono::steady_clock::time_point start_ = std::chrono::steady_clock::now();
+  bool told_ = false;
+};
+
+Store::Database::Database(const std::string& name, Use use, Patience patience)
+    : name_(name),
+      shown_(IsServer(name) ? WithoutPassword(name) : name),
+      patience_(std::move(patience)),
+      server_(IsServer(name)) {
   std::error_code none;
   const bool there = server_ || std::filesystem::exists(name_, none);
   if (name_.empty()) throw Failure(kWrongUsage, "a store needs a name: a file, or postgresql://...");
@@ -68,11 +116,21 @@ Store::Database::Database(const std::string& name, Use use)
   if (!server_ && there && !std::filesystem::is_regular_file(name_, none)) {
     throw Failure(kWrongUsage, shown_ + ": not a file that can hold a store");
   }
-  try {
-    Connect();
-    Migrate(use);
-  } catch (const soci::soci_error& e) {
-    throw Failure(kWrongUsage, shown_ + ": can't be opened as a store: " + OneLine(e.what()));
+  Open(use);
+}
+
+void Store::Database::Open(Use use) {
+  for (Wait wait(*this);;) {
+    try {
+      Connect();
+      Migrate(use);
+      return;
+    } catch (const soci::soci_error& e) {
+      const NoSession no = server_ ? AskServer(name_, e) : NoSession{false, OneLine(e.what())};
+      const bool worth_waiting = no.away && use == Use::kWrite;
+      if (worth_waiting && wait.Again(no.why)) continue;
+      throw Failure(worth_waiting ? kInternalFault : kWrongUsage, shown_ + ": can't be opened as a store: " + no.why);
+    }
   }
 }
 
@@ -180,8 +238,7 @@ Store::Database::Inserts& Store::Database::inserts() {
 }
 
 void Store::Database::Persist(const std::function<void()>& work) {
-  const auto give_up = std::chrono::steady_clock::now() + kPatience;
-  for (bool told = false;;) {
+  for (Wait wait(*this);;) {
     try {
       if (session_ == nullptr) Connect();
       work();
@@ -189,17 +246,11 @@ void Store::Database::Persist(const std::function<void()>& work) {
     } catch (const soci::soci_error& e) {
       const bool again = session_ == nullptr || WorthAnotherTry(e);
       Rollback();
-      if (!again || std::chrono::steady_clock::now() > give_up) Lost(e);
-      if (!told && told_of_waiting) {
-        told_of_waiting(shown_ + ": " + OneLine(e.what()) +
-                        Format("; trying again for %lld s", static_cast<long long>(kPatience.count())));
-      }
-      told = true;
+      if (!again || !wait.Again(OneLine(e.what()))) Lost(e);
     } catch (...) {
       Rollback();
       throw;
     }
-    std::this_thread::sleep_for(std::chrono::milliseconds(200));
     if (server_) {
       inserts_.reset();
       session_.reset();

@@ -19,7 +19,7 @@ namespace qv {
 class Store::Database {
  public:
   /// Opens or makes the store, and migrates it when it is to be written.
-  Database(const std::string& name, Use use);
+  Database(const std::string& name, Use use, Patience patience);
   ~Database();
   Database(const Database&) = delete;
   Database& operator=(const Database&) = delete;
@@ -32,7 +32,7 @@ class Store::Database {
   void Commit();
   void Rollback() noexcept;
 
-  /// Does this again, on a new session where the server was lost, until it works or half a minute has passed.
+  /// Does this again, on a new session where the server was lost, until it works or the patience is at its end.
   void Persist(const std::function<void()>& work);
 
   /// Runs what reads; what the database says against it becomes a Failure.
@@ -49,10 +49,12 @@ class Store::Database {
   /// Made on the present session when first asked for.
   Inserts& inserts();
 
-  std::function<void(const std::string&)> told_of_waiting;
   std::map<std::tuple<std::string, std::string, std::string>, std::int64_t> quantity_ids;  // by name, unit, method
 
  private:
+  class Wait;
+
+  void Open(Use use);
   void Connect();
   void Migrate(Use use);
   int FoundVersion();
@@ -60,6 +62,7 @@ class Store::Database {
   [[noreturn]] void Lost(const std::exception& e) const;
 
   std::string name_, shown_;
+  Patience patience_;
   bool server_ = false;
   std::unique_ptr<soci::session> session_;
   std::unique_ptr<Inserts> inserts_;

@@ -1,6 +1,7 @@
 #ifndef QVTESTER_DESK_RESULTS_STORE_H_
 #define QVTESTER_DESK_RESULTS_STORE_H_
 
+#include <chrono>
 #include <cstdint>
 #include <functional>
 #include <memory>
@@ -43,6 +44,12 @@ struct FigureRow {
   Bounds bounds;
 };
 
+/// How a store that is to be written is waited for: a server that is away, a file that is locked.
+struct Patience {
+  std::chrono::milliseconds longest = std::chrono::seconds(30);
+  std::function<void(const std::string&)> told = {};  // in a sentence, when a wait begins
+};
+
 /// All calls throw Failure: wrong usage when the store can't be opened or is of a newer schema, or when a condition
 /// names what no run has; internal fault when it is lost or full meanwhile. Text reaches the database as bound values
 /// only. One object is for one thread, and is not carried over a fork.
@@ -51,8 +58,9 @@ class Store {
   enum class Use { kRead, kWrite };
 
   /// `name` is a file, made when it is to be written, or a postgresql:// address. A store of an older schema is
-  /// migrated when it is to be written.
-  Store(const std::string& name, Use use);
+  /// migrated when it is to be written. A server that is away, or not ready yet, is waited for by those who write;
+  /// one that refuses the address is not.
+  Store(const std::string& name, Use use, Patience patience = {});
   ~Store();
   Store(const Store&) = delete;
   Store& operator=(const Store&) = delete;
@@ -65,13 +73,10 @@ class Store {
   std::vector<std::string> Keys(const Selection& selection = {});
 
   /// Stores these in one transaction, whole or not at all; those whose key is there are left as they are, but for runs
-  /// that an internal fault ended (-99), which give way to one that was measured. Waits up to half a minute for a file
-  /// that is locked or a server that is gone, then throws. Answers how many went in.
+  /// that an internal fault ended (-99), which give way to one that was measured. Waits for a file that is locked or a
+  /// server that is gone as long as its patience lasts, then throws. Answers how many went in.
   std::size_t Put(const std::vector<StoredRun>& runs);
   std::size_t Put(const StoredRun& run) { return Put(std::vector<StoredRun>{run}); }
-
-  /// Whom to tell, in a sentence, that Put waits for the database.
-  void TellOfWaiting(std::function<void(const std::string&)> told);
 
   std::int64_t Count(const Selection& selection = {});
   /// In the order they were stored.

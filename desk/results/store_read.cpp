@@ -238,7 +238,8 @@ struct FigureBuffer {
 
 }  // namespace
 
-Store::Store(const std::string& name, Use use) : database_(std::make_unique<Database>(name, use)) {}
+Store::Store(const std::string& name, Use use, Patience patience)
+    : database_(std::make_unique<Database>(name, use, std::move(patience))) {}
 Store::~Store() = default;
 
 const std::string& Store::name() const { return database_->shown(); }

@@ -216,10 +216,6 @@ void AddQuantities(Store::Database& database, const std::vector<Prepared>& runs)
 
 }  // namespace
 
-void Store::TellOfWaiting(std::function<void(const std::string&)> told) {
-  database_->told_of_waiting = std::move(told);
-}
-
 std::size_t Store::Put(const std::vector<StoredRun>& runs) {
   std::vector<Prepared> prepared;
   prepared.reserve(runs.size());
