@@ -74,7 +74,7 @@ TEST_F(StoreProgram, RefusesWrongUseInASentence) {
       {"judge store.db --limits none.json", "none.json: no such file"},
       {"study store.db --parts unit", "--parts and --operators belong together"},
       {"study store.db --parts unit --operators station", "at least 2 parts and 2 operators"},
-      {"study store.db --figure nothing", "no figure to study"},
+      {"study store.db --figure nothing", "no figure whose name holds it"},
       {"study store.db --labels unit", "a label is"},
       {"report store.db", "nothing to write"},
       {"report store.db -o store.db", "store.db"},
