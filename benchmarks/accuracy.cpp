@@ -44,11 +44,6 @@ struct Sharpness {
   double vertical = NAN, horizontal = NAN;
 };
 
-Record MeasureAnew(const Request& request) {
-  QVTester tester;
-  return Measure(tester, request);
-}
-
 Sharpness MeasureSharpness(const cv::Mat& photo) {
   const Record record = MeasureAnew({"camera_autofocus", {photo}});
   if (record.phase.code != QV_SUCCESS) return {};

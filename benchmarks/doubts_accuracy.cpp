@@ -108,11 +108,6 @@ cv::Mat Photograph(const cv::Mat& levels, const Fault& fault, std::uint64_t seed
   return photo;
 }
 
-Record MeasureAnew(const Request& request) {
-  QVTester tester;
-  return Measure(tester, request);
-}
-
 // Of the region, or of the photo as a whole.
 bool Doubted(const Record& record, const std::string& region) {
   const std::string other = region == "vertical" ? "horizontal" : "vertical";

@@ -11,8 +11,6 @@
 
 namespace {
 
-constexpr int kMedianAperture = 5;
-
 // A grey, smoothed picture, as stored; empty when the file can't be read, with one line in the log.
 cv::Mat ReadGray(const std::string& path) {
   std::vector<unsigned char> bytes;

@@ -45,8 +45,9 @@ bool KeepsStep(float shift, int npix) {
   return to_integer == 0 || to_integer > (static_cast<float>(npix) + std::fabs(shift)) * FLT_EPSILON;
 }
 
-// 0.54 + 0.46 cos(x) for |x| <= kReach, from x squared: the least greatest error, 0.8e-12, that eight powers allow.
-constexpr double kReach = 3.25;
+// 0.54 + 0.46 cos(x) for |x| <= kCosineReach, from x squared: the least greatest error, 0.8e-12, that eight powers
+// allow.
+constexpr double kCosineReach = 3.25;
 constexpr double kMargin = 1e-12;
 double ApproximateWindow(double z) {
   double w = 1.881097988438079e-14;
@@ -69,7 +70,7 @@ void FillHammingWindow(int n, float mid, float* window) {
     return static_cast<float>(0.54 + 0.46 * std::cos((static_cast<float>(i) - mid) * 3.141592 / wid));
   };
   const double step = 3.141592 / wid;
-  const bool in_reach = std::max(std::fabs(mid), std::fabs(static_cast<float>(n - 1) - mid)) * step < kReach;
+  const bool in_reach = std::max(std::fabs(mid), std::fabs(static_cast<float>(n - 1) - mid)) * step < kCosineReach;
   constexpr int kBlock = 64;
   std::array<float, kBlock> above;
   for (int first = 0; first < n; first += kBlock) {

@@ -14,9 +14,9 @@ namespace qv {
 
 namespace {
 
-using Check = std::function<std::string(const std::string&)>;
+using WordCheck = std::function<std::string(const std::string&)>;
 
-Check Within(double low, double high) {
+WordCheck Within(double low, double high) {
   return [low, high](const std::string& text) {
     double number = NAN;
     const bool read = CLI::detail::lexical_cast(text, number);
@@ -24,7 +24,7 @@ Check Within(double low, double high) {
   };
 }
 
-Check WholeWithin(int low, int high) {
+WordCheck WholeWithin(int low, int high) {
   return [low, high](const std::string& text) {
     int number = 0;
     const bool read = CLI::detail::lexical_cast(text, number);
@@ -32,7 +32,7 @@ Check WholeWithin(int low, int high) {
   };
 }
 
-Check OneOf(const std::vector<std::string>& words) {
+WordCheck OneOf(const std::vector<std::string>& words) {
   return [words](const std::string& text) {
     const bool known = std::find(words.begin(), words.end(), text) != words.end();
     return known ? "" : "\"" + text + "\" is none of " + Listed(words) + DidYouMean(text, words);

@@ -29,7 +29,7 @@ struct RunWanted {
 };
 
 // A line of the table: one figure of one step.
-struct Line {
+struct TableRow {
   int rank;  // failures first
   std::string step, figure, verdict, value, limit;
 };
@@ -43,7 +43,7 @@ int RankOf(Outcome outcome) {
   }
 }
 
-std::string ValueText(const Reading& reading) {
+std::string TableValue(const Reading& reading) {
   if (!std::isfinite(reading.value())) return "none";
   std::string text = Format("%.6g", reading.value());
   if (reading.uncertainties.size() == 1) {
@@ -53,27 +53,27 @@ std::string ValueText(const Reading& reading) {
   return suffix == "1" ? text : text + " " + suffix;
 }
 
-void AddLines(const PlanStep& step, const Record& record, std::vector<Line>& lines) {
+void AddLines(const PlanStep& step, const Record& record, std::vector<TableRow>& lines) {
   for (const Reading& reading : record.phase.readings) {
     if (reading.info->figure->axis != nullptr && !reading.limit.given()) continue;  // curves are in the record
-    const std::string value = reading.info->figure->axis != nullptr ? "a list" : ValueText(reading);
+    const std::string value = reading.info->figure->axis != nullptr ? "a list" : TableValue(reading);
     lines.push_back({RankOf(reading.outcome), step.name, reading.info->name,
                      std::string(Name(reading.outcome)) + (reading.marginal ? ", marginal" : ""), value,
                      LimitWords(reading)});
   }
 }
 
-void PrintTable(std::vector<Line> lines) {
-  std::stable_sort(lines.begin(), lines.end(), [](const Line& a, const Line& b) { return a.rank < b.rank; });
-  const std::vector<std::string Line::*> columns = {&Line::verdict, &Line::figure, &Line::value, &Line::limit,
-                                                    &Line::step};
+void PrintTable(std::vector<TableRow> lines) {
+  std::stable_sort(lines.begin(), lines.end(), [](const TableRow& a, const TableRow& b) { return a.rank < b.rank; });
+  const std::vector<std::string TableRow::*> columns = {&TableRow::verdict, &TableRow::figure, &TableRow::value,
+                                                        &TableRow::limit, &TableRow::step};
   std::vector<std::size_t> widths;
   for (const auto column : columns) {
     std::size_t widest = 0;
-    for (const Line& line : lines) widest = std::max(widest, TextWidth(line.*column));
+    for (const TableRow& line : lines) widest = std::max(widest, TextWidth(line.*column));
     widths.push_back(widest);
   }
-  for (const Line& line : lines) {
+  for (const TableRow& line : lines) {
     std::string text;
     for (std::size_t i = 0; i < columns.size(); ++i) {
       const std::string shown = Printable(line.*columns[i]);
@@ -189,7 +189,7 @@ class PlanRun {
   Plan plan_;
   std::unique_ptr<Store> store_;
   std::vector<StoredRun> runs_;
-  std::vector<Line> lines_;
+  std::vector<TableRow> lines_;
   std::string records_, verdicts_;
   int worst_ = kExitWithinLimits;
   bool ended_ = false;

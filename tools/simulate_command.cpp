@@ -98,7 +98,7 @@ void DeclareDevelopment(Options& command, SimulateOptions& o) {
                "R,G,B");
 }
 
-void DeclareChart(Options& command, SimulateOptions& o) {
+void DeclareChartPhoto(Options& command, SimulateOptions& o) {
   command.Number("--edge-angle", o.style.edge_angle_deg, 3, 8, "chart: angle of the slanted edges", "DEG");
   command.Number("--contrast", o.style.contrast, 1.1, 100,
                  "chart: stored level of the paper over that of the edges' dark side", "RATIO");
@@ -294,7 +294,7 @@ CommandBody DeclareSimulate(Options& command) {
       "SCENE");
   DeclareCamera(command, *o);
   DeclareDevelopment(command, *o);
-  DeclareChart(command, *o);
+  DeclareChartPhoto(command, *o);
   DeclareSpots(command, *o);
   DeclareDisplay(command, *o);
   DeclareLightsAndPrint(command, *o);

@@ -18,7 +18,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Candidate {  // NOLINT(bugprone-exception-escape): moving Json does not throw
+struct StoredRecord {  // NOLINT(bugprone-exception-escape): moving Json does not throw
   fs::path file;
   Json record;
   std::string unreadable;  // why
@@ -40,8 +40,8 @@ std::vector<fs::path> FilesBelow(const std::string& folder) {
 }
 
 // Files as named; of a folder, those that hold records, or what can't be read, which may have been one.
-std::vector<Candidate> ReadRecords(const std::vector<std::string>& paths) {
-  std::vector<Candidate> records;
+std::vector<StoredRecord> ReadRecords(const std::vector<std::string>& paths) {
+  std::vector<StoredRecord> records;
   for (const std::string& path : paths) {
     if (!fs::is_directory(path)) {
       records.push_back({path, ReadJson(path), ""});
@@ -50,7 +50,7 @@ std::vector<Candidate> ReadRecords(const std::vector<std::string>& paths) {
     }
     for (const fs::path& file : FilesBelow(path)) {
       try {
-        Candidate found = {file, ReadJson(file), ""};
+        StoredRecord found = {file, ReadJson(file), ""};
         if (IsRecord(found.record)) records.push_back(std::move(found));
       } catch (const Failure& e) {
         records.push_back({file, {}, e.what()});
@@ -65,7 +65,7 @@ struct Counts {
   int numbers = 0, moved = 0, failed = 0;
 };
 
-void VerifyOne(const Candidate& candidate, Counts& counts) {
+void VerifyOne(const StoredRecord& candidate, Counts& counts) {
   if (!candidate.unreadable.empty()) {
     ++counts.failed;
     std::cerr << candidate.unreadable << '\n';
@@ -98,7 +98,7 @@ CommandBody DeclareVerify(Options& command) {
   return [paths] {
     Counts counts;
     const auto records = ReadRecords(*paths);
-    for (const Candidate& candidate : records) VerifyOne(candidate, counts);
+    for (const StoredRecord& candidate : records) VerifyOne(candidate, counts);
     std::cout << Format("%s, %s: %d moved, %s could not be verified\n", Count(records.size(), "record").c_str(),
                         Count(static_cast<std::size_t>(counts.numbers), "number").c_str(), counts.moved,
                         Count(static_cast<std::size_t>(counts.failed), "record").c_str());

@@ -17,11 +17,11 @@ using ::testing::Not;
 using ::testing::SizeIs;
 
 // Channel 0 of a capture; the other channels must not matter.
-struct Capture {
+struct HdrPicture {
   int height, width;
   std::vector<float> data;
 
-  Capture(int height, int width, float level) : height(height), width(width), data(3 * height * width, NAN) {
+  HdrPicture(int height, int width, float level) : height(height), width(width), data(3 * height * width, NAN) {
     for (int i = 0; i < height * width; ++i) data[3 * i] = level;
   }
   float& at(int row, int column) { return data[3 * (row * width + column)]; }
@@ -40,7 +40,7 @@ struct Capture {
 
 TEST(Dots, APixelIsHeldAgainstItsLocalMean) {
   const LogLines log;
-  Capture capture(20, 30, 4);
+  HdrPicture capture(20, 30, 4);
   EXPECT_THAT(capture.Flagged(1e-6f, 2), IsEmpty()) << "small whole numbers sum exactly";
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[OKAPI] OpenMP #1 Start", "[OKAPI] OpenMP #1 End"));
   capture.at(7, 11) = 8;  // mean 4.16: the dot is 92 % off, its neighbours 3.8 %
@@ -51,11 +51,11 @@ TEST(Dots, APixelIsHeldAgainstItsLocalMean) {
 
 TEST(Dots, SmallPicturesAreLoggedAndLeftAlone) {
   const LogLines log;
-  EXPECT_THAT(Capture(4, 30, 4).Flagged(0, 2), IsEmpty());
+  EXPECT_THAT(HdrPicture(4, 30, 4).Flagged(0, 2), IsEmpty());
   EXPECT_THAT(LogLines::Texts(), ElementsAre("[DetectDot] a picture of 30 x 4 is smaller than the window of radius 2"));
-  EXPECT_THAT(Capture(30, 4, 4).Flagged(0, 2), IsEmpty());
-  EXPECT_THAT(Capture(5, 5, 4).Flagged(0, INT_MAX), IsEmpty());
-  EXPECT_THAT(Capture(5, 5, 4).Flagged(0, -1), IsEmpty());
+  EXPECT_THAT(HdrPicture(30, 4, 4).Flagged(0, 2), IsEmpty());
+  EXPECT_THAT(HdrPicture(5, 5, 4).Flagged(0, INT_MAX), IsEmpty());
+  EXPECT_THAT(HdrPicture(5, 5, 4).Flagged(0, -1), IsEmpty());
 }
 
 TEST(Dots, AreThoseOfTheWholeTable) { ExpectAgreement(plain::Dots, 4000, 0.05, 0.5); }
@@ -69,7 +69,7 @@ TEST(Dots, AreExactAtTheThreshold) {
   for (int round = 0; round < 300; ++round) {
     const int radius = 1 + round % 3;
     const int side = 2 * radius + 1;
-    Capture capture(9, 60, levels[round % 4] * random.uniform(0.5f, 1.0f));
+    HdrPicture capture(9, 60, levels[round % 4] * random.uniform(0.5f, 1.0f));
     capture.at(4, 20) *= factors[round % 6] * random.uniform(0.5f, 1.0f);
     const cv::Mat_<float> sums = plain::SumChannel0(capture.data.data(), 9, 60);
     const cv::Point dot(20, 4);

@@ -16,11 +16,6 @@
 namespace qv {
 namespace {
 
-Record MeasureAnew(const Request& request, const Limits& limits = {}) {
-  QVTester tester;
-  return Measure(tester, request, limits);
-}
-
 cv::Mat Drawn(const Record& record) {
   const std::string file = record.finding->Draw(record)->Png();
   return cv::imdecode(std::vector<uchar>(file.begin(), file.end()), cv::IMREAD_COLOR);

@@ -25,11 +25,6 @@ using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
-Record MeasureAnew(const Request& request) {
-  QVTester tester;
-  return Measure(tester, request);
-}
-
 cv::Mat DustPhoto(double gain) {
   SimulationOptions options;
   options.scene = "dust";

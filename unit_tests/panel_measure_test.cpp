@@ -16,11 +16,6 @@ namespace {
 
 using ::testing::HasSubstr;
 
-Record MeasureAnew(const Request& request) {
-  QVTester tester;
-  return Measure(tester, request);
-}
-
 bool Says(const Record& record, const std::string& name) {
   return std::any_of(record.remarks.begin(), record.remarks.end(),
                      [&](const Remark& remark) { return remark.name == name; });

@@ -11,12 +11,12 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::ElementsAreArray;
 
-QV_PROPERTY_INDEX Index(int index) { return static_cast<QV_PROPERTY_INDEX>(index); }
+QV_PROPERTY_INDEX PropertyIndex(int index) { return static_cast<QV_PROPERTY_INDEX>(index); }
 
 template <typename T>
 T Get(QVTester& tester, int index) {
   T value = {};
-  EXPECT_EQ(1, tester.GetProperty(Index(index), &value)) << "property " << index;
+  EXPECT_EQ(1, tester.GetProperty(PropertyIndex(index), &value)) << "property " << index;
   return value;
 }
 
@@ -37,11 +37,11 @@ TEST(Properties, EveryOneKeepsItsOwnValue) {  // two on one member would overwri
   std::array<unsigned, 9> value;
   for (const auto& property : lengths) {
     value.fill(1000u + static_cast<unsigned>(property.first));
-    ASSERT_EQ(1, tester.SetProperty(Index(property.first), value.data()));
+    ASSERT_EQ(1, tester.SetProperty(PropertyIndex(property.first), value.data()));
   }
   for (const auto& [index, length] : lengths) {
     value.fill(7);
-    ASSERT_EQ(1, tester.GetProperty(Index(index), value.data()));
+    ASSERT_EQ(1, tester.GetProperty(PropertyIndex(index), value.data()));
     std::vector<unsigned> expected(length, 1000u + static_cast<unsigned>(index));
     expected.resize(9, length == 1 ? 7 : 0);  // zeros behind five coefficients
     EXPECT_THAT(value, ElementsAreArray(expected)) << index;
@@ -67,8 +67,8 @@ TEST(Properties, UnknownIndicesChangeNothing) {
   QVTester tester;
   int untouched = 77;
   for (const int index : {-1, 3, 5, 11, 15, 20, 25, 38, 42, 72, 73, 95, 1 << 30}) {
-    EXPECT_EQ(-97, tester.SetProperty(Index(index), &untouched)) << index;
-    EXPECT_EQ(-97, tester.GetProperty(Index(index), &untouched)) << index;
+    EXPECT_EQ(-97, tester.SetProperty(PropertyIndex(index), &untouched)) << index;
+    EXPECT_EQ(-97, tester.GetProperty(PropertyIndex(index), &untouched)) << index;
   }
   EXPECT_EQ(77, untouched);
 }

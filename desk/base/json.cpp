@@ -159,4 +159,15 @@ void JsonView::Refuse(const std::string& why) const { throw Failure(kWrongUsage,
 
 void JsonView::RefuseAs(const char* wanted) const { Refuse("is " + Shown(*value_) + ", not " + wanted); }
 
+const Json& MemberOf(const Json& object, const char* name) {
+  static const Json nothing;
+  const auto found = object.is_object() ? object.find(name) : object.end();
+  return object.is_object() && found != object.end() ? *found : nothing;
+}
+
+std::int64_t WholeAt(const Json& object, const char* name) {
+  const Json& value = MemberOf(object, name);
+  return value.is_number() ? value.get<std::int64_t>() : 0;
+}
+
 }  // namespace qv

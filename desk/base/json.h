@@ -30,6 +30,12 @@ Json ReadJson(const std::string& path, FailureKind kind = kWrongUsage);
 /// What the library says of an access, without its boilerplate in front.
 std::string SentenceOf(const Json::exception& e);
 
+/// The member of an object; null where there is none, or no object. For documents whose shape is not known.
+const Json& MemberOf(const Json& object, const char* name);
+
+/// The whole number that a member holds; 0 where it holds none.
+std::int64_t WholeAt(const Json& object, const char* name);
+
 /// A value of a document with the way that leads to it, read with checks: each refusal is a Failure (wrong usage) in a
 /// sentence such as `plan.json: steps[2].inputs: is 5, not a list`. Refers to the document, which must outlive it.
 class JsonView {

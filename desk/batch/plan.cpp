@@ -190,8 +190,7 @@ std::string Describe(const Plan& plan) {
 }
 
 Record MeasureStep(const PlanStep& step, const Request& request, const std::string& unit, const std::string& station) {
-  QVTester tester;
-  Record record = Measure(tester, request, step.limits);
+  Record record = MeasureAnew(request, step.limits);
   record.dut_id = unit;
   record.station_id = station;
   return record;

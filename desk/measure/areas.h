@@ -15,6 +15,9 @@ namespace qv {
 
 // Error areas, as several measurements find them: rectangles, and how many pixels of each are wrong.
 
+/// Merging is quadratic; so many are noise, not defects. As the library's.
+inline constexpr int kMostSpots = 20'000;
+
 struct Areas {
   std::vector<cv::Rect> rectangles;
   std::vector<int> pixels;

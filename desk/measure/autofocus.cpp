@@ -2,12 +2,11 @@
 
 #include "desk/measure/run_test.h"
 #include "desk/measure/sharpness.h"
+#include "desk/measure/widen.h"
 
 namespace qv {
 
 namespace {
-
-std::vector<double> Widen(const float* values, int count) { return {values, values + count}; }
 
 class Autofocus : public Measurement {
  public:

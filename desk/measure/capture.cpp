@@ -303,7 +303,7 @@ class Capture : public Measurement {
     }
     CollectByCie(record.phase, finding->measured, GivenOrStandard(*finding, request, record));
     std::map<int, cv::Vec3d> given;
-    if (request.parameters.contains("reference")) given = PatchValues(request.parameters["reference"]);
+    if (request.parameters.contains("reference")) given = ReferencePatches(request.parameters["reference"]);
     TrustPatches(record.phase, {finding->photo, finding->outlines, finding->measured, finding->standard,
                                 std::move(given), StepsOf(request.inputs.at(0))});
     return finding;
@@ -347,7 +347,7 @@ class Capture : public Measurement {
       record.Say(Remark::kWarning, "two_standards",
                  "delta_e_2000 compares with the values given, delta_e_76 with the standard photo", "delta_e_2000");
     }
-    return PatchValues(request.parameters["reference"]);
+    return ReferencePatches(request.parameters["reference"]);
   }
 
   void TakePatches(CaptureFinding& finding, const QVTester& tester) const {

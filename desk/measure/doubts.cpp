@@ -85,12 +85,12 @@ int ReachOf(const Side& side, int level) {
 // Of so many of a side's pixels at its outermost level it depends on the edge's shape whether they were cut off.
 constexpr double kShareToLookAt = 0.5;
 
-struct Candidate {
+struct PileCandidate {
   LevelPile pile;
   bool sure;
 };
 
-std::optional<Candidate> PileOf(const Side& side, double noise_elsewhere, bool top, int channel) {
+std::optional<PileCandidate> PileOf(const Side& side, double noise_elsewhere, bool top, int channel) {
   const std::int64_t count = CountOf(side.levels);
   if (count < kFewestPixels) return std::nullopt;
   int level = top ? kLevels - 1 : 0;
@@ -100,7 +100,7 @@ std::optional<Candidate> PileOf(const Side& side, double noise_elsewhere, bool t
   const bool one_sided = ReachOf(side, level) >= kTail || share > kShareFlat;
   const bool noisy = NoiseOf(side) >= kLeastNoise || (noise_elsewhere >= kNoiseElsewhere && one_sided);
   const bool piled = at_end ? share > kShareAtEnd : share > kShareInside && noisy;
-  return piled || share > kShareToLookAt ? std::optional<Candidate>({{level, top, channel, share}, piled})
+  return piled || share > kShareToLookAt ? std::optional<PileCandidate>({{level, top, channel, share}, piled})
                                          : std::nullopt;
 }
 
@@ -171,7 +171,7 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
     const int middle = cvFloor((lowest + highest) / 2);
     const auto [dark, light] = SidesOf(channels[channel], inside, middle);
     for (const bool top : {true, false}) {
-      const std::optional<Candidate> found = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
+      const std::optional<PileCandidate> found = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
       if (!found || (worst && found->pile.share <= worst->share)) continue;
       if (found->sure || IsCut(channels[channel], within, top)) worst = found->pile;
     }

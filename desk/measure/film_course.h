@@ -67,11 +67,6 @@ bool RunFilmTest(QVTester& tester, const Spec& spec, const Request& request, Rec
 /// The largest finite one, or 0.
 double Highest(const std::vector<double>& values);
 
-template <typename T>
-std::vector<double> Widen(const T* values, int count) {
-  return {values, values + count};
-}
-
 }  // namespace qv
 
 #endif  // QVTESTER_DESK_MEASURE_FILM_COURSE_H_

@@ -30,8 +30,6 @@ constexpr Method kNoise = {"picture's own departures from the local mean (median
                            "As good as noise is normal: within a fifth for Gaussian noise.",
                            "Moved by exposure and by the threshold; structure of the panel counts as noise."};
 
-constexpr int kMostSpots = 20'000;  // merging is quadratic; so many are noise, not defects
-
 struct Dots {
   cv::Mat mask;  // CV_8UC1, 1 at a dot
   Areas areas;

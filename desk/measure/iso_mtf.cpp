@@ -22,8 +22,9 @@ constexpr double kOfTheMethod = 0.001;  // what the steps themselves leave, as a
 constexpr double kHalo = 0.03;  // an overshoot from which on the window is twice as wide: sharpening reaches further
 constexpr double kLeastWindow = 1.2;  // where the region is narrower
 
-constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-constexpr IsoFigures kNoFigures = {kNone, kNone, kNone, kNone, kNone, kNone, kNone};
+constexpr double kNotMeasured = std::numeric_limits<double>::quiet_NaN();
+constexpr IsoFigures kNoFigures = {kNotMeasured, kNotMeasured, kNotMeasured, kNotMeasured,
+                                   kNotMeasured, kNotMeasured, kNotMeasured};
 
 std::vector<double> Curve(const LineSpread& line) {
   return ResponseCurve(line, kCurveStep, static_cast<int>(kHighest / kCurveStep) + 1);
@@ -51,7 +52,7 @@ double Crossing(const EdgeSpread& spread, double level, int way) {
                              : way + Between(at(k + way - 1), at(k + way), at(k + way + 1), level, -way);
     return spread.Place(k + share);
   }
-  return kNone;
+  return kNotMeasured;
 }
 
 double EdgeWidth(const EdgeSpread& spread) { return Crossing(spread, 0.9, 1) - Crossing(spread, 0.1, -1); }
@@ -83,7 +84,7 @@ IsoFigures Read(const EdgeSpread& spread, double window) {
 
 IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer) {
   CV_Assert(!gray.empty());
-  IsoMtf iso = {kNoFigures, {}, {}, kNone, nullptr};
+  IsoMtf iso = {kNoFigures, {}, {}, kNotMeasured, nullptr};
   iso.bands.fill(kNoFigures);
   const auto refuse = [&](const char* reason) {
     iso.reason = reason;

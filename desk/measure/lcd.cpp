@@ -26,7 +26,7 @@ constexpr Method kVerdict = {
     "Moved by exposure and white balance of the outer camera, by light that the glass mirrors."};
 constexpr Method kMeans = {"means of stored levels over the straightened screen", "Exact for the photo as stored.",
                            "Moved by exposure, by light that the glass mirrors, by the lens's shading."};
-constexpr Method kDots = {
+constexpr Method kScreenDots = {
     "relative difference to the mean of a square window, by channel; dots that lie close are one area",
     "Points of 4 px and more that differ by half are found; none within 2 % of the rim.",
     "Moved by noise, focus and moire between the camera's pixels and the display's."};
@@ -201,8 +201,9 @@ class Lcd : public Measurement {
         {"levels", kGreyLevel, kReal, &kPointAxis, kMeans,
          "Mean grey at 3 x 3 points of the screen, row by row from the upper left."},
         {"uniformity", kOne, kReal, nullptr, kMeans, "Smallest over largest of the nine levels."},
-        {"dot_count", kOne, kWhole, nullptr, kDots, "Dots on the screen; none are looked for in a result field."},
-        {"dots", kPixel, kReal, &kColumnAxis, kDots, "Middles of the dots, column and row of the straightened screen."},
+        {"dot_count", kOne, kWhole, nullptr, kScreenDots, "Dots on the screen; none are looked for in a result field."},
+        {"dots", kPixel, kReal, &kColumnAxis, kScreenDots,
+         "Middles of the dots, column and row of the straightened screen."},
         {"corners", kPixel, kReal, &kColumnAxis, kScreen,
          "The screen's corners in the photo, column and row, clockwise from the upper left."},
     };

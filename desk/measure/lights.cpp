@@ -26,7 +26,7 @@ constexpr Method kTemperature = {
     "Moved as x and y are, and more the further the light lies from the locus; 0 where the fit has no answer."};
 constexpr Method kEvenness = {"smallest over largest mean of 8 x 8 equal blocks", "Exact for the photo as stored.",
                               "Moved by a lens's own fall-off, by spots, and by a region that reaches over the rim."};
-constexpr Method kDots = {
+constexpr Method kLightDots = {
     "relative difference of grey to the mean of a square window, areas merged within the distance",
     "Of squares 40 % darker {lights_spots} of 2 px and more are found at 1 % noise; of 25 % {lights_spots} from 3 px, "
     "of "
@@ -34,8 +34,7 @@ constexpr Method kDots = {
     "Moved by noise, by the window's size and by what else lies in it."};
 
 constexpr double kClipped = 0.01;  // share of a region's pixels, above which its colour is another one
-constexpr double kDark = 5;        // mean grey, below which a colour is one of noise
-constexpr std::size_t kMostSpots = 20'000;
+constexpr double kDarkGrey = 5;    // mean grey, below which a colour is one of noise
 
 struct LightTest {
   const char* name;
@@ -177,7 +176,7 @@ void Look(Record& record, const Regions& regions, const Areas& areas) {
                         which.c_str(), 100 * region.clipped_share_),
                  "clipped_share_max");
     }
-    if (region.mean_grey_ < kDark) {
+    if (region.mean_grey_ < kDarkGrey) {
       record.Say(Remark::kWarning, "dark_region",
                  Format("%s: mean grey %.1f: is it lit? Its colour is one of noise", which.c_str(), region.mean_grey_),
                  "mean_grey_min");
@@ -259,7 +258,7 @@ class LightFinding : public Finding {
 
  private:
   static Tone ToneOf(const QVLightRegion& r) {
-    return r.clipped_share_ > kClipped ? kPoor : r.mean_grey_ < kDark ? kDoubtful : kGood;
+    return r.clipped_share_ > kClipped ? kPoor : r.mean_grey_ < kDarkGrey ? kDoubtful : kGood;
   }
 
   // Dark dots are red, bright ones yellow.
@@ -339,7 +338,7 @@ class Lights : public Measurement {
       figure.axis = nullptr;
       figures.push_back(figure);
     }
-    for (const Figure& figure : AreaFigures(kDots)) figures.push_back(figure);
+    for (const Figure& figure : AreaFigures(kLightDots)) figures.push_back(figure);
     return figures;
   }
 

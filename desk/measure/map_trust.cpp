@@ -43,12 +43,12 @@ cv::Mat Smoothed(const cv::Mat& picture) {
   return grey;
 }
 
-struct Seen {
+struct Overlap {
   cv::Mat reference, image, by_column, by_row, both;  // the image and its slopes in the reference's frame
 };
 
-Seen LookThrough(const cv::Mat& reference, const cv::Mat& image, const cv::Mat& map) {
-  Seen seen;
+Overlap LookThrough(const cv::Mat& reference, const cv::Mat& image, const cv::Mat& map) {
+  Overlap seen;
   seen.reference = Smoothed(reference);
   const cv::Mat whole = Smoothed(image);
   cv::Mat slope;
@@ -91,11 +91,11 @@ struct Part {
   }
 };
 
-Part& PartAt(std::vector<Part>& parts, const Seen& seen, int row, int column) {
+Part& PartAt(std::vector<Part>& parts, const Overlap& seen, int row, int column) {
   return parts[row * kParts / seen.both.rows * kParts + column * kParts / seen.both.cols];
 }
 
-std::vector<Part> LevelsByParts(const Seen& seen) {
+std::vector<Part> LevelsByParts(const Overlap& seen) {
   std::vector<Part> parts(kParts * kParts);
   for (int row = 0; row < seen.both.rows; ++row) {
     for (int i = 0; i < seen.both.cols; ++i) {
@@ -115,7 +115,7 @@ std::vector<Part> LevelsByParts(const Seen& seen) {
 }
 
 // Each pixel's slope by the parameters, and its residual under gain and offset of the levels.
-void AddSlopes(const Seen& seen, const Frame& frame, const Part& all, std::vector<Part>& parts) {
+void AddSlopes(const Overlap& seen, const Frame& frame, const Part& all, std::vector<Part>& parts) {
   const double gain = all.Both() / all.OfImage();
   const double offset = (all.reference - gain * all.image) / all.count;
   for (int row = 0; row < seen.both.rows; ++row) {
@@ -143,7 +143,7 @@ struct MapTrust {
 };
 
 // By the parts' own scores (a sandwich, as White 1980): noise may be alike between neighbours, and differ by place.
-MapTrust TrustOf(const Seen& seen, const Frame& frame) {
+MapTrust TrustOf(const Overlap& seen, const Frame& frame) {
   std::vector<Part> parts = LevelsByParts(seen);
   Part all;
   for (const Part& part : parts) all += part;

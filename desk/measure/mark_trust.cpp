@@ -105,7 +105,7 @@ cv::Point2d Down(const Places& p) { return {p[4] - p[0], p[5] - p[1]}; }
 
 double LegsRatio(const Places& p) { return Legs{Right(p), Down(p)}.ratio(); }
 double LegsAngle(const Places& p) { return Legs{Right(p), Down(p)}.angle_deg(); }
-double Turn(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 180 / CV_PI; }
+double TurnOf(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 180 / CV_PI; }
 
 }  // namespace
 
@@ -148,7 +148,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
   };
   trust("legs_ratio", LegsRatio);
   trust("legs_angle", LegsAngle);
-  trust("chart_turn", Turn);
+  trust("chart_turn", TurnOf);
   phase.Find("module_size")->Trust({FromKnownError(module_off, kCoreModulePx)});
 }
 

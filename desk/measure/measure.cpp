@@ -119,4 +119,9 @@ Record Measure(QVTester& tester, const Request& request, const Limits& limits) {
   return record;
 }
 
+Record MeasureAnew(const Request& request, const Limits& limits) {
+  QVTester tester;
+  return Measure(tester, request, limits);
+}
+
 }  // namespace qv

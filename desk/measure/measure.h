@@ -18,6 +18,9 @@ namespace qv {
 /// what decoders complain of goes to the process's standard error.
 Record Measure(QVTester& tester, const Request& request, const Limits& limits = {});
 
+/// The same by a new tester.
+Record MeasureAnew(const Request& request, const Limits& limits = {});
+
 }  // namespace qv
 
 #endif  // QVTESTER_DESK_MEASURE_MEASURE_H_

@@ -74,11 +74,12 @@ Json CheckedPatches(const Json& value) {
   if (!patches.is_array() || patches.empty() || !std::all_of(patches.begin(), patches.end(), IsPatch)) {
     throw Failure(kWrongUsage, where + ": neither a capture record nor numbers, L*, a* and b* of patches 0 to 23");
   }
-  if (PatchValues(patches).size() != patches.size()) throw Failure(kWrongUsage, where + ": a patch is given twice");
+  if (ReferencePatches(patches).size() != patches.size())
+    throw Failure(kWrongUsage, where + ": a patch is given twice");
   return patches;
 }
 
-std::map<int, cv::Vec3d> PatchValues(const Json& checked) {
+std::map<int, cv::Vec3d> ReferencePatches(const Json& checked) {
   std::map<int, cv::Vec3d> values;
   for (const Json& patch : checked) {
     values[patch[0].get<int>()] = {patch[1].get<double>(), patch[2].get<double>(), patch[3].get<double>()};

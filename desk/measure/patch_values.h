@@ -14,7 +14,7 @@ namespace qv {
 Json CheckedPatches(const Json& value);
 
 /// By the patch's number.
-std::map<int, cv::Vec3d> PatchValues(const Json& checked);
+std::map<int, cv::Vec3d> ReferencePatches(const Json& checked);
 
 }  // namespace qv
 

@@ -135,7 +135,7 @@ bool IsKept(const Promise& promise, double measured) {
   }
 }
 
-std::string Number(const Promise& promise) {
+std::string NumberText(const Promise& promise) {
   if (promise.bound == kAtLeast && promise.value == 100) return "all";
   if (promise.bound == kAtMost && promise.value == 0) return "none";
   return Format("%g%s", promise.value, promise.unit);
@@ -146,7 +146,7 @@ std::string WithNumbers(std::string_view text) {
   for (std::size_t open = text.find('{'); open != std::string_view::npos; open = text.find('{')) {
     const std::size_t close = text.find('}', open);
     if (close == std::string_view::npos) throw std::logic_error("a brace stays open: " + std::string(text));
-    filled += std::string(text.substr(0, open)) + Number(FindPromise(text.substr(open + 1, close - open - 1)));
+    filled += std::string(text.substr(0, open)) + NumberText(FindPromise(text.substr(open + 1, close - open - 1)));
     text = text.substr(close + 1);
   }
   return filled + std::string(text);

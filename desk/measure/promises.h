@@ -28,7 +28,7 @@ const Promise& FindPromise(std::string_view name);
 bool IsKept(const Promise& promise, double measured);
 
 /// The number with its unit.
-std::string Number(const Promise& promise);
+std::string NumberText(const Promise& promise);
 
 /// The text with each name in braces replaced by its number.
 std::string WithNumbers(std::string_view text);

@@ -15,13 +15,13 @@ namespace qv {
 
 namespace {
 
-constexpr double kMostPixels = 1'500'000;  // in which features are looked for; a refinement follows
+constexpr double kMostMatchedPixels = 1'500'000;  // in which features are looked for; a refinement follows
 constexpr int kMostFeatures = 4000;
-constexpr float kRatio = 0.8f;   // of a match's distance to the next best one's
-constexpr double kAgreeing = 3;  // pixels of the pictures as searched
-constexpr int kFewest = 8;       // agreeing matches; three fix a map, and by chance some lie near it
-constexpr double kLowest = 0.6;  // correlation of a sound map
-constexpr double kFurthest = 4;  // pixels that a refinement may move the map: more is another place
+constexpr float kRatio = 0.8f;      // of a match's distance to the next best one's
+constexpr double kAgreeing = 3;     // pixels of the pictures as searched
+constexpr int kFewestAgreeing = 8;  // agreeing matches; three fix a map, and by chance some lie near it
+constexpr double kLowest = 0.6;     // correlation of a sound map
+constexpr double kFurthest = 4;     // pixels that a refinement may move the map: more is another place
 constexpr int kGrid = 9;
 
 struct Features {
@@ -101,11 +101,11 @@ RobustMap FindRobustMap(QVTester& tester, const cv::Mat& reference, const cv::Ma
   const cv::Mat from = GreyOf(reference);
   const cv::Mat to = GreyOf(image);
   const double pixels = static_cast<double>(std::max(from.total(), to.total()));
-  const double scale = std::min(1.0, std::sqrt(kMostPixels / pixels));
+  const double scale = std::min(1.0, std::sqrt(kMostMatchedPixels / pixels));
   const Matches matches = Match(FindFeatures(from, scale), FindFeatures(to, scale));
   result.matches = static_cast<int>(matches.from.size());
-  if (result.matches < kFewest) {
-    result.doubt = Format("only %d features match, and %d are needed", result.matches, kFewest);
+  if (result.matches < kFewestAgreeing) {
+    result.doubt = Format("only %d features match, and %d are needed", result.matches, kFewestAgreeing);
     return result;
   }
   cv::Mat agreeing;
@@ -113,7 +113,7 @@ RobustMap FindRobustMap(QVTester& tester, const cv::Mat& reference, const cv::Ma
   cv::Mat map = cv::estimateAffine2D(matches.from, matches.to, agreeing, cv::RANSAC, kAgreeing / scale, 5000, 0.999);
   cv::theRNG() = callers;
   result.agreeing = cv::countNonZero(agreeing);
-  if (map.empty() || result.agreeing < kFewest) {
+  if (map.empty() || result.agreeing < kFewestAgreeing) {
     result.doubt = Format("only %d of %d matches agree with one map", result.agreeing, result.matches);
     return result;
   }

@@ -30,21 +30,21 @@ double SlantedEdge::angle_deg() const {
 
 namespace {
 
-constexpr std::size_t kFewestRows = 16;  // that show the edge from side to side
-constexpr double kFarthest = 1e6;        // pixels from the photo's origin
-constexpr double kSmallestReach = 6;     // pixels to each side of the edge
-constexpr double kLeastContrast = 0.5;   // of a row, over that of the row that shows most
-constexpr double kSurelyAnEdge = 3;      // mean contrast of the rows over its scatter
-constexpr double kLeastLight = 1e-8;     // mean contrast, of full scale
-constexpr double kMostEmptyBins = 0.02;  // share that may be filled from the neighbours
+constexpr std::size_t kFewestRows = 16;    // that show the edge from side to side
+constexpr double kFarthest = 1e6;          // pixels from the photo's origin
+constexpr double kSmallestReach = 6;       // pixels to each side of the edge
+constexpr double kLeastRowContrast = 0.5;  // of a row, over that of the row that shows most
+constexpr double kSurelyAnEdge = 3;        // mean contrast of the rows over its scatter
+constexpr double kLeastLight = 1e-8;       // mean contrast, of full scale
+constexpr double kMostEmptyBins = 0.02;    // share that may be filled from the neighbours
 constexpr int kNarrowPasses = 3;
 
 // In sigmas of the edge's width.
-constexpr double kNarrow = 5;   // the centroid's window
-constexpr double kPlateau = 5;  // where the plateaus begin
-constexpr double kBeyond = 4;   // and pixels more, for the overshoot of sharpened edges
-constexpr double kWidest = 48;  // pixels of a plateau that are looked at: light falls off along a curve
-constexpr double kFewest = 6;   // pixels of a plateau that show its slope
+constexpr double kNarrow = 5;           // the centroid's window
+constexpr double kPlateau = 5;          // where the plateaus begin
+constexpr double kBeyondEdge = 4;       // and pixels more, for the overshoot of sharpened edges
+constexpr double kWidest = 48;          // pixels of a plateau that are looked at: light falls off along a curve
+constexpr double kFewestOfPlateau = 6;  // pixels of a plateau that show its slope
 
 struct Span {
   int first, last;    // columns of one row
@@ -141,7 +141,7 @@ bool ShowAnEdge(std::vector<RowEdge>& edges) {
     if (std::fabs(edge.contrast) > std::fabs(best)) best = edge.contrast;
   }
   edges.erase(std::remove_if(edges.begin(), edges.end(),
-                             [&](const RowEdge& edge) { return !(edge.contrast / best > kLeastContrast); }),
+                             [&](const RowEdge& edge) { return !(edge.contrast / best > kLeastRowContrast); }),
               edges.end());
   if (edges.size() < std::max(rows / 2, kFewestRows)) return false;
   const auto n = static_cast<double>(edges.size());
@@ -238,8 +238,8 @@ class PlateauFit {
 
 // Step 4.
 void FitPlateaus(SlantedEdge& edge) {
-  const double begin = kPlateau * edge.sigma_px + kBeyond;
-  const bool sloped = edge.room - begin >= kFewest;
+  const double begin = kPlateau * edge.sigma_px + kBeyondEdge;
+  const bool sloped = edge.room - begin >= kFewestOfPlateau;
   const double from = sloped ? begin : 0.8 * edge.room;
   const double to = std::min(edge.room, from + kWidest);
   PlateauFit fits[2];

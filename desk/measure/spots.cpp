@@ -24,10 +24,10 @@ namespace {
 
 constexpr double kFalse = 0.005;  // spots that pure noise shows in a photo at each size
 constexpr double kLeastDeviations = 5.2;
-constexpr int kLevels = 7;
+constexpr int kPyramidLevels = 7;
 constexpr double kWider = 4;  // of the Gaussian for the ground about a spot
 constexpr std::size_t kMostMinima = 20000;
-constexpr std::size_t kMostSpots = 2000;
+constexpr std::size_t kMostFound = 2000;
 
 // Of the Gaussians at a level, in its pixels; a disc of 3.2 sigmas answers best, so that discs of 3.8, 6.4, 9, 12.8 to
 // 290 pixels do.
@@ -96,15 +96,15 @@ class Photo {
 };
 
 // Where a line of so many values falls when it is shrunk or enlarged to another number.
-struct Span {
+struct SizeSpan {
   int first = 0;
   double first_share = 1;  // of the first value
   int last = 0;
   double last_share = 1;
 };
 
-std::vector<Span> SpansOf(int from, int to) {
-  std::vector<Span> spans(to);
+std::vector<SizeSpan> SpansOf(int from, int to) {
+  std::vector<SizeSpan> spans(to);
   const double scale = static_cast<double>(from) / to;
   for (int i = 0; i < to; ++i) {
     const double begin = i * scale;
@@ -120,8 +120,8 @@ std::vector<Span> SpansOf(int from, int to) {
 
 // Means over blocks that need not be of whole pixels.
 cv::Mat BlockMeans(const Photo& photo, cv::Size size) {
-  const std::vector<Span> across = SpansOf(photo.cols(), size.width);
-  const std::vector<Span> down = SpansOf(photo.rows(), size.height);
+  const std::vector<SizeSpan> across = SpansOf(photo.cols(), size.width);
+  const std::vector<SizeSpan> down = SpansOf(photo.rows(), size.height);
   cv::Mat sums = cv::Mat::zeros(size, CV_64F);
   std::vector<float> levels(photo.cols());
   std::vector<double> row_sums(size.width);
@@ -132,7 +132,7 @@ cv::Mat BlockMeans(const Photo& photo, cv::Size size) {
       if (row != done) {
         photo.Read(row, 0, levels);
         for (int x = 0; x < size.width; ++x) {
-          const Span& span = across[x];
+          const SizeSpan& span = across[x];
           float whole = 0;  // of small whole numbers, or near it
           for (int i = span.first + 1; i < span.last; ++i) whole += levels[i];
           row_sums[x] = whole + span.first_share * levels[span.first] +
@@ -369,7 +369,7 @@ struct Pyramid {
 Pyramid Build(const cv::Mat& relative) {
   Pyramid pyramid;
   cv::Mat level = relative;
-  while (static_cast<int>(pyramid.levels.size()) < kLevels + 2 && std::min(level.cols, level.rows) >= 4) {
+  while (static_cast<int>(pyramid.levels.size()) < kPyramidLevels + 2 && std::min(level.cols, level.rows) >= 4) {
     pyramid.levels.push_back(level);
     std::vector<float> off = Sampled(level, [&](int row, int column) {
       return std::abs(level.at<float>(row, column) - level.at<float>(row, std::abs(column - 2)));
@@ -497,7 +497,7 @@ void AddMinima(const SizeSearch& search, double sigma, double least_depth, doubl
 
 std::vector<Minimum> FindMinima(const Pyramid& pyramid, double least_depth) {
   std::vector<Minimum> minima;
-  for (int level = 0; level < std::min(kLevels, static_cast<int>(pyramid.levels.size())); ++level) {
+  for (int level = 0; level < std::min(kPyramidLevels, static_cast<int>(pyramid.levels.size())); ++level) {
     for (const double sigma : SigmasAt(level)) {
       // White noise of one a pixel keeps so much under the Gaussian.
       const double white = pyramid.noise[level] / (2 * sigma * std::sqrt(CV_PI));
@@ -510,9 +510,9 @@ std::vector<Minimum> FindMinima(const Pyramid& pyramid, double least_depth) {
 
 // ---- 3. Spots -------------------------------------------------------------------------------------------------------
 
-class Regions {
+class SpotRegions {
  public:
-  Regions(const Pyramid& pyramid, cv::Size photo) : pyramid_(pyramid) {
+  SpotRegions(const Pyramid& pyramid, cv::Size photo) : pyramid_(pyramid) {
     taken_ = cv::Mat::zeros((photo.height + 1) / 2, (photo.width + 1) / 2, CV_8U);
   }
 
@@ -678,7 +678,7 @@ double Spot::diameter_px() const { return 2 * std::sqrt(area_px / CV_PI); }
 SpotFinding FindSpots(const cv::Mat& photo) {
   const Target target = LookAtTarget(Photo(photo));
   const Pyramid pyramid = Build(target.relative);
-  Regions regions(pyramid, photo.size());
+  SpotRegions regions(pyramid, photo.size());
   std::vector<Minimum> minima = FindMinima(pyramid, target.stepped ? 1.5 : 0);
   SpotFinding found;
   found.cut_short = minima.size() > kMostMinima;
@@ -687,7 +687,7 @@ SpotFinding FindSpots(const cv::Mat& photo) {
   found.noise = MedianOf(shares);
   for (const Minimum& minimum : minima) {
     if (regions.IsTaken(minimum)) continue;
-    if (found.spots.size() == kMostSpots) {
+    if (found.spots.size() == kMostFound) {
       found.cut_short = true;
       break;
     }

@@ -10,8 +10,8 @@ namespace qv {
 
 namespace {
 
-constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-constexpr double kShare = 0.95;
+constexpr double kUnknown = std::numeric_limits<double>::quiet_NaN();
+constexpr double kCoverage = 0.95;
 
 // Student's distribution function for whole degrees of freedom (Abramowitz and Stegun 26.7.3 and 26.7.4): what lies
 // between -t and t.
@@ -131,14 +131,14 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
 
 double StudentFactor(double degrees_of_freedom) {
   constexpr double kNormal = 1.959964;
-  if (!(degrees_of_freedom >= 1)) return std::isnan(degrees_of_freedom) ? kNone : StudentFactor(1);
+  if (!(degrees_of_freedom >= 1)) return std::isnan(degrees_of_freedom) ? kUnknown : StudentFactor(1);
   if (degrees_of_freedom > 200) return kNormal * (1 + (kNormal * kNormal + 1) / (4 * degrees_of_freedom));
   const auto whole = static_cast<int>(degrees_of_freedom);  // cut: the factor is rather too large than too small
   double low = 1;
   double high = 13;
   for (int step = 0; step < 50; ++step) {
     const double middle = (low + high) / 2;
-    (StudentShare(middle, whole) < kShare ? low : high) = middle;
+    (StudentShare(middle, whole) < kCoverage ? low : high) = middle;
   }
   return high;
 }
@@ -152,7 +152,7 @@ Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, co
 
 double Spread(const std::vector<double>& readings) {
   const auto n = static_cast<double>(readings.size());
-  if (readings.size() < 2) return kNone;
+  if (readings.size() < 2) return kUnknown;
   const double mean = std::accumulate(readings.begin(), readings.end(), 0.0) / n;
   double squares = 0;
   for (const double reading : readings) squares += (reading - mean) * (reading - mean);
@@ -161,7 +161,7 @@ double Spread(const std::vector<double>& readings) {
 
 Uncertainty OfMean(const std::vector<double>& readings, double type_b, const char* method) {
   const auto n = static_cast<double>(readings.size());
-  if (readings.size() < 2) return {kNone, kNone, kNone, method};
+  if (readings.size() < 2) return {kUnknown, kUnknown, kUnknown, method};
   return Combined(Spread(readings) / std::sqrt(n), n - 1, type_b, method);
 }
 
@@ -174,14 +174,14 @@ Uncertainty OfMedian(const std::vector<double>& readings) {
 }
 
 double Median(std::vector<double> readings) {
-  if (readings.empty()) return kNone;
+  if (readings.empty()) return kUnknown;
   std::sort(readings.begin(), readings.end());
   const std::size_t half = readings.size() / 2;
   return readings.size() % 2 != 0 ? readings[half] : (readings[half - 1] + readings[half]) / 2;
 }
 
 Uncertainty FromErrors(std::vector<double> errors, const char* method) {
-  if (errors.empty()) return {kNone, kNone, kNone, method};
+  if (errors.empty()) return {kUnknown, kUnknown, kUnknown, method};
   double squares = 0;
   for (double& error : errors) {
     error = std::isfinite(error) ? std::fabs(error) : std::numeric_limits<double>::infinity();
@@ -190,7 +190,7 @@ Uncertainty FromErrors(std::vector<double> errors, const char* method) {
   std::sort(errors.begin(), errors.end());
   // A further error lies below the k-th of n in k of n + 1 cases.
   const auto n = static_cast<double>(errors.size());
-  const double place = std::clamp(kShare * (n + 1) - 1, 0.0, n - 1);
+  const double place = std::clamp(kCoverage * (n + 1) - 1, 0.0, n - 1);
   const auto below = static_cast<std::size_t>(place);
   const double above = errors[std::min(below + 1, errors.size() - 1)];
   const double expanded =
@@ -201,14 +201,14 @@ Uncertainty FromErrors(std::vector<double> errors, const char* method) {
 
 Uncertainty OfMeanLevel(const cv::Mat& picture, double unit, double type_b) {
   const Parts parts = PartsOf(picture);
-  if (parts.differences.empty()) return {kNone, kNone, kNone, kMeanMethod};
+  if (parts.differences.empty()) return {kUnknown, kUnknown, kUnknown, kMeanMethod};
   return Combined(unit * NoiseOf(parts) / std::sqrt(parts.count), std::max(kWorth * parts.Independent(), 1.0),
                   unit * type_b, kMeanMethod);
 }
 
 Uncertainty OfShare(const cv::Mat& mask) {
   const Parts parts = PartsOf(mask);
-  if (parts.differences.empty()) return {kNone, kNone, kNone, kMeanMethod};
+  if (parts.differences.empty()) return {kUnknown, kUnknown, kUnknown, kMeanMethod};
   double squares = 0;
   for (const double difference : parts.differences) squares += difference * difference;
   const double variance = squares / (kSquaredWeights * static_cast<double>(parts.differences.size()));

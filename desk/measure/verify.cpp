@@ -215,8 +215,7 @@ Verification Verify(const Json& record, const std::string& folder) {
   const Request request = RequestOfRecord(record, folder);
   try {
     RefuseLostFiles(record, request);
-    QVTester tester;
-    return Compare(record, Measure(tester, request, LimitsOfRecord(record)));
+    return Compare(record, MeasureAnew(request, LimitsOfRecord(record)));
   } catch (const Json::exception& e) {
     throw Failure(kCouldNotMeasure, "not a whole record: " + SentenceOf(e));
   } catch (const Failure& e) {

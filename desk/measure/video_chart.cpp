@@ -7,6 +7,7 @@
 #include "desk/measure/chart_view.h"
 #include "desk/measure/film_course.h"
 #include "desk/measure/telling.h"
+#include "desk/measure/widen.h"
 
 namespace qv {
 

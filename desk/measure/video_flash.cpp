@@ -8,14 +8,15 @@
 #include "desk/measure/film_course.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/telling.h"
+#include "desk/measure/widen.h"
 
 namespace qv {
 
 namespace {
 
-constexpr Method kMeans = {"mean over all pixels of the first channel of each frame",
-                           "Exact for the frames as decoded.",
-                           "Moved by exposure, flash and clipping; the first channel of a film's frames is blue."};
+constexpr Method kFrameMeans = {"mean over all pixels of the first channel of each frame",
+                                "Exact for the frames as decoded.",
+                                "Moved by exposure, flash and clipping; the first channel of a film's frames is blue."};
 constexpr Method kWidth = {
     "width of the pulse about the peak at half height, straight lines between the frames",
     "Within {film_pulse} for pulses of three frames and more. Not a number when the peak is less than 5 levels "
@@ -84,11 +85,11 @@ class VideoFlash : public Measurement {
           {},
           QV_PROPERTY_VIDEO_FLASH_FRAME_COUNT}},
         {{"frame_count", kOne, kWhole, nullptr, kStampMethod, "Frames that were read."},
-         {"peak", kGreyLevel, kReal, nullptr, kMeans, "Mean brightness of the brightest frame, 0 to 255."},
-         {"peak_frame", kOne, kWhole, nullptr, kMeans, "The brightest frame, counted from 0."},
-         {"base", kGreyLevel, kReal, nullptr, kMeans, "Brightness without the flash: the median of all frames."},
+         {"peak", kGreyLevel, kReal, nullptr, kFrameMeans, "Mean brightness of the brightest frame, 0 to 255."},
+         {"peak_frame", kOne, kWhole, nullptr, kFrameMeans, "The brightest frame, counted from 0."},
+         {"base", kGreyLevel, kReal, nullptr, kFrameMeans, "Brightness without the flash: the median of all frames."},
          {"width", kMillisecond, kReal, nullptr, kWidth, "How long the flash lasts."},
-         {"mean", kGreyLevel, kReal, &kTimeAxis, kMeans, "Mean brightness over time."}},
+         {"mean", kGreyLevel, kReal, &kTimeAxis, kFrameMeans, "Mean brightness over time."}},
         false,
         kFilmAdvice};
     return spec;

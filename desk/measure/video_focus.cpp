@@ -9,6 +9,7 @@
 #include "desk/measure/heading.h"
 #include "desk/measure/sharpness.h"
 #include "desk/measure/telling.h"
+#include "desk/measure/widen.h"
 
 namespace qv {
 

@@ -17,17 +17,6 @@ constexpr std::size_t kCurvePoints = 101;
 constexpr double kCurveScale = 10000;     // curves are kept as whole ten-thousandths
 constexpr std::size_t kMostCurves = 300;  // drawn one by one; more become bands
 
-const Json& At(const Json& object, const char* name) {
-  static const Json nothing;
-  const auto found = object.is_object() ? object.find(name) : object.end();
-  return object.is_object() && found != object.end() ? *found : nothing;
-}
-
-std::int64_t WholeAt(const Json& object, const char* name) {
-  const Json& value = At(object, name);
-  return value.is_number() ? value.get<std::int64_t>() : 0;
-}
-
 Json NumberOrWord(const std::optional<double>& value) {
   if (!value) return nullptr;
   if (std::isnan(*value)) return "nan";
@@ -67,7 +56,7 @@ std::vector<double> OnCommonAxis(const std::vector<std::pair<double, double>>& p
 }
 
 std::string LimitsName(const Json& record) {
-  const Json& limits = At(At(record, "metadata"), "limits");
+  const Json& limits = MemberOf(MemberOf(record, "metadata"), "limits");
   const std::string name = TextAt(limits, "name");
   return name.empty() ? "" : name + " revision " + TextAt(limits, "revision");
 }
@@ -105,11 +94,11 @@ std::size_t Report::Column::Place(const std::string& text) {
 
 void Report::Add(const StoredRun& run) {
   const Json& record = run.record;
-  const Json& phases = At(record, "phases");
+  const Json& phases = MemberOf(record, "phases");
   const std::string measurement = phases.is_array() && !phases.empty() ? TextAt(phases[0], "name") : "";
   const std::string step = run.filing.step.empty() ? measurement : run.filing.step;
   const std::string outcome = TextAt(record, "outcome");
-  const Json& marginal = At(record, "marginal");
+  const Json& marginal = MemberOf(record, "marginal");
   const std::size_t place = units_.size();
   const std::int64_t start = WholeAt(record, "start_time_millis");
   units_.push_back(TextAt(record, "dut_id"));
@@ -121,7 +110,7 @@ void Report::Add(const StoredRun& run) {
   step_.Add(step);
   measurement_.Add(measurement);
   outcome_.Add(outcome);
-  version_.Add(TextAt(At(record, "metadata"), "library_version"));
+  version_.Add(TextAt(MemberOf(record, "metadata"), "library_version"));
   limits_.Add(LimitsName(record));
   cases_.push_back({static_cast<double>(WholeAt(record, "end_time_millis") - start) / 1000, "", ""});
   AddFigures(place, step, record);
@@ -154,16 +143,16 @@ void Report::AddFigures(std::size_t run, const std::string& step, const Json& re
     if (figure.outcome != "FAIL" && figure.outcome != "UNSET") continue;
     (figure.outcome == "FAIL" ? cases_[run].failure : cases_[run].error) += ReadingWords(figure) + "\n";
   }
-  for (const Json& phase : At(record, "phases")) {
-    const Json& measurements = At(phase, "measurements");
+  for (const Json& phase : MemberOf(record, "phases")) {
+    const Json& measurements = MemberOf(phase, "measurements");
     if (!measurements.is_object()) continue;
     for (const auto& [name, m] : measurements.items()) AddCurve(run, step, name, m);
   }
 }
 
 void Report::AddCurve(std::size_t run, const std::string& step, const std::string& name, const Json& measurement) {
-  const Json& dimensions = At(measurement, "dimensions");
-  const Json& value = At(measurement, "measured_value");
+  const Json& dimensions = MemberOf(measurement, "dimensions");
+  const Json& value = MemberOf(measurement, "measured_value");
   if (!dimensions.is_array() || dimensions.empty() || TextAt(dimensions[0], "suffix") != "Nyquist" ||
       !value.is_array()) {
     return;
@@ -181,16 +170,16 @@ void Report::AddCurve(std::size_t run, const std::string& step, const std::strin
 
 void Report::AddWords(std::size_t run, const StoredRun& source, bool failed) {
   Json sentences = Json::array();
-  for (const Json& detail : At(source.record, "outcome_details")) {
+  for (const Json& detail : MemberOf(source.record, "outcome_details")) {
     sentences.push_back(TextAt(detail, "description"));
     if (TextAt(source.record, "outcome") == "ERROR") cases_[run].error += TextAt(detail, "description") + "\n";
   }
   details_.push_back(std::move(sentences));
   Json inputs = Json::array();
-  for (const Json& input : At(source.record, "inputs")) inputs.push_back(TextAt(input, "path"));
+  for (const Json& input : MemberOf(source.record, "inputs")) inputs.push_back(TextAt(input, "path"));
   inputs_.push_back(std::move(inputs));
   Json log = Json::array();
-  for (const Json& line : At(source.record, "log_records")) log.push_back(TextAt(line, "message"));
+  for (const Json& line : MemberOf(source.record, "log_records")) log.push_back(TextAt(line, "message"));
   logs_.push_back(std::move(log));
   if (pictures_ == Pictures::kNone || (pictures_ == Pictures::kFailures && !failed)) return;
   for (const StoredPicture& picture : source.pictures) {

@@ -13,29 +13,23 @@ namespace qv {
 
 namespace {
 
-const Json& At(const Json& object, const char* name) {
-  static const Json nothing;
-  const auto found = object.is_object() ? object.find(name) : object.end();
-  return object.is_object() && found != object.end() ? *found : nothing;
-}
-
 std::optional<double> NumberAt(const Json& object, const char* name) {
-  const Json& value = At(object, name);
+  const Json& value = MemberOf(object, name);
   return value.is_number() ? std::optional<double>(value.get<double>()) : std::nullopt;
 }
 
 // Records without a request are told apart by what they ran and by the command that made them.
 Json RequestOf(const Json& record) {
-  Json request = At(record, "request");
+  Json request = MemberOf(record, "request");
   if (request.is_object()) {
     request.erase("inputs");  // their hashes stand for them
     return request;
   }
-  const Json& phases = At(record, "phases");
-  const Json& metadata = At(record, "metadata");
-  return {{"measurement", phases.is_array() && !phases.empty() ? At(phases[0], "name") : Json()},
-          {"properties", At(metadata, "properties")},
-          {"command", At(metadata, "command")}};
+  const Json& phases = MemberOf(record, "phases");
+  const Json& metadata = MemberOf(record, "metadata");
+  return {{"measurement", phases.is_array() && !phases.empty() ? MemberOf(phases[0], "name") : Json()},
+          {"properties", MemberOf(metadata, "properties")},
+          {"command", MemberOf(metadata, "command")}};
 }
 
 Bounds BoundsOf(const Json& limits) {
@@ -45,7 +39,7 @@ Bounds BoundsOf(const Json& limits) {
 
 // A list's values, and which of its entries are outside their limits.
 std::string ListWords(const Json& measurement) {
-  const Json& points = At(measurement, "measured_value");
+  const Json& points = MemberOf(measurement, "measured_value");
   double low = std::numeric_limits<double>::infinity();
   double high = -low;
   for (const Json& point : points) {
@@ -55,7 +49,7 @@ std::string ListWords(const Json& measurement) {
   }
   std::string words = Count(points.size(), "value");
   if (low <= high) words += Format(", %.6g to %.6g", low, high);
-  const Json& broken = At(At(measurement, "decision"), "broken");
+  const Json& broken = MemberOf(MemberOf(measurement, "decision"), "broken");
   for (std::size_t i = 0; i < broken.size(); ++i) words += (i == 0 ? "; outside: " : ", ") + broken[i].dump();
   return words;
 }
@@ -77,7 +71,7 @@ std::string ListLimitWords(const Json& limits) {
 }
 
 std::optional<double> ValueOf(const Json& measurement) {
-  const Json& value = At(measurement, "measured_value");
+  const Json& value = MemberOf(measurement, "measured_value");
   if (value.is_number()) return value.get<double>();
   const std::string bad = TextAt(measurement, "non_finite");
   if (value.is_array() || bad.empty()) return std::nullopt;
@@ -88,7 +82,7 @@ std::optional<double> ValueOf(const Json& measurement) {
 }  // namespace
 
 std::string TextAt(const Json& object, const char* name) {
-  const Json& value = At(object, name);
+  const Json& value = MemberOf(object, name);
   return value.is_string() ? value.get<std::string>() : std::string();
 }
 
@@ -101,7 +95,7 @@ std::string BoundsText(const Bounds& bounds) {
 
 std::set<std::string> DoubtsOf(const Json& record) {
   std::set<std::string> doubts;
-  const Json& details = At(record, "outcome_details");
+  const Json& details = MemberOf(record, "outcome_details");
   if (!details.is_array()) return doubts;
   for (const Json& detail : details) {
     const std::string weight = TextAt(detail, "weight");
@@ -114,41 +108,41 @@ std::set<std::string> DoubtsOf(const Json& record) {
 }
 
 std::string RunKey(const Json& record, const Filing& filing) {
-  const Json& metadata = At(record, "metadata");
+  const Json& metadata = MemberOf(record, "metadata");
   nlohmann::json parts;  // sorted: the order of members is nobody's affair
   parts["unit"] = TextAt(record, "dut_id");
   parts["plan"] = filing.plan;
   parts["step"] = filing.step;
   parts["request"] = nlohmann::json(RequestOf(record));
-  parts["limits"] = nlohmann::json(At(metadata, "limits"));
+  parts["limits"] = nlohmann::json(MemberOf(metadata, "limits"));
   parts["library_version"] = TextAt(metadata, "library_version");
   parts["inputs"] = nlohmann::json::array();
-  if (const Json& inputs = At(record, "inputs"); inputs.is_array()) {
+  if (const Json& inputs = MemberOf(record, "inputs"); inputs.is_array()) {
     for (const Json& input : inputs) {
       const std::string hash = TextAt(input, "sha256");
-      parts["inputs"].push_back({nlohmann::json(At(input, "slot")), hash.empty() ? TextAt(input, "path") : hash});
+      parts["inputs"].push_back({nlohmann::json(MemberOf(input, "slot")), hash.empty() ? TextAt(input, "path") : hash});
     }
   }
   return HexDigest(parts.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace), "SHA256");
 }
 
 std::vector<StoredFigure> FiguresOf(const Json& record) {
-  const Json& phases = At(record, "phases");
+  const Json& phases = MemberOf(record, "phases");
   if (TextAt(record, "schema").rfind("qvtester-record-", 0) != 0 || !phases.is_array()) {
     throw Failure(kWrongUsage, R"(no record of this program: its "schema" or its "phases" are missing)");
   }
   std::vector<StoredFigure> figures;
   std::set<std::string> seen;
   for (const Json& phase : phases) {
-    const Json& measurements = At(phase, "measurements");
+    const Json& measurements = MemberOf(phase, "measurements");
     if (!measurements.is_object()) continue;
     for (const auto& [name, m] : measurements.items()) {
-      const Json& limits = At(m, "limits");
-      const bool list = At(m, "measured_value").is_array();
+      const Json& limits = MemberOf(m, "limits");
+      const bool list = MemberOf(m, "measured_value").is_array();
       if ((list && !limits.is_object()) || !seen.insert(name).second) continue;
-      const Json& doubt = At(m, "marginal");
-      figures.push_back({name, TextAt(At(m, "units"), "suffix"), TextAt(m, "method"), TextAt(m, "docstring"),
-                         ValueOf(m), NumberAt(At(m, "uncertainty"), "standard"), TextAt(m, "outcome"),
+      const Json& doubt = MemberOf(m, "marginal");
+      figures.push_back({name, TextAt(MemberOf(m, "units"), "suffix"), TextAt(m, "method"), TextAt(m, "docstring"),
+                         ValueOf(m), NumberAt(MemberOf(m, "uncertainty"), "standard"), TextAt(m, "outcome"),
                          doubt.is_boolean() && doubt.get<bool>(), BoundsOf(limits), list ? ListWords(m) : "",
                          ListLimitWords(limits)});
     }

@@ -198,7 +198,7 @@ struct RowBuffer {
 };
 
 // A server's answer is held whole: it is asked for in parts.
-constexpr long long kRunsAtOnce = 500, kFigureRunsAtOnce = 20000;
+constexpr long long kRunsARead = 500, kFigureRunsAtOnce = 20000;
 
 double NonFinite(const std::string& name) {
   const double infinity = std::numeric_limits<double>::infinity();
@@ -298,7 +298,7 @@ void Store::EachRun(const Selection& selection, bool with_pictures,
     buffer.Into(query);
     query.Into(record).Bind(after, "after");
     query.Run(std::string("SELECT ") + kRowColumns + ", r.record FROM run r WHERE r.id > :after" + where.sql() +
-                  " ORDER BY r.id LIMIT " + std::to_string(kRunsAtOnce),
+                  " ORDER BY r.id LIMIT " + std::to_string(kRunsARead),
               where, [&] {
                 found.push_back({buffer.Filled(), record});
               });

@@ -11,17 +11,6 @@ namespace qv {
 
 namespace {
 
-const Json& At(const Json& object, const char* name) {
-  static const Json nothing = Json::object();
-  const auto found = object.is_object() ? object.find(name) : object.end();
-  return object.is_object() && found != object.end() ? *found : nothing;
-}
-
-std::int64_t WholeAt(const Json& object, const char* name) {
-  const Json& value = At(object, name);
-  return value.is_number() ? value.get<std::int64_t>() : 0;
-}
-
 // Text that every database takes: valid UTF-8 without zeros.
 std::string Clean(const std::string& text) {
   const bool plain = std::all_of(text.begin(), text.end(), [](char c) { return c > 0; });
@@ -34,7 +23,7 @@ std::string Clean(const std::string& text) {
 // One input's hash; of several, theirs in order with blanks between.
 std::string InputHash(const Json& record) {
   std::string hashes;
-  for (const Json& input : At(record, "inputs")) {
+  for (const Json& input : MemberOf(record, "inputs")) {
     hashes += (hashes.empty() ? "" : " ") + TextAt(input, "sha256");
   }
   return hashes;
@@ -42,10 +31,10 @@ std::string InputHash(const Json& record) {
 
 RunRow RowOf(const StoredRun& run) {
   const Json& record = run.record;
-  const Json& phases = At(record, "phases");
-  const Json& phase = phases.is_array() && !phases.empty() ? phases[0] : At(record, "no phase");
-  const Json& metadata = At(record, "metadata");
-  const Json& marginal = At(record, "marginal");
+  const Json& phases = MemberOf(record, "phases");
+  const Json& phase = phases.is_array() && !phases.empty() ? phases[0] : MemberOf(record, "no phase");
+  const Json& metadata = MemberOf(record, "metadata");
+  const Json& marginal = MemberOf(record, "marginal");
   RunRow row;
   row.key = run.key.empty() ? RunKey(record, run.filing) : run.key;
   row.unit = TextAt(record, "dut_id");
@@ -61,8 +50,8 @@ RunRow RowOf(const StoredRun& run) {
   row.start_millis = WholeAt(record, "start_time_millis");
   row.end_millis = WholeAt(record, "end_time_millis");
   row.library_version = TextAt(metadata, "library_version");
-  row.limits_name = TextAt(At(metadata, "limits"), "name");
-  row.limits_revision = TextAt(At(metadata, "limits"), "revision");
+  row.limits_name = TextAt(MemberOf(metadata, "limits"), "name");
+  row.limits_revision = TextAt(MemberOf(metadata, "limits"), "revision");
   row.input_hash = InputHash(record);
   for (const std::string& doubt : DoubtsOf(record)) row.doubts += (row.doubts.empty() ? "" : " ") + doubt;
   for (std::string* text :

@@ -17,7 +17,7 @@ namespace {
 
 constexpr int kTileRows = 128;          // of the photo, drawn and blurred at a time
 constexpr int kTileColumns = 1024;      // a drawing is at most 32767 wide
-constexpr double kReach = 5;            // sigmas to which a Gaussian is carried
+constexpr double kSigmas = 5;           // sigmas to which a Gaussian is carried
 constexpr double kSmallestSigma = 1.2;  // in subpixels: a sampled Gaussian narrower than this is not the continuous one
 constexpr double kStep = 8;             // pixels between the points of a bent edge
 constexpr double kDistance = 2.5;       // of the camera from the scene's plane, in sides of the scene
@@ -30,11 +30,11 @@ int Subpixels(const CameraModel& camera) {
 }
 
 // Maps the scene to a tile; null where a matrix does.
-using Bend = std::function<cv::Point2d(cv::Point2d)>;
+using Bending = std::function<cv::Point2d(cv::Point2d)>;
 
 struct Tile {
   cv::Matx33d from_scene;
-  Bend bent;
+  Bending bent;
   double step;  // of bent edges
   cv::Size size;
 };
@@ -130,7 +130,7 @@ cv::Mat PathKernel(cv::Point2d path) {
 
 void Blur(cv::Mat& tile, const CameraModel& camera, int subpixels) {
   if (const double sigma = camera.blur_px * subpixels; sigma > 0) {
-    const cv::Mat kernel = cv::getGaussianKernel(2 * static_cast<int>(std::ceil(kReach * sigma)) + 1, sigma, CV_32F);
+    const cv::Mat kernel = cv::getGaussianKernel(2 * static_cast<int>(std::ceil(kSigmas * sigma)) + 1, sigma, CV_32F);
     cv::sepFilter2D(tile, tile, CV_32F, kernel, kernel, {-1, -1}, 0, cv::BORDER_REPLICATE);
   }
   const auto filter = [&](const cv::Mat& kernel) {
@@ -208,7 +208,7 @@ cv::Mat Expose(const CameraModel& camera, const Scene& scene, const cv::Matx33d&
   const int s = Subpixels(camera);
   // Whole pixels, so that the tile's own pixels stay on the subpixel grid.
   const int halo =
-      static_cast<int>(std::ceil(kReach * camera.blur_px + camera.defocus_px + cv::norm(camera.smear_px) / 2)) + 2;
+      static_cast<int>(std::ceil(kSigmas * camera.blur_px + camera.defocus_px + cv::norm(camera.smear_px) / 2)) + 2;
   cv::Mat levels(camera.size, CV_32FC3);
   const cv::Rect whole({0, 0}, camera.size);
   for (int top = 0; top < whole.height; top += kTileRows) {

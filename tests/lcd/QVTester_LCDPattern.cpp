@@ -53,7 +53,7 @@ std::string Text(const char* format, double a, double b = 0, double c = 0) {
   return text.data();
 }
 
-std::string Levels(const Colour& c) {
+std::string LevelsText(const Colour& c) {
   return Text("red %.2f, green %.2f, blue %.2f of full range", c.rgb[0] / kFull, c.rgb[1] / kFull, c.rgb[2] / kFull);
 }
 
@@ -161,9 +161,9 @@ void ClusterDots(const QVTester_LCD& rules, const cv::Mat& mask, QVLcdResult& re
 
 // ---- Patterns -------------------------------------------------------------------------------------------------------
 
-class Judge {
+class PatternJudge {
  public:
-  Judge(const QVTester_LCD& rules, const cv::Mat& screen)
+  PatternJudge(const QVTester_LCD& rules, const cv::Mat& screen)
       : rules_(rules), screen_(screen), margin_(rules.margin_ * std::min(screen.cols, screen.rows)) {}
 
   void Pattern(QV_LCD_PATTERN pattern, QVLcdResult& result) {
@@ -217,15 +217,15 @@ class Judge {
     const double darkest = *std::min_element(mean.rgb.begin(), mean.rgb.end());
     const double brightest = *std::max_element(mean.rgb.begin(), mean.rgb.end());
     if (pattern == QV_LCD_BLACK) {
-      seen_ = "black: " + Levels(mean);
+      seen_ = "black: " + LevelsText(mean);
       if (brightest > rules_.max_black_level_ * kFull) {
-        Fault("not black: " + Levels(mean) + Text(", at most %.2f expected", rules_.max_black_level_));
+        Fault("not black: " + LevelsText(mean) + Text(", at most %.2f expected", rules_.max_black_level_));
       }
       return;
     }
     const bool white = pattern == QV_LCD_WHITE;
     const char* const name = white ? "white" : "green";
-    seen_ = name + (": " + Levels(mean));
+    seen_ = name + (": " + LevelsText(mean));
     const double level = white ? darkest : mean.rgb[1];
     const double least = white ? rules_.min_white_level_ : rules_.min_colour_level_;
     if (level < least * kFull) Fault("too dark for " + seen_ + Text(", at least %.2f expected", least));
@@ -345,7 +345,7 @@ int QVTester_LCD::JudgePattern(cv::Mat photo, QV_LCD_PATTERN pattern, QVLcdResul
     const cv::Mat screen = PlainColour(CutScreenOut(photo, corners, ScreenSize(corners)));
     QVLcdResult judged;
     judged.ratio_ = SideRatio(corners);
-    Judge(*this, screen).Pattern(pattern, judged);
+    PatternJudge(*this, screen).Pattern(pattern, judged);
     std::swap(*result, judged);
     aspect_ratio_ = result->ratio_;
     screen_size_ = screen.size();

@@ -35,7 +35,7 @@ constexpr double kClearly = 0.1;        // vote for grey: as much as noise alone
 
 double Cross(cv::Point2d a, cv::Point2d b) { return a.x * b.y - a.y * b.x; }
 
-double Area(const Quad& q) { return 0.5 * Cross(q[2] - q[0], q[3] - q[1]); }
+double AreaOf(const Quad& q) { return 0.5 * Cross(q[2] - q[0], q[3] - q[1]); }
 
 // A line through p along the unit vector d; the screen lies on its right as seen (y points down), so n points outward.
 struct Line {
@@ -82,7 +82,7 @@ bool IsSound(const Quad& q, double least_side) {
 
 // Clockwise as seen, from the corner nearest the upper left.
 Quad InOrder(Quad q) {
-  if (Area(q) < 0) std::reverse(q.begin(), q.end());
+  if (AreaOf(q) < 0) std::reverse(q.begin(), q.end());
   const auto first = std::min_element(q.begin(), q.end(), [](auto a, auto b) { return a.x + a.y < b.x + b.y; });
   std::rotate(q.begin(), first, q.end());
   return q;
@@ -90,7 +90,7 @@ Quad InOrder(Quad q) {
 
 // ---- 1. Candidates --------------------------------------------------------------------------------------------------
 
-struct Candidate {
+struct Outline {
   Quad corners;
   bool dark;
 };
@@ -123,7 +123,7 @@ std::vector<Quad> QuadsOf(const std::vector<cv::Point>& hull) {
   return quads;
 }
 
-void AddCandidates(const cv::Mat& mask, bool dark, double least_area, std::vector<Candidate>& candidates) {
+void AddCandidates(const cv::Mat& mask, bool dark, double least_area, std::vector<Outline>& candidates) {
   cv::Mat framed;
   cv::copyMakeBorder(mask, framed, 1, 1, 1, 1, cv::BORDER_CONSTANT, cv::Scalar(0));
   std::vector<std::vector<cv::Point>> contours;
@@ -136,7 +136,7 @@ void AddCandidates(const cv::Mat& mask, bool dark, double least_area, std::vecto
     std::vector<cv::Point> hull;
     cv::convexHull(contours[i], hull);
     for (const Quad& quad : QuadsOf(hull)) {
-      const double fill = area / std::max(Area(quad), 1e-9);
+      const double fill = area / std::max(AreaOf(quad), 1e-9);
       if (fill > kLeastFill && fill < 1.2 && IsSound(quad, 3)) candidates.push_back({quad, dark});
     }
   }
@@ -168,7 +168,7 @@ double CoarseScale(cv::Size photo) {
 }
 
 // In the photo's pixels, the largest first.
-std::vector<Candidate> Candidates(const cv::Mat& levels, double min_area) {
+std::vector<Outline> Candidates(const cv::Mat& levels, double min_area) {
   const double scale = CoarseScale(levels.size());
   cv::Mat coarse;
   const cv::Size size(cvRound(std::max(levels.cols / scale, 1.0)), cvRound(std::max(levels.rows / scale, 1.0)));
@@ -178,7 +178,7 @@ std::vector<Candidate> Candidates(const cv::Mat& levels, double min_area) {
   const int brush = std::max(3, std::max(size.width, size.height) / 60) | 1;
   const cv::Mat kernel = cv::getStructuringElement(cv::MORPH_RECT, {brush, brush});
   const double least_area = 0.8 * min_area * static_cast<double>(coarse.total());
-  std::vector<Candidate> candidates;
+  std::vector<Outline> candidates;
   for (const int cut : Cuts(coarse)) {
     const cv::Mat bright = coarse > cut;
     cv::Mat opened;
@@ -192,11 +192,11 @@ std::vector<Candidate> Candidates(const cv::Mat& levels, double min_area) {
   }
   const double sx = static_cast<double>(levels.cols) / size.width;
   const double sy = static_cast<double>(levels.rows) / size.height;
-  for (Candidate& candidate : candidates) {  // 1: the frame; contours run through the centres of the outermost pixels
+  for (Outline& candidate : candidates) {  // 1: the frame; contours run through the centres of the outermost pixels
     for (cv::Point2d& p : candidate.corners) p = {(p.x - 0.5) * sx - 0.5, (p.y - 0.5) * sy - 0.5};
   }
   std::stable_sort(candidates.begin(), candidates.end(),
-                   [](const auto& a, const auto& b) { return Area(a.corners) > Area(b.corners); });
+                   [](const auto& a, const auto& b) { return AreaOf(a.corners) > AreaOf(b.corners); });
   return candidates;
 }
 
@@ -208,10 +208,10 @@ bool SamePlace(const Quad& a, const Quad& b, double near) {
 }
 
 // Without those that lie where one before lies.
-std::vector<Candidate> Distinct(const std::vector<Candidate>& candidates, double near) {
-  std::vector<Candidate> distinct;
-  for (const Candidate& candidate : candidates) {
-    if (std::none_of(distinct.begin(), distinct.end(), [&](const Candidate& other) {
+std::vector<Outline> Distinct(const std::vector<Outline>& candidates, double near) {
+  std::vector<Outline> distinct;
+  for (const Outline& candidate : candidates) {
+    if (std::none_of(distinct.begin(), distinct.end(), [&](const Outline& other) {
           return other.dark == candidate.dark && SamePlace(other.corners, candidate.corners, near);
         })) {
       distinct.push_back(candidate);
@@ -348,7 +348,7 @@ struct Screen {
   double support;  // of the least supported side
 };
 
-std::optional<Screen> HoldAgainst(const Levels& levels, const Candidate& candidate, const ScreenRules& rules) {
+std::optional<Screen> HoldAgainst(const Levels& levels, const Outline& candidate, const ScreenRules& rules) {
   const double scale = CoarseScale(levels.size());
   Screen screen = {candidate.corners, candidate.dark, 1};
   for (const double window : {4 * scale, 2 + scale}) {
@@ -368,7 +368,7 @@ std::optional<Screen> HoldAgainst(const Levels& levels, const Candidate& candida
   const bool inside = std::all_of(screen.corners.begin(), screen.corners.end(), [&](cv::Point2d p) {
     return p.x > -0.5 && p.y > -0.5 && p.x < levels.size().width - 0.5 && p.y < levels.size().height - 0.5;
   });
-  if (!inside || Area(screen.corners) < rules.min_area * levels.size().area()) return std::nullopt;
+  if (!inside || AreaOf(screen.corners) < rules.min_area * levels.size().area()) return std::nullopt;
   return screen;
 }
 
@@ -388,7 +388,7 @@ const Screen* Largest(const std::vector<Screen>& screens, const Screen* within, 
   for (const Screen& screen : screens) {
     if (&screen == within || (dark && screen.dark != *dark)) continue;
     if (within != nullptr && !LiesIn(screen.corners, within->corners, -1)) continue;
-    if (largest == nullptr || Area(screen.corners) > Area(largest->corners)) largest = &screen;
+    if (largest == nullptr || AreaOf(screen.corners) > AreaOf(largest->corners)) largest = &screen;
   }
   return largest;
 }
@@ -397,8 +397,8 @@ const Screen* Largest(const std::vector<Screen>& screens, const Screen* within, 
 const Screen* LargestInside(const std::vector<Screen>& screens, const Screen& outer) {
   const Screen* largest = nullptr;
   for (const Screen& screen : screens) {
-    if (screen.dark || !LiesIn(screen.corners, outer.corners, 0.01 * std::sqrt(Area(outer.corners)))) continue;
-    if (largest == nullptr || Area(screen.corners) > Area(largest->corners)) largest = &screen;
+    if (screen.dark || !LiesIn(screen.corners, outer.corners, 0.01 * std::sqrt(AreaOf(outer.corners)))) continue;
+    if (largest == nullptr || AreaOf(screen.corners) > AreaOf(largest->corners)) largest = &screen;
   }
   return largest;
 }
@@ -412,16 +412,16 @@ const Screen* Choose(const std::vector<Screen>& screens, bool dark_first) {
   const Screen* phone = chosen->dark ? chosen : Largest(screens, chosen, true);
   if (phone != nullptr) {
     const Screen* lit = Largest(screens, phone, false);
-    if (lit != nullptr && Area(lit->corners) > kScreenOfPhone * Area(phone->corners)) chosen = lit;
+    if (lit != nullptr && AreaOf(lit->corners) > kScreenOfPhone * AreaOf(phone->corners)) chosen = lit;
   }
   // A light frame about a lighter screen.
   if (!chosen->dark) {
     const Screen* inner = LargestInside(screens, *chosen);
-    if (inner != nullptr && Area(inner->corners) > kScreenOfPhone * Area(chosen->corners)) chosen = inner;
+    if (inner != nullptr && AreaOf(inner->corners) > kScreenOfPhone * AreaOf(chosen->corners)) chosen = inner;
   }
   // Of nearly the same outlines, from other levels, the one that is best supported.
   const Screen* best = chosen;
-  const double near = 0.02 * std::sqrt(Area(chosen->corners));
+  const double near = 0.02 * std::sqrt(AreaOf(chosen->corners));
   for (const Screen& screen : screens) {
     const bool better = screen.dark == chosen->dark && screen.support > best->support;
     if (better && SamePlace(screen.corners, chosen->corners, near)) best = &screen;
@@ -711,7 +711,7 @@ std::vector<cv::Point2d> FindScreenCorners(const cv::Mat& photo, const ScreenRul
   const Levels levels(brightest);
   std::vector<Screen> screens;
   int tried = 0;
-  for (const Candidate& candidate : Distinct(Candidates(brightest, rules.min_area), 1.5 * CoarseScale(photo.size()))) {
+  for (const Outline& candidate : Distinct(Candidates(brightest, rules.min_area), 1.5 * CoarseScale(photo.size()))) {
     if (++tried > kMostTried) break;
     if (const auto screen = HoldAgainst(levels, candidate, rules)) screens.push_back(*screen);
   }

@@ -7,6 +7,7 @@
 #include <new>
 
 #include "qvtester/tester.h"
+#include "tests/led_touch/malloc_array.h"
 
 namespace {
 
@@ -67,17 +68,6 @@ std::vector<Area> MergeOnce(const std::vector<Area>& in, const Closeness& close,
   return out;
 }
 
-struct Free {
-  void operator()(void* array) const { std::free(array); }
-};
-
-template <typename T>
-std::unique_ptr<T[], Free> Allocate(std::size_t count) {
-  void* const array = std::malloc(count * sizeof(T));
-  if (array == nullptr) throw std::bad_alloc();
-  return std::unique_ptr<T[], Free>(static_cast<T*>(array));
-}
-
 }  // namespace
 
 int QVTester::ErrorAreaClustering(int distance, int width, int height, std::vector<int>* areas, int** counts,
@@ -95,9 +85,9 @@ int QVTester::ErrorAreaClustering(int distance, int width, int height, std::vect
     current = MergeOnce(current, close, kept);
   }
 
-  auto merged_counts = Allocate<int>(current.size());
-  auto merged_top_left = Allocate<cv::Point>(current.size());
-  auto merged_bottom_right = Allocate<cv::Point>(current.size());
+  auto merged_counts = MallocArray<int>(current.size());
+  auto merged_top_left = MallocArray<cv::Point>(current.size());
+  auto merged_bottom_right = MallocArray<cv::Point>(current.size());
   for (std::size_t i = 0; i < current.size(); ++i) {
     merged_counts[i] = current[i].count;
     new (&merged_top_left[i]) cv::Point(current[i].top_left);

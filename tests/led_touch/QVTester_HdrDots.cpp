@@ -20,7 +20,7 @@
 namespace {
 
 constexpr int kRowsAtOnce = 6;
-constexpr int kStretch = 32;
+constexpr int kRun = 32;
 
 // Rows of the table S[y][x] = sum of channel 0 over the rows above y and the columns left of x, accumulated row by row
 // in single precision: its rounding is part of the result. A row takes the place of the one `rows` before it.
@@ -60,9 +60,9 @@ struct Row {
   const float *pixels, *upper, *lower;
 };
 
-class Judge {
+class DotJudge {
  public:
-  Judge(int radius, float threshold, int width)
+  DotJudge(int radius, float threshold, int width)
       : radius_(radius), side_(2 * radius + 1), width_(width), threshold_(threshold) {
     area_ = static_cast<float>(static_cast<std::int64_t>(side_) * side_);
     const float safe = threshold * (1 - 1e-6f) - 1e-6f;
@@ -75,9 +75,9 @@ class Judge {
   void Flag(const Row& row, const float* ahead, unsigned char* mask) const {
     FlagExactly(row, 0, radius_, mask);
     int x = radius_;
-    for (; x + kStretch <= width_ - radius_; x += kStretch) {
-      for (int i = 0; i < 3 * kStretch; i += 16) __builtin_prefetch(ahead + 3 * x + i);
-      if (MayDepart(row, x)) FlagExactly(row, x, x + kStretch, mask);
+    for (; x + kRun <= width_ - radius_; x += kRun) {
+      for (int i = 0; i < 3 * kRun; i += 16) __builtin_prefetch(ahead + 3 * x + i);
+      if (MayDepart(row, x)) FlagExactly(row, x, x + kRun, mask);
     }
     FlagExactly(row, x, width_, mask);
   }
@@ -95,7 +95,7 @@ class Judge {
     v_float32x4 least = cv::v_setall_f32(FLT_MAX);
     const float* const upper = row.upper + begin - radius_;
     const float* const lower = row.lower + begin - radius_;
-    for (int i = 0; i < kStretch; i += v_float32x4::nlanes) {
+    for (int i = 0; i < kRun; i += v_float32x4::nlanes) {
       v_float32x4 pixel;
       v_float32x4 second;
       v_float32x4 third;
@@ -130,7 +130,7 @@ void QVTester::DetectDot(float* data, int height, int width, float threshold, in
     return;
   }
   const int side = 2 * radius + 1;
-  const Judge judge(radius, threshold, width);
+  const DotJudge judge(radius, threshold, width);
   SumRows sums(side + kRowsAtOnce, width);
   const auto start = [width](int y) { return static_cast<std::size_t>(y) * width; };
   QVDEBUGP("[OKAPI] OpenMP #1 Start");

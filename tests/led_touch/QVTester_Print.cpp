@@ -13,9 +13,8 @@
 
 namespace {
 
-constexpr const char* kName = "TestTouchPanelPrint";
-constexpr int kMedianAperture = 5;  // as the list's pictures
-constexpr double kLight = 255;      // dark is 0
+constexpr const char* kPrint = "TestTouchPanelPrint";
+constexpr double kLight = 255;  // dark is 0
 constexpr int kOpening = 3;
 
 // Grey as the list's pictures are read, and smoothed like them: the photo of a sample is that sample.
@@ -70,14 +69,14 @@ int QVTester::TestTouchPanelPrint() {
   cv::Mat map = kept_->unwarp.matrix.clone();
   const float correlation = RefineUnwarp(reference, smoothed, map);
   if (std::isnan(correlation))
-    QVDEBUGP("[%s] the registration did not converge: it is good to some pixels only", kName);
+    QVDEBUGP("[%s] the registration did not converge: it is good to some pixels only", kPrint);
 
   const Print print = Straighten(smoothed, map, reference.size());
   const cv::Mat departure = cv::abs(print.binary - Rebuild(list, prop_param_80_, print.binary));
   cv::Mat flagged = departure > kLight / 2;
   flagged.setTo(0, print.seen == 0);
   cv::morphologyEx(flagged, flagged, cv::MORPH_OPEN, cv::Mat::ones(kOpening, kOpening, CV_8U));
-  ErrorAreas errors = FindErrorAreas(*this, kName, flagged);
+  ErrorAreas errors = FindErrorAreas(*this, kPrint, flagged);
   const int seen = cv::countNonZero(print.seen);
 
   ReleaseTestResult(QV_TEST_TOUCH_PANEL_PRINT);

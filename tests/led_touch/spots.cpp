@@ -7,23 +7,12 @@
 #include <vector>
 
 #include "qvtester/log.h"
+#include "tests/led_touch/malloc_array.h"
 
 namespace {
 
 constexpr int kMostSpots = 20'000;
 constexpr int kFarthest = 1'000'000;  // beyond any picture: sums of coordinates never wrap
-
-struct Free {
-  void operator()(void* array) const { std::free(array); }
-};
-
-// What malloc gives and the clustering exchanges.
-template <typename T>
-std::unique_ptr<T[], Free> Allocate(int count) {
-  std::unique_ptr<T[], Free> array(static_cast<T*>(std::calloc(count, sizeof(T))));
-  if (array == nullptr) throw std::bad_alloc();
-  return array;
-}
 
 struct Spot {
   cv::Point first, last;
@@ -47,9 +36,9 @@ std::vector<Spot> FindSpots(const cv::Mat& flagged) {
 
 void Merge(QVTester& tester, cv::Size size, std::vector<Spot>& spots) {
   const int count = static_cast<int>(spots.size());
-  auto counts = Allocate<int>(count);
-  auto first = Allocate<cv::Point>(count);
-  auto last = Allocate<cv::Point>(count);
+  auto counts = MallocArray<int>(count);
+  auto first = MallocArray<cv::Point>(count);
+  auto last = MallocArray<cv::Point>(count);
   for (int i = 0; i < count; ++i) {
     counts[i] = spots[i].pixels;
     first[i] = spots[i].first;
