@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
 #include <sstream>
@@ -14,6 +15,7 @@
 #include "desk/results/pack.h"
 #include "desk/results/report.h"
 #include "desk/results/study.h"
+#include "desk/results/svg_plot.h"
 #include "unit_tests/results.h"
 
 namespace qv {
@@ -80,7 +82,7 @@ TEST_F(Archive, ComesBackAsItWentAndHoldsItsSchema) {
 
 TEST_F(Archive, IsATableForSpreadsheets) {
   Store store = Open("store.db");
-  store.Put({SomeRuns()[0], SomeRuns()[1]});
+  store.Put({SomeRuns()[0], SomeRuns()[1], RunOf("x\ry", nullptr, "-inf", "FAIL")});
   std::string table;
   ExportTable(store, {}, [&](const std::string& part) { table += part; });
   const std::string quoted = "\"<b>&\"\"'\n,;\xc3\xa4</script>\"";
@@ -88,6 +90,8 @@ TEST_F(Archive, IsATableForSpreadsheets) {
   EXPECT_THAT(table, HasSubstr("\r\n" + quoted + ",s,ann,L=1,plan,main,flash,PASS,0,1,2026-11-21T04:47:39Z,"));
   EXPECT_THAT(table, HasSubstr("," + quoted + ",0.30000000000000004\r\n"));
   EXPECT_THAT(table, HasSubstr(",,nan\r\n"));
+  EXPECT_THAT(table, HasSubstr("\r\n\"x\ry\","));
+  EXPECT_THAT(table, HasSubstr(",,-inf\r\n"));
 }
 
 struct JudgeCase {
@@ -256,6 +260,15 @@ TEST_F(Archive, IsStudiedWithoutWhatEndedInError) {
   run.record["phases"][0]["measurements"]["flash_mean"]["limits"]["min"] = 0.15;
   store.Put(run);
   EXPECT_TRUE(StudyFigures(store, {}, {}, {}, true).figures[1].bounds_vary);
+}
+
+TEST(SvgPlot, LiftsThePenOverGapsAndEscapesWords) {
+  SvgPanel panel;
+  panel.title = "a&b";
+  panel.series = {{"", {{1, 1}, {2, NAN}, {3, 1}, {4, 2}}}};
+  const std::string svg = SvgDocument({panel});
+  EXPECT_THAT(svg, HasSubstr(">a&amp;b<"));
+  EXPECT_EQ(1, std::count(svg.begin(), svg.end(), 'L')) << "one stroke, from 3 to 4";
 }
 
 // What a page holds, taken out of its HTML.

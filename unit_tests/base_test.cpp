@@ -80,6 +80,7 @@ TEST(JsonReader, ViewsNameTheWayToWhatIsWrong) {
 
 TEST(Text, TerminalsSeeNoControlAndWordsFindTheirNeighbour) {
   EXPECT_EQ("a\\x1b[31mb\\x0a\\xc2\\x9b\\xff\\xc0\\xaf\xc3\xa9", Printable("a\x1b[31mb\n\xc2\x9b\xff\xc0\xaf\xc3\xa9"));
+  EXPECT_EQ("\\x7f", Printable("\x7f"));
   EXPECT_EQ("ab...", Shortened("ab\xc3\xa9xyz", 6));
   EXPECT_EQ("; did you mean \"autofocus\"?", DidYouMean("autofcus", {"capture", "autofocus"}));
   EXPECT_EQ("", DidYouMean("video", {"capture", "autofocus"}));

@@ -85,6 +85,7 @@ TEST(Manifests, RowsBecomeJobs) {
   EXPECT_THAT(jobs[0].columns, ElementsAre(std::pair("my, column", "say \"hi\"\nthere")));
   EXPECT_EQ("SN2", jobs[1].unit);
   EXPECT_EQ("5\" wide", JobsOfManifest("path,note\na.jpg,5\" wide\n", "m", "").at(0).columns.at("note"));
+  EXPECT_THAT(JobsOfManifest("path2,path\nb,a\n", "m", "/l").at(0).inputs, ElementsAre("/l/a", "/l/b"));
   EXPECT_EQ(7U, std::stoul(JobsOfManifest(R"({"path": "a", "n": 7})", "m", "").at(0).columns.at("n")));
   EXPECT_EQ("m: row 2: 1 values for 2 columns", Sentence([] { JobsOfManifest("path,unit\na,b\nc\n", "m", ""); }));
   EXPECT_THAT(Sentence([] { JobsOfManifest("path\n\"a", "m", ""); }), HasSubstr("a quote stays open"));
@@ -98,6 +99,10 @@ TEST(Manifests, ShardsShareOutEveryJobOnce) {
   for (int i = 0; i < 300; ++i) {
     Job job;
     job.unit = "SN" + std::to_string(i);
+    job.inputs = {"/lots/" + job.unit + ".png"};
+    Job elsewhere = job;
+    elsewhere.inputs = {"/mnt/" + job.unit + ".png"};
+    EXPECT_EQ(FallsTo({1, 3}, job), FallsTo({1, 3}, elsewhere)) << "where a machine has mounted them";
     int times = 0;
     for (unsigned k = 1; k <= 3; ++k) {
       if (!FallsTo({k, 3}, job)) continue;
@@ -209,6 +214,7 @@ TEST_F(Batches, AWorkerThatHangsOrDiesCostsItsOwnUnit) {
   const int held = open(pipe.c_str(), O_RDWR);
   EXPECT_EQ(7U, Run(0.5).runs);
   EXPECT_THAT(Stored().at("hung"), HasSubstr("took longer than 0.5 s"));
+  EXPECT_EQ(1U, Run(0.5).runs) << "it is tried again";
 
   ASSERT_EQ(0, unlink(folder_.Path("results.db").c_str()));
   std::thread killer([] {
@@ -245,6 +251,9 @@ TEST_F(Batches, WhatComesBehindAHungStepIsMeasured) {
   job.unit = "u1";
   Store store(folder_.Path("results.db"), Store::Use::kWrite);
   RunBatch(plan, {job}, nullptr, store, options, [](const BatchProgress&) {});
+  plan.stop_on_error = true;
+  Store stopped(folder_.Path("stopped.db"), Store::Use::kWrite);
+  EXPECT_EQ(2U, RunBatch(plan, {job}, nullptr, stopped, options, [](const BatchProgress&) {}).runs);
   close(held);
   std::map<std::string, std::string> outcomes;
   store.EachRun({}, true, [&](const RunRow& row, StoredRun&& run) {

@@ -24,6 +24,9 @@ TEST_F(CameraProgram, PreviewMeasuresMotion) {
     EXPECT_GT(mean, 0.001);
   }
   EXPECT_EQ(0, Measured(Record("preview photo.png photo.png"), "camera_preview_difference_mean"));
+  Simulate("--scene preview --motion 0,0 --noise 4", "still.png");
+  EXPECT_GT(Measured(Record("preview still.png still.second.png"), "camera_preview_difference_mean"), 0.01)
+      << "each photo has noise of its own";
   ExpectComplaint("preview photo.png " + Simulate("--size 300x200", "small.png"), 3,
                   "of different sizes, 1200 x 900 and 300 x 200");
 }

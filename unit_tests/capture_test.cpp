@@ -45,7 +45,11 @@ TEST_F(Capture, SamplingStopsAtTheFirstPatchOutside) {
   EXPECT_THAT(theTester->GetColorPatchRGB(image.colRange(0, 120), {{20, 20}, {20, 230}, {400, 20}}), SizeIs(3));
   EXPECT_THAT(theTester->GetColorPatchRGB(image, {{20, 5}, {20, 215}, {400, 5}}), SizeIs(12));
   // A range may end exactly with the image.
-  EXPECT_THAT(theTester->GetColorPatchRGB(image, {{10, 10}, {10, 220}, {690, 10}}), SizeIs(24));
+  cv::Mat striped = image.clone();
+  for (int column = 0; column < 1000; column += 2) striped.col(column).setTo(cv::Scalar::all(51));
+  const auto patches = theTester->GetColorPatchRGB(striped, {{10, 10}, {10, 220}, {690, 10}});
+  EXPECT_THAT(patches, SizeIs(24));
+  EXPECT_EQ(cv::Point3i(50, 50, 50), patches[0]) << "means of 50.5 are cut";
   ExpectGolden("log_patches", LogLines::Text());
 }
 

@@ -88,18 +88,27 @@ TEST(Development, DenoisingEvensNoiseAndKeepsEdges) {
   }
 }
 
+// A Gaussian of 1.5 px, among levels that are near.
+TEST(Development, DenoisingWeighsNeighboursByTheirDistance) {
+  cv::Mat levels(9, 9, CV_32FC3, cv::Scalar::all(100));
+  levels.at<cv::Vec3f>(4, 4) = {101, 101, 101};
+  Denoise(1000, levels);
+  const auto lifted = [&](int column) { return levels.at<cv::Vec3f>(4, column)[1] - 100; };
+  EXPECT_NEAR(std::exp(-1 / 4.5), lifted(5) / lifted(4), 0.01);
+}
+
 // Lens and unsharp mask have their analytic responses; the truth's is taken from a picture of an edge.
 TEST(Development, TheSystemsFigureIsThatOfAllItsParts) {
-  for (const double amount : {0.5, 2.0}) {
+  for (const auto& [amount, blur] : {std::pair(0.5, 0.9), {2.0, 0.9}, {2.0, 0.4}}) {
     CameraModel camera;
-    camera.blur_px = 0.9;
+    camera.blur_px = blur;
     camera.sharpen = amount;
     camera.sharpen_radius_px = 1.5;
     camera.gain = 0.6;  // room for the overshoot
     const cv::Point2d along(std::sin(0.09), std::cos(0.09));
-    const auto response = [&](double f) {
+    const auto response = [&, share = amount](double f) {
       return LensResponse(camera, f, {along.y, -along.x}) *
-             (1 + amount * (1 - std::exp(-2 * std::pow(CV_PI * 1.5 * f, 2))));
+             (1 + share * (1 - std::exp(-2 * std::pow(CV_PI * 1.5 * f, 2))));
     };
     const Json truth = SystemTruth(camera, along, 2);
     const double mtf50 = 2 * method_law::HalfPoint(response, 1.0);

@@ -164,6 +164,7 @@ TEST(WithoutATester, HalfATesterIsNone) {
   EXPECT_EQ(-99, init(0)) << "no memory for a new result block";
   EXPECT_EQ(1, GetResult(&results)) << "the tester there is stays";
   FinalizeTestModule();
+  EXPECT_EQ(-96, GetResult(&results)) << "a tester that is gone";
 }
 
 }  // namespace

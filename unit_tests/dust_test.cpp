@@ -69,6 +69,12 @@ TEST_F(Dust, TheSearchSeesSizesAndLevelsAsTuned) {
     EXPECT_EQ(1, Measure(photo));
     EXPECT_EQ(bump - 1, Results().dust_blob_count_main_);
   }
+  for (const int level : {171, 172}) {  // of 49 pixels, 7 and 6 below a local mean that is rounded to 178
+    cv::Mat photo = DrawDust({});
+    photo(cv::Rect(300, 200, 7, 7)).setTo(level);
+    EXPECT_EQ(1, Measure(photo));
+    EXPECT_EQ(172 - level, Results().dust_blob_count_main_) << level;
+  }
   for (const int diameter : {7, 9, 13}) EXPECT_EQ(1, count(300, diameter)) << diameter;
   EXPECT_EQ(0, count(300, 31)) << "hollow in the binary picture";
   EXPECT_EQ(0, count(300, 9, 124)) << "too dark a photo to see any";

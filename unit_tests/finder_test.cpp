@@ -176,6 +176,8 @@ TEST(FinderSelection, StrayModuleSizesGoFirstThenTheLeastSeen) {
     EXPECT_THAT(tester.selectBestPatterns(), UnorderedElementsAre(cv::Point(1, 1), cv::Point(2, 2), cv::Point(3, 3)));
     EXPECT_THAT(tester.possibleCenters, SizeIs(3));
   }
+  tester.possibleCenters = {{1, 1, 10, 3}, {2, 2, 10, 2}, {3, 3, 10, 5}, {4, 4, 11.6f, 9}};  // 1.2 off 10.4
+  EXPECT_THAT(tester.selectBestPatterns(), ElementsAre(cv::Point(4, 4), cv::Point(3, 3), cv::Point(1, 1)));
   tester.possibleCenters.clear();
   for (int i = 1; i <= 8; ++i) tester.possibleCenters.emplace_back(0.0f, static_cast<float>(i), 10.0f, i);
   EXPECT_THAT(tester.selectBestPatterns(), ElementsAre(cv::Point(8, 0), cv::Point(7, 0), cv::Point(6, 0)));

@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 
+#include <cstdint>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 
@@ -154,6 +155,32 @@ TEST_F(Files, SizesOfExtendedWebPsAreReadInTheirOrder) {
                                        {small + large, "not an image"},
                                        {large + large, "too many pixels"}}) {
     const std::string file = start + size;
+    EXPECT_TRUE(QVResource::DecodePicture({file.begin(), file.end()}, reason).empty());
+    EXPECT_THAT(reason, HasSubstr(expected));
+  }
+}
+
+// Rows stored from the top are a height below 0; a big TIFF's numbers have eight bytes; a JPEG 2000's size is less its
+// origin.
+TEST_F(Files, SizesAreReadWhereTheirFormatsKeepThem) {
+  std::string bmp = ReadFile(folder_.Write("a.bmp", cv::Mat(9, 20, CV_8UC3, cv::Scalar(3))));
+  EXPECT_EQ(1, LoadInto(17, folder_.Write("top.bmp", bmp.replace(22, 4, "\xF7\xFF\xFF\xFF"))));
+  const auto number = [](std::uint64_t value, int bytes, bool big) {
+    std::string text;
+    for (int i = 0; i < bytes; ++i) text += static_cast<char>(value >> 8 * (big ? bytes - 1 - i : i) & 255);
+    return text;
+  };
+  const auto entry = [&](int tag) { return number(tag, 2, false) + number(4, 2, false) + number(1, 8, false); };
+  const std::string tiff = "II+" + std::string("\0\x08\0\0\0", 5) + number(16, 8, false) + number(2, 8, false) +
+                           entry(256) + number(20000, 8, false) + entry(257) + number(20000, 8, false);
+  const auto jpeg_2000 = [&](int origin) {
+    return "\xFF\x4F\xFF\x51" + number(41, 4, true) + number(40000, 4, true) + number(40000, 4, true) +
+           number(origin, 4, true) + number(origin, 4, true);
+  };
+  std::string reason;
+  for (const auto& [file, expected] : {std::pair{tiff, "too many pixels"},
+                                       {jpeg_2000(9), "too many pixels"},
+                                       {jpeg_2000(39990), "not an image that can be decoded"}}) {
     EXPECT_TRUE(QVResource::DecodePicture({file.begin(), file.end()}, reason).empty());
     EXPECT_THAT(reason, HasSubstr(expected));
   }

@@ -143,6 +143,21 @@ struct Shown {
   }
 };
 
+TEST(Lcd, WhiteIsOfEqualSharesAndGreenIsEven) {
+  for (const auto& [red, verdict] : {std::pair(224, 1), {240, 0}}) {  // shares off by 0.04 and 0.07
+    Shown shown;
+    shown.screen.setTo(cv::Scalar((600 - red) / 2, (600 - red) / 2, red));
+    EXPECT_EQ(verdict, shown.Judge(QV_LCD_WHITE).verdict_) << red;
+  }
+  Shown shown;
+  shown.screen.setTo(cv::Scalar(0, 200, 0));
+  shown.screen.colRange(0, 133).setTo(cv::Scalar(0, 150, 0));
+  for (const float least : {0.7f, 0.8f}) {
+    shown.lcd.min_uniformity_ = least;
+    EXPECT_EQ(least < 0.75f ? 1 : 0, shown.Judge(QV_LCD_GREEN).verdict_) << shown.result.reason_;
+  }
+}
+
 TEST(Lcd, DotsCountFromTheLeastOfPixelsAndAboveTheNoise) {
   const LogLines log;
   Shown s;

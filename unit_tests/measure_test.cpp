@@ -93,6 +93,7 @@ TEST(Measure, RequestsThatCantBeRunAreRefusedInASentence) {
            {{"circle_check", photo, {{"camera", 1}}}, "camera: 1 is none of 0, 2"},
            {{"lcd", photo}, "pattern is needed"},
            {{"camera_capture", photo, {{"reference", {{9, 95, 0}}}}}, "neither a capture record nor numbers"},
+           {{"camera_capture", photo, {{"reference", {{9, 95, 0, 1e5}}}}}, "neither a capture record nor numbers"},
            {{"circle_check", photo, {{"raw", "640x481"}}}, "an NV21 frame has an even width and height"},
            {{"hdr_dots", photo, {{"channel", "cyan"}}}, "none of red, green, blue"},
            {{"lens_dust", photo, {{"reference", {1, 2}}}}, "neither a dust record nor 256 whole numbers"},
@@ -157,6 +158,22 @@ TEST(Measure, AListIsHeldAgainstItsLimitsEntryByEntry) {
     EXPECT_EQ(marginal, "[" + near + "]") << limit;
     EXPECT_EQ(marginal != std::string("[]"), m.marginal) << limit;
   }
+}
+
+TEST(Measure, IdenticalFramesAreDrawnWithoutDifference) {
+  const cv::Mat frame = DustPhoto(0.92);
+  const Record record = MeasureAnew({"camera_preview", {frame, frame}});
+  cv::Mat least;  // the map's darkest colour
+  cv::inRange(DecodePng(record.finding->Draw(record)->Png()), cv::Scalar(82, 0, 66), cv::Scalar(86, 3, 70), least);
+  EXPECT_GT(cv::countNonZero(least), 390 * 290);
+}
+
+TEST(Measure, OfManyBrokenEntriesTheNumberIsTold) {
+  const Json limits = {{"limits", {{"lens_dust_histogram", {{"each", {{"max", -1}}}}}}}};
+  QVTester tester;
+  const Record record = Measure(tester, {"lens_dust", {DustPhoto(0.92)}}, LimitsFromJson(limits, "limits"));
+  EXPECT_EQ(Outcome::kFail, record.outcome());
+  EXPECT_THAT(record.MissSentence(), HasSubstr(" and 246 more"));
 }
 
 TEST(Measure, OnlyARequestToPublishReachesTheStore) {

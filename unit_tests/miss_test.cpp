@@ -88,6 +88,12 @@ TEST(Miss, TheThirdMarksPlaceIsTold) {
   cv::Mat covered = photo.clone();
   cv::circle(covered, corner, 20, cv::Scalar::all(235), cv::FILLED);
   expect(covered, corner, MissCause::kCovered, "nothing dark is there: is it covered?");
+  QVTester tester;
+  for (const Mark& mark : LookAtChart(tester.FindChart(photo, 125)).marks) {
+    covered = photo.clone();
+    cv::circle(covered, mark.centre, 20, cv::Scalar::all(235), cv::FILLED);
+    expect(covered, mark.centre, MissCause::kCovered, "nothing dark is there: is it covered?");
+  }
   covered = photo.clone();  // from its middle to the left
   cv::rectangle(covered, corner - cv::Point2d(30, 30), corner + cv::Point2d(-3, 30), cv::Scalar::all(20), cv::FILLED);
   expect(covered, corner, MissCause::kCovered, "its bands along the row are ");

@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <cmath>
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 
@@ -61,6 +62,7 @@ TEST_F(PanelPhotos, LightsAreMeasuredRegionByRegion) {
   EXPECT_EQ(3, record.phase.Find("area_count")->value());
   const Reading& areas = *record.phase.Find("areas");
   EXPECT_NEAR(simulation.truth["spots"].size(), areas.values.size(), 0);
+  EXPECT_NEAR(simulation.truth["spots"][0]["side_px"], record.phase.Find("area_width")->values.at(0), 2);
   EXPECT_EQ(Json({199, 0, 9, 9, 0}),
             MeasureAnew({"touch_panel_led", {photo}, {{"regions", "199,0,9,9"}}}).request.parameters["regions"][0]);
 
@@ -88,7 +90,11 @@ TEST_F(PanelPhotos, PrintsAreHeldAgainstTheFilesOfAFolder) {
   options.samples = 3;
   const Simulation simulation = Simulate(options);
   const std::vector<std::string> paths = Write(options, simulation);
+  folder_.Write("samples/.half.png", std::string("still being copied"));
   const Request request = {"touch_panel_print", {paths[0], folder_.Path("samples")}};
+  const Json& move = simulation.truth["matrix"];
+  for (const auto& [place, sign] : {std::pair(1, 1), {3, -1}})
+    EXPECT_NEAR(sign * std::sin(CV_PI / 90), move[place], 1e-9);
   const Record record = MeasureAnew(request);
   ASSERT_EQ(1, record.phase.code) << record.MissSentence();
   EXPECT_EQ(4U, record.inputs.size());

@@ -66,7 +66,9 @@ TEST_F(PictureProgram, WhatCanNotBeSearchedForDotsIsTold) {
   EXPECT_THAT(err_, HasSubstr("smaller than the window, 301 x 301 pixels"));
   // Single pixels apart from each other: nothing joins them.
   folder_.Write("panel.tif", cv::repeat(cv::Mat_<float>({2, 2}, {5.0F, 1.0F, 1.0F, 1.0F}), 150, 200));
-  EXPECT_EQ("ERROR", Record("dots panel.tif --threshold 0.7", 3)["outcome"]);
+  const json noise = Record("dots panel.tif --threshold 0.7", 3);
+  EXPECT_EQ("ERROR", noise["outcome"]);
+  EXPECT_FALSE(noise["phases"][0]["measurements"].contains("hdr_dots_area_count")) << "none is not what was found";
   EXPECT_THAT(err_, HasSubstr("30000 separate dots are noise"));
   cv::Mat hole(300, 400, CV_32FC1, cv::Scalar(1));
   hole.at<float>(100, 100) = NAN;

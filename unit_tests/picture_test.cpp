@@ -104,6 +104,15 @@ TEST(Labels, LieInsideAndOverNothingThatIsToBeSeen) {
   }
 }
 
+TEST(Labels, FarOnesAreTiedToTheirThing) {
+  Labels labels({0, 0, 300, 200});
+  Picture picture(300, 200);
+  const cv::Rect2d crowd(80, 40, 140, 120);
+  labels.Keep(crowd);
+  labels.Add(picture, {"a"}, {150, 100, 1, 1}, kGood);
+  EXPECT_GT(cv::countNonZero(MaskOf(Decode(picture)(crowd), OnLabel(kGood), 60)), 30) << "a stroke over the crowd";
+}
+
 // After an error cairo draws nothing more and says nothing: the picture would look finished.
 TEST(Picture, APictureThatLostAStrokeIsNotHandedOut) {
   Picture picture(40, 20);
@@ -155,6 +164,25 @@ TEST(Plot, CurvesAndMarkersLieWhereTheAxesSay) {
   const cv::Rect marker = cv::boundingRect(MaskOf(drawn, OnPaper(kPoor), 20));
   EXPECT_NEAR(kFrame.x + 0.25 * kFrame.width, marker.x + marker.width / 2.0, 1);
   EXPECT_NEAR(kFrame.y + 0.5 * kFrame.height - 6, marker.y, 2);
+}
+
+TEST(Plot, AxesNeedNotBeginAtZeroAndASecondHasItsOwnNumbers) {
+  Plot plot;
+  plot.y_min = 10;
+  plot.y_max = 12;
+  plot.markers = {{{0.5, 11}, "", kPoor}};
+  Picture picture(400, 300);
+  DrawPlot(picture, plot, {0, 0, 400, 300});
+  EXPECT_NEAR(kFrame.y + 0.5 * kFrame.height - 6, cv::boundingRect(MaskOf(Decode(picture), OnPaper(kPoor), 20)).y, 2);
+  plot.second_x_label = "c/p";
+  std::vector<std::string> drawn;
+  for (const double factor : {1.0, 0.5}) {
+    plot.second_x_factor = factor;
+    Picture both(400, 300);
+    DrawPlot(both, plot, {0, 0, 400, 300});
+    drawn.push_back(both.Png());
+  }
+  EXPECT_NE(drawn[0], drawn[1]);
 }
 
 // Each part is drawn, in its colour, where it should be: without it that place is empty.

@@ -50,6 +50,10 @@ TEST(Refine, ARoughMapBecomesAFineOne) {
     EXPECT_GT(tester.RefineUnwarp(reference, photo, map), 0.9f);
     EXPECT_LT(Apart(truth, map, reference.size()), 0.1) << "turn " << turn << " scale " << scale;
   }
+  cv::Mat third = Motion(reference.size(), 1, 1, {200, 0});
+  cv::Mat beside = Photograph(reference, third, 1);
+  cv::extractChannel(beside, beside, 0);
+  EXPECT_GT(tester.RefineUnwarp(reference, beside, third), 0.9f) << "two fifths overlap";
   const cv::Mat blank(240, 320, CV_8UC1, cv::Scalar(9));
   const cv::Mat start = Motion(reference.size(), 1, 1, {});
   const cv::Mat beyond = Motion(reference.size(), 1, 1, {900, 0});

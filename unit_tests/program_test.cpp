@@ -192,6 +192,7 @@ TEST_F(Program, DoubtfulFindsNeverPass) {
   const json accepted = Record("circles marks.png --limits limits.json");
   EXPECT_EQ("PASS", accepted["outcome"]);
   EXPECT_EQ("accepted doubt", accepted["outcome_details"][0]["weight"]);
+  EXPECT_EQ(json::array({"implausible_marks"}), accepted["metadata"]["limits"]["accept_doubts"]);
 }
 
 TEST_F(Program, BadInputIsACodeAndASentence) {

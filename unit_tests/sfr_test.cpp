@@ -94,6 +94,18 @@ TEST(SfrSteps, KernelsFollowTheBrighterSide) {
   EXPECT_EQ(-0.5f, first_tap());
 }
 
+// Beyond 2^24 a sum of whole levels is rounded: then its order counts.
+TEST(SfrSteps, SumsOfVeryTallRegionsAreTakenInThePlainOrder) {
+  cv::Mat region(140'000, 8, CV_8UC1);
+  cv::randu(region, 200, 256);
+  region.convertTo(region, CV_32F);
+  QVTester tester;
+  EXPECT_EQ(plain::Bits(Values(plain::ProjectData(region, 3e-5f, 1))),
+            plain::Bits(Values(tester.ProjectData(region, 3e-5f, 0, 1))));
+  const cv::Mat square = region.rowRange(0, 8);
+  EXPECT_EQ(square.data, tester.ConvertToVertical(square).data) << "only a wider one is turned";
+}
+
 TEST(SfrSteps, TheDerivativeCorrelatesAndFillsItsFirstColumn) {
   QVTester tester;
   const cv::Mat rows = (cv::Mat_<float>(2, 5) << 0, 1, 4, 9, 16, 5, 5, 5, 5, 7);

@@ -141,6 +141,7 @@ TEST_F(Simulator, APhoneDoesAllOfIt) {
   const json record = Record("capture " + Simulate("--pipeline phone --gain 0.8 --falloff 0 --noise 0.5", "p.jpg"));
   const json truth = Truth("p");
   EXPECT_EQ("srgb", truth["parameters"]["transfer"]);
+  EXPECT_EQ("bayer", truth["parameters"]["mosaic"]);
   EXPECT_EQ(0, truth["parameters"]["falloff_percent"]) << "what is given goes before the pipeline";
   for (const char* edge : {"vertical", "horizontal"}) {
     EXPECT_GT(truth["mtf50"][edge]["system"]["light"]["mtf50_nyquist"], truth["mtf50"][edge]["mtf50_nyquist"]);

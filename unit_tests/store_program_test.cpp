@@ -56,6 +56,12 @@ TEST_F(StoreProgram, ShowsJudgesAndReportsWhatWasMeasured) {
   EXPECT_THAT(Read("tests.xml"), HasSubstr("SN&lt;1&gt;"));
   EXPECT_EQ(0, Run("report record.json -o one.html").status);
   EXPECT_EQ(0, Run("export store.db -o all.jsonl").status);
+  json line = json::parse(Read("all.jsonl"));
+  line["pictures"] = {{{"name", "a.png"}, {"mimetype", "image/png"}, {"content", "iVBORw=="}}};
+  Write("pictured.jsonl", line.dump());
+  Run("import pictured.jsonl -o pictured.db");
+  EXPECT_THAT(Run("export pictured.db -o -").out, HasSubstr("iVBORw=="));
+  EXPECT_THAT(Run("export pictured.db -o - --no-pictures").out, Not(HasSubstr("iVBORw==")));
   EXPECT_THAT(Run("import all.jsonl -o store.db").out, HasSubstr("1 run read, 0 new"));
   EXPECT_EQ(json::parse(Read("record.json")), json::parse(Read("all.jsonl"))["record"]);
 }

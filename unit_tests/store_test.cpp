@@ -106,6 +106,7 @@ TEST_F(Store, TakesWordsForDataWhateverTheySay) {
   const std::string kept = "'; DROP TABLE run; --\" :x \\ <b>\xef\xbf\xbd\xc3\xa4";  // what is no UTF-8 is replaced
   EXPECT_EQ(1, store.Count({{"lot", "=", kept}, {kept, "=", kept}, {"unit", "=", kept}}));
   EXPECT_EQ(0, store.Count({{"lot", "=", "x' OR '1'='1"}}));
+  EXPECT_EQ(2, store.Count({{"limits_name", "=", "l"}, {"limits_revision", "=", "2"}}));
   EXPECT_THROW(store.Count({{"lot = '' OR 1", "=", "1"}}), Failure);
   EXPECT_THROW(store.Count({{"lot", "= '' OR 1 =", "1"}}), Failure);
   EXPECT_EQ(2, store.Count());
