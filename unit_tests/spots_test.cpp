@@ -72,6 +72,15 @@ TEST(Spots, AreSeenWhereTheyStandNineTimesOutOfTheNoise) {
   EXPECT_LE(false_ones, 0.1 * count);
 }
 
+// Between neighbours it shows in a step or two of the levels, and in some tiles in one where others show two.
+TEST(Spots, NoiseOfAboutALevelMakesNone) {
+  std::size_t found = 0;
+  for (const double levels : {0.7, 0.8, 0.9, 1.0, 1.1, 1.3}) {
+    found += qv::FindSpots(Photo({{900, 600}, levels / 255, 0, 7}, {})).spots.size();
+  }
+  EXPECT_LE(found, 1U);
+}
+
 TEST(Spots, EmptyTargetsHaveNone) {
   for (const double noise : {0.0, 0.005, 0.03}) {
     for (const double shading : {0.0, 0.6}) {

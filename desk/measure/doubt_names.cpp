@@ -19,7 +19,7 @@ const std::vector<DoubtInfo>& Doubts() {
       {Doubt::kUnevenPatches, "uneven_patches", "a patch is not of one colour"},
       {Doubt::kNoPlainTarget, "no_plain_target", "dust was looked for on what is no plain, evenly lit target"},
       {Doubt::kLargeDarkAreas, "large_dark_areas",
-       "a plain target has dark areas that are larger than any counted blob"},
+       "a plain target has dark areas over 14 px wide that are no counted blob"},
       {Doubt::kTooManySpots, "too_many_spots", "a plain target has more spots than dust makes"},
       {Doubt::kDotsInNoise, "dots_in_noise", "the picture's own noise would give dots at this threshold"},
       {Doubt::kTooManyDots, "too_many_dots", "a region shows more dots than defects make"},

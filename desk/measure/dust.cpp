@@ -163,7 +163,16 @@ std::optional<Picture> DustFinding::Draw(const Record& record) const {
 
 constexpr double kMostClipped = 0.01;      // of the photo's pixels
 constexpr double kDarkestOfTarget = 0.45;  // its darkest parts over its middle level
-constexpr double kLargestBlobPx = 16;
+constexpr double kSurelyBlobPx = 14;       // discs up to 16 px across are counted, as far as their contrast goes
+constexpr double kLeastContrast = 0.03;    // of a large spot; fainter ones are the lamp's as well as the lens's
+
+bool IsLargeAndUncounted(const Spot& spot, const std::vector<cv::KeyPoint>& blobs) {
+  const double width = spot.diameter_px();
+  if (width <= kSurelyBlobPx || spot.contrast < kLeastContrast) return false;
+  return std::none_of(blobs.begin(), blobs.end(), [&](const cv::KeyPoint& blob) {
+    return cv::norm(cv::Point2d(blob.pt) - spot.centre) < width / 2;
+  });
+}
 
 class Dust : public Measurement {
  public:
@@ -298,12 +307,12 @@ class Dust : public Measurement {
           "histogram");
     }
     const auto large = std::count_if(finding.spots.spots.begin(), finding.spots.spots.end(),
-                                     [](const Spot& spot) { return spot.diameter_px() > kLargestBlobPx; });
+                                     [&](const Spot& spot) { return IsLargeAndUncounted(spot, finding.blobs); });
     if (large > 0) {
       record.Say(
           Doubt::kLargeDarkAreas,
-          Format("%s: %s larger than the discs of 4 to %.0f px that blobs are counted by: see the spots", path,
-                 Count(static_cast<std::size_t>(large), "dark area is", "dark areas are").c_str(), kLargestBlobPx),
+          Format("%s: %s wider than %.0f px and not among the blobs, which are discs of 4 to 16 px: see the spots",
+                 path, Count(static_cast<std::size_t>(large), "dark area is", "dark areas are").c_str(), kSurelyBlobPx),
           "spot_largest_area");
     }
   }

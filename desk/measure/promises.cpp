@@ -114,6 +114,9 @@ const std::vector<Promise>& Promises() {
       {"doubts_false", kAtMost, 1, " %", "good own MTF50 doubted: noise to 1 %, light falling by 10 % at most"},
       {"doubts_patches", kAtMost, 0, "", "photos with a patch off by over 3 and no doubt, pan and tilt to 15 degrees"},
       {"doubts_dots", kAtLeast, 90, " %", "float pictures with a dot that noise made that are doubted"},
+      {"doubts_dust", kAtLeast, 90, " %",
+       "photos whose blobs say nothing, or were not counted as drawn, that are doubted"},
+      {"doubts_dust_false", kAtMost, 1, " %", "photos of plain targets, counted as drawn, that are doubted"},
       {"doubts_maps", kAtMost, 3, " %", "maps that pass without a doubt and are off by over 3 px"},
       {"misses_named", kAtLeast, 90, " %", "charts not found, of nine known causes, that are told the true one first"},
   };

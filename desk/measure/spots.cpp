@@ -53,6 +53,19 @@ double MedianOf(std::vector<float>& values) {
   return *middle;
 }
 
+// Of values that were rounded to whole `step`s and none below 0: as if those of a step lay evenly over it. The median
+// itself would jump from step to step where noise is not many times as large.
+double MedianOfRounded(std::vector<float>& values, double step) {
+  if (values.empty()) return 0;
+  const double median = MedianOf(values);
+  const double begin = std::max(median - step / 2, 0.0);
+  const double end = median + step / 2;
+  const auto below = std::count_if(values.begin(), values.end(), [=](float v) { return v < begin; });
+  const auto until = std::count_if(values.begin(), values.end(), [=](float v) { return v < end; });
+  const double missing = static_cast<double>(values.size()) / 2 - static_cast<double>(below);
+  return begin + (end - begin) * missing / static_cast<double>(until - below);
+}
+
 // Every so many-th value is sampled, about 100000 in all; odd, so that columns change from row to row.
 std::size_t SampleStep(const cv::Mat& map) { return map.total() / 100000 * 2 + 1; }
 
@@ -312,7 +325,7 @@ cv::Mat NoiseByTiles(const Photo& photo) {
       photo.Read(tile.y + row, tile.x, v);
       for (int c = 4; c + 4 < tile.width; c += 3) off.push_back(std::abs(v[c] - 0.5f * (v[c - 4] + v[c + 4])));
     }
-    noise.at<float>(y, x) = static_cast<float>(1.4826 * MedianOf(off) / std::sqrt(1.5));
+    noise.at<float>(y, x) = static_cast<float>(1.4826 * MedianOfRounded(off, photo.step() / 2) / std::sqrt(1.5));
   }
   return noise;
 }
@@ -656,7 +669,7 @@ Target LookAtTarget(const Photo& photo) {
   const Surface surface = FitSurface(blocks);
   cv::Mat noise = NoiseByTiles(photo);
   // A spot must then be deeper than the edges that rounding makes.
-  target.stepped = cv::countNonZero(noise < 0.75 * photo.step()) * 2 > noise.size().area();
+  target.stepped = cv::countNonZero(noise < 0.9 * photo.step()) * 2 > noise.size().area();
   noise = cv::max(noise, 0.5 * photo.step());
   cv::resize(noise, noise, blocks.size(), 0, 0, cv::INTER_LINEAR);
   target.relative = OverNoise(photo, surface, noise);
