@@ -135,6 +135,15 @@ void Propose(const Study& study, double cpk, const std::string& output) {
   WriteOutput(output, file.dump(2, ' ', false, Json::error_handler_t::replace) + "\n");
 }
 
+std::int64_t Wrong(const LimitTrial& trial) { return trial.escapes + trial.false_rejects; }
+
+// The first of those with the fewest wrong verdicts.
+const LimitTrial& Best(const LabelStudy& labels) {
+  return *std::min_element(labels.trials.begin(), labels.trials.end(),
+                           [](const LimitTrial& a, const LimitTrial& b) { return Wrong(a) < Wrong(b); });
+}
+
+// Shares change at the readings only: a minimum's just above each, a maximum's at it.
 SvgPanel PanelOf(const FigureStudy& figure, const LabelStudy& labels) {
   SvgPanel panel;
   panel.title = TitleOf(figure);
@@ -143,11 +152,18 @@ SvgPanel PanelOf(const FigureStudy& figure, const LabelStudy& labels) {
   SvgSeries escapes = {"escapes", {}, 0};
   SvgSeries rejects = {"false rejects", {}, 1};
   for (const LimitTrial& trial : labels.trials) {
-    escapes.points.emplace_back(trial.limit, static_cast<double>(trial.escapes) / static_cast<double>(labels.bad));
-    rejects.points.emplace_back(trial.limit,
-                                static_cast<double>(trial.false_rejects) / static_cast<double>(labels.good));
+    for (const auto& [series, count, all] :
+         {std::tuple(&escapes, trial.escapes, labels.bad), {&rejects, trial.false_rejects, labels.good}}) {
+      const double share = static_cast<double>(count) / static_cast<double>(all);
+      if (!series->points.empty()) {
+        const auto [limit, before] = series->points.back();
+        series->points.emplace_back(labels.low_is_bad ? limit : trial.limit, labels.low_is_bad ? share : before);
+      }
+      series->points.emplace_back(trial.limit, share);
+    }
   }
   panel.series = {escapes, rejects};
+  panel.lines = {{Best(labels).limit, Format("fewest of both: %.4g", Best(labels).limit)}};
   return panel;
 }
 
@@ -167,17 +183,14 @@ std::string LabelText(const FigureStudy& figure, const LabelStudy& labels) {
   };
   const LimitTrial* no_escape = nullptr;
   const LimitTrial* no_reject = nullptr;
-  const LimitTrial* fewest = nullptr;
   for (const LimitTrial& trial : labels.trials) {
-    const auto sum = [](const LimitTrial* t) { return t->escapes + t->false_rejects; };
     if (trial.escapes == 0 && (no_escape == nullptr || trial.false_rejects < no_escape->false_rejects))
       no_escape = &trial;
     if (trial.false_rejects == 0 && (no_reject == nullptr || trial.escapes < no_reject->escapes)) no_reject = &trial;
-    if (fewest == nullptr || sum(&trial) < sum(fewest)) fewest = &trial;
   }
   show("without an escape", no_escape);
   show("without a false reject", no_reject);
-  show("fewest of both", fewest);
+  show("fewest of both", labels.trials.empty() ? nullptr : &Best(labels));
   return text;
 }
 
