@@ -7,8 +7,10 @@
 #include <cstdio>
 #include <map>
 #include <mutex>
+#include <numeric>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -143,13 +145,14 @@ char Expected(const std::string& shown, int asked, int quarters) {
 }
 
 // A third each: light as it is, by sRGB, by sRGB and JPEG; any noise, exposure, cast, ambient light and dim corner.
-Display PatternPhoto(int i, const std::string& shown, int quarters) {
+Display PatternPhoto(int i, const std::string& shown, int quarters, std::optional<double> ambient) {
   cv::RNG random(0x9E3779B97F4A7C15 * (static_cast<std::uint64_t>(i) + 1));
   Setting setting = {"", {800, 600}, random.uniform(0.6, 1.5), random.uniform(0.5, 3.0)};
   setting.srgb = i / 24 % 3 > 0;
   setting.jpeg = i / 24 % 3 > 1 ? random.uniform(60, 96) : 0;
   setting.exposure_ev = random.uniform(-0.5, 0.3);
   setting.veil = random.uniform(0.0, setting.srgb ? 1.0 : 20.0);
+  if (ambient) setting.veil = *ambient * 255;
   SimulationOptions view = Draw(i + 1000, shown, setting);
   view.camera.turn_deg = 90 * quarters + std::remainder(view.camera.turn_deg, 20);
   view.camera.cast = {random.uniform(0.94, 1.06), 1, random.uniform(0.94, 1.06)};
@@ -158,40 +161,64 @@ Display PatternPhoto(int i, const std::string& shown, int quarters) {
   return Photograph(view, setting);
 }
 
-void PrintPatterns(int photos) {
-  std::map<std::string, std::array<int, 5>> ones;
+struct Judged {
+  std::map<std::string, std::array<int, 5>> ones;  // verdicts of 1 by what is shown, and what is asked for
   std::map<std::string, int> counts;
+  std::array<int, 5> wrong = {};  // by what is asked for
+};
+
+// With ambient light of this share of white's, or of any.
+Judged JudgePhotos(int photos, std::optional<double> ambient = {}) {
+  Judged judged;
   std::mutex mutex;
-  int wrong = 0;
   ForEach(photos, [&](int i) {
     const std::string& shown = kDisplayPatterns[i % kDisplayPatterns.size()];
     const int quarters = i / static_cast<int>(kDisplayPatterns.size()) % 4;
-    const Display display = PatternPhoto(i, shown, quarters);
+    const Display display = PatternPhoto(i, shown, quarters, ambient);
     const std::string row = shown == "control" && (quarters == 1 || quarters == 2) ? "control, reversed" : shown;
     for (int asked = 0; asked < 5; ++asked) {
       QVTester_LCD lcd;
       QVLcdResult result;
-      const bool judged = lcd.JudgePattern(display.photo, static_cast<QV_LCD_PATTERN>(asked), &result) == QV_SUCCESS;
+      const bool done = lcd.JudgePattern(display.photo, static_cast<QV_LCD_PATTERN>(asked), &result) == QV_SUCCESS;
       const std::lock_guard<std::mutex> lock(mutex);
-      if (judged) ones[row][asked] += result.verdict_;
+      if (done) judged.ones[row][asked] += result.verdict_;
       const char expected = Expected(shown, asked, quarters);
-      if (!judged || (expected != '*' && result.verdict_ != expected - '0')) {
-        ++wrong;
+      if (!done || (expected != '*' && result.verdict_ != expected - '0')) {
+        ++judged.wrong[asked];
         std::fprintf(stderr, "photo %d, %s asked for %s: %s\n", i, row.c_str(), kAsked[asked], result.reason_.c_str());
       }
     }
     const std::lock_guard<std::mutex> lock(mutex);
-    ++counts[row];
+    ++judged.counts[row];
   });
+  return judged;
+}
+
+int Sum(const std::array<int, 5>& counts) { return std::accumulate(counts.begin(), counts.end(), 0); }
+
+void PrintPatterns(int photos) {
+  Judged judged = JudgePhotos(photos);
+  const int wrong = Sum(judged.wrong);
   std::printf("\nVerdicts of 1, by what is shown and what is asked for: %d photos, %d of %d judgements wrong\n\n",
               photos, wrong, 5 * photos);
   std::printf("| shown | photos | control | green | black | white | result |\n|---|---|---|---|---|---|---|\n");
-  for (const auto& [shown, count] : counts) {
+  for (const auto& [shown, count] : judged.counts) {
     std::printf("| %s | %d |", shown.c_str(), count);
-    for (int asked = 0; asked < 5; ++asked) std::printf(" %d |", ones[shown][asked]);
+    for (int asked = 0; asked < 5; ++asked) std::printf(" %d |", judged.ones[shown][asked]);
     std::printf("\n");
   }
   Hold("display_wrong", 20.0 * wrong / photos);
+}
+
+void PrintAmbient(int photos) {
+  std::printf("\nWrong judgements of %d each, by ambient light and what is asked for\n\n", photos);
+  std::printf("| ambient light, of white's | control | green | black | white | result |\n|---|---|---|---|---|---|\n");
+  for (const double ambient : {0.004, 0.012, 0.04}) {
+    const Judged judged = JudgePhotos(photos, ambient);
+    std::printf("| %.1f %% |", 100 * ambient);
+    for (const int wrong : judged.wrong) std::printf(" %d |", wrong);
+    std::printf("\n");
+  }
 }
 
 void Run() {
@@ -208,6 +235,7 @@ void Run() {
   Hold("display_corners", largest);
   Hold("display_jpeg", stored_as_jpeg);
   PrintPatterns(Trials(500, 20));
+  PrintAmbient(Trials(120, 24));
 }
 
 }  // namespace

@@ -225,7 +225,9 @@ class LightFinding : public Finding {
     constexpr double kKey = 34;
     const double width = std::max(640.0, photo_.cols * scale);
     const Heading heading(
-        record, Format("Lights: %zu regions, %zu areas of dots", regions.size(), areas.rectangles.size()), width);
+        record,
+        "Lights: " + Count(regions.size(), "region") + ", " + Count(areas.rectangles.size(), "area") + " of dots",
+        width);
     const double top = heading.height() + kKey;
     Picture picture(cvRound(width), cvRound(photo_.rows * scale + top));
     heading.Draw(picture);

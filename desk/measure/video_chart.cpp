@@ -50,11 +50,22 @@ class ChartFilmFinding : public FilmFinding {
     std::vector<double> angles = record.phase.Find("angle")->values;
     for (double& angle : angles) angle = angle < 0 ? std::numeric_limits<double>::quiet_NaN() : angle;
     Plot turning = OverTime("Angle of the chart, 315 is upright; none where it was not found", "angle, degrees", 360);
-    turning.curves.push_back(Course("angle", angles));
+    turning.curves.push_back(BrokenAtFullTurns(Course("angle", angles)));
     return {timing, turning};
   }
 
  private:
+  // From 359 degrees on to 0 the chart has hardly turned.
+  static Plot::Curve BrokenAtFullTurns(Plot::Curve curve) {
+    constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+    for (std::size_t i = 1; i < curve.points.size(); ++i) {
+      if (std::fabs(curve.points[i].y - curve.points[i - 1].y) <= 180) continue;
+      if (!std::isfinite(curve.points[i].y) || !std::isfinite(curve.points[i - 1].y)) continue;
+      curve.points.insert(curve.points.begin() + static_cast<std::ptrdiff_t>(i), {kNone, kNone});
+    }
+    return curve;
+  }
+
   std::string Places() const {
     std::string places;
     for (std::size_t i = 0; i < gaps_.size() && i < 5; ++i) {

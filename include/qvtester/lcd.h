@@ -77,7 +77,7 @@ class QV_API QVTester_LCD {
   float white_share_tolerance_ = 0.06f;  // departure of each share from a third
   float min_colour_level_ = 0.25f;       // the channel that shows
   float min_colour_share_ = 0.5f;        // its share
-  float max_black_level_ = 0.2f;         // each channel
+  float max_black_level_ = 0.25f;        // each channel; sRGB stores ambient light of 4 % of white's at 0.22
   float min_field_excess_ = 0.02f;       // result: mean excess of green, or red, over the other two
   float field_ratio_ = 3;                // and how many times the excess of the other colour it must be
   float margin_ = 0.02f;                 // of the shorter side: left out of all figures along the rim and between bars
