@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <cmath>
 #include <functional>
 #include <map>
 #include <opencv2/imgproc.hpp>
@@ -194,6 +195,12 @@ TEST(Lcd, BarsAreReadWithoutTheirRims) {
   EXPECT_EQ(1, s.Judge(QV_LCD_CONTROL).verdict_);
   cv::rectangle(s.screen, cv::Rect(0, 0, 400, 300), cv::Scalar::all(0), 5);
   EXPECT_EQ(1, s.Judge(QV_LCD_CONTROL).verdict_) << s.result.reason_;
+  s.lcd.margin_ = INFINITY;  // the middles are left
+  EXPECT_EQ(1, s.Judge(QV_LCD_CONTROL).verdict_) << s.result.reason_;
+  for (const float none : {0.0f, -1.0f, NAN}) {  // the black rim darkens the white bar
+    s.lcd.margin_ = none;
+    EXPECT_THAT(s.Judge(QV_LCD_CONTROL).reason_, HasSubstr("white")) << none;
+  }
 }
 
 TEST(Lcd, KeptCornersAreFoundAnewWhenAskedFor) {

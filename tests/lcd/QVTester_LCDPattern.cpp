@@ -32,10 +32,13 @@ Colour MeanOf(const cv::Mat& screen, const cv::Rect& part) {
   return {{bgr[2], bgr[1], bgr[0]}};
 }
 
-// What is left of a part when its rim is taken off; never nothing.
+// What is left of a part when its rim is taken off; never nothing, and never more than the part, whatever the margin.
 cv::Rect Inner(const cv::Rect& part, double margin) {
-  const int dx = std::min(static_cast<int>(std::ceil(margin)), (part.width - 1) / 2);
-  const int dy = std::min(static_cast<int>(std::ceil(margin)), (part.height - 1) / 2);
+  const auto rim = [margin](int length) {
+    return margin > 0 ? static_cast<int>(std::min(std::ceil(margin), (length - 1) / 2 * 1.0)) : 0;
+  };
+  const int dx = rim(part.width);
+  const int dy = rim(part.height);
   return {part.x + dx, part.y + dy, part.width - 2 * dx, part.height - 2 * dy};
 }
 
