@@ -160,14 +160,6 @@ TEST(Measure, AListIsHeldAgainstItsLimitsEntryByEntry) {
   }
 }
 
-TEST(Measure, IdenticalFramesAreDrawnWithoutDifference) {
-  const cv::Mat frame = DustPhoto(0.92);
-  const Record record = MeasureAnew({"camera_preview", {frame, frame}});
-  cv::Mat least;  // the map's darkest colour
-  cv::inRange(DecodePng(record.finding->Draw(record)->Png()), cv::Scalar(82, 0, 66), cv::Scalar(86, 3, 70), least);
-  EXPECT_GT(cv::countNonZero(least), 390 * 290);
-}
-
 TEST(Measure, OfManyBrokenEntriesTheNumberIsTold) {
   const Json limits = {{"limits", {{"lens_dust_histogram", {{"each", {{"max", -1}}}}}}}};
   QVTester tester;

@@ -100,8 +100,8 @@ TEST(SfrSteps, SumsOfVeryTallRegionsAreTakenInThePlainOrder) {
   cv::randu(region, 200, 256);
   region.convertTo(region, CV_32F);
   QVTester tester;
-  EXPECT_EQ(plain::Bits(Values(plain::ProjectData(region, 3e-5f, 1))),
-            plain::Bits(Values(tester.ProjectData(region, 3e-5f, 0, 1))));
+  EXPECT_EQ(plain::Bits(Values(plain::ProjectData(region, -3e-5f, 1))),
+            plain::Bits(Values(tester.ProjectData(region, -3e-5f, 0, 1))));
   const cv::Mat square = region.rowRange(0, 8);
   EXPECT_EQ(square.data, tester.ConvertToVertical(square).data) << "only a wider one is turned";
 }
