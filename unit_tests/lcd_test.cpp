@@ -147,7 +147,7 @@ struct Shown {
 TEST(Lcd, WhiteIsOfEqualSharesAndGreenIsEven) {
   for (const auto& [red, verdict] : {std::pair(224, 1), {240, 0}}) {  // shares off by 0.04 and 0.07
     Shown shown;
-    shown.screen.setTo(cv::Scalar((600 - red) / 2, (600 - red) / 2, red));
+    shown.screen.setTo(cv::Scalar(300 - red / 2.0, 300 - red / 2.0, red));
     EXPECT_EQ(verdict, shown.Judge(QV_LCD_WHITE).verdict_) << red;
   }
   Shown shown;

@@ -35,7 +35,8 @@ Colour MeanOf(const cv::Mat& screen, const cv::Rect& part) {
 // What is left of a part when its rim is taken off; never nothing, and never more than the part, whatever the margin.
 cv::Rect Inner(const cv::Rect& part, double margin) {
   const auto rim = [margin](int length) {
-    return margin > 0 ? static_cast<int>(std::min(std::ceil(margin), (length - 1) / 2 * 1.0)) : 0;
+    const double most = std::floor((length - 1) / 2.0);
+    return margin > 0 ? static_cast<int>(std::min(std::ceil(margin), most)) : 0;
   };
   const int dx = rim(part.width);
   const int dy = rim(part.height);
