@@ -24,6 +24,7 @@
 #include "desk/measure/patch_trust.h"
 #include "desk/measure/robust_map.h"
 #include "desk/measure/sharpness.h"
+#include "desk/measure/spots.h"
 #include "desk/measure/uncertainty.h"
 #include "desk/simulation/method_law.h"
 #include "desk/simulation/simulation.h"
@@ -235,6 +236,39 @@ std::vector<Trial> TryFlash(const Condition& condition, cv::RNG& random) {
   return {mean, {share - clipped, OfShare(mask).expanded, clipped}};
 }
 
+// A plain target with one spot of 4 to 60 px, sharp or soft, that stands 10 to 100 times out of the noise.
+std::vector<Trial> TrySpots(const Condition& condition, cv::RNG& random) {
+  constexpr int kSide = 360;
+  const double sigma = condition.noise_percent * 2.55;
+  const double light = random.uniform(150.0, 200.0);
+  const double diameter = std::exp(random.uniform(std::log(4.0), std::log(60.0)));
+  const double out = std::exp(random.uniform(std::log(10.0), std::log(100.0)));
+  const double contrast = std::min(out * sigma / light / (diameter / 2 * std::sqrt(CV_PI)), 0.6);
+  const bool soft = random.uniform(0, 2) == 1;
+  const cv::Point2d at(kSide / 2.0 + random.uniform(-8.0, 8.0), kSide / 2.0 + random.uniform(-8.0, 8.0));
+  cv::Mat levels(kSide, kSide, CV_32F);
+  levels.forEach<float>([&](float& level, const int* place) {
+    const double r = cv::norm(cv::Point2d(place[1], place[0]) - at);
+    const double depth =
+        soft ? std::exp2(-4 * r * r / (diameter * diameter)) : std::clamp(diameter / 2 - r + 0.5, 0.0, 1.0);
+    level = static_cast<float>(light * (1 - contrast * depth));
+  });
+  const SpotFinding found = FindSpots(Photograph(condition, levels, condition.noise_percent, random));
+  const double noise = sigma / light;
+  std::vector<Trial> trials(3, {NAN, NAN, 1});
+  trials.push_back({found.noise - noise, found.of_noise.expanded, noise});
+  for (const Spot& spot : found.spots) {
+    if (cv::norm(spot.centre - at) > diameter) continue;
+    const double area = CV_PI / 4 * diameter * diameter;
+    const SpotTrust trust = found.Trust(spot);
+    trials[0] = {spot.area_px - area, trust.area.expanded, area};
+    trials[1] = {spot.contrast - contrast, trust.contrast.expanded, contrast};
+    trials[2] = {spot.centre.x - at.x, trust.place.expanded, diameter};
+    break;
+  }
+  return trials;
+}
+
 double ValueOf(const Json& truth, const char* name) { return truth.at(name).get<double>(); }
 
 // The marks of a chart photo, as a record has them.
@@ -325,6 +359,7 @@ const std::vector<Group> kGroups = {
       "difference 2000"},
      TryPatch},
     {Group::kFlat, {"mean level", "clipped share"}, TryFlash},
+    {Group::kFlat, {"area of a spot", "contrast of a spot", "place of a spot", "noise of a pixel"}, TrySpots},
     {Group::kChart, {"place of a mark", "module size", "legs' ratio", "legs' angle", "turn of the chart"}, TryMarks},
     {Group::kChart,
      {"shift, fixed map", "turn, fixed map", "a of all matches", "c of all matches", "maps apart"},
@@ -339,21 +374,28 @@ struct Miss {
 };
 constexpr char kCodecTakes[] = "the codec takes pixels off the largest level";
 constexpr char kTooWide[] = "U is rather too wide";
+constexpr char kJumps[] = "U is rather too wide: readings jump";
 constexpr char kRounds[] = "levels stand on few steps";
 constexpr Miss kMisses[] = {
     {"MTF30 ISO", "JPEG 75", "the codec's steps take high frequencies"},
     {"MTF10 ISO", "JPEG 75", "the codec's steps take high frequencies"},
+    {"MTF50 of the test", "noise 0.3 %", kJumps},
+    {"MTF50 of the test", "noise 5 %", kJumps},
     {"mean level", "JPEG 90", kTooWide},
     {"mean level", "JPEG 75", kTooWide},
     {"clipped share", "JPEG 90", kCodecTakes},
     {"clipped share", "JPEG 75", kCodecTakes},
     {"clipped share", "noise 0.3 %", kRounds},
+    {"area of a spot", "noise 0.3 %", kRounds},
+    {"place of a spot", "noise 0.3 %", kRounds},
     {"module size", "blur 2 px", "the inner squares read 1 % small"},
 };
 
 // Whole groups besides: no promise is made of them.
 const char* WhyMissed(const Group& group, const char* figure, const Condition& condition) {
-  if (group.run == TryMaps) return "the map's search ends before its best";
+  if (group.run == TryMaps) return kTooWide;
+  if (group.run == TrySpots && condition.jpeg != 0) return "the codec takes noise and faint spots";
+  if (figure == std::string("noise of a pixel")) return "its median stands on half levels";
   if (group.run == TryPatch && condition.jpeg == 75) return kTooWide;
   for (const Miss& miss : kMisses) {
     if (miss.figure == std::string(figure) && miss.condition == std::string(condition.name)) return miss.why;
@@ -429,6 +471,11 @@ int main(int count, char** arguments) {
       qv::PrintGroup(group, condition, trials, wanted, within);
     }
   }
-  if (words.empty()) Hold("coverage", 100 * within[0] / within[1]);
-  return AllKept() ? 0 : 1;
+  if (!words.empty()) return 0;
+  const double share = 100 * within[0] / within[1];
+  Hold("coverage", share);
+  constexpr double kMost = 97;  // uncertainties that always hold say too much; twelve readings a row can't tell
+  const bool wide = IsChecking() && trials == kFull && share > kMost;
+  if (wide) std::printf("promise coverage BROKEN: %.1f %%, at most %.0f %%\n", share, kMost);
+  return AllKept() && !wide ? 0 : 1;
 }

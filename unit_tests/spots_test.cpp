@@ -56,6 +56,22 @@ TEST(Spots, AreFoundAtAnySizeSharpOrSoftWithTheirAreaAndContrast) {
   }
 }
 
+struct Measured {
+  double diameter, contrast, area_px, seen_contrast;
+};
+
+// Figures that limits may rest on stay as they are when the search is made faster: areas to the pixel, contrasts to
+// 1e-4, which is what other orders of sums in single precision have moved them by.
+TEST(Spots, KeepTheirFigures) {
+  for (const Measured& m :
+       std::vector<Measured>{{6, 0.1, 36, 0.0819024}, {20, 0.05, 288, 0.0496250}, {60, 0.2, 2833, 0.2001039}}) {
+    const auto spots = qv::FindSpots(Photo({}, {{{250.3, 200.6}, m.diameter, m.contrast, false}})).spots;
+    ASSERT_EQ(1U, spots.size()) << m.diameter;
+    EXPECT_EQ(m.area_px, spots[0].area_px) << m.diameter;
+    EXPECT_NEAR(m.seen_contrast, spots[0].contrast, 1e-4) << m.diameter;
+  }
+}
+
 TEST(Spots, AreSeenWhereTheyStandNineTimesOutOfTheNoise) {
   int seen = 0;
   int false_ones = 0;

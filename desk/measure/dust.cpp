@@ -209,7 +209,7 @@ class Dust : public Measurement {
     cv::cvtColor(finding->photo, grey, cv::COLOR_RGB2GRAY);
     record.phase.Find("mean_level")->Trust({OfMeanLevel(grey, 1, MeanShift(StepsOf(request.inputs.at(0))))});
     finding->spots = FindSpots(finding->photo);
-    AddSpots(record, finding->spots);
+    AddSpots(record, finding->spots, static_cast<double>(finding->photo.total()));
     const double mean = record.phase.Find("mean_level")->value();
     if (mean < kDarkestToJudge) {
       record.Say(Remark::kNoJudgement, "too_dark",
@@ -260,10 +260,17 @@ class Dust : public Measurement {
     phase.Add("histogram_difference", front_ ? results.dust_hist_diff_front_ : results.dust_hist_diff_main_);
   }
 
-  static void AddSpots(Record& record, const SpotFinding& found) {
+  static void AddSpots(Record& record, const SpotFinding& found, double pixels) {
     Phase& phase = record.phase;
     std::vector<double> columns, rows, numbers, areas, contrasts;  // NOLINT(readability-isolate-declaration)
+    std::vector<Uncertainty> of_places, of_areas, of_contrasts;    // NOLINT(readability-isolate-declaration)
+    double squares = 0;
     for (const Spot& spot : found.spots) {
+      const SpotTrust trust = found.Trust(spot);
+      of_places.push_back(trust.place);
+      of_areas.push_back(trust.area);
+      of_contrasts.push_back(trust.contrast);
+      squares += trust.area.standard * trust.area.standard;
       columns.push_back(spot.centre.x);
       rows.push_back(spot.centre.y);
       numbers.push_back(static_cast<double>(numbers.size()));
@@ -271,12 +278,15 @@ class Dust : public Measurement {
       contrasts.push_back(spot.contrast);
     }
     phase.Add("spot_count", static_cast<double>(found.spots.size()));
-    phase.Add("spot_largest_area", found.largest_area);
-    phase.Add("spot_dark_share", found.dark_share);
-    phase.Add("spots", columns, rows);
-    phase.Add("spot_areas", numbers, areas);
-    phase.Add("spot_contrasts", numbers, contrasts);
-    phase.Add("noise", found.noise);
+    const auto largest = std::max_element(areas.begin(), areas.end());
+    Reading& largest_area = phase.Add("spot_largest_area", found.largest_area);
+    if (!areas.empty()) largest_area.Trust({of_areas[largest - areas.begin()]});
+    Reading& dark_share = phase.Add("spot_dark_share", found.dark_share);
+    if (!areas.empty()) dark_share.Trust({Combined(0, 1, std::sqrt(squares) / pixels, kSpotMethod)});
+    phase.Add("spots", columns, rows).Trust(std::move(of_places));
+    phase.Add("spot_areas", numbers, areas).Trust(std::move(of_areas));
+    phase.Add("spot_contrasts", numbers, contrasts).Trust(std::move(of_contrasts));
+    phase.Add("noise", found.noise).Trust({found.of_noise});
     if (!found.cut_short) return;
     record.Say(Doubt::kTooManySpots,
                record.inputs[0].path + ": more spots than a plain target has dust; is the target plain?", "spot_count");

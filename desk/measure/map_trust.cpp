@@ -14,6 +14,11 @@ using Covariance = cv::Matx<double, 6, 6>;
 
 constexpr int kParts = 8;  // of the picture in each direction
 
+// Type B: how much further off places and enlargements were seen than noise alone explains; pixels between pixels are
+// interpolated. Turns were not.
+constexpr double kPlaceWider = 1.35;
+constexpr double kEnlargementWider = 1.7;
+
 // Reference coordinates from the middle, in halves of the longer side: all six parameters are then pixels of the image.
 struct Frame {
   cv::Point2d middle;
@@ -138,6 +143,7 @@ void AddSlopes(const Overlap& seen, const Frame& frame, const Part& all, std::ve
 
 struct MapTrust {
   Covariance covariance;
+  Parameters step;         // what the search left to climb when it ended
   double correlation = 0;  // its standard uncertainty
   int parts = 0;           // that had their say
 };
@@ -167,8 +173,10 @@ MapTrust TrustOf(const Overlap& seen, const Frame& frame) {
   }
   const Covariance inverse = information.inv(cv::DECOMP_SVD);
   const double n = trust.parts;
-  const Parameters step = inverse * all_scores;  // what the search left to climb when it ended
-  trust.covariance = inverse * scores * inverse * (n / std::max(n - 6, 1.0)) + step * step.t();
+  trust.step = inverse * all_scores;
+  trust.covariance = inverse * scores * inverse * (n / std::max(n - 6, 1.0));
+  const Parameters wider(kEnlargementWider, 1, kPlaceWider, 1, kEnlargementWider, kPlaceWider);
+  trust.covariance = Covariance::diag(wider) * trust.covariance * Covariance::diag(wider);
   trust.correlation = Spread(without) * (n - 1) / std::sqrt(n);
   return trust;
 }
@@ -179,6 +187,27 @@ double Stretch(const Parameters& p) {
   cv::Vec2d enlargements;
   cv::SVD::compute(cv::Matx22d(p[0], p[1], p[3], p[4]), enlargements, cv::SVD::NO_UV);
   return enlargements[0] / enlargements[1];
+}
+
+// Of the distance from the fixed map to what the map of all may be, drawn many times (JCGM 101): no distance is below
+// 0, so that near it the law is not normal about the reading.
+Uncertainty OfDistance(const Frame& frame, const cv::Mat& fixed, const Parameters& best, const Covariance& covariance,
+                       const Phase& phase, cv::Size size) {
+  constexpr int kDraws = 400;
+  const double reading = phase.Find("map_distance")->value();
+  cv::Vec<double, 6> variances;
+  Covariance directions;
+  cv::eigen(covariance, variances, directions);
+  cv::RNG random(6);
+  std::vector<double> errors;
+  for (int i = 0; i < kDraws; ++i) {
+    Parameters draw = best;
+    for (int k = 0; k < 6; ++k) {
+      draw += directions.row(k).t() * (std::sqrt(std::max(variances[k], 0.0)) * random.gaussian(1));
+    }
+    errors.push_back(MapDistance(fixed, cv::Mat(frame.Map(draw)), size) - reading);
+  }
+  return FromErrors(std::move(errors), kResidualMethod);
 }
 
 }  // namespace
@@ -192,26 +221,26 @@ void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, con
   if (degrees < 1) return;
   const Parameters of_all = frame.From(robust.matrix);
   const Parameters of_three = frame.From(fixed);
-  const auto standard = [&](const auto& f) { return Propagated<6>(f, of_all, trust.covariance, 0.01); };
-  const auto by_other = [&](const char* figure, const auto& f) {
-    phase.Find(figure)->Trust({FromKnownError(f(of_three) - f(of_all), standard(f))});
+  const Parameters best = of_all + trust.step;
+  const auto off_best = [&](const Parameters& is, const auto& f) {
+    return FromKnownError(f(is) - f(best), Propagated<6>(f, best, trust.covariance, 0.01));
   };
-  by_other("shift_columns", [](const Parameters& p) { return p[2]; });
-  by_other("shift_rows", [](const Parameters& p) { return p[5]; });
-  by_other("turn", Turn);
-  by_other("scale", [&](const Parameters& p) { return std::sqrt(std::fabs(Area(p))) / frame.half; });
-  by_other("stretch", Stretch);
+  const auto by_best = [&](const char* figure, const auto& f) { phase.Find(figure)->Trust({off_best(of_three, f)}); };
+  by_best("shift_columns", [](const Parameters& p) { return p[2]; });
+  by_best("shift_rows", [](const Parameters& p) { return p[5]; });
+  by_best("turn", Turn);
+  by_best("scale", [&](const Parameters& p) { return std::sqrt(std::fabs(Area(p))) / frame.half; });
+  by_best("stretch", Stretch);
   std::vector<Uncertainty> elements;
   std::vector<Uncertainty> fixed_elements;
   for (const int i : {0, 1, 2, 3, 4, 5}) {
     const auto element = [&](const Parameters& p) { return frame.Map(p).val[i]; };
-    elements.push_back(Combined(standard(element), degrees, 0, kResidualMethod));
-    fixed_elements.push_back(FromKnownError(element(of_three) - element(of_all), standard(element)));
+    elements.push_back(off_best(of_all, element));
+    fixed_elements.push_back(off_best(of_three, element));
   }
   phase.Find("robust_matrix")->Trust(elements);
   phase.Find("matrix")->Trust(fixed_elements);
-  const auto apart = [&](const Parameters& p) { return MapDistance(fixed, cv::Mat(frame.Map(p)), reference.size()); };
-  phase.Find("map_distance")->Trust({Combined(standard(apart), degrees, 0, kResidualMethod)});
+  phase.Find("map_distance")->Trust({OfDistance(frame, fixed, best, trust.covariance, phase, reference.size())});
   const double matches = 2.0 * robust.agreeing - 6;
   phase.Find("robust_residual")
       ->Trust({Combined(robust.residual_px / std::sqrt(2 * matches), matches, 0, kResidualMethod)});

@@ -46,6 +46,8 @@ double DeviationsFor(std::size_t places) {
   return high;
 }
 
+constexpr double kDeviationsOfMedian = 1.4826;
+
 double MedianOf(std::vector<float>& values) {
   if (values.empty()) return 0;
   const auto middle = values.begin() + static_cast<std::ptrdiff_t>(values.size() / 2);
@@ -300,7 +302,7 @@ Surface FitSurface(const cv::Mat& blocks) {
       left[i] = std::abs(levels[i] - terms[i].dot(surface.factors));
       off.push_back(static_cast<float>(left[i]));
     }
-    const double scale = std::max(4.685 * 1.4826 * MedianOf(off), 1e-6);
+    const double scale = std::max(4.685 * kDeviationsOfMedian * MedianOf(off), 1e-6);
     for (std::size_t i = 0; i < terms.size(); ++i) {  // Tukey's biweight
       const double u = std::min(left[i] / scale, 1.0);
       weights[i] = (1 - u * u) * (1 - u * u);
@@ -309,9 +311,15 @@ Surface FitSurface(const cv::Mat& blocks) {
   return surface;
 }
 
+constexpr int kTileRows = 48;  // that are looked at, or all where there are fewer
+
+cv::Size TilesOf(const Photo& photo) {
+  return {std::clamp(photo.cols() / 60, 1, 12), std::clamp(photo.rows() / 60, 1, 9)};
+}
+
 // Standard deviation of a pixel by tiles, from second differences of neighbours: gradients and most edges do not count.
 cv::Mat NoiseByTiles(const Photo& photo) {
-  const cv::Size tiles(std::clamp(photo.cols() / 60, 1, 12), std::clamp(photo.rows() / 60, 1, 9));
+  const cv::Size tiles = TilesOf(photo);
   cv::Mat noise(tiles, CV_32F);
   for (int i = 0; i < tiles.area(); ++i) {
     const int x = i % tiles.width;
@@ -320,12 +328,13 @@ cv::Mat NoiseByTiles(const Photo& photo) {
                         cv::Point((x + 1) * photo.cols() / tiles.width, (y + 1) * photo.rows() / tiles.height));
     std::vector<float> off;
     std::vector<float> v(tile.width);
-    const int step = std::max(1, tile.height / 48);
+    const int step = std::max(1, tile.height / kTileRows);
     for (int row = 0; row < tile.height; row += step) {
       photo.Read(tile.y + row, tile.x, v);
       for (int c = 4; c + 4 < tile.width; c += 3) off.push_back(std::abs(v[c] - 0.5f * (v[c - 4] + v[c + 4])));
     }
-    noise.at<float>(y, x) = static_cast<float>(1.4826 * MedianOfRounded(off, photo.step() / 2) / std::sqrt(1.5));
+    noise.at<float>(y, x) =
+        static_cast<float>(kDeviationsOfMedian * MedianOfRounded(off, photo.step() / 2) / std::sqrt(1.5));
   }
   return noise;
 }
@@ -387,7 +396,7 @@ Pyramid Build(const cv::Mat& relative) {
     std::vector<float> off = Sampled(level, [&](int row, int column) {
       return std::abs(level.at<float>(row, column) - level.at<float>(row, std::abs(column - 2)));
     });
-    pyramid.noise.push_back(1.4826 * MedianOf(off) / std::sqrt(2.0));
+    pyramid.noise.push_back(kDeviationsOfMedian * MedianOf(off) / std::sqrt(2.0));
     cv::Mat half;
     cv::resize(level, half, {(level.cols + 1) / 2, (level.rows + 1) / 2}, 0, 0, cv::INTER_AREA);
     level = half;
@@ -487,7 +496,7 @@ void AddMinima(const SizeSearch& search, double sigma, double least_depth, doubl
     const std::vector<Strip> strips = search.Look(static_cast<float>(loose));
     std::vector<float> off;
     for (const Strip& strip : strips) off.insert(off.end(), strip.samples.begin(), strip.samples.end());
-    const double noise = std::max({1.4826 * MedianOf(off), least_depth / deviations, 1e-9});
+    const double noise = std::max({kDeviationsOfMedian * MedianOf(off), least_depth / deviations, 1e-9});
     if (-deviations * noise > loose) {
       loose = -kCautious * deviations * noise;
       continue;
@@ -653,6 +662,7 @@ struct Target {
   cv::Mat relative;      // departures over the noise there
   cv::Mat share;         // the noise over the light, by blocks
   double shrink = 1;     // blocks to a pixel
+  double light = 1;      // mean level
   bool stepped = false;  // noise is less than a step of the levels: rounding makes edges of its own
 
   float ShareAt(cv::Point2d at) const {
@@ -666,6 +676,7 @@ Target LookAtTarget(const Photo& photo) {
   target.shrink = std::min(1.0, 128.0 / std::max(photo.cols(), photo.rows()));
   const cv::Mat blocks = BlockMeans(
       photo, {std::max(cvRound(photo.cols() * target.shrink), 1), std::max(cvRound(photo.rows() * target.shrink), 1)});
+  target.light = std::max(cv::mean(blocks)[0], 1.0);
   const Surface surface = FitSurface(blocks);
   cv::Mat noise = NoiseByTiles(photo);
   // A spot must then be deeper than the edges that rounding makes.
@@ -684,7 +695,32 @@ Target LookAtTarget(const Photo& photo) {
   return target;
 }
 
+// Of the noise: differences of whole levels have a median of whole or half ones (type B), and it is of so many.
+Uncertainty OfNoise(const Photo& photo, double light, double noise) {
+  constexpr int kDraws = 400;
+  constexpr double kMedianWorth = 0.37;
+  const cv::Size tiles = TilesOf(photo);
+  const double values = 1.0 * photo.cols() / 3 * tiles.height * std::min(kTileRows, photo.rows() / tiles.height);
+  const double spread = noise * std::sqrt(CV_PI / 2 / (2 * kMedianWorth * std::max(values, 1.0)));
+  const double half_step = 0.25 * photo.step() * kDeviationsOfMedian / std::sqrt(1.5) / light;
+  cv::RNG random(kDraws);
+  std::vector<double> errors;
+  for (int i = 0; i < kDraws; ++i) errors.push_back(random.uniform(-half_step, half_step) + random.gaussian(spread));
+  return FromErrors(std::move(errors), kSpotMethod);
+}
+
 }  // namespace
+
+SpotTrust SpotFinding::Trust(const Spot& spot) const {
+  // The 95 % quantiles of simulated spots' errors, half of them sharp and half soft, 4 to 80 px, by how far they stand
+  // out of the noise. From kClear on a spot is seen at a scale fine enough for its depth.
+  constexpr double kClear = 50;
+  const double seen = spot.contrast * std::sqrt(spot.area_px) / noise;
+  const auto of_quantile = [](double size) { return Uncertainty{size / 1.96, size, 1.96, kSpotMethod}; };
+  return {of_quantile(spot.area_px * (0.5 + 1.6 / seen)),
+          of_quantile(spot.contrast * ((seen < kClear ? 0.45 : 0.1) + 6 / seen)),
+          of_quantile(spot.diameter_px() * (0.015 + 1.2 / seen))};
+}
 
 double Spot::diameter_px() const { return 2 * std::sqrt(area_px / CV_PI); }
 
@@ -698,6 +734,7 @@ SpotFinding FindSpots(const cv::Mat& photo) {
   if (found.cut_short) minima.resize(kMostMinima);
   std::vector<float> shares(target.share.begin<float>(), target.share.end<float>());
   found.noise = MedianOf(shares);
+  found.of_noise = OfNoise(Photo(photo), target.light, found.noise);
   for (const Minimum& minimum : minima) {
     if (regions.IsTaken(minimum)) continue;
     if (found.spots.size() == kMostFound) {

@@ -4,6 +4,8 @@
 #include <opencv2/core.hpp>
 #include <vector>
 
+#include "desk/measure/uncertainty.h"
+
 namespace qv {
 
 /// A dark spot in a photo of a plain target.
@@ -16,12 +18,20 @@ struct Spot {
   double diameter_px() const;  // of a disc of that area
 };
 
+/// How far a spot's figures may be trusted. Its softness is not known: that is most of it.
+struct SpotTrust {
+  Uncertainty area, contrast, place;  // place: of column and of row
+};
+
 struct SpotFinding {
   std::vector<Spot> spots;  // the surest first
   double noise = 0;         // of a pixel, median over the photo, as a share of the light
   double largest_area = 0;  // pixels
   double dark_share = 0;    // of the photo's pixels that lie in spots
   bool cut_short = false;   // more than can be spots on a plain target
+  Uncertainty of_noise = {};
+
+  SpotTrust Trust(const Spot& spot) const;
 };
 
 /// Dark spots of 3 to 300 pixels across, sharp or soft, wherever contrast times the root of the spot's pixels is 9

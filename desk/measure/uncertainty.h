@@ -31,6 +31,7 @@ inline constexpr char kResamplingMethod[] = "the region's own noise, drawn again
 inline constexpr char kPixelMethod[] = "variance of the pixels, carried through the formulas";
 inline constexpr char kMeanMethod[] = "variance of blocks of pixels over their number";
 inline constexpr char kResidualMethod[] = "residuals of the fit";
+inline constexpr char kSpotMethod[] = "errors of simulated spots of unknown softness";
 inline constexpr char kRepeatMethod[] = "spread of repeated photos, t-interval";
 
 /// What holds 95 % of Student's distribution, both sides together; 1.96 for infinitely many degrees of freedom.
