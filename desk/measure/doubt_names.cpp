@@ -8,6 +8,7 @@ namespace qv {
 const std::vector<DoubtInfo>& Doubts() {
   static const std::vector<DoubtInfo> doubts = {
       {Doubt::kDecoderComplaint, "decoder_complaint", "a picture or film is cut or damaged; the decoder filled it up"},
+      {Doubt::kFilmCut, "film_cut", "a film ends before nine tenths of what its container promises"},
       {Doubt::kClipped, "clipped", "light or dark was cut off where a figure is read: an edge, dust or a light"},
       {Doubt::kMirrored, "mirrored", "the chart is seen in a mirror"},
       {Doubt::kImplausibleMarks, "implausible_marks", "the three marks do not lie as a chart's"},

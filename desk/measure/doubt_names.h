@@ -9,6 +9,7 @@ namespace qv {
 /// What a measured run may be doubted for.
 enum class Doubt {
   kDecoderComplaint,
+  kFilmCut,
   kClipped,
   kMirrored,
   kImplausibleMarks,

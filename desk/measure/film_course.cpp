@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <opencv2/videoio.hpp>
 
 #include "desk/base/kept_stderr.h"
 #include "desk/base/text.h"
@@ -105,6 +106,21 @@ bool RunFilmTest(QVTester& tester, const Spec& spec, const Request& request, Rec
   SayComplaint(record, record.inputs[0].path, chatter);
   record.chatter.insert(record.chatter.end(), chatter.begin(), chatter.end());
   return measured;
+}
+
+void DoubtCutFilm(Record& record, const QVTester& tester, QV_RESOURCE_INDEX slot, const std::vector<double>& time_ms) {
+  constexpr double kLeastThere = 0.9;
+  cv::VideoCapture film;
+  tester.resources_[slot]->GetVideo(&film);
+  const double promised_ms = 1000 * film.get(cv::CAP_PROP_FRAME_COUNT) / film.get(cv::CAP_PROP_FPS);
+  if (time_ms.size() < 2 || !(promised_ms > 0)) return;
+  const double interval_ms = (time_ms.back() - time_ms.front()) / static_cast<double>(time_ms.size() - 1);
+  const double there_ms = time_ms.back() + 2 * interval_ms;
+  if (there_ms >= kLeastThere * promised_ms) return;
+  record.Say(Doubt::kFilmCut,
+             Format("%s: the film ends at %.1f s of %.1f s that its container promises; it was cut",
+                    record.inputs[0].path.c_str(), time_ms.back() / 1000, promised_ms / 1000),
+             "frame_count");
 }
 
 double Highest(const std::vector<double>& values) {

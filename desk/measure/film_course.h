@@ -61,8 +61,11 @@ class NoFilm : public Finding {
   std::optional<Picture> Draw(const Record& /*record*/) const override { return std::nullopt; }
 };
 
-/// Runs the row's numbered test on a film; what decoders say goes into the record, with a warning. True with code 1.
+/// Runs the row's numbered test on a film; what decoders say goes into the record, with a doubt. True with code 1.
 bool RunFilmTest(QVTester& tester, const Spec& spec, const Request& request, Record& record);
+
+/// A doubt where the last frame's time stamp lies well before the end that the container promises.
+void DoubtCutFilm(Record& record, const QVTester& tester, QV_RESOURCE_INDEX slot, const std::vector<double>& time_ms);
 
 /// The largest finite one, or 0.
 double Highest(const std::vector<double>& values);

@@ -82,7 +82,7 @@ const std::vector<Promise>& Promises() {
        "sharp-rimmed discs of 4 to 16 px, 0.3 or more darker than the target, found"},
       {"dust_hollow", kAtMost, 0, " %", "sharp-rimmed discs of 20 px and more found"},
       {"dust_light", kAbout, 126, "", "least mean level of photos in which blobs are found", 0.5},
-      {"spots_found", kAtLeast, 95, " %",
+      {"spots_found", kAtLeast, 93, " %",
        "dark spots of 3 to 300 px found, contrast times root of pixels 9 x the noise"},
       {"spots_false", kAtMost, 0.1, "", "false spots a photo"},
       {"dots_found", kAtLeast, 100, " %",

@@ -107,6 +107,7 @@ class VideoFlash : public Measurement {
     phase.Add("base", results.video_flash_base_);
     phase.Add("width", results.video_flash_width_);
     phase.Add("mean", time, Widen(results.video_flash_mean_, count));
+    if (count != tester.prop_video_flash_frame_count_) DoubtCutFilm(record, tester, spec().inputs[0].slot, time);
     return std::make_unique<FlashFilmFinding>(time);
   }
 };

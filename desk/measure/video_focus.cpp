@@ -106,6 +106,7 @@ class VideoFocus : public Measurement {
     phase.Add("settle_time", results.video_af_settle_time_);
     phase.Add("mtf50_vertical", time, vertical);
     phase.Add("mtf50_horizontal", time, Widen(results.video_af_mtf50_horizontal_, count));
+    DoubtCutFilm(record, tester, spec().inputs[0].slot, time);
     return std::make_unique<FocusFinding>(time);
   }
 };
