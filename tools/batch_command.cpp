@@ -88,8 +88,13 @@ std::vector<Job> JobsFor(const BatchWanted& wanted, Plan& plan) {
   const bool stdin_given = wanted.inputs == "-";
   const std::string text = stdin_given ? std::string(std::istreambuf_iterator<char>(std::cin), {})
                                        : ReadWholeFile(wanted.inputs, kWrongUsage);
-  return JobsOfManifest(text, stdin_given ? "standard input" : Printable(wanted.inputs),
-                        stdin_given ? "" : fs::path(wanted.inputs).parent_path().string());
+  const std::string name = stdin_given ? "standard input" : Printable(wanted.inputs);
+  std::vector<Job> jobs = JobsOfManifest(text, name, stdin_given ? "" : fs::path(wanted.inputs).parent_path().string());
+  const bool pathless = std::all_of(jobs.begin(), jobs.end(), [](const Job& job) { return job.inputs.empty(); });
+  if (single && !jobs.empty() && pathless) {
+    throw Failure(kWrongUsage, name + ": no row has a path: a measurement needs the column \"path\"");
+  }
+  return jobs;
 }
 
 std::string Verdicts(const BatchProgress& progress) {

@@ -2,8 +2,10 @@
 
 #include <gmock/gmock.h>
 
+#include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 
+#include "unit_tests/film_file.h"
 #include "unit_tests/program.h"
 
 namespace {
@@ -57,6 +59,17 @@ TEST_F(VideoProgram, LostFramesAndTheTurnAreSeen) {
   Film("flash", "--size 160x120 --frames 20 --lost 5");
   const json blank = Record("video play film.mp4", 3);
   EXPECT_EQ(1, Measured(blank, "video_play_frames_lost")) << "what was lost is known without a chart";
+}
+
+TEST_F(VideoProgram, AFilmThatEndsBeforeItsPromiseIsDoubted) {
+  const std::vector<cv::Mat> frames(40, cv::Mat(120, 160, CV_8UC3, cv::Scalar::all(90)));
+  const std::string file = WriteFilm(folder_.Path("film.avi"), frames, "-c:v mjpeg");
+  for (const auto& [size, status] : {std::pair(1.0, 0), {0.6, 3}}) {
+    std::filesystem::resize_file(file, static_cast<std::uintmax_t>(size * std::filesystem::file_size(file)));
+    Record("video flash film.avi", status);
+    EXPECT_EQ(status == 3, err_.find("promises; it was cut") != std::string::npos) << size;
+    Record("video flash film.avi --set 89=10");  // whose end was not asked for
+  }
 }
 
 TEST_F(VideoProgram, TheEnvironmentLetsNoFilmElsewhere) {

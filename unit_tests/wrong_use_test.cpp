@@ -127,9 +127,10 @@ class NoMemoryForGrey : public cv::MatAllocator {
 
 TEST_F(WrongUses, ExhaustedMemoryIsNoFaultOfThePhoto) {
   NoMemoryForGrey allocator;
+  cv::MatAllocator* const before = cv::Mat::getDefaultAllocator();
   cv::Mat::setDefaultAllocator(&allocator);
   const int status = Run({"autofocus", "chart.png"});
-  cv::Mat::setDefaultAllocator(nullptr);
+  cv::Mat::setDefaultAllocator(before);
   EXPECT_EQ(4, status);
   EXPECT_THAT(Said(), AllOf(HasSubstr("code -99"), HasSubstr("no memory for a grey picture")));
 }

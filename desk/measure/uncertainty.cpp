@@ -126,7 +126,7 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "Type B alone: the 95 % quantiles of the errors of 1,400 simulated spots, half sharp and half soft, by contrast "
        "times the root of the pixels over the noise, s: of the area 0.5 + 1.6 / s of it, of the contrast 0.45 + 6 / s "
        "(from s = 50 on 0.1 + 6 / s), of a place 0.015 + 1.2 / s of the diameter; of all spots together, the root of "
-       "the squares. The noise of a pixel: its median stands on half levels. What JPEG takes off noise and spots is "
+       "the squares. The noise of a pixel: half a step of its differences. What JPEG takes off noise and spots is "
        "not in it."},
       {kRepeatMethod,
        "The spread of several photos of one unit, over the root of their number, with Student's factor; the median's "
