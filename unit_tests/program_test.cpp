@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <opencv2/imgcodecs.hpp>
 
+#include "desk/simulation/method_law.h"
 #include "unit_tests/golden.h"
 #include "unit_tests/program.h"
 
@@ -304,6 +305,14 @@ TEST_F(Program, TheTruthToldBesideAFigureIsWhatTheMethodMakesOfIt) {
   ASSERT_EQ(4, std::sscanf(told.c_str() + at, "  vertical %lf %lf to %lf %lf", &figures[0], &figures[1],  // NOLINT
                            &figures[2], &figures[3]))
       << told;
+  const double edge_deg = Truth()["mtf50"]["vertical"]["edge_direction_deg"];
+  const auto straightened = [edge_deg](double f) {
+    return qv::method_law::TrueResponse(f, 1.2, edge_deg) * std::pow(qv::method_law::Sinc(f), 2);
+  };
+  const auto [low, high] = qv::method_law::MeasuredMtf50(straightened, 108);
+  EXPECT_THAT(told, HasSubstr("108 pixels across"));
+  EXPECT_NEAR(low, figures[1], 6e-5);
+  EXPECT_NEAR(high, figures[2], 6e-5);
   EXPECT_GT(figures[3], 0.98 * figures[1]);
   EXPECT_LT(figures[3], 1.02 * figures[2]);
 }
