@@ -235,7 +235,7 @@ void Run() {
   Hold("display_corners", largest);
   Hold("display_jpeg", stored_as_jpeg);
   PrintPatterns(Trials(500, 20));
-  PrintAmbient(Trials(120, 24));
+  PrintAmbient(Trials(120, 6));
 }
 
 }  // namespace
