@@ -112,7 +112,7 @@ cv::Mat Photograph(const cv::Mat& levels, const Fault& fault, std::uint64_t seed
 bool Doubted(const Record& record, const std::string& region) {
   const std::string other = region == "vertical" ? "horizontal" : "vertical";
   return std::any_of(record.remarks.begin(), record.remarks.end(), [&](const Remark& remark) {
-    return remark.weight == Remark::kDoubt && remark.figure.find(other) == std::string::npos;
+    return remark.doubts() && remark.figure().find(other) == std::string::npos;
   });
 }
 

@@ -141,7 +141,7 @@ void Warn(const Record& record, const MeasureOptions& options) {
     return;
   }
   for (const Remark& remark : record.remarks) {
-    std::cerr << (remark.weight == Remark::kDoubt ? "doubt: " : "warning: ") << Printable(remark.sentence) << '\n';
+    std::cerr << (remark.doubts() ? "doubt: " : "warning: ") << Printable(remark.sentence()) << '\n';
   }
 }
 

@@ -149,7 +149,7 @@ class PlanRun {
     run.record = record.ToJson();
     if (record.outcome() == Outcome::kError) {
       for (const Remark& remark : record.remarks)
-        std::cerr << Printable(step.name) << ": " << Printable(remark.sentence) << '\n';
+        std::cerr << Printable(step.name) << ": " << Printable(remark.sentence()) << '\n';
       ended_ = plan_.stop_on_error;
     }
     AddLines(step, record, lines_);

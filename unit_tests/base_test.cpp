@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <array>
 #include <csignal>
 #include <cstdint>
 #include <filesystem>
@@ -207,6 +208,18 @@ TEST_F(Files, OutputsAreCheckedBeforeAnythingIsDone) {
   EXPECT_THAT(said(Path("folder")), HasSubstr("is a directory"));
   EXPECT_THAT(said(Path("none/record")), HasSubstr("can't be written"));
   EXPECT_EQ(3U, Entries());
+
+  ASSERT_EQ(0, mkfifo(Path("fifo").c_str(), 0600));  // nobody reads it: it would be waited for
+  EXPECT_EQ(Path("fifo") + ": is no regular file", said(Path("fifo")));
+  EXPECT_THAT(Sentence([&] { WriteWholeFile(Path("fifo"), "x"); }), HasSubstr("is no regular file"));
+  std::array<int, 2> ends = {};  // as a shell gives them: >(command), /dev/stdout
+  ASSERT_EQ(0, pipe(ends.data()));
+  const std::string end = "/dev/fd/" + std::to_string(ends[1]);
+  EXPECT_EQ("no failure", said(end, "/dev/null"));
+  WriteWholeFile(end, "record");
+  std::array<char, 9> got = {};
+  EXPECT_EQ(6, read(ends[0], got.data(), got.size()));
+  for (const int one : ends) close(one);
 }
 
 }  // namespace

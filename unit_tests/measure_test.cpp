@@ -203,7 +203,7 @@ TEST(Measure, ADisplayThatShowsSomethingElseFailsWithoutLimitsToo) {
   EXPECT_EQ(4U, right.phase.Find("corners")->values.size());
   const Record wrong = MeasureAnew({"lcd", {DisplayPhoto("cross")}, {{"pattern", "result"}}});
   EXPECT_EQ(Outcome::kFail, wrong.outcome());
-  EXPECT_THAT(wrong.remarks.at(0).sentence, HasSubstr("red cross field"));
+  EXPECT_THAT(wrong.remarks.at(0).sentence(), HasSubstr("red cross field"));
   const Record none = MeasureAnew({"lcd", {cv::Mat(90, 90, CV_8UC3, cv::Scalar::all(60))}, {{"pattern", "black"}}});
   EXPECT_EQ(QV_ERROR_PATTERN_NOT_FOUND, none.phase.code);
   EXPECT_THAT(none.MissSentence(), AllOf(HasSubstr("no screen is seen"), Not(HasSubstr("chart"))));
@@ -244,7 +244,7 @@ TEST(Measure, EveryChannelOfAFlashPhotoIsCounted) {
 
 std::vector<std::string> Remarks(const Record& record) {
   std::vector<std::string> names;
-  for (const Remark& remark : record.remarks) names.emplace_back(remark.name);
+  for (const Remark& remark : record.remarks) names.emplace_back(remark.name());
   return names;
 }
 

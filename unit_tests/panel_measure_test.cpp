@@ -19,7 +19,7 @@ using ::testing::HasSubstr;
 
 bool Says(const Record& record, const std::string& name) {
   return std::any_of(record.remarks.begin(), record.remarks.end(),
-                     [&](const Remark& remark) { return remark.name == name; });
+                     [&](const Remark& remark) { return remark.name() == name; });
 }
 
 class PanelPhotos : public ::testing::Test {

@@ -1,7 +1,9 @@
 #include "desk/base/files.h"
 
 #include <fcntl.h>
+#include <linux/magic.h>
 #include <sys/stat.h>
+#include <sys/statfs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -125,10 +127,20 @@ mode_t RightsFor(const fs::path& target) {
   return 0666U & ~mask;
 }
 
-// Whether the path names something that is no regular file: written as it is, there is nothing to keep.
+// Whether the path names a device or this process's end of a shell's pipe: written as it is, there is nothing to keep.
 bool IsPlainStream(const std::string& path) {
   struct stat status = {};
-  return stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode);
+  if (stat(path.c_str(), &status) != 0) return false;
+  struct statfs system = {};
+  return S_ISCHR(status.st_mode) ||
+         (S_ISFIFO(status.st_mode) && statfs(path.c_str(), &system) == 0 && system.f_type == PIPEFS_MAGIC);
+}
+
+// A named pipe would be waited for, a disk overwritten.
+void RefuseOtherThings(const std::string& path) {
+  struct stat status = {};
+  if (stat(path.c_str(), &status) != 0 || S_ISREG(status.st_mode) || IsPlainStream(path)) return;
+  throw Failure(kWrongUsage, Printable(path) + (S_ISDIR(status.st_mode) ? ": is a directory" : ": is no regular file"));
 }
 
 [[noreturn]] void RefuseToWrite(const std::string& path) {
@@ -137,7 +149,7 @@ bool IsPlainStream(const std::string& path) {
 }
 
 void CheckWritable(const std::string& path) {
-  if (fs::is_directory(path)) throw Failure(kWrongUsage, Printable(path) + ": is a directory");
+  RefuseOtherThings(path);
   if (access(path.c_str(), F_OK) == 0 && access(path.c_str(), W_OK) != 0) RefuseToWrite(path);
   if (!IsPlainStream(path) && FileAside(Followed(path)).file() < 0) RefuseToWrite(path);
 }
@@ -194,6 +206,7 @@ void WriteWholeFile(const std::string& path, const std::function<void(const Sink
     write_to(file.number());
     return;
   }
+  RefuseOtherThings(path);
   const fs::path target = Followed(path);
   FileAside aside(target);
   if (aside.file() < 0 || fchmod(aside.file(), RightsFor(target)) != 0) RefuseToWrite(path);

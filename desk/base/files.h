@@ -20,9 +20,9 @@ std::string LowerExtension(const std::string& path);
 std::string ReadWholeFile(const std::string& path, FailureKind kind, std::size_t most = kMostFileBytes);
 
 /// The one way anything is written: aside in the same folder, flushed to the disk, renamed, so that what was there
-/// stays until the new file is whole, and no half file is ever left. A link is followed; a pipe or device is written as
-/// it is. Throws Failure: wrong usage when the place can't be written, an internal fault when the disk filled up
-/// meanwhile.
+/// stays until the new file is whole, and no half file is ever left. A link is followed; a device, or a shell's pipe
+/// below /dev/fd, is written as it is. Throws Failure: wrong usage when the place can't be written or is a named pipe,
+/// which is never waited for; an internal fault when the disk filled up meanwhile.
 void WriteWholeFile(const std::string& path, const std::string& content);
 
 /// The same for what is too long to be held at once: `produce` hands its parts to the sink, in order.

@@ -27,13 +27,9 @@ std::string FigureText(const Reading& m) {
   return m.info->name + " " + value + (unit == "1" ? "" : " " + unit) + LimitText(m);
 }
 
-Tone ToneOf(Remark::Weight weight) {
-  switch (weight) {
-    case Remark::kMiss: return kPoor;
-    case Remark::kDoubt:
-    case Remark::kNoJudgement: return kDoubtful;
-    default: return kInk;
-  }
+Tone ToneOf(const Remark& remark) {
+  if (remark.Is(Remark::kMiss)) return kPoor;
+  return remark.doubts() || remark.Is(Remark::kNoJudgement) ? kDoubtful : kInk;
 }
 
 }  // namespace
@@ -61,7 +57,7 @@ Heading::Heading(const Record& record, const std::string& title, double width) :
   for (const Reading& m : record.phase.readings) {
     if (m.limit.given()) add(FigureText(m), ToneOf(m));
   }
-  for (const Remark& remark : record.remarks) add(remark.sentence, ToneOf(remark.weight));
+  for (const Remark& remark : record.remarks) add(remark.sentence(), ToneOf(remark));
   if (lines_.size() <= kMostLines) return;
   lines_.resize(kMostLines);
   lines_.push_back({"and more, in the record", kInk});

@@ -83,8 +83,7 @@ void Reading::JudgeEntries(const DecisionRule& rule) {
 
 void Record::Judge() {
   for (Remark& remark : remarks) {
-    if (remark.weight == Remark::kDoubt && limits.accept_doubts.count(remark.name) != 0)
-      remark.weight = Remark::kAccepted;
+    if (limits.accept_doubts.count(remark.name()) != 0) remark.Accept();
   }
   for (const auto& [name, limit] : limits.by_name) {  // what was asked of this test and not measured is shown as such
     const FigureInfo* const info = FindFigure(name);

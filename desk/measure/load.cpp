@@ -185,7 +185,7 @@ class Loader {
 
   bool Refuse(const Input& input, int code, const std::string& why) {
     record_.phase.code = code;
-    record_.remarks = {{Remark::kMiss, "refused_input", input.name + ": " + why}};
+    record_.remarks = {Remark(Remark::kMiss, "refused_input", input.name + ": " + why)};
     return false;
   }
 
@@ -205,7 +205,7 @@ class Loader {
     const std::string& line = log_.lines().back().text;
     const std::size_t end = line.find("] ");
     record_.phase.code = code;
-    record_.remarks = {{Remark::kMiss, "refused_input", end == std::string::npos ? line : line.substr(end + 2)}};
+    record_.remarks = {Remark(Remark::kMiss, "refused_input", end == std::string::npos ? line : line.substr(end + 2))};
     return false;
   }
 

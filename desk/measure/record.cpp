@@ -128,10 +128,9 @@ Json JsonOf(const Reading& m, const DecisionRule& rule) {
 }
 
 Json JsonOf(const Remark& remark, int code) {
-  constexpr const char* kWeights[] = {"warning", "miss", "doubt", "accepted doubt", "no judgement"};
   Json json = {
-      {"code", code}, {"description", remark.sentence}, {"name", remark.name}, {"weight", kWeights[remark.weight]}};
-  if (!remark.figure.empty()) json["figure"] = remark.figure;
+      {"code", code}, {"description", remark.sentence()}, {"name", remark.name()}, {"weight", remark.weight()}};
+  if (!remark.figure().empty()) json["figure"] = remark.figure();
   return json;
 }
 
@@ -175,11 +174,12 @@ Json JsonOf(const Limits& limits) {
   return json;
 }
 
-bool Holds(const std::vector<Remark>& remarks, Remark::Weight weight) {
-  return std::any_of(remarks.begin(), remarks.end(), [=](const Remark& remark) { return remark.weight == weight; });
-}
-
 }  // namespace
+
+const char* Remark::weight() const {
+  constexpr const char* kNotes[] = {"warning", "miss", "no judgement"};
+  return note_ ? kNotes[*note_] : accepted_ ? "accepted doubt" : "doubt";
+}
 
 const char* Name(Outcome outcome) {
   switch (outcome) {
@@ -228,9 +228,15 @@ void Reading::Trust(std::vector<Uncertainty> known) {
     uncertainties = std::move(known);
 }
 
-bool Record::measured() const { return phase.code == QV_SUCCESS && !Holds(remarks, Remark::kNoJudgement); }
+bool Record::measured() const {
+  return phase.code == QV_SUCCESS && std::none_of(remarks.begin(), remarks.end(),
+                                                  [](const Remark& remark) { return remark.Is(Remark::kNoJudgement); });
+}
 
-bool Record::doubtful() const { return measured() && Holds(remarks, Remark::kDoubt); }
+bool Record::doubtful() const {
+  return measured() &&
+         std::any_of(remarks.begin(), remarks.end(), [](const Remark& remark) { return remark.doubts(); });
+}
 
 Outcome Record::outcome() const {
   const auto any = [&](Outcome outcome) {
@@ -252,7 +258,7 @@ bool Record::marginal() const {
 
 std::string Record::MissSentence() const {
   std::string text;
-  for (const Remark& remark : remarks) text += (text.empty() ? "" : "; ") + remark.sentence;
+  for (const Remark& remark : remarks) text += (text.empty() ? "" : "; ") + remark.sentence();
   if (phase.code == QV_SUCCESS) return text;
   // The circle check answers a miss with 0.
   const ResultCode& row = FindCode(phase.code == QV_DONE ? QV_ERROR_PATTERN_NOT_FOUND : phase.code);

@@ -93,19 +93,35 @@ struct RecordedInput {
   int width = 0, height = 0;
 };
 
-/// A sentence about a run.
-struct Remark {
-  enum Weight {
+/// A sentence about a run: a note under any name, or one of Doubts(), which a limits file may accept by its name.
+class Remark {
+ public:
+  enum Note {
     kWarning,      // worth knowing
     kMiss,         // why there is no result
-    kDoubt,        // measured, but not to be trusted: an ERROR; one of Doubts()
-    kAccepted,     // a doubt that the limits file accepts
     kNoJudgement,  // the test ran, but its figures say nothing about the unit
   };
-  Weight weight;
-  std::string name;  // "clipped": by which it may be told from others
-  std::string sentence;
-  std::string figure = {};  // that it rests on, without the phase's name; may be empty
+  Remark(Note note, std::string name, std::string sentence, std::string figure = {})
+      : name_(std::move(name)), sentence_(std::move(sentence)), figure_(std::move(figure)), note_(note) {}
+  Remark(Doubt doubt, std::string sentence, std::string figure = {})
+      : name_(Info(doubt).name), sentence_(std::move(sentence)), figure_(std::move(figure)) {}
+
+  const std::string& name() const { return name_; }  // "clipped": by which it may be told from others
+  const std::string& sentence() const { return sentence_; }
+  const std::string& figure() const { return figure_; }  // that it rests on, without the phase's name; may be empty
+  bool Is(Note note) const { return note_ == note; }
+  /// Measured, but not to be trusted: an ERROR, unless the limits file accepts it.
+  bool doubts() const { return !note_ && !accepted_; }
+  bool accepted() const { return accepted_; }
+  /// As records call it: "warning", "accepted doubt".
+  const char* weight() const;
+  /// Changes nothing but a doubt.
+  void Accept() { accepted_ = !note_; }
+
+ private:
+  std::string name_, sentence_, figure_;
+  std::optional<Note> note_;  // none: a doubt
+  bool accepted_ = false;
 };
 
 struct Record {
@@ -126,11 +142,11 @@ struct Record {
   std::string advice;                      // what to look at when an input is refused; empty: the code's own
   std::shared_ptr<const Finding> finding;  // none when an input could not be loaded
 
-  void Say(Remark::Weight weight, std::string name, std::string sentence, std::string figure = {}) {
-    remarks.push_back({weight, std::move(name), std::move(sentence), std::move(figure)});
+  void Say(Remark::Note note, std::string name, std::string sentence, std::string figure = {}) {
+    remarks.emplace_back(note, std::move(name), std::move(sentence), std::move(figure));
   }
   void Say(Doubt doubt, std::string sentence, std::string figure = {}) {
-    Say(Remark::kDoubt, Info(doubt).name, std::move(sentence), std::move(figure));
+    remarks.emplace_back(doubt, std::move(sentence), std::move(figure));
   }
 
   /// Holds every figure against its limit. Call once, when all figures are in.
