@@ -290,12 +290,8 @@ constexpr int kSpecks = 3;
 
 // How many of them lie within 2 px of a blob.
 int SpecksFound(int trial, double diameter, double darkness) {
-  SimulationOptions options;
-  options.scene = "dust";
-  options.camera.size = {800, 600};
+  SimulationOptions options = SceneOptions("dust", {800, 600}, 0.5, trial + 1);
   options.camera.blur_px = 0.7;
-  options.camera.noise_percent = 0.5;
-  options.camera.seed = trial + 1;
   options.specks = kSpecks;
   options.speck_px = diameter;
   options.speck_darkness = darkness;
@@ -348,12 +344,8 @@ struct DotCount {
 
 // By where the dots lie; as "false" those that were found where none is.
 std::map<std::string, DotCount> CountDots(int trial, int radius) {
-  SimulationOptions options;
-  options.scene = "hdr";
-  options.camera.size = {1200, 900};
-  options.camera.noise_percent = 0.5;
+  SimulationOptions options = SceneOptions("hdr", {1200, 900}, 0.5, trial + 1);
   options.camera.shading_percent = 20;
-  options.camera.seed = trial + 1;
   options.dot_contrast = 0.2;
   const Simulation simulation = Simulate(options);
   cv::Mat picture = simulation.levels[0].clone();

@@ -20,6 +20,7 @@
 #include "desk/base/text.h"
 #include "desk/batch/batch.h"
 #include "desk/measure/measure.h"
+#include "desk/measure/uncertainty.h"
 #include "qvtester/tester.h"
 #include "unit_tests/drawing.h"
 
@@ -54,12 +55,6 @@ double CpuOf(const std::function<void()>& work) {
   }
   waitpid(process, nullptr, 0);
   return CpuSeconds() - before;
-}
-
-double Median(std::vector<double> values) {
-  const auto middle = values.begin() + static_cast<std::ptrdiff_t>(values.size() / 2);
-  std::nth_element(values.begin(), middle, values.end());
-  return *middle;
 }
 
 double Least(const std::vector<double>& values) { return *std::min_element(values.begin(), values.end()); }

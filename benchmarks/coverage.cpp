@@ -248,9 +248,7 @@ std::vector<Trial> TrySpots(const Condition& condition, cv::RNG& random) {
   const cv::Point2d at(kSide / 2.0 + random.uniform(-8.0, 8.0), kSide / 2.0 + random.uniform(-8.0, 8.0));
   cv::Mat levels(kSide, kSide, CV_32F);
   levels.forEach<float>([&](float& level, const int* place) {
-    const double r = cv::norm(cv::Point2d(place[1], place[0]) - at);
-    const double depth =
-        soft ? std::exp2(-4 * r * r / (diameter * diameter)) : std::clamp(diameter / 2 - r + 0.5, 0.0, 1.0);
+    const double depth = SpotDepth(cv::norm(cv::Point2d(place[1], place[0]) - at), diameter, soft);
     level = static_cast<float>(light * (1 - contrast * depth));
   });
   const SpotFinding found = FindSpots(Photograph(condition, levels, condition.noise_percent, random));

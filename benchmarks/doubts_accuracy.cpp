@@ -16,6 +16,7 @@
 
 #include "benchmarks/pairs.h"
 #include "benchmarks/trials.h"
+#include "desk/base/text.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/robust_map.h"
 #include "desk/measure/sharpness.h"
@@ -206,23 +207,18 @@ Count TryFault(const std::vector<ChartScene>& scenes, const Fault& fault, int re
 
 void AddUnevenLight(std::vector<Fault>& faults) {
   for (const double shading : {10.0, 20.0, 40.0, 60.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "shading %g %%", shading);
-    faults.push_back({name, 1, shading <= 10, 0, 0, [=](cv::Point2d p) { return 1 - shading / 200 * p.dot(p); }});
+    faults.push_back({Format("shading %g %%", shading), 1, shading <= 10, 0, 0,
+                      [=](cv::Point2d p) { return 1 - shading / 200 * p.dot(p); }});
   }
   for (const double fall : {10.0, 20.0, 40.0, 60.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "light falls by %g %% along a line", fall);
-    faults.push_back(
-        {name, 1, fall <= 10, 0, 0, [=](cv::Point2d p) { return 1 - fall / 200 * (1 + 0.8 * p.x + 0.2 * p.y); }});
+    faults.push_back({Format("light falls by %g %% along a line", fall), 1, fall <= 10, 0, 0,
+                      [=](cv::Point2d p) { return 1 - fall / 200 * (1 + 0.8 * p.x + 0.2 * p.y); }});
   }
   for (const double depth : {0.2, 0.4, 0.6}) {
     for (const double width : {0.1, 0.3}) {
-      char name[64];
-      std::snprintf(name, sizeof name, "soft shadow of %.0f %%, %.0f %% of the photo wide", 100 * depth, 50 * width);
-      faults.push_back({name, 1, false, 0, 0, [=](cv::Point2d p) {
-                          return 1 - depth / (1 + std::exp(-(p.x + 0.3 * p.y - 0.1) * 4 / width));
-                        }});
+      faults.push_back(
+          {Format("soft shadow of %.0f %%, %.0f %% of the photo wide", 100 * depth, 50 * width), 1, false, 0, 0,
+           [=](cv::Point2d p) { return 1 - depth / (1 + std::exp(-(p.x + 0.3 * p.y - 0.1) * 4 / width)); }});
     }
   }
 }
@@ -251,18 +247,13 @@ void AddClipping(std::vector<Fault>& faults) {
 std::vector<Fault> Faults() {
   std::vector<Fault> faults;
   for (const double noise : {0.0, 0.5, 1.0, 1.5, 2.0, 3.0, 5.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "noise %g %%", noise);
-    faults.push_back({name, noise, noise <= 1});
+    faults.push_back({Format("noise %g %%", noise), noise, noise <= 1});
   }
   AddUnevenLight(faults);
   AddClipping(faults);
   for (const double angle : {5.0, 10.0, 15.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "pan %g degrees", angle);
-    faults.push_back({name, 1, false, angle, 0});
-    std::snprintf(name, sizeof name, "tilt %g degrees", angle);
-    faults.push_back({name, 1, false, 0, angle});
+    faults.push_back({Format("pan %g degrees", angle), 1, false, angle, 0});
+    faults.push_back({Format("tilt %g degrees", angle), 1, false, 0, angle});
   }
   return faults;
 }
@@ -352,10 +343,8 @@ void PrintPatches() {
       ForEachTrial(photos, [&](int trial) { tried[trial] = TryPatches(oblique, trial, as_standard); });
       Count count;
       count.Add(tried, kPatchOff);
-      char name[96];
-      std::snprintf(name, sizeof name, "%s%g degrees off straight on, any direction",
-                    as_standard ? "the standard, " : "", oblique);
-      PrintRow(name, count);
+      PrintRow(Format("%s%g degrees off straight on, any direction", as_standard ? "the standard, " : "", oblique),
+               count);
       all.Add(count);
     }
   }
@@ -400,12 +389,8 @@ void PrintDotsInNoise() {
     for (const double noise : {0.5, 1.0, 1.5, 2.0, 2.5, 3.0, 5.0}) {
       std::vector<std::pair<int, bool>> tried(pictures);
       ForEachTrial(pictures, [&](int trial) {
-        SimulationOptions options;
-        options.scene = "hdr";
-        options.camera.size = {600, 400};
-        options.camera.noise_percent = noise;
+        SimulationOptions options = SceneOptions("hdr", {600, 400}, noise, trial + 1);
         options.camera.shading_percent = 10;
-        options.camera.seed = static_cast<std::uint64_t>(trial) + 1;
         options.dots = drawn;
         options.dot_contrast = 0.3;
         const Simulation simulation = Simulate(options);
@@ -415,9 +400,7 @@ void PrintDotsInNoise() {
       });
       Count count;
       for (const auto& [surplus, doubted] : tried) count.Add(surplus > 0, doubted);
-      char name[64];
-      std::snprintf(name, sizeof name, "noise %g %%, %d dots", noise, drawn);
-      PrintRow(name, count);
+      PrintRow(Format("noise %g %%, %d dots", noise, drawn), count);
       all.Add(count);
     }
   }
@@ -456,14 +439,10 @@ DustCase NoTarget(const char* name, const char* scene) {
 std::vector<DustCase> DustCases() {
   std::vector<DustCase> rows;
   for (const double noise : {0.0, 0.5, 1.0, 2.0, 3.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "plain target, noise %g %%", noise);
-    rows.push_back(Plain(name, noise));
+    rows.push_back(Plain(Format("plain target, noise %g %%", noise), noise));
   }
   for (const double shading : {10.0, 30.0, 50.0}) {
-    char name[64];
-    std::snprintf(name, sizeof name, "plain target, shading %g %%", shading);
-    rows.push_back(Plain(name, 1));
+    rows.push_back(Plain(Format("plain target, shading %g %%", shading), 1));
     rows.back().options.camera.shading_percent = shading;
   }
   rows.push_back(Plain("plain target, stored as sRGB", 1));
@@ -474,9 +453,7 @@ std::vector<DustCase> DustCases() {
   rows.back().light = [](cv::Point2d p) { return 1 - 0.02 * std::exp(-p.dot(p) / (2 * 0.3 * 0.3)); };
   for (const double px : {5.0, 10.0, 16.0, 20.0, 24.0, 40.0, 100.0}) {
     for (const double darkness : px < 30 ? std::vector<double>{0.6, 0.3} : std::vector<double>{0.6, 0.3, 0.1}) {
-      char name[64];
-      std::snprintf(name, sizeof name, "3 specks of %g px, %g darker", px, darkness);
-      rows.push_back(Plain(name, 1, 3, px, darkness));
+      rows.push_back(Plain(Format("3 specks of %g px, %g darker", px, darkness), 1, 3, px, darkness));
     }
   }
   rows.push_back(Plain("white cut off: the target above 255", 1));

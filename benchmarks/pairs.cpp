@@ -2,16 +2,14 @@
 
 #include <vector>
 
+#include "benchmarks/trials.h"
+
 using namespace qv;
 
 SimulationOptions DrawPair(double blur_px, double noise_percent, std::uint64_t seed, cv::RNG& random) {
-  SimulationOptions options;
-  options.scene = "pair";
-  options.camera.size = {640, 480};
+  SimulationOptions options = SceneOptions("pair", {640, 480}, noise_percent, seed);
   options.camera.blur_px = blur_px;
-  options.camera.noise_percent = noise_percent;
   options.camera.gain = 0.75;
-  options.camera.seed = seed;
   const double x = random.uniform(-40.0, 40.0);
   const double y = random.uniform(-40.0, 40.0);
   options.motion_px = {x, y};

@@ -44,13 +44,9 @@ cv::Vec3d LevelsOf(cv::Point2d xy, double strongest) {
 }
 
 SimulationOptions LightsOptions(double noise_percent, int seed) {
-  SimulationOptions options;
-  options.scene = "lights";
-  options.camera.size = {900, 600};
+  SimulationOptions options = SceneOptions("lights", {900, 600}, noise_percent, seed);
   options.camera.blur_px = 0.8;
   options.camera.gain = 1;
-  options.camera.noise_percent = noise_percent;
-  options.camera.seed = seed;
   return options;
 }
 
@@ -202,13 +198,9 @@ struct PrintTrial {
 
 SimulationOptions PrintOptions(int trial, double side, double contrast) {
   cv::RNG random(trial + 1);
-  SimulationOptions options;
-  options.scene = "print";
-  options.camera.size = {800, 600};
+  SimulationOptions options = SceneOptions("print", {800, 600}, 2, trial + 1);
   options.camera.fill = 0.85;
   options.camera.blur_px = 1;
-  options.camera.noise_percent = 2;
-  options.camera.seed = trial + 1;
   options.print.seed = trial % 10 + 1;
   options.print.defect_contrast = contrast;
   options.print_defect_px = side;

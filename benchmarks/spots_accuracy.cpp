@@ -44,9 +44,7 @@ void AddSpot(cv::Mat& light, cv::Point2d at, double diameter, double contrast, b
                        cv::Rect({}, light.size());
   for (int y = box.y; y < box.br().y; ++y) {
     for (int x = box.x; x < box.br().x; ++x) {
-      const double r = cv::norm(cv::Point2d(x, y) - at);
-      const double depth =
-          soft ? std::exp2(-4 * r * r / (diameter * diameter)) : std::clamp(diameter / 2 - r + 0.5, 0.0, 1.0);
+      const double depth = SpotDepth(cv::norm(cv::Point2d(x, y) - at), diameter, soft);
       light.at<float>(y, x) *= static_cast<float>(1 - contrast * depth);
     }
   }

@@ -73,3 +73,17 @@ double ShareBelow(const std::vector<double>& values, double limit) {
   return 100.0 * static_cast<double>(std::count_if(values.begin(), values.end(), [=](double v) { return v < limit; })) /
          static_cast<double>(values.size());
 }
+
+qv::SimulationOptions SceneOptions(const char* scene, cv::Size size, double noise_percent, std::uint64_t seed) {
+  qv::SimulationOptions options;
+  options.scene = scene;
+  options.camera.size = size;
+  options.camera.noise_percent = noise_percent;
+  options.camera.seed = seed;
+  return options;
+}
+
+double SpotDepth(double distance_px, double diameter_px, bool soft) {
+  if (soft) return std::exp2(-4 * distance_px * distance_px / (diameter_px * diameter_px));
+  return std::clamp(diameter_px / 2 - distance_px + 0.5, 0.0, 1.0);
+}

@@ -1,9 +1,12 @@
 #ifndef QVTESTER_BENCHMARKS_TRIALS_H_
 #define QVTESTER_BENCHMARKS_TRIALS_H_
 
+#include <cstdint>
 #include <functional>
 #include <string>
 #include <vector>
+
+#include "desk/simulation/simulation.h"
 
 // What the accuracy tables share.
 
@@ -33,6 +36,13 @@ int Trials(int full, int few);
 
 /// Takes "--check" and "--quick" out of a program's words. Promises are printed with --check alone.
 void TakeCheckOptions(std::vector<std::string>& words);
+
+/// A scene as its options have it by default, but for these.
+qv::SimulationOptions SceneOptions(const char* scene, cv::Size size, double noise_percent, std::uint64_t seed);
+
+/// Depth of a spot so far from its middle, 0 to 1: a disc whose rim is smoothed over a pixel, or a Gaussian that is as
+/// wide at half its depth.
+double SpotDepth(double distance_px, double diameter_px, bool soft);
 
 // Tables in files of their own.
 void PrintRegistration();

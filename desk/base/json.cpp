@@ -161,8 +161,13 @@ void JsonView::RefuseAs(const char* wanted) const { Refuse("is " + Shown(*value_
 
 const Json& MemberOf(const Json& object, const char* name) {
   static const Json nothing;
-  const auto found = object.is_object() ? object.find(name) : object.end();
-  return object.is_object() && found != object.end() ? *found : nothing;
+  const auto found = object.find(name);  // the end of what is no object
+  return found != object.end() ? *found : nothing;
+}
+
+const Json& FirstOf(const Json& list) {
+  static const Json nothing;
+  return list.is_array() && !list.empty() ? list[0] : nothing;
 }
 
 std::int64_t WholeAt(const Json& object, const char* name) {

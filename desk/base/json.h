@@ -33,6 +33,9 @@ std::string SentenceOf(const Json::exception& e);
 /// The member of an object; null where there is none, or no object. For documents whose shape is not known.
 const Json& MemberOf(const Json& object, const char* name);
 
+/// The first element of a list; null where there is none, or no list.
+const Json& FirstOf(const Json& list);
+
 /// The whole number that a member holds; 0 where it holds none.
 std::int64_t WholeAt(const Json& object, const char* name);
 

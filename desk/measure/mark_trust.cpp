@@ -111,7 +111,6 @@ double TurnOf(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 18
 
 // The true value is normal about where the known error puts it: 95 % of it lie within so much of the reading.
 Uncertainty FromKnownError(double error, double standard) {
-  constexpr double kShare = 0.95;
   const double off = std::fabs(error);
   const double all = std::hypot(off, standard);
   const auto below = [&](double x) { return 0.5 * std::erfc(-x / standard / std::sqrt(2.0)); };
@@ -119,7 +118,7 @@ Uncertainty FromKnownError(double error, double standard) {
   double high = off + 2 * standard;
   for (int step = 0; step < 40 && standard > 0; ++step) {
     const double middle = (low + high) / 2;
-    (below(middle - off) - below(-middle - off) < kShare ? low : high) = middle;
+    (below(middle - off) - below(-middle - off) < kCoverage ? low : high) = middle;
   }
   return {all, high, all == 0 ? 1 : high / all, kResidualMethod};
 }

@@ -11,7 +11,6 @@ namespace qv {
 namespace {
 
 constexpr double kUnknown = std::numeric_limits<double>::quiet_NaN();
-constexpr double kCoverage = 0.95;
 
 // Student's distribution function for whole degrees of freedom (Abramowitz and Stegun 26.7.3 and 26.7.4): what lies
 // between -t and t.

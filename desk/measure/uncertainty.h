@@ -34,6 +34,9 @@ inline constexpr char kResidualMethod[] = "residuals of the fit";
 inline constexpr char kSpotMethod[] = "errors of simulated spots of unknown softness";
 inline constexpr char kRepeatMethod[] = "spread of repeated photos, t-interval";
 
+/// Of expanded uncertainties.
+inline constexpr double kCoverage = 0.95;
+
 /// What holds 95 % of Student's distribution, both sides together; 1.96 for infinitely many degrees of freedom.
 double StudentFactor(double degrees_of_freedom);
 

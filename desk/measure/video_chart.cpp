@@ -110,8 +110,9 @@ class VideoChart : public Measurement {
     if (result.frame_count_ == 0) return std::make_unique<NoFilm>();
     AddFigures(record.phase, result);
     SayWhatIsOdd(record, result, found);
-    DoubtCutFilm(record, tester, spec_.inputs[0].slot, Widen(result.time_, result.frame_count_));
-    return std::make_unique<ChartFilmFinding>(Widen(result.time_, result.frame_count_));
+    const std::vector<double> time = Widen(result.time_, result.frame_count_);
+    DoubtCutFilm(record, tester, spec_.inputs[0].slot, time);
+    return std::make_unique<ChartFilmFinding>(time);
   }
 
  private:

@@ -64,8 +64,7 @@ struct Judgement {
 
 /// Judges by `now` as a measurement would: a list that lacks an entry with bounds of its own is UNSET, and a run is an
 /// ERROR where the rule asks for an uncertainty that its record does not hold. Before is what the store holds, or what
-/// `against` would say. Throws Failure (wrong usage) where no
-/// run measures anything that `now` limits.
+/// `against` would say. Throws Failure (wrong usage) where no run measures anything that `now` limits.
 Judgement JudgeAgain(Store& store, const Selection& selection, const ArchiveLimits& now, const ArchiveLimits* against);
 
 /// The verdict on units whose runs come in: of each unit, the worst of the latest runs of each plan, step, measurement.

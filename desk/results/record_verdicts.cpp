@@ -12,14 +12,14 @@ namespace {
 
 constexpr double kNoNumber = std::numeric_limits<double>::quiet_NaN();
 
-bool MovesLimits(const ArchiveLimits& limits) { return limits.rule.kind != DecisionRule::Kind::kSimple; }
+bool MovesLimits(const DecisionRule& rule) { return rule.kind != DecisionRule::Kind::kSimple; }
 
 std::set<std::string> NamesOf(const ArchiveLimits& now, const ArchiveLimits* against) {
   std::set<std::string> names;
   for (const ArchiveLimits* const limits : {&now, against}) {
     if (limits == nullptr) continue;
     for (const auto& [name, bounds] : limits->lists) names.insert(name);
-    if (!MovesLimits(*limits)) continue;
+    if (!MovesLimits(limits->rule)) continue;
     for (const auto& [name, bounds] : limits->by_name) names.insert(name);
   }
   return names;
@@ -42,7 +42,7 @@ bool Keeps(double value, double expanded, const Bounds& bounds, const DecisionRu
 RecordVerdict OfValue(const Json& measurement, const Bounds& bounds, const DecisionRule& rule, bool real) {
   const double value = NumberOf(measurement.at("measured_value"));
   const double expanded = ExpandedOf(measurement, 0);
-  const bool unknown = rule.kind != DecisionRule::Kind::kSimple && real && std::isfinite(value);
+  const bool unknown = MovesLimits(rule) && real && std::isfinite(value);
   return {Keeps(value, expanded, bounds, rule) ? "PASS" : "FAIL", unknown && !std::isfinite(expanded)};
 }
 
@@ -60,8 +60,8 @@ RecordVerdict OfList(const Json& measurement, const ListBounds& bounds, const De
     const Bounds& held = found == bounds.by_number.end() ? bounds.each : found->second;
     const double value = NumberOf(point[1]);
     const double expanded = ExpandedOf(measurement, i);
-    const bool moved = rule.kind != DecisionRule::Kind::kSimple && real;
-    verdict.unknown_band = verdict.unknown_band || (moved && std::isfinite(value) && !std::isfinite(expanded));
+    const bool moved = MovesLimits(rule) && real && std::isfinite(value);
+    verdict.unknown_band = verdict.unknown_band || (moved && !std::isfinite(expanded));
     if (held == Bounds()) continue;
     broken = broken || !Keeps(value, expanded, held, rule);
   }

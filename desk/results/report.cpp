@@ -94,8 +94,7 @@ std::size_t Report::Column::Place(const std::string& text) {
 
 void Report::Add(const StoredRun& run) {
   const Json& record = run.record;
-  const Json& phases = MemberOf(record, "phases");
-  const std::string measurement = phases.is_array() && !phases.empty() ? TextAt(phases[0], "name") : "";
+  const std::string measurement = TextAt(FirstOf(MemberOf(record, "phases")), "name");
   const std::string step = run.filing.step.empty() ? measurement : run.filing.step;
   const std::string outcome = TextAt(record, "outcome");
   const Json& marginal = MemberOf(record, "marginal");

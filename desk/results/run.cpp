@@ -25,9 +25,8 @@ Json RequestOf(const Json& record) {
     request.erase("inputs");  // their hashes stand for them
     return request;
   }
-  const Json& phases = MemberOf(record, "phases");
   const Json& metadata = MemberOf(record, "metadata");
-  return {{"measurement", phases.is_array() && !phases.empty() ? MemberOf(phases[0], "name") : Json()},
+  return {{"measurement", MemberOf(FirstOf(MemberOf(record, "phases")), "name")},
           {"properties", MemberOf(metadata, "properties")},
           {"command", MemberOf(metadata, "command")}};
 }

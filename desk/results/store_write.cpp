@@ -31,8 +31,7 @@ std::string InputHash(const Json& record) {
 
 RunRow RowOf(const StoredRun& run) {
   const Json& record = run.record;
-  const Json& phases = MemberOf(record, "phases");
-  const Json& phase = phases.is_array() && !phases.empty() ? phases[0] : MemberOf(record, "no phase");
+  const Json& phase = FirstOf(MemberOf(record, "phases"));
   const Json& metadata = MemberOf(record, "metadata");
   const Json& marginal = MemberOf(record, "marginal");
   RunRow row;
