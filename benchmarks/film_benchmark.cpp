@@ -8,7 +8,7 @@
 #include <opencv2/videoio.hpp>
 
 #include "benchmarks/ratios.h"
-#include "chart/chart_rows.h"
+#include "chart/cut_photo.h"
 #include "chart/find_chart.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"

@@ -14,7 +14,7 @@
 #include <numeric>
 #include <optional>
 
-#include "chart/chart_rows.h"
+#include "chart/cut_photo.h"
 #include "chart/dark_runs.h"
 #include "qvtester/log.h"
 #include "qvtester/tester.h"
@@ -40,36 +40,31 @@ void SetAverage(std::vector<QVFinderPattern>& candidates, float average) {
   for (QVFinderPattern& candidate : candidates) candidate.setAverage(average);
 }
 
-// A walk over the image, one pixel at a time; `left` pixels lie ahead of it. Rows that are not there yet are made.
+// A walk over the image, one pixel at a time; `left` pixels lie ahead of it.
 struct Walk {
   const uchar* start;
   std::ptrdiff_t at, step;
   int left;
-  int row, row_step;
-  ChartRows* rows;  // null: all are there
+  const CutPhoto* photo;  // null: a binary picture
 
-  bool Reads() const {
-    if (rows != nullptr) rows->Need(row);
-    return true;
-  }
+  bool IsDark() const { return photo == nullptr ? start[at] == 0 : photo->IsDark(start + at); }
 
   // Counts pixels of one kind while they last, the image lasts, and the count is at most `most`.
   void Count(bool dark, int most, int& count) {
-    for (; left > 0 && Reads() && (start[at] == 0) == dark && count <= most; at += step, row += row_step, --left) {
-      ++count;
-    }
+    for (; left > 0 && IsDark() == dark && count <= most; at += step, --left) ++count;
   }
 };
 
 // Run lengths along a line through the core at (i, j): first against (di, dj), then along it. The first half may count
 // maxCount pixels and end at the border, the second stays below maxCount and ends before it, but for its last run.
 // Answers where counting ended, or nothing when a run is too long or leaves the image.
-std::optional<cv::Point> CountRuns(const cv::Mat& image, ChartRows* rows, int i, int j, int di, int dj, int maxCount,
-                                   int* counts) {
+std::optional<cv::Point> CountRuns(const cv::Mat& image, const CutPhoto* photo, int i, int j, int di, int dj,
+                                   int maxCount, int* counts) {
   if (i < 0 || i >= image.rows || j < 0 || j >= image.cols) return std::nullopt;
-  const auto* const core = image.ptr<uchar>(i, j);
-  const std::ptrdiff_t step = di * static_cast<std::ptrdiff_t>(image.step) + dj;
-  Walk back{core, 0, -step, std::min(di == 0 ? INT_MAX : i + 1, dj == 0 ? INT_MAX : j + 1), i, -di, rows};
+  const auto* const core = image.ptr(i, j);
+  const std::ptrdiff_t step =
+      di * static_cast<std::ptrdiff_t>(image.step) + dj * static_cast<std::ptrdiff_t>(image.elemSize());
+  Walk back{core, 0, -step, std::min(di == 0 ? INT_MAX : i + 1, dj == 0 ? INT_MAX : j + 1), photo};
   back.Count(true, kNoLimit, counts[2]);
   if (back.left == 0) return std::nullopt;
   back.Count(false, maxCount, counts[1]);
@@ -78,7 +73,7 @@ std::optional<cv::Point> CountRuns(const cv::Mat& image, ChartRows* rows, int i,
   if (counts[0] > maxCount) return std::nullopt;
 
   const int ahead_left = std::min(di == 0 ? INT_MAX : image.rows - 1 - i, dj == 0 ? INT_MAX : image.cols - 1 - j);
-  Walk ahead{core, step, step, ahead_left, i + di, di, rows};
+  Walk ahead{core, step, step, ahead_left, photo};
   ahead.Count(true, kNoLimit, counts[2]);
   if (ahead.left == 0) return std::nullopt;
   ahead.Count(false, maxCount - 1, counts[3]);
@@ -92,7 +87,10 @@ std::optional<cv::Point> CountRuns(const cv::Mat& image, ChartRows* rows, int i,
 }  // namespace
 
 std::vector<cv::Point> QVTester::GetFinderPoints(cv::Mat image) {
-  if (image.type() != CV_8UC1) CV_Error(cv::Error::StsUnsupportedFormat, "finder marks need one channel of 8 bits");
+  const CutPhoto* const photo = kept_->cut_photo;
+  if (photo == nullptr && image.type() != CV_8UC1) {
+    CV_Error(cv::Error::StsUnsupportedFormat, "finder marks need one channel of 8 bits");
+  }
   hasSkipped = false;
   possibleCenters.clear();
   if (image.rows < 3) return selectBestPatterns();
@@ -101,8 +99,9 @@ std::vector<cv::Point> QVTester::GetFinderPoints(cv::Mat image) {
   int iSkip = kRowStep;
   bool done = false;
   for (int i = kFirstRow; i < image.rows && !done; i += iSkip) {
-    if (kept_->rows != nullptr) kept_->rows->NeedSome(i, iSkip);
-    runs.Read(image.ptr<uchar>(i), image.ptr<uchar>(std::min(i + iSkip, image.rows - 1)));
+    const uchar* const row = image.ptr(i);
+    const uchar* const next = image.ptr(std::min(i + iSkip, image.rows - 1));
+    photo == nullptr ? runs.Read(row, next) : runs.Read(*photo, row, next);
     const int* bounds = runs.Begin();
     while ((bounds = runs.NextMark(bounds)) != nullptr) {
       int counts[5];
@@ -166,7 +165,7 @@ float QVTester::centerFromEnd(int* stateCount, int end) {
 
 float QVTester::crossCheckVertical(cv::Mat image, int startI, int centerJ, int maxCount, int rowStateCountTotal) {
   getCrossCheckStateCount();
-  const auto end = CountRuns(image, kept_->rows, startI, centerJ, 1, 0, maxCount, crossCheckStateCount);
+  const auto end = CountRuns(image, kept_->cut_photo, startI, centerJ, 1, 0, maxCount, crossCheckStateCount);
   if (!end) return FLT_MAX;
   // 40 % off the row's total is too much.
   if (5 * std::abs(Total(crossCheckStateCount) - rowStateCountTotal) >= 2 * rowStateCountTotal) return FLT_MAX;
@@ -175,7 +174,7 @@ float QVTester::crossCheckVertical(cv::Mat image, int startI, int centerJ, int m
 
 float QVTester::crossCheckHorizontal(cv::Mat image, int startJ, int centerI, int maxCount, int rowStateCountTotal) {
   getCrossCheckStateCount();
-  const auto end = CountRuns(image, kept_->rows, centerI, startJ, 0, 1, maxCount, crossCheckStateCount);
+  const auto end = CountRuns(image, kept_->cut_photo, centerI, startJ, 0, 1, maxCount, crossCheckStateCount);
   if (!end) return FLT_MAX;
   // 20 % off the row's total is too much: half of what the vertical check allows.
   if (5 * std::abs(Total(crossCheckStateCount) - rowStateCountTotal) >= rowStateCountTotal) return FLT_MAX;
@@ -184,7 +183,7 @@ float QVTester::crossCheckHorizontal(cv::Mat image, int startJ, int centerI, int
 
 bool QVTester::crossCheckDiagonal(cv::Mat image, int startI, int centerJ, int maxCount, int rowStateCountTotal) {
   getCrossCheckStateCount();
-  return CountRuns(image, kept_->rows, startI, centerJ, 1, 1, maxCount, crossCheckStateCount) &&
+  return CountRuns(image, kept_->cut_photo, startI, centerJ, 1, 1, maxCount, crossCheckStateCount) &&
          std::abs(Total(crossCheckStateCount) - rowStateCountTotal) < 2 * rowStateCountTotal &&
          foundPatternCross(crossCheckStateCount);
 }

@@ -11,7 +11,8 @@
 
 namespace {
 
-constexpr int kBlock = 64;
+constexpr int kBlock = CutPhoto::kBlock;
+constexpr int kCacheLine = 64;
 
 // Bit k is set when pixel k is dark.
 std::uint64_t DarkMask(const uchar* pixels) {
@@ -46,19 +47,13 @@ int MayBeMarks(const int* bounds) {
 }  // namespace
 
 // A block's mask, exclusive-or itself moved up by a pixel, has a bit wherever dark and light meet, so a block of one
-// kind costs no more than its reading. Rows lie far apart: the processor would not fetch the next one by itself.
-void DarkRuns::Read(const uchar* row, const uchar* next) {
+// kind costs no more than its reading.
+template <typename DarkMask>
+void DarkRuns::Take(DarkMask dark_mask) {
   int* bound = bounds_.data();
   std::uint64_t last = 0;  // of the block before: light before the row
   for (int j = 0; j < cols_; j += kBlock) {
-    __builtin_prefetch(next + j);
-    uchar rest[kBlock];
-    const bool whole = cols_ - j >= kBlock;
-    if (!whole) {  // light behind the row
-      std::memset(rest, 255, kBlock);
-      std::memcpy(rest, row + j, static_cast<std::size_t>(cols_ - j));
-    }
-    const std::uint64_t dark = DarkMask(whole ? row + j : rest);
+    const std::uint64_t dark = dark_mask(j);
     for (std::uint64_t meet = dark ^ (dark << 1 | last); meet != 0; meet &= meet - 1) {
       *bound++ = j + __builtin_ctzll(meet);
     }
@@ -66,6 +61,30 @@ void DarkRuns::Read(const uchar* row, const uchar* next) {
   }
   if (last != 0) *bound++ = cols_;
   end_ = bound;
+}
+
+// Rows lie far apart: the processor would not fetch the next one by itself.
+void DarkRuns::Read(const uchar* row, const uchar* next) {
+  Take([&](int j) {
+    __builtin_prefetch(next + j);
+    uchar rest[kBlock];
+    const bool whole = cols_ - j >= kBlock;
+    if (!whole) {  // light behind the row
+      std::memset(rest, 255, kBlock);
+      std::memcpy(rest, row + j, static_cast<std::size_t>(cols_ - j));
+    }
+    return DarkMask(whole ? row + j : rest);
+  });
+}
+
+void DarkRuns::Read(const CutPhoto& photo, const uchar* row, const uchar* next) {
+  const int bytes = kBlock * photo.channels();
+  Take([&, at = 0](int j) mutable {
+    for (int line = 0; line < bytes; line += kCacheLine) __builtin_prefetch(next + at + line);
+    const std::uint64_t dark = photo.DarkMask(row + at, cols_ - j);
+    at += bytes;
+    return dark;
+  });
 }
 
 const int* DarkRuns::NextMark(const int* bounds) const {

@@ -58,12 +58,13 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const char* name;
     plain::Agreement (*compare)(Draws& any);
   } kForms[] = {{"GetFinderPoints", plain::ScanOfRunsAndOfPixels},
-                {"FindMarks", plain::ScanOfRowsAndOfThePicture},
+                {"FindMarks", plain::ScanOfThePhotoAndOfItsCut},
                 {"DetectDot", plain::Dots},
                 {"CalculateSFR", plain::Sfr},
                 {"ErrorAreaClustering", plain::Areas},
                 {"rgb2xyz and xyz2cct", plain::Colours},
-                {"WarpRegion", plain::Warp}};
+                {"WarpRegion", plain::Warp},
+                {"DarkMask", plain::DarkPixels}};
   Bytes bytes(data, size);
   const auto subject = bytes.ConsumeIntegralInRange<std::size_t>(0, std::size(kForms));
   if (subject == std::size(kForms)) {

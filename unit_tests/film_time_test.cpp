@@ -47,11 +47,12 @@ TEST(FilmTime, StampsBecomeTimes) {
   }
 }
 
-TEST(ChartRows, FindWhatTheWholePictureShows) {
-  ExpectAgreement(plain::ScanOfRowsAndOfThePicture, 6000, 0.05);
+TEST(CutPhoto, ShowsTheSearchWhatTheBinaryPictureDoes) {
+  ExpectAgreement(plain::ScanOfThePhotoAndOfItsCut, 6000, 0.05);
+  ExpectAgreement(plain::DarkPixels, 20000, 0.2);
   QVTester tester;
   EXPECT_THROW(FindMarks(tester, cv::Mat(40, 40, CV_16UC3), 125), cv::Exception);
-  EXPECT_EQ(nullptr, tester.kept_->rows);
+  EXPECT_EQ(nullptr, tester.kept_->cut_photo);
 }
 
 }  // namespace

@@ -4,7 +4,6 @@
 
 #include <opencv2/imgproc.hpp>
 
-#include "chart/chart_rows.h"
 #include "unit_tests/agreement_test.h"
 #include "unit_tests/drawing.h"
 
@@ -56,16 +55,6 @@ TEST(RegionWarp, AMapThatFoldsShowsOnePixel) {
   cv::Mat whole;
   cv::warpAffine(image, whole, map, {30, 30});
   EXPECT_EQ(0, cv::norm(whole(cv::Rect(4, 5, 20, 20)), WarpRegion(image, map, {30, 30}, {4, 5, 20, 20}), cv::NORM_INF));
-}
-
-// Rows are made apart from each other while marks are looked for.
-TEST(ChartRows, AreCutAtTheThresholdHoweverTheyAreMade) {
-  cv::Mat sheet(400, 400, CV_8UC1, cv::Scalar(235));
-  for (const cv::Point at : {cv::Point(40, 40), {40, 250}, {250, 40}}) DrawMark(sheet, at.x, at.y, 6, 125, 235);
-  cv::cvtColor(sheet, sheet, cv::COLOR_GRAY2BGR);
-  QVTester tester;
-  EXPECT_EQ(3U, FindMarks(tester, sheet, 125).size());
-  EXPECT_EQ(0U, FindMarks(tester, sheet, 124).size());
 }
 
 TEST(RegionWarp, ALargePictureKeepsItsPlaces) {

@@ -449,9 +449,9 @@ class QV_API QVTester {
     // Work images: kept, since new pages cost more than what is written to them. The next test overwrites them, so
     // nothing that is handed out shares them.
     cv::Mat gray, binary;
-    bool publishes = true;            // tests write system properties; else they write none
-    int published = 0;                // system properties written; what the store refused is not counted
-    class ChartRows* rows = nullptr;  // makes the binary picture as a search reads it; null: all of it is there
+    bool publishes = true;                      // tests write system properties; else they write none
+    int published = 0;                          // system properties written; what the store refused is not counted
+    const class CutPhoto* cut_photo = nullptr;  // what a search reads; null: a binary picture
     // Called after each frame of a film with the frames so far and those that the container promises (0 where it says
     // nothing); may be empty.
     std::function<void(int frames, int promised)> film_progress;

@@ -1,6 +1,6 @@
 // Tests 25 and 26: frames and time stamps of a film, and the chart's marks in each frame.
 
-#include "chart/chart_rows.h"
+#include "chart/cut_photo.h"
 #include "chart/points.h"
 #include "core/slots.h"
 #include "qvtester/tester.h"

@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <opencv2/imgproc.hpp>
 
-#include "chart/chart_rows.h"
+#include "chart/cut_photo.h"
 #include "chart/find_chart.h"
 #include "chart/region_warp.h"
 #include "unit_tests/plain/colour.h"
@@ -41,14 +41,32 @@ inline Agreement ScanOfRunsAndOfPixels(Draws& any) {
   return {expected == fast.GetFinderPoints(image) && Bits(Traces(plain)) == Bits(Traces(fast)), expected.size()};
 }
 
-inline Agreement ScanOfRowsAndOfThePicture(Draws& any) {
+inline Agreement ScanOfThePhotoAndOfItsCut(Draws& any) {
   const cv::Mat photo = RandomMarkPhoto(any);
   const int threshold = any.Pick({125, 125, 125, -1, 0, 254, 255, 400});
   QVTester whole;
-  QVTester rows;
-  rows.kept_->binary = cv::Mat(200, 240, CV_8UC1, cv::Scalar(any.Pick({0, 255})));  // what the frame before left
+  QVTester cut;
   const auto expected = whole.GetFinderPoints(Binarise(whole, photo, threshold, nullptr));
-  return {expected == FindMarks(rows, photo, threshold) && Bits(Traces(whole)) == Bits(Traces(rows)), expected.size()};
+  return {expected == FindMarks(cut, photo, threshold) && Bits(Traces(whole)) == Bits(Traces(cut)), expected.size()};
+}
+
+// A block of a photo whose channels lie near the threshold, by blocks and by pixels.
+inline Agreement DarkPixels(Draws& any) {
+  cv::Mat row(1, any.Whole(1, CutPhoto::kBlock), any.OneIn(4) ? CV_8UC4 : CV_8UC3);
+  const int threshold = any.Whole(-2, 257);
+  const int middle = std::clamp(threshold, 0, 255);
+  const int spread = any.Pick({1, 2, 5, 40, 256});
+  any.Fill(row, std::max(middle - spread, 0), std::min(middle + spread, 255) + 1);
+  QVTester tester;
+  const cv::Mat binary = Binarise(tester, row, threshold, nullptr);
+  const CutPhoto cut(row, threshold);
+  const std::uint64_t mask = cut.DarkMask(row.data, row.cols);
+  bool same = row.cols == CutPhoto::kBlock || mask >> row.cols == 0;
+  for (int k = 0; k < row.cols; ++k) {
+    const bool dark = binary.at<uchar>(k) == 0;
+    same = same && (mask >> k & 1) == (dark ? 1U : 0U) && cut.IsDark(row.ptr(0, k)) == dark;
+  }
+  return {same, static_cast<std::size_t>(cv::countNonZero(binary)), static_cast<std::size_t>(row.cols)};
 }
 
 inline Agreement Dots(Draws& any) {
