@@ -93,7 +93,7 @@ std::vector<std::string> Words(const cv::Mat& frame, const FilmStyle& style, con
   for (std::string word; raw >> word;) words.push_back(word);
   words.insert(words.end(), {"-i", "pipe:0", "-vf", StampFilter(style)});
   std::istringstream coded(
-      "-fps_mode passthrough -enc_time_base 1:90000 -c:v libx264 -preset veryfast -crf 10 "
+      "-fps_mode passthrough -enc_time_base 1:90000 -c:v libx264 -threads 4 -preset veryfast -crf 10 "
       "-sws_flags accurate_rnd+full_chroma_int -pix_fmt yuv420p");
   for (std::string word; coded >> word;) words.push_back(word);
   words.push_back(output);
