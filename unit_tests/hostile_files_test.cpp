@@ -1,7 +1,9 @@
 // Files that lead a decoder elsewhere, keep it waiting or ask for the whole memory; and all that must still be read.
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cstdint>
 #include <filesystem>
@@ -143,6 +145,12 @@ TEST_F(Files, WhatIsNoFileEndsAtOnce) {
   for (const std::string& path : {pipe, link, std::string("/dev/zero"), std::string("/dev/tty"), folder_.Path("")}) {
     ExpectRefused(path);
   }
+  // Nor is anything closed but what was opened: standard input, for one.
+  const bool closed = fcntl(0, F_GETFD) < 0;
+  if (closed) ASSERT_EQ(0, open("/dev/null", O_RDONLY | O_CLOEXEC));
+  ExpectRefused(folder_.Path(""));
+  EXPECT_LE(0, fcntl(0, F_GETFD));
+  if (closed) close(0);
 }
 
 // An extended WebP file gives width and height less one, three bytes each.
