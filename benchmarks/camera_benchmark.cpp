@@ -204,7 +204,7 @@ void CaptureCalls(benchmark::State& state) {
 }
 BENCHMARK(CaptureCalls)->Arg(0)->Arg(3);
 
-const Ratios kRatios = {
+const Ratios kCameraRatios = {
     {"lens dust, real", "TestLensDust/real", {"DustCalls/real"}, 1.10},
     {"lens dust, fake", "TestLensDust/fake", {"DustCalls/fake"}, 1.10},
     {"loading a photo, over cv::imread", "SetResource", {"Imread"}, 1.05},

@@ -18,8 +18,8 @@
 
 namespace {
 
-constexpr int kThreshold = 125;
-const cv::Size kSize(4000, 3000);
+constexpr int kChartThreshold = 125;
+const cv::Size kChartSize(4000, 3000);
 
 cv::Mat GrayChart() {
   cv::Mat gray;
@@ -35,15 +35,15 @@ cv::Mat SpeckedChart() {
 }
 
 cv::Mat Noise() {
-  cv::Mat noise(kSize, CV_8UC1);
+  cv::Mat noise(kChartSize, CV_8UC1);
   cv::randu(noise, 0, 256);
   return noise > 127;
 }
 
 // Blocks as of a two-dimensional code of so many modules a side, over the whole picture.
 cv::Mat Code(int modules) {
-  const int module = kSize.height / modules;
-  cv::Mat blocks(modules, kSize.width / module + 1, CV_8UC1);
+  const int module = kChartSize.height / modules;
+  cv::Mat blocks(modules, kChartSize.width / module + 1, CV_8UC1);
   cv::randu(blocks, 0, 256);
   cv::Mat code;
   cv::resize(blocks > 127, code, {}, module, module, cv::INTER_NEAREST);
@@ -52,14 +52,14 @@ cv::Mat Code(int modules) {
     code(cv::Rect(corner, cv::Size(8 * module, 8 * module))).setTo(255);
     DrawMark(code, corner.y + (corner.y > 0 ? module : 0), corner.x + (corner.x > 0 ? module : 0), module);
   }
-  cv::Mat picture(kSize, CV_8UC1, cv::Scalar(255));
-  const cv::Rect shared = cv::Rect({}, code.size()) & cv::Rect({}, kSize);
+  cv::Mat picture(kChartSize, CV_8UC1, cv::Scalar(255));
+  const cv::Rect shared = cv::Rect({}, code.size()) & cv::Rect({}, kChartSize);
   code(shared).copyTo(picture(shared));
   return picture;
 }
 
 const cv::Mat& Binary(const std::string& name) {
-  static const std::map<std::string, cv::Mat> pictures = {{"chart", GrayChart() > kThreshold},
+  static const std::map<std::string, cv::Mat> pictures = {{"chart", GrayChart() > kChartThreshold},
                                                           {"specks", SpeckedChart()},
                                                           {"code10", Code(57)},
                                                           {"code40", Code(177)},
@@ -113,7 +113,7 @@ void GrayAndBinary(benchmark::State& state) {
   const cv::Mat& photo = ChartPhoto();
   QVTester tester;
   for ([[maybe_unused]] auto _ : state) {
-    benchmark::DoNotOptimize(Binarise(tester, photo, kThreshold, nullptr).data);
+    benchmark::DoNotOptimize(Binarise(tester, photo, kChartThreshold, nullptr).data);
   }
 }
 BENCHMARK(GrayAndBinary);
@@ -124,7 +124,7 @@ void CvtColorAndThreshold(benchmark::State& state) {
   cv::Mat binary;
   for ([[maybe_unused]] auto _ : state) {
     cv::cvtColor(photo, gray, cv::COLOR_RGB2GRAY);
-    cv::threshold(gray, binary, kThreshold, 255, cv::THRESH_BINARY);
+    cv::threshold(gray, binary, kChartThreshold, 255, cv::THRESH_BINARY);
     benchmark::DoNotOptimize(binary.data);
   }
 }
@@ -135,7 +135,7 @@ BENCHMARK(CvtColorAndThreshold);
 // Marks of a chart turned counter-clockwise, rows in x.
 std::vector<cv::Point> Marks(double turn_deg) {
   ChartView view;
-  view.size = kSize;
+  view.size = kChartSize;
   view.turn_deg = turn_deg;
   view.scale = 0.3;
   std::vector<cv::Point> points;
@@ -158,7 +158,7 @@ BENCHMARK(NormalizePatternImage)->Arg(0)->Arg(3)->Arg(118);
 
 void CopyIntoCanvas(benchmark::State& state) {
   const cv::Mat gray = GrayChart();
-  cv::Mat canvas(kSize.width, kSize.width, CV_8UC1);
+  cv::Mat canvas(kChartSize.width, kChartSize.width, CV_8UC1);
   for ([[maybe_unused]] auto _ : state) {
     gray.copyTo(canvas.rowRange(0, gray.rows));
     canvas.rowRange(gray.rows, canvas.rows).setTo(0);
@@ -169,12 +169,12 @@ BENCHMARK(CopyIntoCanvas);
 
 void WarpAffine(benchmark::State& state) {
   const cv::Mat gray = GrayChart();
-  const float middle = static_cast<float>(kSize.width) * 0.5f;
+  const float middle = static_cast<float>(kChartSize.width) * 0.5f;
   const float angle_deg = QVTester().GetPatternAngle(Marks(static_cast<double>(state.range(0))));
   const cv::Mat turn = cv::getRotationMatrix2D({middle, middle}, 315 - angle_deg, 1);
   cv::Mat canvas;
   for ([[maybe_unused]] auto _ : state) {
-    cv::warpAffine(gray, canvas, turn, {kSize.width, kSize.width});
+    cv::warpAffine(gray, canvas, turn, {kChartSize.width, kChartSize.width});
     benchmark::DoNotOptimize(canvas.data);
   }
 }
@@ -223,7 +223,7 @@ void PlainSFRFromImage(benchmark::State& state) {
 }
 BENCHMARK(PlainSFRFromImage)->Arg(0)->Arg(3)->Arg(29)->Arg(118);
 
-const Ratios kRatios = {
+const Ratios kChartRatios = {
     {"finder marks, chart", "GetFinderPoints/chart", {"PlainFinderPoints/chart"}, 0.10},
     {"finder marks, chart, over reading", "GetFinderPoints/chart", {"ReadRows/chart"}, 3},
     {"finder marks, specks", "GetFinderPoints/specks", {"PlainFinderPoints/specks"}, 0.13},

@@ -107,7 +107,7 @@ void PowAndExp(benchmark::State& state) {
 }
 BENCHMARK(PowAndExp);
 
-const Ratios kRatios = {
+const Ratios kColourRatios = {
     {"RGB to XYZ, over cv::transform", "Rgb2Xyz", {"Transform"}, 1.8},
     {"RGB to XYZ", "Rgb2Xyz", {"PlainRgb2Xyz"}, 1},
     {"colour temperature, warm", "Xyz2Cct/warm", {"PowAndExp"}, 2.4},

@@ -13,30 +13,31 @@
 
 namespace {
 
-const cv::Size kSize(4000, 3000);
+const cv::Size kCaptureSize(4000, 3000);
 constexpr int kRadius = 10;
-constexpr float kThreshold = 0.1f;
+constexpr float kDotThreshold = 0.1f;
 
 // Light that falls off to the side, a little noise, and some hundred dots.
 cv::Mat& Capture() {
   static cv::Mat capture;
   if (!capture.empty()) return capture;
-  capture.create(kSize, CV_32FC3);
+  capture.create(kCaptureSize, CV_32FC3);
   cv::RNG random(1);
   random.fill(capture, cv::RNG::UNIFORM, 0.98, 1.02);
-  for (int x = 0; x < kSize.width; ++x) capture.col(x) *= 200 - 0.02 * x;
+  for (int x = 0; x < kCaptureSize.width; ++x) capture.col(x) *= 200 - 0.02 * x;
   for (int i = 0; i < 300; ++i) {
-    capture.at<cv::Vec3f>(cv::Point{random.uniform(0, kSize.width), random.uniform(0, kSize.height)}) = {400, 400, 400};
+    capture.at<cv::Vec3f>(cv::Point{random.uniform(0, kCaptureSize.width), random.uniform(0, kCaptureSize.height)}) = {
+        400, 400, 400};
   }
   return capture;
 }
 
 void DetectDot(benchmark::State& state) {
   cv::Mat& capture = Capture();
-  cv::Mat mask(kSize, CV_8U, cv::Scalar(0));
+  cv::Mat mask(kCaptureSize, CV_8U, cv::Scalar(0));
   QVTester tester;
   for ([[maybe_unused]] auto _ : state) {
-    tester.DetectDot(capture.ptr<float>(), kSize.height, kSize.width, kThreshold, kRadius, mask.data);
+    tester.DetectDot(capture.ptr<float>(), kCaptureSize.height, kCaptureSize.width, kDotThreshold, kRadius, mask.data);
     benchmark::DoNotOptimize(mask.data);
   }
 }
@@ -44,9 +45,9 @@ BENCHMARK(DetectDot);
 
 void PlainDetectDot(benchmark::State& state) {
   const cv::Mat& capture = Capture();
-  cv::Mat mask(kSize, CV_8U, cv::Scalar(0));
+  cv::Mat mask(kCaptureSize, CV_8U, cv::Scalar(0));
   for ([[maybe_unused]] auto _ : state) {
-    plain::DetectDot(capture.ptr<float>(), kSize.height, kSize.width, kThreshold, kRadius, mask.data);
+    plain::DetectDot(capture.ptr<float>(), kCaptureSize.height, kCaptureSize.width, kDotThreshold, kRadius, mask.data);
     benchmark::DoNotOptimize(mask.data);
   }
 }
@@ -80,8 +81,8 @@ void BoxFilter(benchmark::State& state) {
     cv::boxFilter(channel, mean, CV_32F, {2 * kRadius + 1, 2 * kRadius + 1});
     cv::subtract(mean, channel, departure);
     cv::divide(departure, mean, departure);
-    cv::compare(departure, kThreshold, mask, cv::CMP_GT);
-    cv::compare(departure, -kThreshold, below, cv::CMP_LT);
+    cv::compare(departure, kDotThreshold, mask, cv::CMP_GT);
+    cv::compare(departure, -kDotThreshold, below, cv::CMP_LT);
     cv::bitwise_or(mask, below, mask);
     benchmark::DoNotOptimize(mask.data);
   };
@@ -90,7 +91,7 @@ void BoxFilter(benchmark::State& state) {
 }
 BENCHMARK(BoxFilter);
 
-const Ratios kRatios = {
+const Ratios kDotsRatios = {
     {"dots", "DetectDot", {"PlainDetectDot"}, 0.25},
     {"dots, over box filters", "DetectDot", {"BoxFilter"}, 0.30},
     {"dots, over reading", "DetectDot", {"ReadCapture"}, 3},

@@ -17,8 +17,8 @@
 
 namespace {
 
-constexpr int kThreshold = 125;
-const cv::Size kSize(1920, 1080);
+constexpr int kFilmThreshold = 125;
+const cv::Size kFrameSize(1920, 1080);
 
 // A chart that sways, with noise.
 const std::vector<cv::Mat>& Frames() {
@@ -26,10 +26,10 @@ const std::vector<cv::Mat>& Frames() {
     std::vector<cv::Mat> all;
     cv::RNG random(1);
     for (int i = 0; i < 40; ++i) {
-      cv::Mat noise(kSize, CV_16SC3);
+      cv::Mat noise(kFrameSize, CV_16SC3);
       random.fill(noise, cv::RNG::NORMAL, 0, 2);
       cv::Mat frame;
-      cv::add(DrawChart({3, 0.1 * i, 0.12, kSize, 1}), noise, frame, cv::noArray(), CV_8U);
+      cv::add(DrawChart({3, 0.1 * i, 0.12, kFrameSize, 1}), noise, frame, cv::noArray(), CV_8U);
       all.push_back(frame);
     }
     return all;
@@ -41,7 +41,7 @@ enum Kind { kRich, kThin };
 
 std::vector<cv::Mat> PlainFrames() {
   std::vector<cv::Mat> frames;
-  for (int i = 0; i < 40; ++i) frames.push_back(DrawChart({3, 0.1 * i, 0.12, kSize, 1}));
+  for (int i = 0; i < 40; ++i) frames.push_back(DrawChart({3, 0.1 * i, 0.12, kFrameSize, 1}));
   return frames;
 }
 
@@ -70,7 +70,7 @@ void DecodeAndBinarise(benchmark::State& state) {
   cv::Mat frame;
   for ([[maybe_unused]] auto _ : state) {
     cv::VideoCapture film(path, cv::CAP_FFMPEG);
-    while (film.read(frame)) benchmark::DoNotOptimize(Binarise(tester, frame, kThreshold, nullptr).data);
+    while (film.read(frame)) benchmark::DoNotOptimize(Binarise(tester, frame, kFilmThreshold, nullptr).data);
   }
 }
 BENCHMARK(DecodeAndBinarise)->MeasureProcessCPUTime();
@@ -91,19 +91,19 @@ BENCHMARK_CAPTURE(Film, autofocus_thin, QV_TEST_VIDEO_AUTOFOCUS, QV_RESOURCE_VID
 
 void MarksOfFrame(benchmark::State& state) {
   QVTester tester;
-  for ([[maybe_unused]] auto _ : state) benchmark::DoNotOptimize(FindMarks(tester, Frames()[0], kThreshold));
+  for ([[maybe_unused]] auto _ : state) benchmark::DoNotOptimize(FindMarks(tester, Frames()[0], kFilmThreshold));
 }
 BENCHMARK(MarksOfFrame);
 
 void PlainMarksOfFrame(benchmark::State& state) {
   QVTester tester;
   for ([[maybe_unused]] auto _ : state) {
-    benchmark::DoNotOptimize(tester.GetFinderPoints(Binarise(tester, Frames()[0], kThreshold, nullptr)));
+    benchmark::DoNotOptimize(tester.GetFinderPoints(Binarise(tester, Frames()[0], kFilmThreshold, nullptr)));
   }
 }
 BENCHMARK(PlainMarksOfFrame);
 
-const Ratios kRatios = {
+const Ratios kFilmRatios = {
     {"film: marks of each frame, over decoding", "Film/record", {"Decode/rich"}, 1.15},
     {"film of 0.2 Mbit/s: the same", "Film/record_thin", {"Decode/thin"}, 1.15},
     {"film: MTF50 of each frame, over decoding", "Film/autofocus", {"Decode/rich"}, 1.5},

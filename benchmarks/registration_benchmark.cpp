@@ -39,6 +39,6 @@ void PlainGetUnwarpedImage(benchmark::State& state) {
 }
 BENCHMARK(PlainGetUnwarpedImage);
 
-const Ratios kRatios = {{"registration, 640 x 480", "GetUnwarpedImage", {"PlainGetUnwarpedImage"}, 0.5}};
+const Ratios kRegistrationRatios = {{"registration, 640 x 480", "GetUnwarpedImage", {"PlainGetUnwarpedImage"}, 0.5}};
 
 }  // namespace

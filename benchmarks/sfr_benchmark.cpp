@@ -66,7 +66,7 @@ void SlantedEdgeMtfOfVigra(benchmark::State& state) {
 BENCHMARK(SlantedEdgeMtfOfVigra)->Args({200, 600})->Args({400, 1200});
 #endif
 
-const Ratios kRatios = {
+const Ratios kSfrRatios = {
     {"SFR, region 200 x 600", "CalculateSFR/200/600", {"PlainSFR/200/600"}, 0.30},
     {"SFR, region 200 x 600", "CalculateSFR/200/600", {"SlantedEdgeMtfOfVigra/200/600"}, 1.0 / 14},
     {"SFR, region 400 x 1200", "CalculateSFR/400/1200", {"PlainSFR/400/1200"}, 0.30},
