@@ -63,12 +63,14 @@ struct NoSession {
   std::string why;
 };
 
-NoSession AskServer(const std::string& name, const soci::soci_error& e) {
+// `lost`: what failed would succeed on a server that has come meanwhile.
+NoSession AskServer(const std::string& name, const soci::soci_error& e, bool lost) {
   const std::string address = Address(name);
   const PGPing answer = PQping(address.c_str());
   if (answer == PQPING_NO_RESPONSE) return {true, "no server answers there"};
   if (answer == PQPING_REJECT) return {true, "the server takes no connections yet"};
   const std::unique_ptr<PGconn, void (*)(PGconn*)> connection(PQconnectdb(address.c_str()), PQfinish);
+  if (lost && PQstatus(connection.get()) == CONNECTION_OK) return {true, "the server has only just come"};
   const std::string said = connection ? PQerrorMessage(connection.get()) : "";
   return {false, OneLine(said.empty() ? e.what() : said)};
 }
@@ -126,7 +128,8 @@ void Store::Database::Open(Use use) {
       Migrate(use);
       return;
     } catch (const soci::soci_error& e) {
-      const NoSession no = server_ ? AskServer(name_, e) : NoSession{false, OneLine(e.what())};
+      const bool lost = session_ == nullptr || WorthAnotherTry(e);
+      const NoSession no = server_ ? AskServer(name_, e, lost) : NoSession{false, OneLine(e.what())};
       const bool worth_waiting = no.away && use == Use::kWrite;
       if (worth_waiting && wait.Again(no.why)) continue;
       throw Failure(worth_waiting ? kInternalFault : kWrongUsage, shown_ + ": can't be opened as a store: " + no.why);
