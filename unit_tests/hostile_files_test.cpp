@@ -147,7 +147,9 @@ TEST_F(Files, WhatIsNoFileEndsAtOnce) {
   }
   // Nor is anything closed but what was opened: standard input, for one.
   const bool closed = fcntl(0, F_GETFD) < 0;
-  if (closed) ASSERT_EQ(0, open("/dev/null", O_RDONLY | O_CLOEXEC));
+  if (closed) {
+    ASSERT_EQ(0, open("/dev/null", O_RDONLY | O_CLOEXEC));
+  }
   ExpectRefused(folder_.Path(""));
   EXPECT_LE(0, fcntl(0, F_GETFD));
   if (closed) close(0);
