@@ -9,6 +9,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/measure/measure.h"
+#include "desk/measure/measurement.h"
 #include "desk/simulation/simulation.h"
 #include "unit_tests/drawing.h"
 
@@ -138,6 +139,104 @@ TEST_F(PanelPhotos, BothMapsOfARegistrationStandSideBySide) {
   EXPECT_GT(record.phase.Find("map_distance")->value(), 0);
   const Record blank = MeasureAnew({"registration", {photos[0], DrawScene(9, {400, 300})}, {{"map", "robust"}}});
   EXPECT_TRUE(Says(blank, "robust_map_doubtful"));
+}
+
+// What a picture says of a figure: the word before its line, and the line, in one tone.
+std::string Said(const Picture& picture, const std::string& figure) {
+  const std::vector<Picture::Words>& words = picture.words();
+  for (std::size_t i = 1; i < words.size(); ++i) {
+    if (words[i].text.rfind(figure + " ", 0) != 0) continue;
+    EXPECT_EQ(words[i].tone, words[i - 1].tone) << figure;
+    EXPECT_EQ(words[i].tone == kPoor, words[i - 1].text == "FAIL") << figure;
+    return words[i - 1].text + " " + words[i].text;
+  }
+  return "nothing";
+}
+
+// At a place in the photo, in red what failed.
+bool SaysAtPlace(const Picture& picture, const std::string& verdict, bool failed) {
+  return std::any_of(picture.words().begin(), picture.words().end(), [&](const Picture::Words& words) {
+    return words.text.find(verdict) != std::string::npos && (words.tone == kPoor) == failed;
+  });
+}
+
+struct PictureCase {
+  const char* measurement;
+  const char* scene;
+  Json parameters;
+  std::vector<std::string> shown;  // without a limit too
+  const char* list = nullptr;      // whose entries stand at their places
+};
+
+// The limits that every single figure keeps or breaks, and each entry of the list.
+Limits LimitsAround(const Record& record, const char* list, bool kept) {
+  Limits limits;
+  for (const Reading& m : record.phase.readings) {
+    const bool wanted = list != nullptr && m.info->figure->name == std::string(list);
+    if (m.info->figure->axis == nullptr ? !std::isfinite(m.value()) : !wanted) continue;
+    FigureLimit& limit = limits.by_name[m.info->name];
+    (kept ? limit.max : limit.min) = 1e6;
+  }
+  return limits;
+}
+
+TEST_F(PanelPhotos, PicturesShowEachFigureWithItsVerdictAndLimit) {
+  const Json regions = Json::parse("[[40, 40, 90, 90, 7], [200, 40, 90, 90, 8]]");
+  const PictureCase cases[] = {
+      {"camera_flash", "dust", {}, {"mean", "mean_red", "mean_green", "mean_blue"}},
+      {"lens_dust", "dust", {}, {"blob_count", "spot_count", "spot_largest_area", "mean_level"}, "spot_areas"},
+      {"hdr_dots", "hdr", {}, {"dot_count", "area_count"}, "area_pixels"},
+      {"led_light", "lights", {{"regions", regions}}, {"region_count", "area_count"}, "mean_grey"},
+      {"touch_panel_led", "lights", {}, {"region_count", "area_count"}, "cct"},
+      {"lcd", "display", {{"pattern", "white"}}, {"ratio", "uniformity", "dot_count"}, "levels"},
+      {"touch_panel_print", "print", {}, {"area_count", "rms", "correlation"}, "area_pixels"},
+      {"registration", "pair", {}, {"shift_columns", "shift_rows", "turn", "scale", "map_distance"}},
+      {"camera_preview", "preview", {}, {"difference_mean"}},
+      {"circle_check", "chart", {}, {"module_size", "legs_ratio", "chart_turn"}, "centre"},
+      {"camera_autofocus", "chart", {}, {"chart_turn"}},
+      {"camera_capture", "chart", {{"standard", "p.png"}}, {"delta_e_76_mean", "delta_e_2000_max"}, "delta_e_76"}};
+  for (const PictureCase& one : cases) {
+    SCOPED_TRACE(one.measurement);
+    SimulationOptions options;
+    options.scene = one.scene;
+    options.camera.size = {640, 480};
+    options.camera.noise_percent = 0.3;
+    options.camera.gain = 0.8;
+    options.dots = 6;
+    options.extra = 1;
+    options.samples = 3;
+    const Simulation simulation = Simulate(options);
+    std::vector<std::string> paths = Write(options, simulation);
+    if (one.scene == std::string("hdr")) paths = {folder_.Write("p.pfm", simulation.levels[0])};
+    Request request = {one.measurement, {paths[0]}, one.parameters.is_null() ? Json::object() : one.parameters};
+    if (one.scene == std::string("print")) request.inputs.emplace_back(folder_.Path("samples"));
+    if (one.scene == std::string("pair") || one.scene == std::string("preview")) request.inputs.emplace_back(paths[1]);
+    if (request.parameters.contains("standard")) request.parameters["standard"] = paths[0];
+    const Record plain = MeasureAnew(request);
+    ASSERT_TRUE(plain.measured()) << plain.MissSentence();
+    const Picture bare = *plain.finding->Draw(plain);
+    for (const std::string& figure : one.shown) {
+      const std::string name = plain.phase.name + "_" + figure;
+      EXPECT_THAT(Said(bare, name), ::testing::StartsWith("MEASURED " + name));
+    }
+    for (const bool kept : {true, false}) {
+      const Limits limits = LimitsAround(plain, one.list, kept);
+      const Record judged = MeasureAnew(request, limits);
+      const Picture picture = *judged.finding->Draw(judged);
+      const std::string limit = kept ? "at most 1e+06" : "at least 1e+06";
+      std::size_t told = 0;
+      for (const auto& [name, ignored] : limits.by_name) {
+        const std::string said = Said(picture, name);
+        if (kept && said == "nothing") continue;  // where there are very many
+        EXPECT_THAT(said, ::testing::AllOf(::testing::StartsWith(kept ? "PASS " : "FAIL "), HasSubstr(limit)));
+        ++told;
+      }
+      EXPECT_GE(told, std::min<std::size_t>(limits.by_name.size(), 10));
+      if (one.list != nullptr) {
+        EXPECT_TRUE(SaysAtPlace(picture, (kept ? "PASS, " : "FAIL, ") + limit, !kept)) << one.list;
+      }
+    }
+  }
 }
 
 }  // namespace

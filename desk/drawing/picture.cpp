@@ -92,6 +92,7 @@ void Picture::Circle(cv::Point2d centre, double radius, Colour colour, double wi
 }
 
 void Picture::Text(const std::string& text, cv::Point2d place, double size, Tone tone, Align align, bool backed) {
+  words_.push_back({text, tone});
   cairo_set_font_size(cr_.get(), size);
   cairo_text_extents_t extents;
   cairo_text_extents(cr_.get(), text.c_str(), &extents);
@@ -104,6 +105,7 @@ void Picture::Text(const std::string& text, cv::Point2d place, double size, Tone
 }
 
 double Picture::Badge(const std::string& text, cv::Point2d place, double size, Tone tone) {
+  words_.push_back({text, tone});
   const double width = WidthOf(text, size);
   FillRectangle({place.x, place.y - size, width + 12, size * 1.35}, OnPaper(tone));
   cairo_set_font_size(cr_.get(), size);

@@ -47,12 +47,20 @@ class Picture {
   /// The picture as a PNG file's content; throws Failure when anything before could not be drawn.
   std::string Png() const;
 
+  /// All that was written on it, in that order.
+  struct Words {
+    std::string text;
+    Tone tone;
+  };
+  const std::vector<Words>& words() const { return words_; }
+
   int width() const { return cairo_image_surface_get_width(surface_.get()); }
   int height() const { return cairo_image_surface_get_height(surface_.get()); }
 
  private:
   std::unique_ptr<cairo_surface_t, void (*)(cairo_surface_t*)> surface_;
   std::unique_ptr<cairo_t, void (*)(cairo_t*)> cr_;
+  std::vector<Words> words_;
 };
 
 /// Width of a text of this size.

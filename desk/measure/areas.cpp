@@ -3,7 +3,7 @@
 #include <algorithm>
 
 #include "desk/base/text.h"
-#include "desk/measure/telling.h"
+#include "desk/measure/heading.h"
 
 namespace qv {
 
@@ -80,7 +80,7 @@ std::string AreaLines(const Areas& areas, const char* unit) {
   return text;
 }
 
-void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const Areas& areas,
+void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const Areas& areas, const Phase& phase,
                const std::vector<Tone>& tones) {
   constexpr double kFrame = 6;  // picture pixels around an area
   constexpr std::size_t kNumbered = 200;
@@ -101,7 +101,12 @@ void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const 
     if (areas.rectangles.size() <= kNumbered) labels.Keep(boxes.back());
   }
   for (std::size_t i = 0; i < boxes.size() && boxes.size() <= kNumbered; ++i) {
-    labels.Add(picture, {std::to_string(i)}, boxes[i], tones.empty() ? kDoubtful : tones[i], 13);
+    PlaceWords words(std::to_string(i), tones.empty() ? kDoubtful : tones[i]);
+    for (const char* figure : {"areas", "area_pixels", "area_width", "area_height"}) {
+      words.AddEntry(phase.Find(figure), i);
+    }
+    const std::vector<std::string> lines = words.judged() ? words.Lines() : std::vector<std::string>{std::to_string(i)};
+    labels.Add(picture, lines, boxes[i], words.tone(), 13);
   }
 }
 

@@ -36,9 +36,9 @@ void AddAreas(Phase& phase, const Areas& areas);
 /// A line for each of the first twenty.
 std::string AreaLines(const Areas& areas, const char* unit);
 
-/// Frames with numbers (none when there are very many); a frame keeps off what is wrong. A tone each, or none:
-/// doubtful.
-void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const Areas& areas,
+/// Frames with numbers (none when there are very many) and the verdicts on each; a frame keeps off what is wrong. A
+/// tone each, or none: doubtful.
+void DrawAreas(Picture& picture, Labels& labels, const PhotoPlace& place, const Areas& areas, const Phase& phase,
                const std::vector<Tone>& tones = {});
 
 /// What frames and rings of these tones stand for, side by side on paper; the baseline starts at the place.

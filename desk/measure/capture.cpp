@@ -89,6 +89,8 @@ void CollectByCie(Phase& phase, const PatchColours& measured, const std::map<int
   phase.Add("delta_e_2000", compared, differences);
 }
 
+constexpr double kColumn = 290;  // of the swatches, picture pixels
+
 void Swatch(Picture& picture, const cv::Rect2d& area, const cv::Point3i& colour) {
   picture.FillRectangle(area, {colour.x / 255.0, colour.y / 255.0, colour.z / 255.0});
 }
@@ -152,10 +154,14 @@ void CaptureFinding::DrawPatch(Picture& picture, const Record& record, std::size
   if (compared) Swatch(picture, {swatches.x + 26, swatches.y + 4, 84, 52}, standard[i]);
   Swatch(picture, {swatches.x + 38, swatches.y + 14, 60, 32}, measured[i]);
   if (!compared) return;
-  const Reading& largest = *record.phase.Find("delta_e_76_max");
-  const bool over = largest.limit.max && delta->values[i] > *largest.limit.max;
-  picture.Text(Format("dE %.1f", delta->values[i]), swatches + cv::Point2d(120, 28), 14, over ? kPoor : kInk);
-  if (over) picture.Text(Format("over %g", *largest.limit.max), swatches + cv::Point2d(120, 48), 14, kPoor);
+  PlaceWords words("", kInk);
+  words.AddEntry(delta, i);
+  words.AddExtreme(record.phase.Find("delta_e_76_max"), true, *delta, i);
+  cv::Point2d at = swatches + cv::Point2d(120, 20);
+  picture.Text(Format("dE %.1f", delta->values[i]), at, 14, words.tone());
+  for (const std::string& line : Wrapped(words.Verdict(), 13, kColumn - 130)) {
+    picture.Text(line, at += cv::Point2d(0, 17), 13, words.tone());
+  }
 }
 
 // Patches outlined, their numbers beside them on the photo; next to it, measured inside the standard's colour, and the
@@ -163,13 +169,13 @@ void CaptureFinding::DrawPatch(Picture& picture, const Record& record, std::size
 std::optional<Picture> CaptureFinding::Draw(const Record& record) const {
   constexpr std::size_t kRows = 12;
   constexpr double kRow = 62;
-  constexpr double kColumn = 230;
   constexpr double kLegend = 28;
   if (!ShowsPhoto(record.phase.code)) return std::nullopt;
   const double scale = FitScale(photo, 1000);
   const double width = photo.cols * scale;
   const double swatches = width + 16;
-  const Heading heading(record, record.test_name, swatches + 2 * kColumn);
+  const Heading heading(record, record.test_name, swatches + 2 * kColumn,
+                        {"delta_e_76_mean", "delta_e_76_max", "delta_e_2000_mean", "delta_e_2000_max"});
   const double top = heading.height();
   Picture picture(cvRound(swatches + 2 * kColumn), cvRound(std::max(photo.rows * scale, kRows * kRow + kLegend) + top));
   heading.Draw(picture);

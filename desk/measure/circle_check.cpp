@@ -42,8 +42,9 @@ class CircleFinding : public Finding {
     if (!ShowsPhoto(record.phase.code)) return std::nullopt;
     const double scale = FitScale(frame, 1080);
     const double width = std::max(700.0, frame.cols * scale);
-    const Heading heading(
-        record, Format("Target check: %zu of 3 marks, threshold %d", view.marks.size(), view.threshold), width);
+    const Heading heading(record,
+                          Format("Target check: %zu of 3 marks, threshold %d", view.marks.size(), view.threshold),
+                          width, {"module_size", "legs_ratio", "chart_turn"});
     Picture picture(cvRound(width), cvRound(frame.rows * scale + heading.height()));
     heading.Draw(picture);
     const PhotoPlace place = picture.PlacePhoto(frame, {0, heading.height()}, scale);
@@ -55,7 +56,9 @@ class CircleFinding : public Finding {
       picture.Line({{cross.x, at.y}, {cross.br().x, at.y}}, kGood, 3);
       picture.Line({{at.x, cross.y}, {at.x, cross.br().y}}, kGood, 3);
       labels.Keep(cross);
-      labels.Add(picture, {Format("centre (%.1f, %.1f)", m->axis[0], m->values[0])}, cross, kGood);
+      PlaceWords words(Format("centre (%.1f, %.1f)", m->axis[0], m->values[0]));
+      words.AddEntry(m, 0);
+      labels.Add(picture, words.Lines(), cross, words.tone());
     }
     return picture;
   }

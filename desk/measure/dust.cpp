@@ -5,6 +5,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "desk/base/text.h"
+#include "desk/drawing/labels.h"
 #include "desk/drawing/plot.h"
 #include "desk/measure/areas.h"
 #include "desk/measure/codec_steps.h"
@@ -47,7 +48,8 @@ class DustFinding : public Finding {
   SpotFinding spots;
 
  private:
-  void DrawPhoto(Picture& picture, double top, double scale) const;
+  void DrawPhoto(Picture& picture, const Phase& phase, double top, double scale) const;
+  void LabelSpots(Picture& picture, const Phase& phase, const PhotoPlace& place) const;
 };
 
 // The blobs that were counted: the first five outside the corners.
@@ -95,7 +97,25 @@ std::string DustFinding::Report(const Record& record) const {
   return text;
 }
 
-void DustFinding::DrawPhoto(Picture& picture, double top, double scale) const {
+// Spots of which some figure has a limit.
+void DustFinding::LabelSpots(Picture& picture, const Phase& phase, const PhotoPlace& place) const {
+  constexpr std::size_t kMost = 60;
+  Labels labels({place.origin, cv::Size2d(photo.cols * place.scale, photo.rows * place.scale)});
+  std::vector<cv::Rect2d> boxes;
+  for (const Spot& spot : spots.spots) {
+    const double reach = std::max(10.0, spot.diameter_px() / 2 * place.scale + 4);
+    const cv::Point2d half(reach, reach);
+    boxes.emplace_back(place(spot.centre) - half, place(spot.centre) + half);
+    labels.Keep(boxes.back());
+  }
+  for (std::size_t i = 0; i < std::min(boxes.size(), kMost); ++i) {
+    PlaceWords words(std::to_string(i), kDoubtful);
+    for (const char* figure : {"spots", "spot_areas", "spot_contrasts"}) words.AddEntry(phase.Find(figure), i);
+    if (words.judged()) labels.Add(picture, words.Lines(), boxes[i], words.tone(), 13);
+  }
+}
+
+void DustFinding::DrawPhoto(Picture& picture, const Phase& phase, double top, double scale) const {
   const PhotoPlace place = picture.PlacePhoto(photo, {0, top}, scale);
   for (const cv::Point corner : {cv::Point(0, 0), {1, 0}, {0, 1}, {1, 1}}) {
     const cv::Point2d at(corner.x * (photo.cols - kCornerPx) - 0.5, corner.y * (photo.rows - kCornerPx) - 0.5);
@@ -109,6 +129,7 @@ void DustFinding::DrawPhoto(Picture& picture, double top, double scale) const {
   for (const Spot& spot : spots.spots) {
     picture.Circle(place(spot.centre), std::max(6.0, spot.diameter_px() / 2 * scale + 4), kDoubtful, 1.5);
   }
+  LabelSpots(picture, phase, place);
 }
 
 Plot HistogramPlot(const Record& record) {
@@ -147,15 +168,14 @@ std::optional<Picture> DustFinding::Draw(const Record& record) const {
   const Reading* const count = record.phase.Find("blob_count");
   const bool counted = count != nullptr && count->outcome != Outcome::kUnset;
   const Heading heading(record,
-                        record.test_name + (counted ? ": " + Count(static_cast<std::size_t>(count->value()), "blob") +
-                                                          ", " + Count(spots.spots.size(), "spot")
+                        record.test_name + (counted               ? ""
                                             : record.request.fake ? ": blobs not looked for in fake mode"
                                                                   : ": too dark to judge"),
-                        width + kPlot + 10);
+                        width + kPlot + 10, {"blob_count", "spot_count", "spot_largest_area", "mean_level"});
   const double top = heading.height();
   Picture picture(cvRound(width + kPlot + 10), cvRound(std::max(photo.rows * scale, 440.0) + top));
   heading.Draw(picture);
-  DrawPhoto(picture, top, scale);
+  DrawPhoto(picture, record.phase, top, scale);
   DrawPlot(picture, HistogramPlot(record), {width + 10, top, kPlot, 380});
   DrawKey(picture, {width + 22, top + 410}, {{"blob", kPoor}, {"spot", kDoubtful}, {"corner, left out", kInk}});
   return picture;

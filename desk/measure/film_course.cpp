@@ -47,7 +47,7 @@ std::optional<Picture> FilmFinding::Draw(const Record& record) const {
   constexpr double kWidth = 1100;
   constexpr double kPlot = 400;
   const std::vector<Plot> plots = Plots(record);
-  const Heading heading(record, record.test_name + ", " + record.inputs[0].path, kWidth);
+  const Heading heading(record, record.test_name + ", " + record.inputs[0].path, kWidth, Shown());
   Picture picture(static_cast<int>(kWidth), cvRound(heading.height() + kPlot * static_cast<double>(plots.size())));
   heading.Draw(picture);
   double top = heading.height();

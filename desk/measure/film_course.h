@@ -41,6 +41,8 @@ class FilmFinding : public Finding {
 
  protected:
   virtual std::vector<Plot> Plots(const Record& record) const = 0;
+  /// Figures that stand above them.
+  virtual std::vector<std::string> Shown() const = 0;
 
   /// Lines at a figure's limits.
   static void AddLimits(Plot& plot, const Reading& figure, const std::string& name, bool upright = false);

@@ -61,8 +61,8 @@ class FlashFinding : public Finding {
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
     const double scale = FitScale(photo_, 1200);
     const double width = std::max(640.0, photo_.cols * scale);
-    const double mean = record.phase.Find("mean")->value();
-    const Heading heading(record, Format("Flash: mean of the first channel %.2f of 255", mean), width);
+    const Heading heading(record, record.test_name + ": levels over the whole photo", width,
+                          {"mean", "mean_red", "mean_green", "mean_blue"});
     Picture picture(cvRound(width), cvRound(photo_.rows * scale + heading.height()));
     heading.Draw(picture);
     picture.PlacePhoto(photo_, {0, heading.height()}, scale);

@@ -216,7 +216,7 @@ class DotsFinding : public Finding {
     const double scale = longer < kSide / 2 ? std::floor(kSide / longer) : std::min(1.0, kSide / longer);
     const double width = std::max(640.0, seen.cols * scale);
     const int count = cv::countNonZero(dots.mask);
-    const Heading heading(record, Format("HDR dots: %d dots in %zu areas", count, dots.areas.rectangles.size()), width);
+    const Heading heading(record, "HDR dots", width, {"dot_count", "area_count"});
     const double top = heading.height() + kKey;
     Picture picture(cvRound(width), cvRound(seen.rows * scale + top));
     heading.Draw(picture);
@@ -230,7 +230,7 @@ class DotsFinding : public Finding {
     for (const cv::Rect& area : dots.areas.rectangles) {
       tones.push_back(2 * cv::countNonZero(bright(area)) >= cv::countNonZero(dots.mask(area)) ? kBright : kDark);
     }
-    DrawAreas(picture, labels, place, dots.areas, tones);
+    DrawAreas(picture, labels, place, dots.areas, record.phase, tones);
     return picture;
   }
 

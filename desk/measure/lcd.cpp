@@ -79,7 +79,7 @@ std::optional<Picture> LcdFinding::Draw(const Record& record) const {
   const std::string verdict = screen.empty()         ? ": no screen found"
                               : result.verdict_ == 1 ? ", verdict 1: " + result.reason_
                                                      : Format(", verdict %d", result.verdict_);
-  const Heading heading(record, pattern + verdict, whole);
+  const Heading heading(record, pattern + verdict, whole, {"ratio", "uniformity", "dot_count"});
   const double top = heading.height();
   Picture picture(cvRound(whole), cvRound(std::max(photo.rows * scale, 420.0) + top));
   heading.Draw(picture);
@@ -103,7 +103,10 @@ std::optional<Picture> LcdFinding::Draw(const Record& record) const {
   for (int i = 0; i < 9; ++i) {
     const int row = i / 3;
     const cv::Point2d point((2 * (i % 3) + 1) * screen.cols / 6.0, (2 * row + 1) * screen.rows / 6.0);
-    levels.Add(picture, {Format("%.0f", result.levels_[i])}, {at(point), cv::Size2d(1, 1)}, kGood, 14);
+    PlaceWords words("");
+    words.AddEntry(record.phase.Find("levels"), i);
+    levels.Add(picture, {Format("%.0f", result.levels_[i]), words.Verdict()}, {at(point), cv::Size2d(1, 1)},
+               words.tone(), 14);
   }
   DrawKey(picture, {width + 20, top + screen.rows * at.scale + 26},
           {{"mean grey level at each point", kGood}, {"dot", kPoor}});

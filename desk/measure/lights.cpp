@@ -224,10 +224,7 @@ class LightFinding : public Finding {
     const double scale = FitScale(photo_, kSide);
     constexpr double kKey = 34;
     const double width = std::max(640.0, photo_.cols * scale);
-    const Heading heading(
-        record,
-        "Lights: " + Count(regions.size(), "region") + ", " + Count(areas.rectangles.size(), "area") + " of dots",
-        width);
+    const Heading heading(record, "Lights", width, {"region_count", "area_count"});
     const double top = heading.height() + kKey;
     Picture picture(cvRound(width), cvRound(photo_.rows * scale + top));
     heading.Draw(picture);
@@ -242,13 +239,11 @@ class LightFinding : public Finding {
       picture.Line({from, {to.x, from.y}, to, {from.x, to.y}}, ToneOf(r), 2, true);
       boxes.emplace_back(from, to);
     }
-    DrawAreas(picture, labels, place, areas, TonesOfAreas());
+    DrawAreas(picture, labels, place, areas, record.phase, TonesOfAreas());
     for (const cv::Rect2d& box : boxes) labels.Keep(box);
     for (std::size_t i = 0; i < regions.size(); ++i) {
-      const QVLightRegion& r = regions[i];
-      labels.Add(picture,
-                 {Format("%d: x %.3f y %.3f, %.0f K", r.label_, r.chromaticity_[0], r.chromaticity_[1], r.cct_)},
-                 boxes[i], ToneOf(r), 13);
+      const PlaceWords words = WordsOf(record.phase, i);
+      labels.Add(picture, words.Lines(), boxes[i], words.tone(), 13);
     }
     return picture;
   }
@@ -261,6 +256,18 @@ class LightFinding : public Finding {
  private:
   static Tone ToneOf(const QVLightRegion& r) {
     return r.clipped_share_ > kClipped ? kPoor : r.mean_grey_ < kDarkGrey ? kDoubtful : kGood;
+  }
+
+  // Its colour, and each of its figures that has a limit, as an entry or as the least or largest of all regions.
+  PlaceWords WordsOf(const Phase& phase, std::size_t i) const {
+    const QVLightRegion& r = regions[i];
+    PlaceWords words(Format("%d: x %.3f y %.3f, %.0f K", r.label_, r.chromaticity_[0], r.chromaticity_[1], r.cct_),
+                     ToneOf(r));
+    for (const LightFigure& row : LightFigures()) words.AddEntry(phase.Find(row.figure.name), i);
+    for (const Extreme& extreme : Extremes()) {
+      words.AddExtreme(phase.Find(extreme.name), extreme.most, *phase.Find(extreme.figure->figure.name), i);
+    }
+    return words;
   }
 
   // Dark dots are red, bright ones yellow.

@@ -50,9 +50,8 @@ class PreviewFinding : public Finding {
     const double scale = FitScale(first_, 760);
     const double width = first_.cols * scale;
     const double whole = std::max(2 * width + 110, 640.0);
-    const double difference = record.phase.Find("difference_mean")->value();
-    const Heading heading(
-        record, Format("%s: mean difference %.5f of full scale", record.test_name.c_str(), difference), whole);
+    const Reading& mean = *record.phase.Find("difference_mean");
+    const Heading heading(record, record.test_name, whole, {"difference_mean"});
     const double top = heading.height() + 24;
     Picture picture(cvRound(whole), cvRound(std::max(first_.rows * scale, kSteps + 40.0) + top));
     heading.Draw(picture);
@@ -63,7 +62,8 @@ class PreviewFinding : public Finding {
     cv::Mat colours;
     map_.convertTo(colours, CV_8U, largest > 0 ? 255 / largest : 0);
     cv::applyColorMap(colours, colours, cv::COLORMAP_VIRIDIS);
-    picture.Text("difference to the second", {width + 12, top - 8}, 13, kInk);
+    picture.Text(Format("difference to the second, mean %.5f: ", mean.value()) + VerdictText(mean),
+                 {width + 12, top - 8}, 13, mean.limit.given() ? ToneOf(mean) : kInk);
     picture.PlacePhoto(colours, {width + 8, top}, scale);
     DrawColourBar(picture, {2 * width + 20, top + 8}, kSteps, 255 * largest);
     return picture;

@@ -98,14 +98,12 @@ class PrintFinding : public Finding {
     const double scale = FitScale(print.straight, 1280);
     const double width = std::max(640.0, print.straight.cols * scale);
     const double height = print.straight.rows * scale;
-    const Heading heading(record,
-                          Format("Print, in the good one's frame: %zu error areas, correlation %.3f",
-                                 print.areas.rectangles.size(), record.phase.Find("correlation")->value()),
-                          width);
+    const Heading heading(record, "Print, in the good one's frame", width, {"area_count", "rms", "correlation"});
     Picture picture(cvRound(width), cvRound(height + heading.height()));
     heading.Draw(picture);
     Labels labels({0, heading.height(), width, height});
-    DrawAreas(picture, labels, picture.PlacePhoto(print.straight, {0, heading.height()}, scale), print.areas);
+    DrawAreas(picture, labels, picture.PlacePhoto(print.straight, {0, heading.height()}, scale), print.areas,
+              record.phase);
     return picture;
   }
 

@@ -150,13 +150,15 @@ class RegistrationFinding : public Finding {
     const double middle = unwarp.reference.cols * scale;
     const double width = std::max(640.0, middle + unwarp.image.cols * scale);
     const int agreeing = CountAgreeing(unwarp);
-    const Heading heading(
-        record, Format("Registration: %zu good matches, %d agree with the map", unwarp.good.size(), agreeing), width);
+    const Heading heading(record, "Registration", width,
+                          {"shift_columns", "shift_rows", "turn", "scale", "map_distance"});
     const double top = heading.height() + kKey;
     Picture picture(cvRound(width), cvRound(std::max(unwarp.reference.rows, unwarp.image.rows) * scale + top));
     heading.Draw(picture);
     DrawKey(picture, {12, top - 10},
-            {{Format("within %.0f px of the map: %d", kAgreePx, agreeing), kGood},
+            {{Format("matches within %.0f px of the map: %d, ", kAgreePx, agreeing) +
+                  VerdictText(*record.phase.Find("agreeing_matches")),
+              kGood},
              {Format("further off: %zu", unwarp.good.size() - agreeing), kPoor}});
     const PhotoPlace left = picture.PlacePhoto(unwarp.reference, {0, top}, scale);
     const PhotoPlace right = picture.PlacePhoto(unwarp.image, {middle, top}, scale);

@@ -43,12 +43,10 @@ void DrawRegion(Picture& picture, Labels& labels, const Record& record, const cv
                 const std::string& name) {
   const Reading& mtf50 = *record.phase.Find("mtf50_" + name);
   const Reading& iso = *record.phase.Find("mtf50_iso_" + name);
-  std::vector<std::string> lines = {name, "MTF50 " + FigureText(mtf50.value()) + " Nyquist"};
-  if (mtf50.limit.given()) lines.push_back(LimitText(mtf50).substr(2));
-  lines.push_back("ISO 12233: " + FigureText(iso.value()));
-  if (iso.limit.given()) lines.push_back(LimitText(iso).substr(2));
-  const bool iso_worse = ToneOf(iso) == kPoor || (ToneOf(iso) == kDoubtful && ToneOf(mtf50) == kGood);
-  labels.Add(picture, lines, box, iso_worse ? ToneOf(iso) : ToneOf(mtf50));
+  PlaceWords words(name);
+  words.Add(mtf50, "MTF50 " + FigureText(mtf50.value()) + " Nyquist");
+  words.Add(iso, "ISO 12233: " + FigureText(iso.value()));
+  labels.Add(picture, words.Lines(), box, words.tone());
 }
 
 Plot ProfilePlot(const SharpnessRegion& region, const std::string& name) {
@@ -97,7 +95,9 @@ Plot ResponsePlot(const Phase& phase, const std::string& name) {
     if (mtf50 == nullptr) continue;
     plot.markers.push_back({{mtf50->value(), 0.5}, Format("MTF50 %s %.4f", label, mtf50->value()), ToneOf(*mtf50)});
     for (const auto& [limit, side] : {std::pair{mtf50->limit.min, "at least"}, {mtf50->limit.max, "at most"}}) {
-      if (limit) plot.levels.push_back({*limit, Format("%s: %s %g", label, side, *limit), true, ToneOf(*mtf50)});
+      if (limit)
+        plot.levels.push_back(
+            {*limit, Format("%s: %s %g, %s", label, side, *limit, Name(mtf50->outcome)), true, ToneOf(*mtf50)});
     }
   }
   return plot;
@@ -105,8 +105,7 @@ Plot ResponsePlot(const Phase& phase, const std::string& name) {
 
 std::string TitleOf(const Record& record, const ChartView& view) {
   if (record.phase.code == QV_SUCCESS) {
-    return Format("%s: chart turned by %.1f degrees, threshold %d", record.test_name.c_str(), view.turn_deg,
-                  view.threshold);
+    return Format("%s, threshold %d", record.test_name.c_str(), view.threshold);
   }
   return Format("%s: code %d, %zu of 3 marks, threshold %d", record.test_name.c_str(), record.phase.code,
                 view.marks.size(), view.threshold);
@@ -123,7 +122,7 @@ std::optional<Picture> SharpnessFinding::Draw(const Record& record) const {
   const double width = photo.cols * scale;
   const double height = std::max(photo.rows * scale, measured ? kPlotsHeight : 0);
   const double whole = measured ? width + 2 * kPlotWidth + 16 : std::max(width, kLeastWidth);
-  const Heading heading(record, TitleOf(record, view), whole);
+  const Heading heading(record, TitleOf(record, view), whole, {"chart_turn"});
   const double top = heading.height();
   Picture picture(cvRound(whole), cvRound(height + top));
   heading.Draw(picture);

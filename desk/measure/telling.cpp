@@ -17,6 +17,12 @@ std::string BoundsWords(const Limit& limit) {
   return text;
 }
 
+std::string HowSure(const Reading& m) {
+  const bool unsure = m.decision && m.decision->near_limit && !m.uncertainties.empty();
+  return std::string(m.marginal ? ", marginal" : "") +
+         (unsure ? Format(", wrong with a probability of %.0f %%", 100 * m.decision->wrong_probability) : "");
+}
+
 }  // namespace
 
 double FitScale(const cv::Mat& photo, double side) { return std::min(1.0, side / std::max(photo.cols, photo.rows)); }
@@ -55,10 +61,23 @@ std::string LimitWords(const Reading& m) {
 std::string LimitText(const Reading& m) {
   if (!m.limit.given()) return "";
   const std::string bounds = LimitWords(m);
-  std::string text = "  (" + bounds + (bounds.empty() ? "" : ", ");
-  text += Name(m.outcome) + std::string(m.marginal ? ", marginal" : "");
-  const bool unsure = m.decision && m.decision->near_limit && !m.uncertainties.empty();
-  return text + (unsure ? Format(", wrong with a probability of %.0f %%)", 100 * m.decision->wrong_probability) : ")");
+  return "  (" + bounds + (bounds.empty() ? "" : ", ") + Name(m.outcome) + HowSure(m) + ")";
+}
+
+std::string VerdictText(const Reading& m) {
+  if (!m.limit.given()) return Name(m.outcome);
+  const std::string bounds = LimitWords(m);
+  return Name(m.outcome) + (bounds.empty() ? "" : ", " + bounds) + HowSure(m);
+}
+
+std::string VerdictText(const Reading& list, std::size_t place) {
+  for (const EntryVerdict& entry : list.entries) {
+    if (entry.place != place) continue;
+    const std::string bounds = BoundsWords(list.limit.Of(list.axis[place]));
+    return Name(entry.decision.pass ? Outcome::kPass : Outcome::kFail) + (bounds.empty() ? "" : ", " + bounds) +
+           (entry.marginal ? ", marginal" : "");
+  }
+  return "";
 }
 
 }  // namespace qv

@@ -28,6 +28,12 @@ std::string LimitWords(const Reading& m);
 /// "  (at least 0.38, at most 0.6, FAIL)" for a figure with a limit, nothing for one without.
 std::string LimitText(const Reading& m);
 
+/// As it stands at a figure in a picture: "MEASURED", "FAIL, at most 3", "PASS, at least 0.38, marginal".
+std::string VerdictText(const Reading& m);
+
+/// The same of a list's entry; empty where it has no limit.
+std::string VerdictText(const Reading& list, std::size_t place);
+
 }  // namespace qv
 
 #endif  // QVTESTER_DESK_MEASURE_TELLING_H_

@@ -54,6 +54,10 @@ class ChartFilmFinding : public FilmFinding {
     return {timing, turning};
   }
 
+  std::vector<std::string> Shown() const override {
+    return {"frames_lost", "frames_bad", "mean_rate", "longest_gap", "found_count"};
+  }
+
  private:
   // From 359 degrees on to 0 the chart has hardly turned.
   static Plot::Curve BrokenAtFullTurns(Plot::Curve curve) {

@@ -59,6 +59,8 @@ class FlashFilmFinding : public FilmFinding {
     return {plot};
   }
 
+  std::vector<std::string> Shown() const override { return {"peak", "base", "width"}; }
+
  private:
   double PeakTime(const Record& record) const {
     return time_[static_cast<std::size_t>(record.phase.Find("peak_frame")->value())];

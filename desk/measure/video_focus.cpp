@@ -59,6 +59,8 @@ class FocusFinding : public FilmFinding {
     }
     return {plot};
   }
+
+  std::vector<std::string> Shown() const override { return {"best_mtf50", "final_mtf50", "settle_time"}; }
 };
 
 class VideoFocus : public Measurement {
