@@ -7,6 +7,7 @@
 
 #include "core/file_gate.h"
 #include "core/slots.h"
+#include "platform/jpeg.h"
 #include "qvtester/log.h"
 
 namespace {
@@ -65,7 +66,10 @@ cv::Mat QVResource::DecodePicture(const std::vector<unsigned char>& bytes, std::
   cv::Mat image;
   try {
     const std::size_t size = bytes.size();
-    if (bytes[0] == 0xFF && bytes[1] == 0xD8 && (bytes[size - 2] != 0xFF || bytes[size - 1] != 0xD9)) {
+    const bool jpeg = bytes[0] == 0xFF && bytes[1] == 0xD8;
+    if (jpeg && flags == cv::IMREAD_COLOR) image = platform::DecodeSoundJpeg(bytes);
+    if (!image.empty()) return image;
+    if (jpeg && (bytes[size - 2] != 0xFF || bytes[size - 1] != 0xD9)) {
       // A cut JPEG is filled up as from a file, where libjpeg adds the mark of the end itself.
       std::vector<unsigned char> ended(bytes);
       ended.insert(ended.end(), {0xFF, 0xD9});

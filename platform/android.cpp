@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "platform/jpeg.h"
 #include "platform/preview_folder.h"
 #include "platform/properties.h"
 
@@ -22,5 +23,7 @@ int property_set(const char* key, const char* value) {
 }
 
 std::string PreviewFolder() { return "/data/ozrlog"; }
+
+cv::Mat DecodeSoundJpeg(const std::vector<unsigned char>& /*file*/) { return {}; }
 
 }  // namespace platform

@@ -13,7 +13,10 @@ target_link_libraries(qvtester_platform INTERFACE "${QV_LIBLOG_LIBRARY}")
 if(ANDROID)
   set(QV_PLATFORM_SOURCES platform/files.cpp platform/log.cpp platform/android.cpp)
 else()
-  set(QV_PLATFORM_SOURCES platform/files.cpp platform/log.cpp platform/host.cpp)
+  set(QV_PLATFORM_SOURCES platform/files.cpp platform/log.cpp platform/host.cpp platform/host_jpeg.cpp)
+  find_package(PkgConfig REQUIRED)
+  pkg_check_modules(turbojpeg REQUIRED IMPORTED_TARGET GLOBAL libturbojpeg)
+  target_link_libraries(qvtester_platform INTERFACE PkgConfig::turbojpeg)
 endif()
 
 # Debian keeps liblog outside the loader's path.
