@@ -97,6 +97,22 @@ TEST(Spots, NoiseOfAboutALevelMakesNone) {
   EXPECT_LE(found, 1U);
 }
 
+// Of the stored levels: what the photo's noise and rounding add up to.
+TEST(Spots, NoiseIsWithinItsUncertaintyNearStepsOfTheLevelsToo) {
+  int within = 0;
+  int count = 0;
+  for (const double levels : {0.0, 0.15, 0.7, 0.9, 1.3, 2.5}) {
+    for (std::uint64_t seed = 0; seed < 5; ++seed, ++count) {
+      const qv::SpotFinding found = qv::FindSpots(Photo({{320, 240}, levels / 255, 0, seed}, {}));
+      // A light of 200 is a whole level: noise of 0.15 never rounds away from it.
+      const double noise = levels < 0.2 ? 0 : std::sqrt(levels * levels + 1.0 / 12) / 200;
+      within += std::fabs(found.noise - noise) <= found.of_noise.expanded ? 1 : 0;
+      if (levels >= 0.7) EXPECT_LT(found.of_noise.expanded, 0.05 * noise) << levels;
+    }
+  }
+  EXPECT_GE(within, count - 5);  // 28 are meant
+}
+
 TEST(Spots, EmptyTargetsHaveNone) {
   for (const double noise : {0.0, 0.005, 0.03}) {
     for (const double shading : {0.0, 0.6}) {

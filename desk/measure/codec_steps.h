@@ -1,6 +1,7 @@
 #ifndef QVTESTER_DESK_MEASURE_CODEC_STEPS_H_
 #define QVTESTER_DESK_MEASURE_CODEC_STEPS_H_
 
+#include <cmath>
 #include <string>
 
 #include "desk/measure/request.h"
@@ -21,9 +22,11 @@ CodecSteps StepsOf(const Input& input);
 /// Of what cv::imencode and others with the standard tables (T.81, Annex K) write at this quality.
 CodecSteps StepsAtQuality(int quality);
 
-/// By how many levels the mean of a whole picture may lie off: blocks half-way between two steps, one in eight times
-/// the first table entry, are all rounded away from middle grey, by half a step. The entry cancels.
-inline double MeanShift(const CodecSteps& codec) { return codec.luma == 0 ? 0 : 1.0 / 128; }
+/// Standard uncertainty, in levels, of what the codec does to the mean of a whole picture. Blocks half-way between two
+/// steps, one in eight times the first table entry, are all rounded away from middle grey, by half a step; the entry
+/// cancels. A 128th of a level is the most of it (all blocks on one side of middle grey), so it may be anything up to
+/// that.
+inline double MeanShift(const CodecSteps& codec) { return codec.luma == 0 ? 0 : 1.0 / 128 / std::sqrt(3.0); }
 
 }  // namespace qv
 

@@ -13,8 +13,8 @@ using Places = cv::Vec<double, 6>;  // column and row of the three marks
 
 struct Core {
   cv::Point2d centre;
-  double noise_px = 0;   // standard uncertainty of the centre by noise
   double module_px = 0;  // along the square's side
+  double noise = 0;      // of a pixel, of the contrast
 };
 
 // Of levels as the search weighs them.
@@ -57,6 +57,30 @@ cv::Vec3d DarknessWithin(const cv::Mat& grey, cv::Point2d middle, double radius,
   return sum;
 }
 
+// Levels as if the light that falls there were even, and paper and ring at level 1: over the plane through those that
+// are `least` or more.
+cv::Mat Evened(const cv::Mat& grey, double least) {
+  cv::Matx33d products = cv::Matx33d::zeros();
+  cv::Vec3d sums;
+  const auto at = [](int row, int column) { return cv::Vec3d(1, column, row); };
+  for (int row = 0; row < grey.rows; ++row) {
+    for (int i = 0; i < grey.cols; ++i) {
+      const double level = grey.at<float>(row, i);
+      if (level < least) continue;
+      products += at(row, i) * at(row, i).t();
+      sums += at(row, i) * level;
+    }
+  }
+  const cv::Vec3d plane = products.solve(sums, cv::DECOMP_SVD);
+  cv::Mat even(grey.size(), CV_32F);
+  for (int row = 0; row < grey.rows; ++row) {
+    for (int i = 0; i < grey.cols; ++i) {
+      even.at<float>(row, i) = static_cast<float>(grey.at<float>(row, i) / plane.dot(at(row, i)));
+    }
+  }
+  return even;
+}
+
 std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double radius) {
   std::vector<float> levels;
   for (int row = 0; row < grey.rows; ++row) {
@@ -72,31 +96,32 @@ std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double 
 Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module) {
   constexpr double kReach = 2.2;
   constexpr double kSizeReach = 2.3;
-  constexpr double kSeen = 4.5;         // the paper about the mark
-  constexpr double kNoiseShare = 0.33;  // of the noise over the contrast: the circle's second moment over its weight
+  constexpr double kSeen = 4.5;  // the paper about the mark
   const int reach = cvCeil(kSeen * module) + 1;
   const cv::Rect part =
       cv::Rect(cvRound(mark.centre.x) - reach, cvRound(mark.centre.y) - reach, 2 * reach + 1, 2 * reach + 1) &
       cv::Rect({}, photo.size());
   if (part.width < 9 || part.height < 9) return {};
-  const cv::Mat grey = GreyPart(photo, part);
+  cv::Mat grey = GreyPart(photo, part);
   const std::vector<float> levels(grey.begin<float>(), grey.end<float>());
   const double light = LevelAt(levels, 0.85);
   const double contrast = light - LevelAt(levels, 0.15);
   if (!(contrast > 0)) return {};
+  // What is light but for noise, and no blurred edge.
+  const double noise = NoiseOf(grey);
+  grey = Evened(grey, light - std::clamp(2.5 * noise, contrast / 8, contrast / 3));
   const cv::Point2d corner = part.tl();
-  Core core = {mark.centre, kNoiseShare * NoiseOf(grey) / contrast, 0};
+  Core core = {mark.centre, 0, noise / contrast};
   for (int round = 0; round < 6; ++round) {
-    const cv::Vec3d dark = DarknessWithin(grey, core.centre - corner, kReach * module, light);
+    const cv::Vec3d dark = DarknessWithin(grey, core.centre - corner, kReach * module, 1);
     if (!(dark[2] > 0)) return {};
     core.centre += cv::Point2d(dark[0], dark[1]) / dark[2];
   }
   const std::vector<float> inside = LevelsWithin(grey, core.centre - corner, kSizeReach * module);
   if (inside.empty()) return {};
-  const double ring = LevelAt(inside, 0.85);
   const double square = LevelAt(inside, 0.25);
-  const double dark = DarknessWithin(grey, core.centre - corner, kSizeReach * module, ring)[2];
-  core.module_px = ring > square ? std::sqrt(std::max(dark, 0.0) / (ring - square)) / 3 : 0;
+  const double dark = DarknessWithin(grey, core.centre - corner, kSizeReach * module, 1)[2];
+  core.module_px = square < 1 ? std::sqrt(std::max(dark, 0.0) / (1 - square)) / 3 : 0;
   return core;
 }
 
@@ -110,7 +135,7 @@ double TurnOf(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 18
 }  // namespace
 
 // The true value is normal about where the known error puts it: 95 % of it lie within so much of the reading.
-Uncertainty FromKnownError(double error, double standard) {
+Uncertainty FromKnownError(double error, double standard, const char* method) {
   const double off = std::fabs(error);
   const double all = std::hypot(off, standard);
   const auto below = [&](double x) { return 0.5 * std::erfc(-x / standard / std::sqrt(2.0)); };
@@ -120,13 +145,17 @@ Uncertainty FromKnownError(double error, double standard) {
     const double middle = (low + high) / 2;
     (below(middle - off) - below(-middle - off) < kCoverage ? low : high) = middle;
   }
-  return {all, high, all == 0 ? 1 : high / all, kResidualMethod};
+  return {all, high, all == 0 ? 1 : high / all, method};
 }
 
 void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
-  constexpr double kCorePx = 0.009;       // type B: what pixels and light leave of a centre
-  constexpr double kApartPx = 0.002;      // and of two centres' distance
+  constexpr double kCorePx = 0.005;       // type B: what pixels and light leave of a centre
+  constexpr double kApartPx = 0.003;      // and of two centres' distance
   constexpr double kCoreModulePx = 0.01;  // and of the squares' sizes
+  // Noise over the contrast moves a centre by the circle's second moment over the square's weight, and the square's
+  // side by half the root of the circle's pixels over it.
+  constexpr double kNoisePx = 0.48;
+  constexpr double kNoiseModulePx = 0.23;
   if (!view.complete()) return;
   const double turn = view.turn_deg * CV_PI / 180;
   const double upright = std::max(std::fabs(std::cos(turn)), std::fabs(std::sin(turn)));  // of a row's way through
@@ -134,6 +163,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
   Places cores;
   auto covariance = cv::Matx<double, 6, 6>::zeros();
   double module_off = 0;
+  double module_squares = kCoreModulePx * kCoreModulePx;
   std::vector<Uncertainty> rows;
   for (int i = 0; i < 3; ++i) {
     const Mark& mark = view.marks[i];
@@ -143,10 +173,12 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
     found[2 * i + 1] = mark.centre.y;
     cores[2 * i] = core.centre.x;
     cores[2 * i + 1] = core.centre.y;
-    const double apart = std::hypot(kApartPx, core.noise_px);
+    const double noise = kNoisePx * core.noise;
+    const double apart = std::hypot(kApartPx, noise);
     covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = apart * apart;
-    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, std::hypot(kCorePx, core.noise_px)));
+    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, std::hypot(kCorePx, noise)));
     module_off += (mark.module_px - core.module_px / upright) / 3;
+    module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2);
   }
   phase.Find("marks")->Trust(std::move(rows));
   const auto trust = [&](const char* figure, double (*f)(const Places&)) {
@@ -155,7 +187,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
   trust("legs_ratio", LegsRatio);
   trust("legs_angle", LegsAngle);
   trust("chart_turn", TurnOf);
-  phase.Find("module_size")->Trust({FromKnownError(module_off, kCoreModulePx)});
+  phase.Find("module_size")->Trust({FromKnownError(module_off, std::sqrt(module_squares))});
 }
 
 }  // namespace qv

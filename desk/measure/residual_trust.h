@@ -11,7 +11,7 @@ namespace qv {
 // How far places and maps may be trusted, from what their fits leave over.
 
 /// Of a figure whose error is known but for this standard uncertainty, and left in it.
-Uncertainty FromKnownError(double error, double standard);
+Uncertainty FromKnownError(double error, double standard, const char* method = kResidualMethod);
 
 /// The marks' places, module size, the legs' ratio and angle, the chart's turn: from how far the search's places lie
 /// from the centres of gravity of the marks' inner squares. Says nothing unless there are three marks. `photo` is the

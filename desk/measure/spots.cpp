@@ -17,6 +17,7 @@
 #include <opencv2/imgproc.hpp>
 
 #include "desk/measure/grey.h"
+#include "desk/measure/residual_trust.h"
 
 namespace qv {
 
@@ -317,10 +318,18 @@ cv::Size TilesOf(const Photo& photo) {
   return {std::clamp(photo.cols() / 60, 1, 12), std::clamp(photo.rows() / 60, 1, 9)};
 }
 
+constexpr double kSecondDifference = 1.5;  // variance of v[i] - (v[i - 4] + v[i + 4]) / 2, of a pixel's
+
+struct TileNoise {
+  cv::Mat deviation;  // of a pixel, levels
+  cv::Mat spread;     // standard uncertainty of that, a share of it
+};
+
 // Standard deviation of a pixel by tiles, from second differences of neighbours: gradients and most edges do not count.
-cv::Mat NoiseByTiles(const Photo& photo) {
+TileNoise NoiseByTiles(const Photo& photo) {
+  constexpr double kMedianSpread = 1.166;  // of a median of normal values' sizes, times the root of their number
   const cv::Size tiles = TilesOf(photo);
-  cv::Mat noise(tiles, CV_32F);
+  TileNoise noise = {cv::Mat(tiles, CV_32F), cv::Mat(tiles, CV_32F)};
   for (int i = 0; i < tiles.area(); ++i) {
     const int x = i % tiles.width;
     const int y = i / tiles.width;
@@ -333,8 +342,10 @@ cv::Mat NoiseByTiles(const Photo& photo) {
       photo.Read(tile.y + row, tile.x, v);
       for (int c = 4; c + 4 < tile.width; c += 3) off.push_back(std::abs(v[c] - 0.5f * (v[c - 4] + v[c + 4])));
     }
-    noise.at<float>(y, x) =
-        static_cast<float>(kDeviationsOfMedian * MedianOfRounded(off, photo.step() / 2) / std::sqrt(1.5));
+    noise.deviation.at<float>(y, x) =
+        static_cast<float>(kDeviationsOfMedian * MedianOfRounded(off, photo.step() / 2) / std::sqrt(kSecondDifference));
+    noise.spread.at<float>(y, x) =
+        static_cast<float>(kMedianSpread / std::sqrt(std::max(1.0, static_cast<double>(off.size()))));
   }
   return noise;
 }
@@ -657,12 +668,14 @@ class SpotRegions {
   std::vector<std::pair<cv::Point2d, double>> masses_;  // places, and depths times pixels
 };
 
+constexpr double kLeastNoise = 0.5;  // steps of the levels: less does not show
+
 // The photo without its light's fall-off.
 struct Target {
   cv::Mat relative;      // departures over the noise there
   cv::Mat share;         // the noise over the light, by blocks
   double shrink = 1;     // blocks to a pixel
-  double light = 1;      // mean level
+  TileNoise tiles;       // the noise by itself
   bool stepped = false;  // noise is less than a step of the levels: rounding makes edges of its own
 
   float ShareAt(cv::Point2d at) const {
@@ -676,12 +689,13 @@ Target LookAtTarget(const Photo& photo) {
   target.shrink = std::min(1.0, 128.0 / std::max(photo.cols(), photo.rows()));
   const cv::Mat blocks = BlockMeans(
       photo, {std::max(cvRound(photo.cols() * target.shrink), 1), std::max(cvRound(photo.rows() * target.shrink), 1)});
-  target.light = std::max(cv::mean(blocks)[0], 1.0);
   const Surface surface = FitSurface(blocks);
-  cv::Mat noise = NoiseByTiles(photo);
+  target.tiles = NoiseByTiles(photo);
   // A spot must then be deeper than the edges that rounding makes.
-  target.stepped = cv::countNonZero(noise < 0.9 * photo.step()) * 2 > noise.size().area();
-  noise = cv::max(noise, 0.5 * photo.step());
+  target.stepped =
+      cv::countNonZero(target.tiles.deviation < 0.9 * photo.step()) * 2 > target.tiles.deviation.size().area();
+  cv::Mat noise;
+  cv::max(target.tiles.deviation, kLeastNoise * photo.step(), noise);
   cv::resize(noise, noise, blocks.size(), 0, 0, cv::INTER_LINEAR);
   target.relative = OverNoise(photo, surface, noise);
   target.share = noise;
@@ -695,18 +709,43 @@ Target LookAtTarget(const Photo& photo) {
   return target;
 }
 
-// Of the noise: differences of whole levels have a median of whole or half ones (type B), and it is of so many.
-Uncertainty OfNoise(const Photo& photo, double light, double noise) {
-  constexpr int kDraws = 400;
-  constexpr double kMedianWorth = 0.37;
-  const cv::Size tiles = TilesOf(photo);
-  const double values = 1.0 * photo.cols() / 3 * tiles.height * std::min(kTileRows, photo.rows() / tiles.height);
-  const double spread = noise * std::sqrt(CV_PI / 2 / (2 * kMedianWorth * std::max(values, 1.0)));
-  const double half_step = 0.25 * photo.step() * kDeviationsOfMedian / std::sqrt(1.5) / light;
+// By which share a tile's noise is known to read high: the differences stand on half steps, and between these their
+// median is read off a straight line, though their density falls; to second order.
+double KnownToReadHigh(double deviation, double step) {
+  const double spread = deviation * std::sqrt(kSecondDifference);
+  const double median = spread / kDeviationsOfMedian;
+  const double width = step / 2;
+  const double begin = std::max((std::floor(median / width + 0.5) - 0.5) * width, 0.0);
+  const double end = (std::floor(median / width + 0.5) + 0.5) * width;
+  return ((median - begin) * (end - median) / 2 - width * width / 24) / (spread * spread);
+}
+
+// Of the median over the photo: what the tiles' own scatter does to it is drawn (JCGM 101).
+Uncertainty OfNoise(const Target& target, double step, double noise) {
+  constexpr int kDraws = 200;
+  std::vector<float> levels(target.tiles.deviation.begin<float>(), target.tiles.deviation.end<float>());
+  const double deviation = MedianOf(levels);
+  if (deviation <= kLeastNoise * step) return {noise / std::sqrt(3.0), noise, std::sqrt(3.0), kSpotMethod};
+  // Rounding adds a twelfth of a step squared, evenly only where noise carries levels over the whole step.
+  const double before = std::max(std::pow(deviation / step, 2) - 1.0 / 12, 0.0);
+  const double uneven = 2 * std::exp(-2 * CV_PI * CV_PI * before);
+  cv::Mat shares;
+  cv::resize(target.share, shares, {32, 24}, 0, 0, cv::INTER_AREA);
   cv::RNG random(kDraws);
-  std::vector<double> errors;
-  for (int i = 0; i < kDraws; ++i) errors.push_back(random.uniform(-half_step, half_step) + random.gaussian(spread));
-  return FromErrors(std::move(errors), kSpotMethod);
+  double squares = 0;
+  for (int i = 0; i < kDraws; ++i) {
+    cv::Mat off(target.tiles.spread.size(), CV_32F);
+    random.fill(off, cv::RNG::NORMAL, 0, 1);
+    off = off.mul(target.tiles.spread);
+    cv::resize(off, off, shares.size(), 0, 0, cv::INTER_LINEAR);
+    std::vector<float> drawn(shares.total());
+    for (int k = 0; k < static_cast<int>(drawn.size()); ++k) {
+      drawn[k] = shares.at<float>(k / shares.cols, k % shares.cols) * (1 + off.at<float>(k / off.cols, k % off.cols));
+    }
+    squares += std::pow(MedianOf(drawn) - noise, 2) / kDraws;
+  }
+  return FromKnownError(noise * KnownToReadHigh(deviation, step), std::hypot(std::sqrt(squares), uneven * noise),
+                        kSpotMethod);
 }
 
 }  // namespace
@@ -717,7 +756,7 @@ SpotTrust SpotFinding::Trust(const Spot& spot) const {
   constexpr double kClear = 50;
   const double seen = spot.contrast * std::sqrt(spot.area_px) / noise;
   const auto of_quantile = [](double size) { return Uncertainty{size / 1.96, size, 1.96, kSpotMethod}; };
-  return {of_quantile(spot.area_px * (0.5 + 1.6 / seen)),
+  return {of_quantile(spot.area_px * (0.48 + 1.5 / seen)),
           of_quantile(spot.contrast * ((seen < kClear ? 0.45 : 0.1) + 6 / seen)),
           of_quantile(spot.diameter_px() * (0.015 + 1.2 / seen))};
 }
@@ -734,7 +773,7 @@ SpotFinding FindSpots(const cv::Mat& photo) {
   if (found.cut_short) minima.resize(kMostMinima);
   std::vector<float> shares(target.share.begin<float>(), target.share.end<float>());
   found.noise = MedianOf(shares);
-  found.of_noise = OfNoise(Photo(photo), target.light, found.noise);
+  found.of_noise = OfNoise(target, Photo(photo).step(), found.noise);
   for (const Minimum& minimum : minima) {
     if (regions.IsTaken(minimum)) continue;
     if (found.spots.size() == kMostFound) {
