@@ -117,12 +117,10 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "light, which are good to 0.005 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
        "carried to the legs and the turn; a module is good to 0.01 px (type B) and noise. Where the blur is over a "
        "fifth of a module the frame shines into the square, and in a JPEG file the codec hides the noise: U then holds "
-       "for 83 to 90 of 100. Registration: the grey levels left over under "
-       "the map "
-       "of all matches, by 64 parts of the picture (as noise may be alike between neighbours), tell where the best map "
-       "lies and how surely; what lies between it and either map is in that one's uncertainty, and the distance of "
-       "both maps has it by 400 draws (JCGM 101). Type B, of interpolated pixels: 0.0015 px of a place and 0.0038 px "
-       "of an enlargement at the "
+       "for 83 to 90 of 100. Registration: the grey levels left over under the map of all matches, by 64 parts of the "
+       "picture (as noise may be alike between neighbours), tell where the best map lies and how surely; what lies "
+       "between it and either map is in that one's uncertainty, and the distance of both maps has it by 400 draws "
+       "(JCGM 101). Type B, of interpolated pixels: 0.0015 px of a place and 0.0038 px of an enlargement at the "
        "picture's sides; none for depth in the scene and distortion, which no affine map follows."},
       {kSpotMethod,
        "Type B alone: the 95 % quantiles of the errors of 3,000 simulated spots, half sharp and half soft, by contrast "
