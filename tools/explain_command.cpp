@@ -71,9 +71,9 @@ void ListFigures() {
       std::cout << name << Shortened(meaning, kWidth - name.size()) << '\n';
     }
   }
-  std::cout
-      << "\n`qvtester explain NAME` tells more of one, or of all of a measurement; `qvtester explain uncertainty`\n"
-         "how far figures may be trusted, `qvtester explain doubts` what makes a run an ERROR although it measured.\n";
+  std::cout << "\n`qvtester explain NAME` tells more of one, or of all of a measurement; `qvtester explain\n"
+               "uncertainty` how far figures may be trusted, `qvtester explain doubts` what makes a run an ERROR\n"
+               "although it measured.\n";
 }
 
 // How far figures may be trusted is told by method: many figures share one.

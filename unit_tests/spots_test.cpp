@@ -107,7 +107,9 @@ TEST(Spots, NoiseIsWithinItsUncertaintyNearStepsOfTheLevelsToo) {
       // A light of 200 is a whole level: noise of 0.15 never rounds away from it.
       const double noise = levels < 0.2 ? 0 : std::sqrt(levels * levels + 1.0 / 12) / 200;
       within += std::fabs(found.noise - noise) <= found.of_noise.expanded ? 1 : 0;
-      if (levels >= 0.7) EXPECT_LT(found.of_noise.expanded, 0.05 * noise) << levels;
+      if (levels >= 0.7) {
+        EXPECT_LT(found.of_noise.expanded, 0.05 * noise) << levels;
+      }
     }
   }
   EXPECT_GE(within, count - 5);  // 28 are meant

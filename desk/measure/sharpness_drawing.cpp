@@ -95,9 +95,9 @@ Plot ResponsePlot(const Phase& phase, const std::string& name) {
     if (mtf50 == nullptr) continue;
     plot.markers.push_back({{mtf50->value(), 0.5}, Format("MTF50 %s %.4f", label, mtf50->value()), ToneOf(*mtf50)});
     for (const auto& [limit, side] : {std::pair{mtf50->limit.min, "at least"}, {mtf50->limit.max, "at most"}}) {
-      if (limit)
-        plot.levels.push_back(
-            {*limit, Format("%s: %s %g, %s", label, side, *limit, Name(mtf50->outcome)), true, ToneOf(*mtf50)});
+      if (!limit) continue;
+      plot.levels.push_back(
+          {*limit, Format("%s: %s %g, %s", label, side, *limit, Name(mtf50->outcome)), true, ToneOf(*mtf50)});
     }
   }
   return plot;
