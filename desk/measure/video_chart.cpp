@@ -155,6 +155,12 @@ class VideoChart : public Measurement {
                         "not have been",
                         path.c_str(), result.frames_promised_, result.frame_count_),
                  "frames_promised");
+    } else if (result.frames_promised_ == 0) {
+      record.Say(Remark::kWarning, "no_promise",
+                 path +
+                     ": the file promises no number of frames, as bare streams do; these hold no time stamps either, "
+                     "and frames that they lost can't be seen",
+                 "frames_lost");
     }
   }
 

@@ -12,6 +12,7 @@ namespace {
 
 constexpr int kFailuresAtEnd = 8;
 constexpr double kUsualInterval = 1000 / 30.0;  // ms, where neither stamps nor container tell one
+constexpr double kLeastInterval = 0.1;          // ms: no camera takes more frames than 10,000 in a second
 constexpr double kGap = 1.5;                    // median intervals
 
 int AsCount(double value) {
@@ -21,7 +22,7 @@ int AsCount(double value) {
 
 double NominalInterval(const cv::VideoCapture& video) {
   const double interval = 1000 / video.get(cv::CAP_PROP_FPS);
-  return interval > 0 && std::isfinite(interval) ? interval : kUsualInterval;
+  return interval >= kLeastInterval && std::isfinite(interval) ? interval : kUsualInterval;
 }
 
 double FirstOf(const std::vector<double>& stamps) { return std::isfinite(stamps[0]) ? stamps[0] : 0; }
@@ -63,14 +64,15 @@ double Median(std::vector<double> values) {
 
 int KeepTime(const std::vector<double>& stamps, double nominal, Film& film) {
   const std::vector<double> intervals = UsableIntervals(stamps);
-  const double interval = intervals.empty() ? nominal : Median(intervals);
+  const bool ticks = !intervals.empty() && Median(intervals) < kLeastInterval;  // a bare stream's, which tell no time
+  const double interval = intervals.empty() || ticks ? nominal : Median(intervals);
   int extended = 0;
   const double first = FirstOf(stamps);
   double last = first;
   double lost = 0;
   film.time.assign(1, 0.0);
   for (std::size_t i = 1; i < stamps.size(); ++i) {
-    const bool goes_on = GoesOn(stamps[i], last);
+    const bool goes_on = !ticks && GoesOn(stamps[i], last);
     const double now = goes_on ? stamps[i] : last + interval;
     extended += goes_on ? 0 : 1;
     film.longest_gap = std::max(film.longest_gap, now - last);
@@ -122,7 +124,9 @@ int ReadFilm(QVTester& tester, int slot, const char* test, int most, const std::
              film.promised);
   }
   const int extended = KeepTime(stamps, NominalInterval(video), film);
-  if (extended > 0) {
+  if (extended > 0 && extended == count - 1) {
+    QVDEBUGP("[%s] the time stamps tell no time; the container's rate is taken, or 30 frames a second", test);
+  } else if (extended > 0) {
     QVDEBUGP("[%s] %d of %d time stamps go back or repeat; each was extended by the median interval", test, extended,
              count);
   }

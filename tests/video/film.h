@@ -25,7 +25,7 @@ int ReadFilm(QVTester& tester, int slot, const char* test, int most, const std::
              Film& film);
 
 /// Fills in times, rate, gaps and lost frames, from one stamp a frame. A stamp that goes back or repeats is extended by
-/// the median interval, or by `nominal` when no stamps tell one; all in ms.
+/// the median interval, or by `nominal` when no stamps tell one, as where they follow nearer than 0.1 ms; all in ms.
 /// @return the number of stamps that were extended. At the end of films whose frames are stored out of order OpenCV
 /// reads stamps of 0: they are extended too, and a gap among those frames can't be seen.
 int KeepTime(const std::vector<double>& stamps, double nominal, Film& film);
