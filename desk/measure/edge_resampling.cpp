@@ -86,28 +86,31 @@ SlantedEdge EdgeOf(const cv::Mat& region) {
                     {Transfer::Kind::kLinear, 1});
 }
 
+// The region without its noise, as it lies in the photo, in levels.
+cv::Mat NoiselessRegion(const SlantedEdge& edge, const EdgeSpread& spread, double moved) {
+  cv::Mat plain;
+  Noiseless(edge, spread, moved).convertTo(plain, CV_32F, 255);
+  if (!edge.lying) return plain;
+  cv::Mat turned;
+  cv::transpose(plain, turned);
+  return turned;
+}
+
 }  // namespace
 
 NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read, double found,
                                double tolerance) {
   SlantedEdge edge = EdgeOf(region);
   if (edge.reason != nullptr) return {kNone, kNone, kNone, kNone};
-  const double fall = std::max(std::fabs(edge.left.by_distance), std::fabs(edge.right.by_distance));
-  const double uneven = fall * edge.light.cols / std::fabs(edge.right.level - edge.left.level);
+  const SlantedEdge lit = edge;
   for (Plateau* plateau : {&edge.left, &edge.right}) plateau->by_distance = plateau->by_row = 0;
   const EdgeSpread spread = SpreadOf(edge);
-  const auto moved = [&](double by) {
-    cv::Mat plain;
-    Noiseless(edge, spread, by).convertTo(plain, CV_32F, 255);
-    cv::Mat turned = plain;
-    if (edge.lying) cv::transpose(plain, turned);
-    return read(turned);
-  };
-  if (spread.levels.empty()) return {kNone, kNone, kNone, uneven};
+  if (spread.levels.empty()) return {kNone, kNone, kNone, kNone};
+  const auto moved = [&](double by) { return read(NoiselessRegion(edge, spread, by)); };
   const double value = moved(0);
-  if (std::fabs(found - value) <= tolerance * value) return {value, value, value, uneven};
+  if (std::fabs(found - value) <= tolerance * value) return {value, value, value, value};
   const auto [low, high] = std::minmax({value, moved(-kMoved), moved(kMoved)});
-  return {value, low, high, uneven};
+  return {value, low, high, read(NoiselessRegion(lit, SpreadOf(lit), 0))};
 }
 
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {

@@ -24,12 +24,12 @@ struct NoiselessReading {
   double value;  // NaN where no edge is found
   double low,
       high;  // the same of edges moved by up to a twentieth of a pixel, about which a measure may be of two minds
-  double unevenness;  // by how much the light's fall across the region changes its plateaus, share of the edge's step
+  double in_its_light;  // the same in the light that falls on it, be it even or not
 };
 
 /// The figure of the region as it would be without noise, and in even light: what `read` gives of the edge spread
 /// alone. Where a figure that was found lies within `tolerance` of it (a share), no moved edges are read, and low and
-/// high are the value.
+/// high are the value, and so is the reading in its light.
 NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read,
                                double found = std::numeric_limits<double>::quiet_NaN(), double tolerance = 0);
 

@@ -11,8 +11,7 @@ namespace qv {
 
 namespace {
 
-constexpr double kMostOff = 0.05;      // of the noiseless figure
-constexpr double kUnevenLight = 0.03;  // fall of the light across a region, share of the edge's step
+constexpr double kMostOff = 0.05;  // of the noiseless figure
 
 constexpr Method kNoiselessMethod = {
     "the test's own measure of the region's edge spread alone",
@@ -63,8 +62,11 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
         figure);
     return;
   }
-  if (value >= noiseless.low * (1 - kMostOff) && value <= noiseless.high * (1 + kMostOff)) return;
-  const bool uneven = noiseless.unevenness > kUnevenLight;
+  const auto is_off = [&](double reading) {
+    return !(reading >= noiseless.low * (1 - kMostOff) && reading <= noiseless.high * (1 + kMostOff));
+  };
+  if (!is_off(value)) return;
+  const bool uneven = is_off(noiseless.in_its_light);
   record.Say(uneven ? Doubt::kUnevenLight : Doubt::kNoise,
              Format("%s: the %s region reads %.4f Nyquist, and its edge without noise and in even light %.4f: %s", path,
                     name, value, noiseless.value,
