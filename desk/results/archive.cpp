@@ -40,7 +40,7 @@ std::string Field(const std::string& text) {
   return quoted + "\"";
 }
 
-std::string TextOf(double value) {
+std::string CellOf(double value) {
   if (std::isnan(value)) return "nan";
   if (std::isinf(value)) return value > 0 ? "inf" : "-inf";
   return Format("%.17g", value);
@@ -102,7 +102,7 @@ void ExportTable(Store& store, const Selection& selection, const Sink& sink) {
   };
   store.EachFigure(selection, [&](const FigureRow& figure) {
     flush(figure.run);
-    if (figure.measured) fields[place.at(figure.quantity)] = TextOf(figure.value);
+    if (figure.measured) fields[place.at(figure.quantity)] = CellOf(figure.value);
   });
   flush(std::numeric_limits<std::int64_t>::max());
 }
