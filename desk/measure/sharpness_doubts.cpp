@@ -62,11 +62,9 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
         figure);
     return;
   }
-  const auto is_off = [&](double reading) {
-    return !(reading >= noiseless.low * (1 - kMostOff) && reading <= noiseless.high * (1 + kMostOff));
-  };
-  if (!is_off(value)) return;
-  const bool uneven = is_off(noiseless.in_its_light);
+  if (value >= noiseless.low * (1 - kMostOff) && value <= noiseless.high * (1 + kMostOff)) return;
+  // Of both causes the one that accounts for more.
+  const bool uneven = std::fabs(noiseless.in_its_light - noiseless.value) > std::fabs(value - noiseless.value) / 2;
   record.Say(uneven ? Doubt::kUnevenLight : Doubt::kNoise,
              Format("%s: the %s region reads %.4f Nyquist, and its edge without noise and in even light %.4f: %s", path,
                     name, value, noiseless.value,
