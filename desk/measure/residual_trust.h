@@ -10,7 +10,8 @@ namespace qv {
 
 // How far places and maps may be trusted, from what their fits leave over.
 
-/// Of a figure whose error is known but for this standard uncertainty, and left in it.
+/// Of a figure whose error is known but for this standard uncertainty, and left in it; both, and what comes back, in
+/// the figure's unit.
 Uncertainty FromKnownError(double error, double standard, const char* method = kResidualMethod);
 
 /// The marks' places, module size, the legs' ratio and angle, the chart's turn: from how far the search's places lie

@@ -126,11 +126,10 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "Type B alone: the 95 % quantiles of the errors of 3,000 simulated spots, half sharp and half soft, by contrast "
        "times the root of the pixels over the noise, s: of the area 0.48 + 1.5 / s of it, of the contrast 0.45 + 6 / s "
        "(from s = 50 on 0.1 + 6 / s), of a place 0.015 + 1.2 / s of the diameter; of all spots together, the root of "
-       "the squares. The noise of a pixel, rounding to levels included: the scatter of medians "
-       "over parts of the photo, drawn 200 times (JCGM 101), and what their reading between steps is known to be off. "
-       "What JPEG takes off noise and spots is not in it. Under half a percent of noise only sharp spots stand out of "
-       "the "
-       "levels' steps: areas and contrasts are then too wide, by half."},
+       "the squares. The noise of a pixel, rounding to levels included: the scatter of medians over parts of the "
+       "photo, drawn 200 times (JCGM 101), and what their reading between steps is known to be off. What JPEG takes "
+       "off noise and spots is not in it. Under half a percent of noise only sharp spots stand out of the levels' "
+       "steps: areas and contrasts are then too wide, by half."},
       {kRepeatMethod,
        "The spread of several photos of one unit, over the root of their number, with Student's factor; the median's "
        "is "
