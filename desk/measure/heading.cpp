@@ -32,9 +32,7 @@ std::string FigureText(const Reading& m) {
   if (m.values.size() == 1 && std::isfinite(m.value())) {
     value = ValueText(m, m.info->figure->number == Number::kWhole ? 0 : 4) + UnitText(m);
   }
-  const std::string verdict = VerdictText(m);
-  const std::size_t word = std::string(Name(m.outcome)).size();
-  return m.info->name + " " + value + verdict.substr(word);
+  return m.info->name + " " + value + BehindVerdict(m);
 }
 
 std::string EntryWords(const Reading& list, std::size_t place) {

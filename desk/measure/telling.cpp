@@ -64,10 +64,12 @@ std::string LimitText(const Reading& m) {
   return "  (" + bounds + (bounds.empty() ? "" : ", ") + Name(m.outcome) + HowSure(m) + ")";
 }
 
-std::string VerdictText(const Reading& m) {
-  if (!m.limit.given()) return Name(m.outcome);
+std::string VerdictText(const Reading& m) { return Name(m.outcome) + BehindVerdict(m); }
+
+std::string BehindVerdict(const Reading& m) {
+  if (!m.limit.given()) return "";
   const std::string bounds = LimitWords(m);
-  return Name(m.outcome) + (bounds.empty() ? "" : ", " + bounds) + HowSure(m);
+  return (bounds.empty() ? "" : ", " + bounds) + HowSure(m);
 }
 
 std::string VerdictText(const Reading& list, std::size_t place) {

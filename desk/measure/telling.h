@@ -31,6 +31,9 @@ std::string LimitText(const Reading& m);
 /// As it stands at a figure in a picture: "MEASURED", "FAIL, at most 3", "PASS, at least 0.38, marginal".
 std::string VerdictText(const Reading& m);
 
+/// What stands there behind the word: ", at least 0.38, marginal"; nothing without a limit.
+std::string BehindVerdict(const Reading& m);
+
 /// The same of a list's entry; empty where it has no limit.
 std::string VerdictText(const Reading& list, std::size_t place);
 
