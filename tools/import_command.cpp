@@ -26,8 +26,6 @@ Imported ImportFile(const std::string& path, Store& store) {
   if (LowerExtension(path) == ".json") {  // a record as a command wrote it
     return {1, store.Put(ParseRun(ReadWholeFile(path, kWrongUsage), Printable(path)))};
   }
-  if (!std::filesystem::is_regular_file(path))
-    throw Failure(kWrongUsage, Printable(path) + ": no such file, or none of lines");
   std::ifstream lines(path);
   if (!lines || lines.peek() == EOF) throw Failure(kWrongUsage, Printable(path) + ": can't be read, or holds no run");
   return ImportLines(lines, Printable(path), store);
@@ -36,7 +34,10 @@ Imported ImportFile(const std::string& path, Store& store) {
 int Import(const ImportOptions& options) {
   const std::string file = options.store.find("://") == std::string::npos ? options.store : "";
   for (const std::string& path : options.files) {
-    if (path != "-") CheckOutputs({{"the archive", path}}, {{"the store", file}});
+    if (path == "-") continue;
+    if (!std::filesystem::is_regular_file(path))
+      throw Failure(kWrongUsage, Printable(path) + ": no such file, or none of lines");
+    CheckOutputs({{"the archive", path}}, {{"the store", file}});
   }
   Store store(options.store, Store::Use::kWrite, options.wait.patience());
   Imported all;

@@ -19,12 +19,9 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t kRunsAtOnce = 64;  // stored in one transaction
+constexpr std::size_t kJobsGiven = 2;    // to a worker: one to measure, one for when it is done
 constexpr auto kStoredAfter = std::chrono::milliseconds(500);
 constexpr int kPollMillis = 200;
-
-struct Todo {
-  std::size_t job, first_step;
-};
 
 class Running {
  public:
@@ -66,13 +63,15 @@ class Running {
     return progress_;
   }
 
+  // Who has nothing to do comes first. Near the end nobody gets a second job that another could begin at once.
   void HandOut() {
-    for (std::unique_ptr<Worker>& worker : workers_) {
-      if (todo_.empty()) return;
-      if (!worker) worker = std::make_unique<Worker>(order_);
-      if (!worker->idle()) continue;
-      worker->Give(todo_.front().job, jobs_[todo_.front().job], todo_.front().first_step);
-      todo_.pop_front();
+    for (std::size_t held = 0; held < kJobsGiven; ++held) {
+      for (std::unique_ptr<Worker>& worker : workers_) {
+        if (todo_.empty() || (held > 0 && todo_.size() < workers_.size())) return;
+        if (!worker) worker = std::make_unique<Worker>(order_);
+        if (worker->given().size() > held) continue;
+        if (worker->Give(todo_.front(), jobs_[todo_.front().job])) todo_.pop_front();
+      }
     }
   }
 
@@ -96,18 +95,16 @@ class Running {
 
   void Attend(std::unique_ptr<Worker>& worker) {
     std::vector<StepDone> done;
-    bool finished = false;
-    const bool open = worker->Receive(done, finished);
-    const std::size_t job = worker->job();
-    for (StepDone& step : done) Keep(job, std::move(step));
-    if (finished) ++progress_.jobs_done;
-    if (open && !finished && !TimedOut(*worker)) return;
-    if (open && finished) return;
-    const std::size_t step = worker->next_step();
+    const bool open = worker->Receive(done, progress_.jobs_done);
+    for (StepDone& step : done) Keep(std::move(step));
+    if (open && (worker->idle() || !TimedOut(*worker))) return;
+    std::deque<Todo> given = worker->given();
     const std::string why = open ? Format("measuring took longer than %g s (--timeout)", order_.options.timeout_seconds)
                                  : "the process that measured it was " + worker->End();
     worker.reset();  // another takes its place when there is something to do
-    if (!finished) Abandon(job, step, why);
+    if (given.empty()) return;
+    todo_.insert(todo_.begin(), given.begin() + 1, given.end());
+    Abandon(given.front(), why);
   }
 
   bool TimedOut(const Worker& worker) const {
@@ -115,27 +112,36 @@ class Running {
   }
 
   // The step is an ERROR; those behind it are measured by another worker.
-  void Abandon(std::size_t job, std::size_t step, const std::string& why) {
-    if (step < order_.plan.steps.size()) Keep(job, {step, RunWithout(order_, jobs_[job], step, why)});
-    if (step + 1 < order_.plan.steps.size() && !order_.plan.stop_on_error) {
-      todo_.push_front({job, step + 1});
+  void Abandon(const Todo& at, const std::string& why) {
+    const std::size_t steps = order_.plan.steps.size();
+    if (at.first_step < steps) {
+      Keep({at.job, at.first_step, RunWithout(order_, jobs_[at.job], at.first_step, why)});
+    }
+    if (at.first_step + 1 < steps && !order_.plan.stop_on_error) {
+      todo_.push_front({at.job, at.first_step + 1});
     } else {
       ++progress_.jobs_done;
     }
   }
 
-  void Keep(std::size_t job, StepDone&& done) {
-    if (!done.run) {
-      ++progress_.known;
-      ++progress_.outcomes[known_.at(done.known_key)];
-      progress_.keys.push_back(done.known_key);
-      return;
+  // A key that is known stands for a run that is stored, or about to be: a manifest may name a photo twice.
+  void Keep(StepDone&& done) {
+    if (done.run) {
+      const std::string outcome = TextAt(done.run->record, "outcome");
+      const bool fault = WholeAt(FirstOf(MemberOf(done.run->record, "phases")), "result_code") == QV_ERROR_INTERNAL;
+      if (fault || known_.emplace(done.run->key, outcome).second) {
+        done.run->filing = FilingFor(order_, jobs_[done.job], order_.plan.steps.at(done.step));
+        ++progress_.runs;
+        ++progress_.outcomes[outcome];
+        progress_.keys.push_back(done.run->key);
+        pending_.push_back(std::move(*done.run));
+        return;
+      }
+      done.known_key = done.run->key;
     }
-    done.run->filing = FilingFor(order_, jobs_[job], order_.plan.steps.at(done.step));
-    ++progress_.runs;
-    ++progress_.outcomes[TextAt(done.run->record, "outcome")];
-    progress_.keys.push_back(done.run->key);
-    pending_.push_back(std::move(*done.run));
+    ++progress_.known;
+    ++progress_.outcomes[known_.at(done.known_key)];
+    progress_.keys.push_back(done.known_key);
   }
 
   void Flush() {

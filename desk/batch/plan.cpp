@@ -41,7 +41,8 @@ std::string Placed(const Plan& plan, const std::string& name, const std::string&
   const fs::path from_there = place.lexically_normal().lexically_relative(below);
   if (from_there.empty() || *from_there.begin() == "..") {
     throw Failure(kWrongUsage, "unit \"" + Printable(unit) + "\": " + Printable(filled) +
-                                   " leads out of the folder \"" + Printable(below.string()) + "\" of the plan");
+                                   " leads out of the folder \"" + Printable(below.empty() ? "." : below.string()) +
+                                   "\" of the plan");
   }
   return place.string();
 }

@@ -30,6 +30,10 @@ namespace {
 // The line carries frames: eight bytes of length, then the content. Parent to worker: {"job", "first"}. Back: a frame a
 // step, {"step", "key", "pictures"} and behind it the record and each picture; a last one, {"done"}.
 
+// Parent and worker would wait for each other if a job did not fit into the line while a run comes back. Linux's lines
+// hold over 200 kB.
+constexpr std::size_t kMostWaiting = 16384;
+
 bool SendAll(int line, const char* bytes, std::size_t length) {
   while (length > 0) {
     const ssize_t sent = send(line, bytes, length, MSG_NOSIGNAL);
@@ -272,15 +276,16 @@ Worker::Worker(const WorkOrder& order) {
 
 Worker::~Worker() { End(); }
 
-void Worker::Give(std::size_t index, const Job& job, std::size_t first_step) {
-  busy_ = true;
-  job_ = index;
-  next_step_ = first_step;
-  since_ = std::chrono::steady_clock::now();
-  SendFrame(line_, Dump({{"job", ToJson(job)}, {"first", first_step}}));  // a worker that is gone is seen by Receive
+bool Worker::Give(const Todo& todo, const Job& job) {
+  const std::string frame = Dump({{"job", ToJson(job)}, {"first", todo.first_step}});
+  if (!idle() && frame.size() > kMostWaiting) return false;
+  if (idle()) since_ = std::chrono::steady_clock::now();
+  given_.push_back(todo);
+  SendFrame(line_, frame);  // a worker that is gone is seen by Receive
+  return true;
 }
 
-bool Worker::TakeFrame(std::vector<StepDone>& done, bool& finished) {
+bool Worker::TakeFrame(std::vector<StepDone>& done, std::size_t& finished) {
   std::uint64_t length = 0;
   if (received_.size() - taken_ < sizeof length) return false;
   std::memcpy(&length, received_.data() + taken_, sizeof length);
@@ -297,11 +302,12 @@ bool Worker::TakeFrame(std::vector<StepDone>& done, bool& finished) {
   } else {
     Json head = Json::parse(content);
     if (head.contains("done")) {
-      busy_ = false;
-      finished = true;
+      given_.pop_front();
+      ++finished;
       return true;
     }
     StepDone step;
+    step.job = given_.front().job;
     step.step = head.at("step");
     if (!head.contains("pictures")) {
       step.known_key = head.at("key");
@@ -315,14 +321,14 @@ bool Worker::TakeFrame(std::vector<StepDone>& done, bool& finished) {
     incomplete_ = std::move(step);
   }
   if (frames_due_ > 0) return true;
-  next_step_ = incomplete_->step + 1;
+  given_.front().first_step = incomplete_->step + 1;
   since_ = std::chrono::steady_clock::now();
   done.push_back(std::move(*incomplete_));
   incomplete_.reset();
   return true;
 }
 
-bool Worker::Receive(std::vector<StepDone>& done, bool& finished) {
+bool Worker::Receive(std::vector<StepDone>& done, std::size_t& finished) {
   bool open = true;
   std::array<char, 65536> buffer;
   for (;;) {

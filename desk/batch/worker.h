@@ -4,6 +4,7 @@
 #include <sys/types.h>
 
 #include <chrono>
+#include <deque>
 #include <optional>
 #include <string>
 #include <unordered_map>
@@ -32,14 +33,20 @@ Request RequestFor(const Plan& plan, const PlanStep& step, const Job& job);
 /// A run that came to no measurement, with its reason in a sentence.
 StoredRun RunWithout(const WorkOrder& order, const Job& job, std::size_t step, const std::string& sentence);
 
+/// A step of a job, where a worker begins or has to go on.
+struct Todo {
+  std::size_t job, first_step;
+};
+
 /// A step that a worker has done: its run, or none where the store holds it.
 struct StepDone {
-  std::size_t step = 0;
+  std::size_t job = 0, step = 0;
   std::optional<StoredRun> run;
   std::string known_key = {};
 };
 
-/// A forked process that measures one job after another. It ends with its parent, and when its end of the line closes.
+/// A forked process that measures one job after another; the next may wait in its line, so that it has something to do
+/// while its parent stores runs. It ends with its parent, and when its end of the line closes.
 class Worker {
  public:
   explicit Worker(const WorkOrder& order);
@@ -47,29 +54,28 @@ class Worker {
   Worker(const Worker&) = delete;
   Worker& operator=(const Worker&) = delete;
 
-  bool idle() const { return !busy_; }
-  int descriptor() const { return line_; }  // to poll for reading
-  std::size_t job() const { return job_; }
-  std::size_t next_step() const { return next_step_; }
+  bool idle() const { return given_.empty(); }
+  const std::deque<Todo>& given() const { return given_; }                // at the first it is at work: with this step
+  int descriptor() const { return line_; }                                // to poll for reading
   std::chrono::steady_clock::time_point since() const { return since_; }  // when it began its step
 
   /// Puts off the end of its time.
   void Excuse(std::chrono::steady_clock::duration time) { since_ += time; }
 
-  void Give(std::size_t index, const Job& job, std::size_t first_step);
-  /// Takes what has arrived; false when the process is gone. `finished` says that the job is done.
-  bool Receive(std::vector<StepDone>& done, bool& finished);
+  /// False, and nothing is given, where it has a job and this one is too long to wait in the line.
+  bool Give(const Todo& todo, const Job& job);
+  /// Takes what has arrived, and adds to `finished` how many jobs are done; false when the process is gone.
+  bool Receive(std::vector<StepDone>& done, std::size_t& finished);
   /// Why a process that is gone went: "killed by SIGSEGV (Segmentation fault)". Call after Receive answered false, or
   /// to kill one that hangs.
   std::string End();
 
  private:
-  bool TakeFrame(std::vector<StepDone>& done, bool& finished);
+  bool TakeFrame(std::vector<StepDone>& done, std::size_t& finished);
 
   pid_t process_ = -1;
   int line_ = -1;
-  bool busy_ = false;
-  std::size_t job_ = 0, next_step_ = 0;
+  std::deque<Todo> given_;
   std::chrono::steady_clock::time_point since_;
   std::string received_;
   std::size_t taken_ = 0;

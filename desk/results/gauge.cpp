@@ -17,9 +17,29 @@ constexpr double kPoolAbove = 0.25;  // the interaction's p from which on the ma
 // Readings in a table: [part][operator][trial].
 using Table = std::vector<std::vector<std::vector<double>>>;
 
+using Places = std::map<std::string, std::size_t>;
+
+void CheckBalance(const Table& table, const Places& parts, const Places& operators) {
+  using Cell = std::pair<std::size_t, std::string>;
+  Cell least;
+  Cell most;
+  for (const auto& [part, row] : parts) {
+    for (const auto& [who, column] : operators) {
+      const std::size_t times = table[row][column].size();
+      const std::string words = who + " measured part " + part + " " + Count(times, "time");
+      if (least.second.empty() || times < least.first) least = {times, words};
+      if (times > most.first) most = {times, words};
+    }
+  }
+  if (least.first == most.first && least.first >= 2) return;
+  throw Failure(kWrongUsage,
+                "a gauge study needs each part measured equally often, at least twice, by each operator; " +
+                    least.second + (least.first < most.first ? ", " + most.second : ""));
+}
+
 Table Arrange(const std::vector<GaugeReading>& readings) {
-  std::map<std::string, std::size_t> parts;
-  std::map<std::string, std::size_t> operators;
+  Places parts;
+  Places operators;
   for (const GaugeReading& reading : readings) {
     if (!std::isfinite(reading.value)) {
       throw Failure(kWrongUsage, "part " + reading.part + " has a value that is not finite: no gauge study of it");
@@ -35,16 +55,7 @@ Table Arrange(const std::vector<GaugeReading>& readings) {
   for (const GaugeReading& reading : readings) {
     table[parts[reading.part]][operators[reading.operator_name]].push_back(reading.value);
   }
-  const std::size_t trials = readings.size() / (parts.size() * operators.size());
-  for (const auto& [part, row] : parts) {
-    for (const auto& [who, column] : operators) {
-      const std::size_t had = table[row][column].size();
-      if (had == trials && trials >= 2) continue;
-      throw Failure(kWrongUsage, Format("a gauge study needs each part measured equally often, at least twice, by each "
-                                        "operator; %s measured part %s %zu times",
-                                        who.c_str(), part.c_str(), had));
-    }
-  }
+  CheckBalance(table, parts, operators);
   return table;
 }
 
