@@ -203,6 +203,17 @@ TEST(Lcd, BarsAreReadWithoutTheirRims) {
   }
 }
 
+// Edges are two pixels wide on the field of 388 x 288, seen at 160 x 119: of a square of 58 pixels they take 1 %.
+TEST(Lcd, ASignTakesAHundredthOfTheFieldAndStandsOutByAnEighth) {
+  const LogLines log;
+  for (const auto& [side, step, seen] : {std::tuple(66, 100, 1), {50, 100, 0}, {150, 36, 1}, {150, 26, 0}}) {
+    Shown s;
+    s.screen.setTo(cv::Scalar(20, 200, 20));
+    s.screen(cv::Rect(130, 80, side, side)).setTo(cv::Scalar(20, 200 - step, 20));
+    EXPECT_EQ(seen, s.Judge(QV_LCD_RESULT).verdict_) << side << ", " << step << ": " << s.result.reason_;
+  }
+}
+
 TEST(Lcd, KeptCornersAreFoundAnewWhenAskedFor) {
   const LogLines log;
   Shown s;

@@ -100,6 +100,8 @@ TEST_F(Preview, TheCentreIsTheMiddleOfTheLongestSide) {
   EXPECT_EQ("0,10", centre({{0, 0}, {0, 10}, {0, 20}}));
   EXPECT_EQ("0,8", centre({{0, 0}, {6, 8}, {0, 16}})) << "of a middle one";
   EXPECT_EQ("20,5", centre({{0, 0}, {40, 10}, {0, 20}})) << "of two alike the first";
+  EXPECT_EQ("4,4", centre({{4, 4}, {4, 5}, {4, 4}})) << "of a side of one pixel";
+  EXPECT_EQ("0,0", centre({{4, 4}, {4, 4}, {4, 4}})) << "no side is longer than none";
   EXPECT_EQ("0,0", centre({{0, 0}, {0, 10}, {8, 5}, {4, 2}})) << "four points have no centre";
   EXPECT_EQ("4,2", Property("t82.vi_circle_loc_0_3"));
   EXPECT_EQ("0,0", centre({}));
