@@ -36,7 +36,9 @@ std::string FigureText(const Reading& m) {
 }
 
 std::string EntryWords(const Reading& list, std::size_t place) {
-  return Format("%s %.4g", list.info->figure->name, list.values[place]) + UnitText(list);
+  const double value = list.values[place];
+  const std::string text = std::isnan(value) ? "none" : Format("%.4g", value) + UnitText(list);
+  return list.info->figure->name + (" " + text);
 }
 
 Tone ToneOf(const Remark& remark) {

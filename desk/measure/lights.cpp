@@ -121,6 +121,11 @@ const std::vector<LightFigure>& LightFigures() {
   return figures;
 }
 
+// A colour's figure for people: the dark has none, nor has a light too far from white a temperature.
+std::string ColourText(const char* format, double value) {
+  return std::isnan(value) || value == 0 ? "none" : Format(format, value);
+}
+
 // The least and the largest of all regions, which limits may be set on.
 struct Extreme {
   std::string name, docstring;
@@ -205,15 +210,17 @@ class LightFinding : public Finding {
     std::string text = "region  label   grey      Y        x       y      CCT   clipped  uniformity\n";
     for (std::size_t i = 0; i < regions.size(); ++i) {
       const QVLightRegion& r = regions[i];
-      text += Format("%6zu %6d %6.1f %7.4f  %7.4f %7.4f %6.0f K %7.1f %% %8.3f\n", i, r.label_, r.mean_grey_, r.xyz_[1],
-                     r.chromaticity_[0], r.chromaticity_[1], r.cct_, 100 * r.clipped_share_, r.uniformity_);
+      text += Format("%6zu %6d %6.1f %7.4f  %7s %7s %8s %7.1f %% %8.3f\n", i, r.label_, r.mean_grey_, r.xyz_[1],
+                     ColourText("%.4f", r.chromaticity_[0]).c_str(), ColourText("%.4f", r.chromaticity_[1]).c_str(),
+                     ColourText("%.0f K", r.cct_).c_str(), 100 * r.clipped_share_, r.uniformity_);
     }
     const Reading& count = *record.phase.Find("area_count");
     text += Format("areas of dots  %.0f%s\n", count.value(), LimitText(count).c_str()) + AreaLines(areas, "pixels");
     for (const Extreme& extreme : Extremes()) {
       const Reading& reading = *record.phase.Find(extreme.name);
       if (!reading.limit.given()) continue;
-      text += Format("%s  %.4g%s\n", extreme.name.c_str(), reading.value(), LimitText(reading).c_str());
+      const std::string value = std::isnan(reading.value()) ? "none" : Format("%.4g", reading.value());
+      text += extreme.name + "  " + value + LimitText(reading) + "\n";
     }
     return text;
   }
@@ -221,7 +228,8 @@ class LightFinding : public Finding {
   std::optional<Picture> Draw(const Record& record) const override {
     constexpr double kSide = 1280;
     if (record.phase.code != QV_SUCCESS) return std::nullopt;
-    const double scale = FitScale(photo_, kSide);
+    const double fit = FitScale(photo_, kSide);  // a small photo is enlarged: a region's words are wide
+    const double scale = fit < 1 ? fit : std::clamp(std::floor(kSide / std::max(photo_.cols, photo_.rows)), 1.0, 4.0);
     constexpr double kKey = 34;
     const double width = std::max(640.0, photo_.cols * scale);
     const Heading heading(record, "Lights", width, {"region_count", "area_count"});
@@ -261,8 +269,9 @@ class LightFinding : public Finding {
   // Its colour, and each of its figures that has a limit, as an entry or as the least or largest of all regions.
   PlaceWords WordsOf(const Phase& phase, std::size_t i) const {
     const QVLightRegion& r = regions[i];
-    PlaceWords words(Format("%d: x %.3f y %.3f, %.0f K", r.label_, r.chromaticity_[0], r.chromaticity_[1], r.cct_),
-                     ToneOf(r));
+    const bool lit = !std::isnan(r.chromaticity_[0]);
+    const std::string colour = lit ? Format("x %.3f y %.3f", r.chromaticity_[0], r.chromaticity_[1]) : "no light";
+    PlaceWords words(Format("%d: ", r.label_) + colour + (r.cct_ > 0 ? Format(", %.0f K", r.cct_) : ""), ToneOf(r));
     for (const LightFigure& row : LightFigures()) words.AddEntry(phase.Find(row.figure.name), i);
     for (const Extreme& extreme : Extremes()) {
       words.AddExtreme(phase.Find(extreme.name), extreme.most, *phase.Find(extreme.figure->figure.name), i);
@@ -365,6 +374,8 @@ class Lights : public Measurement {
                  Format("%s: region with label %d (left %d, top %d, %d x %d) does not lie inside the photo of %d x %d",
                         record.inputs[0].path.c_str(), r[4].get<int>(), r[0].get<int>(), r[1].get<int>(),
                         r[2].get<int>(), r[3].get<int>(), photo.width, photo.height));
+      record.meaning = "a region lies outside";
+      record.advice = "are these the regions of photos of that size?";
       return false;
     }
     return true;

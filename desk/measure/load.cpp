@@ -184,8 +184,10 @@ class Loader {
   }
 
   bool Refuse(const Input& input, int code, const std::string& why) {
+    const std::string name = input.name + ": ";
     record_.phase.code = code;
-    record_.remarks = {Remark(Remark::kMiss, "refused_input", input.name + ": " + why)};
+    record_.remarks = {
+        Remark(Remark::kMiss, "refused_input", why.compare(0, name.size(), name) == 0 ? why : name + why)};
     return false;
   }
 

@@ -262,7 +262,11 @@ std::string Record::MissSentence() const {
   if (phase.code == QV_SUCCESS) return text;
   // The circle check answers a miss with 0.
   const ResultCode& row = FindCode(phase.code == QV_DONE ? QV_ERROR_PATTERN_NOT_FOUND : phase.code);
-  if (text.empty()) text = row.meaning;
+  if (text.empty()) {
+    for (std::size_t i = 0; i < std::min<std::size_t>(inputs.size(), 2); ++i)
+      text += (i == 0 ? "" : ", ") + inputs[i].path;
+    text += (text.empty() ? "" : ": ") + std::string(row.meaning);
+  }
   const bool advised = !advice.empty() && (row.code == QV_ERROR_INVALID_ARGUMENT || !meaning.empty());
   const std::string look_at = advised ? advice : row.look_at;
   if (row.code != phase.code) {

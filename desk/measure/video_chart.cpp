@@ -30,7 +30,9 @@ class ChartFilmFinding : public FilmFinding {
     text += line("bad      ", "frames_bad", " could not be decoded");
     text += Format("rate     %.3f frames/s%s, longest gap %.1f ms%s\n", rate.value(), LimitText(rate).c_str(),
                    gap.value(), LimitText(gap).c_str());
-    return text + line("chart    ", "found_count", " frames show its three marks");
+    const bool one = record.phase.Find("found_count")->value() == 1;
+    return text +
+           line("chart    ", "found_count", one ? " frame shows its three marks" : " frames show its three marks");
   }
 
  protected:

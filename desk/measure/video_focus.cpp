@@ -92,7 +92,13 @@ class VideoFocus : public Measurement {
   }
 
   std::unique_ptr<Finding> Run(QVTester& tester, const Request& request, Record& record) const override {
-    if (!RunFilmTest(tester, spec(), request, record)) return std::make_unique<NoFilm>();
+    if (!RunFilmTest(tester, spec(), request, record)) {
+      if (record.phase.code == QV_ERROR_PATTERN_NOT_FOUND) {
+        record.Say(Remark::kMiss, "chart_not_found",
+                   record.inputs[0].path + ": the chart was measured in none of the film's frames");
+      }
+      return std::make_unique<NoFilm>();
+    }
     const QVResultData& results = *tester.results_;
     const int count = results.video_af_frame_count_;
     const std::vector<double> time = Widen(results.video_af_time_, count);
