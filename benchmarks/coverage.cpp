@@ -1,15 +1,17 @@
 // Whether uncertainties keep their word: simulated readings of known truth, and the share of them whose true value lies
 // within the expanded uncertainty. 95 in 100 is meant, 93 to 97 is promised.
-//   coverage_accuracy [--check] [--quick] [WORD...]     --quick: 12 readings a row in place of 1000, of fewer
-//   conditions; of rows that hold all words
+//   coverage_accuracy [--check] [--quick] [NUMBER] [WORD...]     --quick: 12 readings a row in place of 1000, of
+//   fewer conditions; NUMBER: so many readings a row; of rows that hold all words
 
 #include <algorithm>
 #include <array>
 #include <atomic>
 #include <cmath>
 #include <cstdio>
+#include <cstdlib>
 #include <functional>
 #include <map>
+#include <memory>
 #include <mutex>
 #include <opencv2/core.hpp>
 #include <opencv2/core/utility.hpp>
@@ -30,6 +32,8 @@
 #include "desk/measure/sharpness.h"
 #include "desk/measure/spots.h"
 #include "desk/measure/uncertainty.h"
+#include "desk/scenes/scene.h"
+#include "desk/simulation/film.h"
 #include "desk/simulation/method_law.h"
 #include "desk/simulation/simulation.h"
 #include "qvtester/tester.h"
@@ -290,6 +294,250 @@ std::vector<Trial> TrySpots(const Condition& condition, cv::RNG& random) {
   return trials;
 }
 
+// A photo as the measurements take it: a picture, or a JPEG file's content, whose tables tell how it rounds.
+Input AsInput(const Condition& condition, const cv::Mat& photo) {
+  if (condition.jpeg == 0) return {photo};
+  std::vector<uchar> file;
+  cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, condition.jpeg});
+  return {"photo.jpg", std::string(file.begin(), file.end())};
+}
+
+Trial TrialOf(const Reading& reading, std::size_t i, double is, double scale) {
+  if (reading.uncertainties.size() <= i) return {NAN, NAN, 1};
+  return {reading.values[i] - is, reading.uncertainties[i].expanded, scale};
+}
+
+// Lights of some colour in light that falls off by none to 40 % across the photo; the second of six.
+std::vector<Trial> TryLights(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("lights", {600, 400}, condition.noise_percent, random.next());
+  options.camera.blur_px = condition.blur;
+  options.camera.gain = 1;
+  const double level = random.uniform(90.0, 210.0);
+  options.lights.colour = level * cv::Vec3d(1, random.uniform(0.85, 1.0), random.uniform(0.65, 1.05));
+  options.camera.falloff_percent = random.uniform(0, 2) * random.uniform(0.0, 40.0);
+  const Simulation simulation = Simulate(options);
+  const cv::Mat photo = Sense(options.camera, simulation.levels[0], 8);
+  Json regions = Json::array();
+  for (const Json& r : simulation.truth.at("regions")) {
+    constexpr int kRim = 16;  // a block of a codec's: what it does at the light's rim stays out
+    const auto at = [&](const char* name) { return r.at(name).get<int>(); };
+    regions.push_back(
+        {at("left") + kRim, at("top") + kRim, at("width") - 2 * kRim, at("height") - 2 * kRim, at("label")});
+  }
+  const Record record = MeasureAnew({"led_light", {AsInput(condition, photo)}, {{"regions", regions}}});
+  const Json& r = regions[1];
+  const cv::Mat levels = simulation.levels[0](cv::Rect(r[0], r[1], r[2], r[3]));
+  cv::Vec3d light;
+  double least = 1e9;
+  double most = 0;
+  for (int i = 0; i < 8; ++i) {
+    for (int k = 0; k < 8; ++k) {
+      const cv::Scalar mean = cv::mean(levels(cv::Range(i * levels.rows / 8, (i + 1) * levels.rows / 8),
+                                              cv::Range(k * levels.cols / 8, (k + 1) * levels.cols / 8)));
+      const double grey = 0.299 * mean[0] + 0.587 * mean[1] + 0.114 * mean[2];
+      least = std::min(least, grey);
+      most = std::max(most, grey);
+    }
+  }
+  for (const cv::Vec3f& bgr : cv::Mat_<cv::Vec3f>(levels)) {
+    for (int k = 0; k < 3; ++k) light[k] += LightOf(bgr[2 - k]) / (255.0 * static_cast<double>(levels.total()));
+  }
+  const cv::Scalar mean = cv::mean(levels);
+  const cv::Matx33d xyz_from_rgb(0.4124, 0.3576, 0.1805, 0.2126, 0.7152, 0.0722, 0.0193, 0.1192, 0.9505);
+  const cv::Vec3d xyz = xyz_from_rgb * light;
+  std::vector<float> floats = {static_cast<float>(xyz[0]), static_cast<float>(xyz[1]), static_cast<float>(xyz[2])};
+  QVTester tester;
+  const std::unique_ptr<float, decltype(&std::free)> kelvin(tester.xyz2cct(floats.data(), 1, 1), &std::free);
+  const auto trial = [&](const char* figure, double is, double scale) {
+    return TrialOf(*record.phase.Find(figure), 1, is, scale);
+  };
+  const double grey = 0.299 * mean[0] + 0.587 * mean[1] + 0.114 * mean[2];
+  const double sum = xyz[0] + xyz[1] + xyz[2];
+  return {trial("mean_grey", grey, grey),     trial("linear_red", light[0], light[0]),
+          trial("luminance", xyz[1], xyz[1]), trial("chromaticity_x", xyz[0] / sum, xyz[0] / sum),
+          trial("cct", *kelvin, 6500),        trial("uniformity", least / most, 1)};
+}
+
+// A display in light that falls off, seen up to 20 degrees off; the truth of its means by the same rule, without noise.
+std::vector<Trial> TryDisplay(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("display", {600, 450}, condition.noise_percent, random.next());
+  options.camera.blur_px = condition.blur;
+  options.camera.turn_deg = random.uniform(-5.0, 5.0);
+  options.camera.pan_deg = random.uniform(-20.0, 20.0);
+  options.camera.shading_percent = random.uniform(5.0, 40.0);
+  options.camera.gain = random.uniform(0.5, 0.8);
+  const Simulation simulation = Simulate(options);
+  const auto measure = [&](const cv::Mat& photo) {
+    return MeasureAnew({"lcd", {AsInput(condition, photo)}, {{"pattern", "white"}}});
+  };
+  CameraModel sensor = options.camera;
+  const std::vector<const char*> figures = {"mean_green", "share_red", "levels", "uniformity"};
+  constexpr int kPhotos = 16;  // whose mean is the truth of all but the evenness, which noise moves one way
+  std::vector<double> truth(figures.size());
+  cv::Mat levels = cv::Mat::zeros(3, 3, CV_64F);
+  Record record;
+  for (int photo = 0; photo <= kPhotos; ++photo) {
+    sensor.seed += 0x9E3779B97F4A7C15;
+    record = measure(Sense(sensor, simulation.levels[0], 8));
+    if (record.phase.Find("levels") == nullptr) return std::vector<Trial>(figures.size(), {NAN, NAN, 1});
+    if (photo == kPhotos) break;
+    for (std::size_t k = 0; k < figures.size(); ++k) truth[k] += record.phase.Find(figures[k])->value() / kPhotos;
+    levels += cv::Mat(record.phase.Find("levels")->values, true).reshape(1, 3) / kPhotos;
+  }
+  double least = 0;
+  double most = 0;
+  cv::minMaxLoc(levels, &least, &most);
+  truth.back() = least / most;
+  std::vector<Trial> trials;
+  for (std::size_t k = 0; k < figures.size(); ++k) {
+    trials.push_back(TrialOf(*record.phase.Find(figures[k]), 0, truth[k], truth[k]));
+  }
+  return trials;
+}
+
+// One at a time: folders are named by the process and a count of its own.
+std::unique_ptr<TemporaryFolder> NewFolder() {
+  static std::mutex one_at_a_time;
+  const std::lock_guard<std::mutex> lock(one_at_a_time);
+  return std::make_unique<TemporaryFolder>();
+}
+
+// A print moved, turned and scaled against the good ones, which differ a little.
+std::vector<Trial> TryPrint(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("print", {600, 450}, condition.noise_percent, random.next());
+  options.camera.fill = 0.85;
+  options.camera.blur_px = condition.blur;
+  options.samples = 3;
+  options.motion_px = {random.uniform(-15.0, 15.0), random.uniform(-15.0, 15.0)};
+  options.second_turn_deg = random.uniform(-4.0, 4.0);
+  options.second_scale = random.uniform(0.96, 1.04);
+  const Simulation simulation = Simulate(options);
+  const std::unique_ptr<TemporaryFolder> folder = NewFolder();
+  Request request = {"touch_panel_print", {}};
+  CameraModel sensor = options.camera;
+  for (const cv::Mat& levels : simulation.levels) {
+    const std::string file = std::to_string(request.inputs.size()) + (condition.jpeg == 0 ? ".png" : ".jpg");
+    request.inputs.emplace_back(folder->Path(file));
+    cv::imwrite(request.inputs.back().name, Sense(sensor, levels, 8), {cv::IMWRITE_JPEG_QUALITY, condition.jpeg});
+    sensor.seed += 0x9E3779B97F4A7C15;
+  }
+  const Record record = MeasureAnew(request);
+  const Reading* const matrix = record.phase.Find("matrix");
+  std::vector<Trial> trials;
+  for (const int i : {0, 2, 5}) {
+    const double is = simulation.truth.at("matrix")[i].get<double>();
+    trials.push_back(matrix == nullptr ? Trial{NAN, NAN, 1} : TrialOf(*matrix, i, is, i == 0 ? 1 : 100));
+  }
+  return trials;
+}
+
+// Two frames of a preview that moves, or stands still; the truth is the mean of what all noise gives.
+std::vector<Trial> TryPreview(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("preview", {320, 240}, condition.noise_percent, 5);
+  options.camera.blur_px = condition.blur;
+  options.motion_px = {2, 0};
+  static std::mutex one_at_a_time;
+  static std::map<const Condition*, std::pair<Simulation, double>> known;
+  const auto measure = [&](const Simulation& simulation, cv::RNG& seeds) {
+    std::vector<Input> frames;
+    for (const cv::Mat& levels : simulation.levels) {
+      CameraModel sensor = options.camera;
+      sensor.seed = seeds.next();
+      frames.push_back(AsInput(condition, Sense(sensor, levels, 8)));
+    }
+    return MeasureAnew({"camera_preview", frames});
+  };
+  const auto& [simulation, truth] = [&]() -> const std::pair<Simulation, double>& {
+    const std::lock_guard<std::mutex> lock(one_at_a_time);
+    const auto [found, is_new] = known.try_emplace(&condition);
+    if (!is_new) return found->second;
+    constexpr int kPairs = 400;
+    found->second.first = Simulate(options);
+    cv::RNG seeds(77);
+    for (int i = 0; i < kPairs; ++i) {
+      found->second.second += measure(found->second.first, seeds).phase.Find("difference_mean")->value() / kPairs;
+    }
+    return found->second;
+  }();
+  return {TrialOf(*measure(simulation, random).phase.Find("difference_mean"), 0, truth, truth)};
+}
+
+// Films of a flash, of a focus and of a chart whose frames come late and early, some lost.
+Record MeasureFilm(const char* measurement, const FilmStyle& style, Film film, const char* name) {
+  static std::mutex one_at_a_time;  // scratch folders are
+  std::map<int, cv::Mat> frames;
+  for (const int frame : film.kept) frames[frame] = film.frame(frame);
+  film.frame = [&](int frame) { return frames.at(frame); };
+  const std::unique_ptr<TemporaryFolder> folder = NewFolder();
+  std::string path;
+  {
+    const std::lock_guard<std::mutex> lock(one_at_a_time);
+    path = folder->Write(name, EncodeFilm(film, style, name));
+  }
+  return MeasureAnew({measurement, {path}});
+}
+
+std::vector<Trial> TryFlashFilm(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("film-flash", {160, 120}, condition.noise_percent, random.next());
+  FilmStyle style;
+  style.frames = 60;
+  style.pulse_ms = random.uniform(3.0, 12.0) * 1000 / style.rate;
+  style.pulse_at_ms = random.uniform(900.0, 1100.0);
+  style.base = random.uniform(0.1, 0.5);
+  const Film film = SimulateFilm(options, style);
+  const Record record = MeasureFilm("video_flash", style, film, "film.mp4");
+  const auto at = static_cast<std::size_t>(record.phase.Find("peak_frame")->value());
+  const double away = std::fabs(film.truth.at("time_ms")[at].get<double>() - style.pulse_at_ms) / style.pulse_ms;
+  const double pulse = style.base + (1 - style.base) * (1 + std::cos(CV_PI * std::min(away, 1.0))) / 2;
+  const double peak = film.truth.at("peak").get<double>() * pulse;
+  const double base = film.truth.at("base");
+  return {TrialOf(*record.phase.Find("peak"), 0, peak, peak), TrialOf(*record.phase.Find("base"), 0, base, base),
+          TrialOf(*record.phase.Find("width"), 0, style.pulse_ms, style.pulse_ms)};
+}
+
+std::vector<Trial> TryTimes(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("film-chart", {160, 120}, condition.noise_percent, random.next());
+  FilmStyle style;
+  style.rate = random.uniform(20.0, 60.0);
+  style.frames = 30;
+  style.jitter = random.uniform(0, 2) * 0.1;
+  for (int frame = 1; frame < 20; ++frame) {
+    if (random.uniform(0.0, 1.0) < 0.08) style.lost.push_back(frame);
+  }
+  const Film film = SimulateFilm(options, style);
+  const Record record = MeasureFilm("video_play", style, film, random.uniform(0, 2) == 0 ? "film.mp4" : "film.mkv");
+  const std::vector<double> time = film.truth.at("time_ms");
+  double longest = 0;
+  for (std::size_t i = 1; i < time.size(); ++i) longest = std::max(longest, time[i] - time[i - 1]);
+  const double rate = 1000 * static_cast<double>(time.size() - 1) / (time.back() - time.front());
+  return {TrialOf(*record.phase.Find("mean_rate"), 0, rate, rate),
+          TrialOf(*record.phase.Find("longest_gap"), 0, longest, longest)};
+}
+
+std::vector<Trial> TryFocus(const Condition& condition, cv::RNG& random) {
+  SimulationOptions options = SceneOptions("film-focus", {480, 400}, condition.noise_percent, random.next());
+  options.camera.blur_px = random.uniform(0.7, 1.2);
+  FilmStyle style;
+  style.frames = 45;
+  style.sweep_ms = random.uniform(300.0, 600.0);
+  style.overshoot_px = random.uniform(1.5, 2.5);
+  style.return_ms = random.uniform(300.0, 500.0);
+  const Film film = SimulateFilm(options, style);
+  const Record record = MeasureFilm("video_autofocus", style, film, "film.mp4");
+  CameraModel quiet = options.camera;  // the last frame, and the lens at its best, without noise and codec
+  quiet.noise_percent = 0;
+  SimulationOptions chart = options;
+  chart.scene = "chart";
+  chart.camera = quiet;
+  const Record still = MeasureAnew({"mtf_check", {Sense(quiet, Simulate(chart).levels[0], 8)}});
+  const double level =
+      (still.phase.Find("mtf50_vertical")->value() + still.phase.Find("mtf50_horizontal")->value()) / 2;
+  const double settled = film.truth.at("settle_time_ms");
+  return {TrialOf(*record.phase.Find("final_mtf50"), 0, level, level),
+          TrialOf(*record.phase.Find("best_mtf50"), 0, level, level),
+          TrialOf(*record.phase.Find("settle_time"), 0, settled, 1000 / style.rate)};
+}
+
 double ValueOf(const Json& truth, const char* name) { return truth.at(name).get<double>(); }
 
 // The marks of a chart photo, as a record has them.
@@ -364,7 +612,7 @@ std::vector<Trial> TryMaps(const Condition& condition, cv::RNG& random) {
 
 // One run gives a reading of each figure.
 struct Group {
-  enum Kind { kEdge, kFlat, kChart };  // which conditions tell something
+  enum Kind { kEdge, kFlat, kChart, kFilm };  // which conditions tell something
   Kind kind;
   std::vector<const char*> figures;
   std::vector<Trial> (*run)(const Condition&, cv::RNG&);
@@ -372,6 +620,7 @@ struct Group {
   bool Takes(const Condition& c) const {
     if (kind == kEdge) return true;
     if (c.contrast != 5 || !c.srgb || c.rows != 260 || c.blur < 0.8) return false;
+    if (kind == kFilm) return &c == kConditions;
     return kind == kChart || (c.blur == 0.8 && c.turn_deg == 0);
   }
 };
@@ -386,6 +635,18 @@ const std::vector<Group> kGroups = {
       "difference 2000"},
      TryPatch},
     {Group::kFlat, {"mean level", "clipped share"}, TryFlash},
+    {Group::kFlat,
+     {"grey of a light", "red of a light", "luminance of a light", "x of a light", "CCT of a light",
+      "evenness of a light"},
+     TryLights},
+    {Group::kChart,
+     {"mean of a display", "share of red of a display", "level of a display", "evenness of a display"},
+     TryDisplay},
+    {Group::kChart, {"a of a print", "c of a print", "f of a print"}, TryPrint},
+    {Group::kFlat, {"difference of two frames"}, TryPreview},
+    {Group::kFilm, {"peak of a flash film", "base of a flash film", "width of a flash film"}, TryFlashFilm},
+    {Group::kFilm, {"rate of a film", "longest gap of a film"}, TryTimes},
+    {Group::kFilm, {"final MTF50 of a film", "best MTF50 of a film", "settling of a film"}, TryFocus},
     {Group::kFlat, {"area of a spot", "contrast of a spot", "place of a spot", "noise of a pixel"}, TrySpots},
     {Group::kChart, {"place of a mark", "module size", "legs' ratio", "legs' angle", "turn of the chart"}, TryMarks},
     {Group::kChart,
@@ -480,7 +741,11 @@ int main(int count, char** arguments) {
   std::vector<std::string> words(arguments + 1, arguments + count);
   TakeCheckOptions(words);
   constexpr int kFull = 1000;
-  const int trials = Trials(kFull, 12);
+  int trials = Trials(kFull, 12);
+  if (!words.empty() && words[0].find_first_not_of("0123456789") == std::string::npos) {
+    trials = std::stoi(words[0]);
+    words.erase(words.begin());
+  }
   std::printf("Coverage, %d readings a row\n\n| figure | photo | scatter | bias | mean U | within U, of 100 |\n",
               trials);
   std::printf("|---|---|---|---|---|---|\n");
@@ -491,7 +756,7 @@ int main(int count, char** arguments) {
   cv::Vec2d within;
   for (const qv::Group& group : qv::kGroups) {
     for (const qv::Condition& condition : qv::kConditions) {
-      const bool costly = group.kind == qv::Group::kChart && &condition != qv::kConditions;
+      const bool costly = group.kind >= qv::Group::kChart && &condition != qv::kConditions;
       if (!group.Takes(condition) || (trials < kFull && (costly || !condition.quick()))) continue;
       qv::PrintGroup(group, condition, trials, wanted, within);
     }

@@ -7,6 +7,7 @@
 #include "desk/measure/doubt_names.h"
 #include "desk/measure/figures.h"
 #include "desk/measure/measurement.h"
+#include "desk/measure/trust_table.h"
 #include "desk/measure/uncertainty.h"
 #include "tools/commands.h"
 #include "tools/program.h"
@@ -35,10 +36,17 @@ std::string UnitText(const Figure& figure) {
                      : Format("; the same photo may give %g more or less on another machine", repeatability));
 }
 
+std::string TrustText(const FigureInfo& info) {
+  const TrustLaw* const law = LawOf(info);
+  if (law == nullptr) return "";
+  if (law->method == nullptr) return Line("no uncertainty", law->reason);
+  return Line("uncertainty", std::string(law->method) + (law->on_request ? "; with --uncertainty" : ""));
+}
+
 std::string Explain(const FigureInfo& info) {
   const Figure& figure = *info.figure;
   return info.name + "\n" + Line("meaning", figure.docstring) + Line("unit", UnitText(figure)) +
-         MethodText(figure.method);
+         MethodText(figure.method) + TrustText(info);
 }
 
 std::string Title(const Spec& spec) {
@@ -54,7 +62,7 @@ std::string Explain(const Spec& spec) {
     if (method == nullptr || std::string(method->name) != figure.method.name) text += "\n" + MethodText(figure.method);
     method = &figure.method;
     text += std::string(spec.name) + "_" + figure.name + "\n" + Line("meaning", figure.docstring) +
-            Line("unit", UnitText(figure));
+            Line("unit", UnitText(figure)) + TrustText(*FindFigure(std::string(spec.name) + "_" + figure.name));
   }
   return text;
 }

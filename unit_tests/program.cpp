@@ -16,6 +16,8 @@
 #include <valijson/validation_results.hpp>
 #include <valijson/validator.hpp>
 
+#include "desk/measure/trust_table.h"
+
 // The program lies above its tests; this is all that they call of it.
 namespace qv {
 int RunProgram(const std::vector<std::string>& words);
@@ -70,6 +72,31 @@ void SimulatedPhotos::ExpectComplaint(const std::string& arguments, int status, 
   EXPECT_THAT(run.err, ::testing::HasSubstr(complaint)) << arguments;
 }
 
+namespace {
+
+// What `explain` tells of each real figure's uncertainty is so: it has one by that method, or none.
+void ExpectTrustAsToldOf(const json& record) {
+  const json& request = record.at("request");
+  if (request.contains("repeats")) return;                                                      // all have one
+  const bool tiny = !record.at("inputs").empty() && record.at("inputs").at(0).at("width") < 3;  // shows no noise
+  for (const auto& [name, m] : record.at("phases").at(0).at("measurements").items()) {
+    const qv::FigureInfo& info = *qv::FindFigure(name);
+    const qv::TrustLaw* const law = qv::LawOf(info);
+    EXPECT_EQ(info.figure->number == qv::Number::kReal, law != nullptr) << name;
+    const bool has_one = m.contains("uncertainty");
+    if (law == nullptr || law->method == nullptr) {
+      EXPECT_FALSE(has_one) << name;
+    } else if (has_one) {
+      EXPECT_EQ(law->method, m.at("uncertainty").at("method")) << name;
+    } else if (!law->on_request || request.at("parameters").value("uncertainty", false)) {
+      const json value = m.value("measured_value", json());
+      EXPECT_TRUE(tiny || record.at("outcome") == "ERROR" || value.empty()) << name << " has none";
+    }
+  }
+}
+
+}  // namespace
+
 json SimulatedPhotos::Record(const std::string& arguments, int status) {
   const ProgramRun run = Run(arguments + " --json -");
   EXPECT_EQ(status, run.status) << arguments << '\n' << run.err;
@@ -80,6 +107,7 @@ json SimulatedPhotos::Record(const std::string& arguments, int status) {
   valijson::SchemaParser().populateSchema(NlohmannJsonAdapter(document), schema);
   valijson::ValidationResults breaches;
   valijson::Validator().validate(schema, NlohmannJsonAdapter(record), &breaches);
+  ExpectTrustAsToldOf(record);
   for (const auto& breach : breaches) {
     ADD_FAILURE() << ::testing::PrintToString(breach.context) << ": " << breach.description;
   }

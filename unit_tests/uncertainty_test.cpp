@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cmath>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
@@ -12,6 +13,7 @@
 #include "desk/measure/edge_resampling.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/patch_trust.h"
+#include "desk/measure/trust_table.h"
 #include "unit_tests/drawing.h"
 
 namespace qv {
@@ -132,6 +134,44 @@ TEST(Uncertainty, ResamplingFindsWhatNoiseDoes) {
     EXPECT_NEAR(law, ResampleEdge(photo, mean).standard, 0.35 * law);  // of 50 runs
   }
   EXPECT_TRUE(std::isnan(ResampleEdge(cv::Mat(260, 90, CV_8U, cv::Scalar(9)), mean).expanded));
+}
+
+TEST(Uncertainty, EveryRealFigureHasALawOrAReason) {
+  for (const FigureInfo& info : AllFigures()) {
+    const TrustLaw* const law = LawOf(info);
+    ASSERT_EQ(info.figure->number == Number::kReal, law != nullptr) << info.name;
+    if (law == nullptr) continue;
+    EXPECT_NE(law->method == nullptr, law->reason == nullptr) << info.name;
+    const auto& methods = UncertaintyMethods();
+    const bool told = std::any_of(methods.begin(), methods.end(), [&](const UncertaintyMethod& method) {
+      return law->method == nullptr || std::string(method.name) == law->method;
+    });
+    EXPECT_TRUE(told) << info.name;
+  }
+}
+
+// The truth is that of the light without noise, which the mean of bent levels is lifted from; the extremes of even
+// blocks lie apart by noise alone.
+TEST(Uncertainty, HoldsForTheColourAndTheEvennessOfALight) {
+  constexpr int kSide = 72;
+  int within_green = 0;
+  int within_even = 0;
+  constexpr int kLights = 60;
+  for (int i = 0; i < kLights; ++i) {
+    cv::RNG random(100 + i);
+    cv::Mat photo(kSide, kSide, CV_32FC3);
+    random.fill(photo, cv::RNG::NORMAL, cv::Scalar(90.3, 120.4, 150.2), cv::Scalar::all(12));
+    photo.convertTo(photo, CV_8U);
+    const Record record = MeasureAnew({"led_light", {photo}});
+    const auto holds = [&](const char* figure, double is) {
+      const Reading& reading = *record.phase.Find(figure);
+      return std::fabs(reading.value() - is) <= reading.uncertainties.at(0).expanded ? 1 : 0;
+    };
+    within_green += holds("linear_green", std::pow((120.4 / 255 + 0.055) / 1.055, 2.4));
+    within_even += holds("uniformity", 1);
+  }
+  EXPECT_GT(within_green, 0.85 * kLights);  // 95 in 100 are meant; nearly four deviations off
+  EXPECT_GT(within_even, 0.85 * kLights);
 }
 
 struct Verdict {

@@ -1,12 +1,15 @@
 // A display in a photo: what it shows, judged by the library's own rules.
 
 #include <algorithm>
+#include <opencv2/imgproc.hpp>
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/load.h"
+#include "desk/measure/mean_trust.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
 #include "qvtester/lcd.h"
@@ -57,10 +60,11 @@ std::string LcdFinding::Report(const Record& record) const {
   const Phase& phase = record.phase;
   std::string text = Format("verdict    %d: %s%s\n", result.verdict_, result.reason_.c_str(),
                             LimitText(*phase.Find("verdict")).c_str());
-  text +=
-      Format("means      red %.1f, green %.1f, blue %.1f of 255\n", result.sums_[0], result.sums_[1], result.sums_[2]);
-  text += Format("sides      %.3f to 1%s\n", result.ratio_, LimitText(*phase.Find("ratio")).c_str());
-  text += Format("uniformity %.3f%s\n", result.uniformity_, LimitText(*phase.Find("uniformity")).c_str());
+  const auto value = [&](const char* figure, int decimals) { return ValueText(*phase.Find(figure), decimals); };
+  text += "means      red " + value("mean_red", 2) + ", green " + value("mean_green", 2) + ", blue " +
+          value("mean_blue", 2) + " of 255\n";
+  text += "sides      " + value("ratio", 3) + " to 1" + LimitText(*phase.Find("ratio")) + "\n";
+  text += "uniformity " + value("uniformity", 4) + LimitText(*phase.Find("uniformity")) + "\n";
   text += Format("dots       %d%s\n", result.error_count_, LimitText(*phase.Find("dot_count")).c_str());
   for (const QVRECT& r : result.error_areas_) {
     text += Format("           column %d to %d, row %d to %d of the screen\n", r.left, r.right, r.top, r.bottom);
@@ -143,6 +147,42 @@ void Collect(Phase& phase, const LcdFinding& found) {
   phase.Add("corners", columns, rows);
 }
 
+// Noise is that of the photo within the screen: straightening makes neighbours alike. Of the result field's and the
+// bars' colours it is taken to be the same.
+void TrustMeans(Phase& phase, const LcdFinding& found, const CodecSteps& codec) {
+  cv::Mat photo;
+  found.photo.convertTo(photo, CV_8U, found.photo.depth() == CV_16U ? 1.0 / 257 : 1);
+  if (photo.channels() != 3)
+    cv::cvtColor(photo, photo, photo.channels() == 1 ? cv::COLOR_GRAY2BGR : cv::COLOR_BGRA2BGR);
+  const cv::Mat corners(found.corners);
+  const cv::Rect bounds = cv::boundingRect(corners);
+  const cv::Point middle = (bounds.tl() + bounds.br()) / 2;
+  const cv::Size half(bounds.width / 4, bounds.height / 4);  // within, however it is turned
+  const MeanErrors errors(photo(cv::Rect(middle - cv::Point(half), half * 2) & cv::Rect({}, photo.size())), codec);
+  const double area = cv::contourArea(corners);
+  const std::vector<cv::Vec3d> off = errors.OfMean(area);
+  const char* const channels[] = {"red", "green", "blue"};
+  const QVLcdResult& r = found.result;
+  for (int i = 0; i < 3; ++i) {
+    const auto mean = [&](const cv::Vec3d& bgr, int k) { return std::max(r.sums_[k] + bgr[2 - k], 0.0); };
+    phase.Find(std::string("mean_") + channels[i])->Trust({OfDrawn(off, r.sums_[i], [&](const cv::Vec3d& bgr) {
+      return mean(bgr, i);
+    })});
+    phase.Find(std::string("share_") + channels[i])->Trust({OfDrawn(off, r.shares_[i], [&](const cv::Vec3d& bgr) {
+      const double total = mean(bgr, 0) + mean(bgr, 1) + mean(bgr, 2);
+      return total > 0 ? mean(bgr, i) / total : 0;
+    })});
+  }
+  const double side = std::min(found.screen.cols, found.screen.rows) / 12;
+  const double part = side * side * area / static_cast<double>(found.screen.total());  // of the photo
+  const std::vector<cv::Vec3d> off_point = errors.OfMean(part);
+  const Uncertainty of_level = OfDrawn(off_point, 0, GreyOfMeans);
+  phase.Find("levels")->Trust(std::vector<Uncertainty>(9, of_level));
+  cv::Mat levels(3, 3, CV_64F);
+  std::copy(std::begin(r.levels_), std::end(r.levels_), levels.begin<double>());
+  phase.Find("uniformity")->Trust({errors.OfEvenness(levels, part)});
+}
+
 class Lcd : public Measurement {
  public:
   Lcd() {
@@ -184,6 +224,7 @@ class Lcd : public Measurement {
     lcd.keep_corners_ = true;
     lcd.Straighten(finding->photo, lcd.screen_size_, finding->screen);
     Collect(record.phase, *finding);
+    TrustMeans(record.phase, *finding, StepsOf(request.inputs.at(0)));
     if (finding->result.verdict_ != 1) record.Say(Remark::kWarning, "verdict", finding->result.reason_, "verdict");
     return finding;
   }

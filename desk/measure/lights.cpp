@@ -5,7 +5,9 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/heading.h"
+#include "desk/measure/light_trust.h"
 #include "desk/measure/load.h"
 #include "desk/measure/regions.h"
 #include "desk/measure/run_test.h"
@@ -63,60 +65,74 @@ using Regions = std::vector<QVLightRegion>;
 struct LightFigure {
   Figure figure;
   double (*of)(const QVLightRegion& region);
-  bool least, most;  // has figures of its own, for limits
+  bool least, most;                                      // has figures of its own, for limits
+  const Uncertainty& (*trust)(const LightTrust& trust);  // null for whole numbers
 };
 
 const std::vector<LightFigure>& LightFigures() {
   constexpr auto kWhole = Number::kWhole;
   constexpr auto kReal = Number::kReal;
   using R = const QVLightRegion&;
+  using T = const LightTrust&;
+  using U = const Uncertainty&;
   static const std::vector<LightFigure> figures = {
       {{"label", kOne, kWhole, &kRegionAxis, kLight, "Label of each region."},
        [](R r) -> double { return r.label_; },
        false,
-       false},
+       false,
+       nullptr},
       {{"mean_grey", kGreyLevel, kReal, &kRegionAxis, kLight, "Mean grey level of each region, 0 to 255."},
        [](R r) -> double { return r.mean_grey_; },
        true,
-       true},
+       true,
+       [](T t) -> U { return t.mean_grey; }},
       {{"linear_red", kOne, kReal, &kRegionAxis, kLight, "Mean red light of each region, 0 to 1."},
        [](R r) -> double { return r.linear_rgb_[0]; },
        false,
-       false},
+       false,
+       [](T t) -> U { return t.linear[0]; }},
       {{"linear_green", kOne, kReal, &kRegionAxis, kLight, "Mean green light of each region, 0 to 1."},
        [](R r) -> double { return r.linear_rgb_[1]; },
        false,
-       false},
+       false,
+       [](T t) -> U { return t.linear[1]; }},
       {{"linear_blue", kOne, kReal, &kRegionAxis, kLight, "Mean blue light of each region, 0 to 1."},
        [](R r) -> double { return r.linear_rgb_[2]; },
        false,
-       false},
+       false,
+       [](T t) -> U { return t.linear[2]; }},
       {{"luminance", kOne, kReal, &kRegionAxis, kLight, "CIE Y of each region; white of level 255 is 1."},
        [](R r) -> double { return r.xyz_[1]; },
        true,
-       true},
+       true,
+       [](T t) -> U { return t.luminance; }},
       {{"chromaticity_x", kOne, kReal, &kRegionAxis, kLight, "CIE x of each region; none where there is no light."},
        [](R r) -> double { return r.chromaticity_[0]; },
        true,
-       true},
+       true,
+       [](T t) -> U { return t.chromaticity[0]; }},
       {{"chromaticity_y", kOne, kReal, &kRegionAxis, kLight, "CIE y of each region; none where there is no light."},
        [](R r) -> double { return r.chromaticity_[1]; },
        true,
-       true},
+       true,
+       [](T t) -> U { return t.chromaticity[1]; }},
       {{"cct", kKelvin, kReal, &kRegionAxis, kTemperature,
         "Correlated colour temperature of each region; 0 where there "
         "is none."},
        [](R r) -> double { return r.cct_; },
        true,
-       true},
+       true,
+       [](T t) -> U { return t.cct; }},
       {{"clipped_share", kOne, kReal, &kRegionAxis, kLight, "Share of each region's pixels with a channel at 255."},
        [](R r) -> double { return r.clipped_share_; },
        false,
-       true},
+       true,
+       [](T t) -> U { return t.clipped_share; }},
       {{"uniformity", kOne, kReal, &kRegionAxis, kEvenness, "Darkest over lightest block of each region; 1 is even."},
        [](R r) -> double { return r.uniformity_; },
        true,
-       false},
+       false,
+       [](T t) -> U { return t.uniformity; }},
   };
   return figures;
 }
@@ -155,6 +171,22 @@ double ExtremeOf(const Extreme& extreme, const Regions& regions) {
     if (std::isnan(value) || (extreme.most ? one > value : one < value)) value = one;
   }
   return value;
+}
+
+// Each region's, and of the least and the largest that of the region that it is of.
+void TrustLights(Phase& phase, const std::vector<LightTrust>& trusts) {
+  for (const LightFigure& row : LightFigures()) {
+    if (row.trust == nullptr) continue;
+    std::vector<Uncertainty> known;
+    for (const LightTrust& trust : trusts) known.push_back(row.trust(trust));
+    phase.Find(row.figure.name)->Trust(std::move(known));
+  }
+  for (const Extreme& extreme : Extremes()) {
+    const std::vector<double>& all = phase.Find(extreme.figure->figure.name)->values;
+    Reading& reading = *phase.Find(extreme.name);
+    const auto whose = std::find(all.begin(), all.end(), reading.value());
+    if (whose != all.end()) reading.Trust({extreme.figure->trust(trusts[whose - all.begin()])});
+  }
 }
 
 void Collect(Phase& phase, const Regions& regions, const Areas& areas) {
@@ -213,6 +245,15 @@ class LightFinding : public Finding {
       text += Format("%6zu %6d %6.1f %7.4f  %7s %7s %8s %7.1f %% %8.3f\n", i, r.label_, r.mean_grey_, r.xyz_[1],
                      ColourText("%.4f", r.chromaticity_[0]).c_str(), ColourText("%.4f", r.chromaticity_[1]).c_str(),
                      ColourText("%.0f K", r.cct_).c_str(), 100 * r.clipped_share_, r.uniformity_);
+      const auto plus = [&](const char* figure, const char* format, double unit = 1) {
+        const std::vector<Uncertainty>& known = record.phase.Find(figure)->uncertainties;
+        return i < known.size() ? Format(format, unit * known[i].expanded) : std::string("-");
+      };
+      if (record.phase.Find("mean_grey")->uncertainties.empty()) continue;
+      text += Format("%6s \u00b1 %4s %6s %7s  %7s %7s %8s %7s %% %8s\n", "", "", plus("mean_grey", "%.1f").c_str(),
+                     plus("luminance", "%.4f").c_str(), plus("chromaticity_x", "%.4f").c_str(),
+                     plus("chromaticity_y", "%.4f").c_str(), plus("cct", "%.0f K").c_str(),
+                     plus("clipped_share", "%.1f", 100).c_str(), plus("uniformity", "%.3f").c_str());
     }
     const Reading& count = *record.phase.Find("area_count");
     text += Format("areas of dots  %.0f%s\n", count.value(), LimitText(count).c_str()) + AreaLines(areas, "pixels");
@@ -340,6 +381,12 @@ class Lights : public Measurement {
     finding->regions.assign(found.regions_, found.regions_ + found.region_count_);
     finding->areas = AreasOf(found.error_count_, found.error_areas_, found.error_pixels_);
     Collect(record.phase, finding->regions, finding->areas);
+    const CodecSteps codec = StepsOf(request.inputs.at(0));
+    std::vector<LightTrust> trusts;
+    for (const QVLightRegion& region : finding->regions) {
+      trusts.push_back(TrustInLight(finding->photo(), region, codec));
+    }
+    TrustLights(record.phase, trusts);
     Look(record, finding->regions, finding->areas);
     return finding;
   }

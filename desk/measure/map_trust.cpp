@@ -210,7 +210,30 @@ Uncertainty OfDistance(const Frame& frame, const cv::Mat& fixed, const Parameter
   return FromErrors(std::move(errors), kResidualMethod);
 }
 
+// Of each element of a map, by the best one near that of all matches, `refined`.
+std::vector<Uncertainty> OfElements(const MapTrust& trust, const Frame& frame, const Parameters& refined,
+                                    const Parameters& is) {
+  const Parameters best = refined + trust.step;
+  std::vector<Uncertainty> elements;
+  for (const int i : {0, 1, 2, 3, 4, 5}) {
+    const auto element = [&](const Parameters& p) { return frame.Map(p).val[i]; };
+    elements.push_back(
+        FromKnownError(element(is) - element(best), Propagated<6>(element, best, trust.covariance, 0.01)));
+  }
+  return elements;
+}
+
 }  // namespace
+
+void TrustRefinedMap(Phase& phase, const cv::Mat& reference, const cv::Mat& image, const cv::Mat& map) {
+  if (!std::isfinite(phase.Find("correlation")->value())) return;
+  const Frame frame(reference.size());
+  const MapTrust trust = TrustOf(LookThrough(reference, image, map), frame);
+  if (trust.parts <= 6) return;
+  const Parameters found = frame.From(map);
+  phase.Find("matrix")->Trust(OfElements(trust, frame, found, found));
+  phase.Find("correlation")->Trust({Combined(trust.correlation, trust.parts - 6, 0, kResidualMethod)});
+}
 
 void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, const cv::Mat& fixed,
                const RobustMap& robust) {
@@ -231,15 +254,8 @@ void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, con
   by_best("turn", Turn);
   by_best("scale", [&](const Parameters& p) { return std::sqrt(std::fabs(Area(p))) / frame.half; });
   by_best("stretch", Stretch);
-  std::vector<Uncertainty> elements;
-  std::vector<Uncertainty> fixed_elements;
-  for (const int i : {0, 1, 2, 3, 4, 5}) {
-    const auto element = [&](const Parameters& p) { return frame.Map(p).val[i]; };
-    elements.push_back(off_best(of_all, element));
-    fixed_elements.push_back(off_best(of_three, element));
-  }
-  phase.Find("robust_matrix")->Trust(elements);
-  phase.Find("matrix")->Trust(fixed_elements);
+  phase.Find("robust_matrix")->Trust(OfElements(trust, frame, of_all, of_all));
+  phase.Find("matrix")->Trust(OfElements(trust, frame, of_all, of_three));
   phase.Find("map_distance")->Trust({OfDistance(frame, fixed, best, trust.covariance, phase, reference.size())});
   const double matches = 2.0 * robust.agreeing - 6;
   phase.Find("robust_residual")

@@ -12,35 +12,6 @@ constexpr int kDraws = 400;
 
 cv::Vec3d Levels(const cv::Point3i& mean) { return {1.0 * mean.x, 1.0 * mean.y, 1.0 * mean.z}; }
 
-// L with L L^T = covariance, of what is positive definite but for rounding.
-cv::Matx33d Root(const cv::Matx33d& covariance) {
-  cv::Matx33d root = cv::Matx33d::zeros();
-  for (int row = 0; row < 3; ++row) {
-    for (int column = 0; column <= row; ++column) {
-      double rest = covariance(row, column);
-      for (int k = 0; k < column; ++k) rest -= root(row, k) * root(column, k);
-      if (row == column) {
-        root(row, row) = std::sqrt(std::max(rest, 0.0));
-      } else if (root(column, column) > 0) {
-        root(row, column) = rest / root(column, column);
-      }
-    }
-  }
-  return root;
-}
-
-// Half the interval in which rounding leaves a mean; a spread of the step's size takes the error away.
-double HalfInterval(double step, double spread) {
-  if (step == 0) return 0;
-  const double share = spread / step;
-  return step / 2 * std::exp(-2 * CV_PI * CV_PI * share * share);
-}
-
-// Of a JPEG file's decoded pixels: half the intervals in which their means lie off.
-struct DecodedRounding {
-  double luma, chroma_block, chroma_sample, channel;
-};
-
 constexpr double kLumaShare = 0.67;  // of a channel's noise: the root of the weights' squares
 constexpr double kChromaShare = 0.62;
 constexpr int kBlockPx = 8;
@@ -81,23 +52,6 @@ double ChromaSpread(const cv::Mat& pixels) {
   return std::sqrt(squares) / kOfDifferences;
 }
 
-// Blocks are rounded to the codec's steps; then samples of chroma to levels, and with them the channels. Where few
-// different values come in, all pixels of a patch are off alike. Multiples of a step differ in their rounding by what
-// the step departs from a whole number; multiples of chroma's weights in the channels by some 0.3.
-DecodedRounding RoundingOf(const cv::Mat& pixels, const CodecSteps& codec) {
-  constexpr double kWeightsApart = 0.3;
-  constexpr double kRoundingsVariance = 0.09;  // a twelfth of the samples, and some of the channels
-  if (codec.luma == 0) return {};
-  const double noise = NoiseBeforeCodec(pixels, codec);
-  const double seen = ChromaSpread(pixels);
-  const double unrounded = std::sqrt(std::max(seen * seen - kRoundingsVariance, 0.0));
-  const bool whole = codec.chroma == std::round(codec.chroma);
-  const double steps_apart = whole ? 0 : std::fabs(1 - std::round(codec.chroma) / codec.chroma);
-  return {HalfInterval(codec.luma, kLumaShare * noise / kBlockPx),
-          HalfInterval(codec.chroma, kChromaShare * noise / kChromaBlockPx),
-          whole ? 0 : HalfInterval(1, unrounded * steps_apart), HalfInterval(1, seen * kWeightsApart)};
-}
-
 // What the rounding of luma and both chromas may add (ITU-T T.871), in the order of the stored channels: blue first.
 cv::Vec3d RgbOf(double luma, double blue, double red) {
   return {luma + 1.772 * blue, luma - 0.344136 * blue - 0.714136 * red, luma + 1.402 * red};
@@ -105,11 +59,63 @@ cv::Vec3d RgbOf(double luma, double blue, double red) {
 
 }  // namespace
 
+cv::Matx33d RootOf(const cv::Matx33d& covariance) {
+  cv::Matx33d root = cv::Matx33d::zeros();
+  for (int row = 0; row < 3; ++row) {
+    for (int column = 0; column <= row; ++column) {
+      double rest = covariance(row, column);
+      for (int k = 0; k < column; ++k) rest -= root(row, k) * root(column, k);
+      if (row == column) {
+        root(row, row) = std::sqrt(std::max(rest, 0.0));
+      } else if (root(column, column) > 0) {
+        root(row, column) = rest / root(column, column);
+      }
+    }
+  }
+  return root;
+}
+
+double HalfInterval(double step, double spread) {
+  if (step == 0) return 0;
+  const double share = spread / step;
+  return step / 2 * std::exp(-2 * CV_PI * CV_PI * share * share);
+}
+
+// Blocks are rounded to the codec's steps; then samples of chroma to levels, and with them the channels. Where few
+// different values come in, all pixels of a patch are off alike. Multiples of a step differ in their rounding by what
+// the step departs from a whole number; multiples of chroma's weights in the channels by some 0.3.
+CodecRounding::CodecRounding(const cv::Mat& pixels, const CodecSteps& codec, const cv::Vec3d& spread) {
+  constexpr double kWeightsApart = 0.3;
+  constexpr double kRoundingsVariance = 0.09;  // a twelfth of the samples, and some of the channels
+  rounds_ = codec.luma != 0;
+  if (!rounds_) return;
+  const double noise = NoiseBeforeCodec(pixels, codec);
+  const double seen = ChromaSpread(pixels);
+  const double unrounded = std::sqrt(std::max(seen * seen - kRoundingsVariance, 0.0));
+  const bool whole = codec.chroma == std::round(codec.chroma);
+  const double steps_apart = whole ? 0 : std::fabs(1 - std::round(codec.chroma) / codec.chroma);
+  luma_ = HalfInterval(codec.luma, std::hypot(kLumaShare * noise / kBlockPx, spread[0]));
+  chroma_blue_ = HalfInterval(codec.chroma, std::hypot(kChromaShare * noise / kChromaBlockPx, spread[1]));
+  chroma_red_ = HalfInterval(codec.chroma, std::hypot(kChromaShare * noise / kChromaBlockPx, spread[2]));
+  chroma_sample_ = whole ? 0 : HalfInterval(1, unrounded * steps_apart);
+  channel_ = HalfInterval(1, seen * kWeightsApart);
+}
+
+cv::Vec3d CodecRounding::Draw(cv::RNG& random) const {
+  if (!rounds_) return {};
+  const auto within = [&random](double bound) { return bound * random.uniform(-1.0, 1.0); };
+  const double blue = within(chroma_blue_) + within(chroma_sample_);
+  const double red = within(chroma_red_) + within(chroma_sample_);
+  cv::Vec3d off = RgbOf(within(luma_), blue, red);
+  for (int k = 0; k < 3; ++k) off[k] += within(channel_);
+  return off;
+}
+
 std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean, std::uint64_t seed,
                                         const CodecSteps& codec) {
-  const DecodedRounding half = RoundingOf(pixels, codec);
+  const CodecRounding rounding(pixels, codec);
   const double share = static_cast<double>(pixels.total()) / area;
-  const cv::Matx33d root = Root(CovarianceOfMean(pixels, 0) * share);
+  const cv::Matx33d root = RootOf(CovarianceOfMean(pixels, 0) * share);
   cv::RNG random(seed);
   std::vector<cv::Vec3d> draws;
   for (int i = 0; i < kDraws; ++i) {
@@ -117,13 +123,7 @@ std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, cons
     cv::Vec3d cut;
     for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
     for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
-    draws.push_back(Levels(mean) + cut + root * normal);
-    if (codec.luma == 0) continue;
-    const auto within = [&random](double bound) { return bound * random.uniform(-1.0, 1.0); };
-    const double blue = within(half.chroma_block) + within(half.chroma_sample);
-    const double red = within(half.chroma_block) + within(half.chroma_sample);
-    draws.back() += RgbOf(within(half.luma), blue, red);
-    for (int k = 0; k < 3; ++k) draws.back()[k] += within(half.channel);
+    draws.push_back(Levels(mean) + cut + root * normal + rounding.Draw(random));
   }
   return draws;
 }

@@ -39,8 +39,8 @@ class PreviewFinding : public Finding {
 
   std::string Report(const Record& record) const override {
     const Reading& mean = *record.phase.Find("difference_mean");
-    return Format("mean difference  %.5f of full scale (%.2f grey levels)%s\n", mean.value(), 255 * mean.value(),
-                  LimitText(mean).c_str());
+    return Format("mean difference  %s of full scale (%.2f grey levels)%s\n", ValueText(mean, 5).c_str(),
+                  255 * mean.value(), LimitText(mean).c_str());
   }
 
   // The difference map beside the first frame; the map's largest value is its lightest colour.
@@ -95,9 +95,9 @@ class Preview : public Measurement {
     if (const QVResultData* results = RunNumberedTest(tester, spec_, request, record.phase)) {
       const QVPreviewResult& result = results->*result_;
       if (result.preview_diff_map_ != nullptr) {
-        record.phase.Add("difference_mean", result.preview_diff_mean_);
         map = cv::Mat(result.preview_diff_rows_, result.preview_diff_cols_, CV_32F, result.preview_diff_map_).clone();
         cv::patchNaNs(map, 0);  // identical frames: no difference anywhere
+        record.phase.Add("difference_mean", result.preview_diff_mean_).Trust({OfMeanLevel(map)});
       } else {
         SayFramesDiffer(record);
       }

@@ -5,10 +5,13 @@
 #include <numeric>
 #include <opencv2/imgproc.hpp>
 
+#include "chart/image_list.h"
 #include "desk/base/text.h"
 #include "desk/measure/areas.h"
+#include "desk/measure/grey.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/load.h"
+#include "desk/measure/residual_trust.h"
 #include "desk/measure/run_test.h"
 #include "desk/measure/telling.h"
 
@@ -84,13 +87,12 @@ void Look(Record& record, const Print& print) {
 class PrintFinding : public Finding {
  public:
   std::string Report(const Record& record) const override {
-    const auto line = [&](const char* name, const char* format, const char* figure) {
+    const auto line = [&](const char* name, int decimals, const char* figure, const char* unit = "") {
       const Reading& reading = *record.phase.Find(figure);
-      return Format("%-12s ", name) + Format(format, reading.value()) + LimitText(reading) + "\n";
+      return Format("%-12s ", name) + ValueText(reading, decimals) + unit + LimitText(reading) + "\n";
     };
-    return line("departure", "%.4f of the binary range, root mean square", "rms") +
-           line("correlation", "%.4f", "correlation") + line("areas", "%.0f", "area_count") +
-           AreaLines(print.areas, "pixels");
+    return line("departure", 4, "rms", " of the binary range, root mean square") +
+           line("correlation", 4, "correlation") + line("areas", 0, "area_count") + AreaLines(print.areas, "pixels");
   }
 
   std::optional<Picture> Draw(const Record& record) const override {
@@ -162,6 +164,9 @@ class TouchPanelPrint : public Measurement {
                    cv::BORDER_CONSTANT, cv::Scalar::all(128));
     print.areas = AreasOf(results->print_error_count_, results->print_error_areas_, results->print_error_pixels_);
     Collect(record.phase, *results, print);
+    cv::Mat smoothed = GreyOf(print.photo);
+    cv::medianBlur(smoothed, smoothed, kMedianAperture);  // as the good prints are
+    TrustRefinedMap(record.phase, list.gray.front(), smoothed, print.map);
     Look(record, print);
     return finding;
   }

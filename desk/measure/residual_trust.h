@@ -25,6 +25,9 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo);
 void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, const cv::Mat& fixed,
                const RobustMap& robust);
 
+/// `matrix` and `correlation` of a map that was refined as the one of all matches is; nothing where it was not.
+void TrustRefinedMap(Phase& phase, const cv::Mat& reference, const cv::Mat& image, const cv::Mat& map);
+
 }  // namespace qv
 
 #endif  // QVTESTER_DESK_MEASURE_RESIDUAL_TRUST_H_

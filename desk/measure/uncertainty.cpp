@@ -101,10 +101,15 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "noise is the expanded uncertainty; jumps of the reading are in it. It tells how far the reading lies from the "
        "noiseless one, not how far that lies from the lens's own figure."},
       {kPixelMethod,
-       "What the patch's colour may be is drawn 400 times (JCGM 101) and carried through the colour formulas: from the "
-       "variance of its pixels, by differences between neighbours, over their number, and from its mean, which is cut "
-       "to a whole level (type B: up to one level low), and which a JPEG file's tables round by blocks (type B). The "
-       "standard photo's noise is taken to be the same."},
+       "What the colour of a patch, a light or a display may be is drawn 400 times (JCGM 101) and carried through the "
+       "formulas: from the variance of its pixels, by differences between neighbours, over their number, and from its "
+       "mean, which a JPEG file's tables round by blocks (type B). A patch's mean is cut to a whole level (type B: up "
+       "to one level low); the standard photo's noise is taken to be the same. Of a light the true value is that "
+       "without noise, which lifts the mean of bent levels: by how much, its blocks of 8 x 8 pixels tell. An evenness "
+       "is "
+       "the least over the largest of means, and reads low by noise: noise is drawn anew about the plainest surface "
+       "through them. A light's region should keep 16 px off its rim in a JPEG file. What light and exposure do from "
+       "photo to photo is not in it."},
       {kMeanMethod,
        "The variance of blocks of 8 x 8 pixels, from differences between neighbours, over their number; of single "
        "pixels where there are fewer than 60 blocks. A share of pixels is a mean of ones and noughts, of the photo as "
@@ -130,6 +135,17 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "photo, drawn 200 times (JCGM 101), and what their reading between steps is known to be off. What JPEG takes "
        "off noise and spots is not in it. Under half a percent of noise only sharp spots stand out of the levels' "
        "steps: areas and contrasts are then too wide, by half."},
+      {kStampTrust,
+       "Type B alone: of a rate and of a gap the step of both time stamps, a millisecond where all are whole ones "
+       "(Matroska), else a 90,000th of a second, rectangular, and of a film whose last frames have no stamps how far "
+       "its intervals depart from their median; of the moment of settling one frame to either side."},
+      {kCourseMethod,
+       "Differences between neighbouring frames beyond what the film does tell the noise of one; a median of n has it "
+       "1.25 times over the root of n (of two thirds of n for MTF50, since a codec makes neighbours alike). A pulse's "
+       "width has that of both its flanks, and type B, for what lies between "
+       "frames, up to 0.4 intervals over the number of intervals that it lasts. Type B of a flash's levels: up to one "
+       "level, by which colours are rounded between luma and chroma and back; what else the film's codec does to all "
+       "frames alike is not in it."},
       {kRepeatMethod,
        "The spread of several photos of one unit, over the root of their number, with Student's factor; the median's "
        "is "
@@ -157,6 +173,11 @@ Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, co
   const double share = standard == 0 ? 1 : type_a / standard;
   const double factor = StudentFactor(degrees_of_freedom / std::pow(share, 4));
   return {standard, factor * standard, factor, method};
+}
+
+Uncertainty Rectangular(double half, const char* method) {
+  const double standard = half / std::sqrt(3.0);
+  return {standard, kCoverage * half, kCoverage * std::sqrt(3.0), method};
 }
 
 double Spread(const std::vector<double>& readings) {

@@ -32,6 +32,8 @@ inline constexpr char kPixelMethod[] = "variance of the pixels, carried through 
 inline constexpr char kMeanMethod[] = "variance of blocks of pixels over their number";
 inline constexpr char kResidualMethod[] = "residuals of the fit";
 inline constexpr char kSpotMethod[] = "errors of simulated spots of unknown softness";
+inline constexpr char kStampTrust[] = "steps of the time stamps and of the frames";
+inline constexpr char kCourseMethod[] = "scatter between neighbouring frames";
 inline constexpr char kRepeatMethod[] = "spread of repeated photos, t-interval";
 
 /// Of expanded uncertainties.
@@ -42,6 +44,9 @@ double StudentFactor(double degrees_of_freedom);
 
 /// Type A of so many degrees of freedom and type B together, by Welch and Satterthwaite.
 Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, const char* method);
+
+/// Type B alone: anything up to `half` to either side is as likely.
+Uncertainty Rectangular(double half, const char* method);
 
 /// Of the mean of readings that are alike, with a type B part of their mean. Readings that are no numbers make it NaN.
 Uncertainty OfMean(const std::vector<double>& readings, double type_b, const char* method);

@@ -6,6 +6,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/chart_view.h"
 #include "desk/measure/film_course.h"
+#include "desk/measure/film_trust.h"
 #include "desk/measure/telling.h"
 #include "desk/measure/widen.h"
 
@@ -28,8 +29,8 @@ class ChartFilmFinding : public FilmFinding {
     text += line("promised ", "frames_promised", " by the container");
     text += line("lost     ", "frames_lost", Places().c_str());
     text += line("bad      ", "frames_bad", " could not be decoded");
-    text += Format("rate     %.3f frames/s%s, longest gap %.1f ms%s\n", rate.value(), LimitText(rate).c_str(),
-                   gap.value(), LimitText(gap).c_str());
+    text += Format("rate     %s frames/s%s, longest gap %s ms%s\n", ValueText(rate, 3).c_str(), LimitText(rate).c_str(),
+                   ValueText(gap, 1).c_str(), LimitText(gap).c_str());
     const bool one = record.phase.Find("found_count")->value() == 1;
     return text +
            line("chart    ", "found_count", one ? " frame shows its three marks" : " frames show its three marks");
@@ -131,6 +132,7 @@ class VideoChart : public Measurement {
     phase.Add("frames_bad", result.frames_bad_);
     phase.Add("mean_rate", result.mean_rate_);
     phase.Add("longest_gap", result.longest_gap_);
+    TrustTimes(phase, time);
     phase.Add("found_count", result.found_count_);
     phase.Add("mark_count", time, Widen(result.mark_count_, count));
     phase.Add("angle", time, Widen(result.angle_, count));

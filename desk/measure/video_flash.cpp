@@ -6,6 +6,7 @@
 
 #include "desk/base/text.h"
 #include "desk/measure/film_course.h"
+#include "desk/measure/film_trust.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/telling.h"
 #include "desk/measure/widen.h"
@@ -34,9 +35,11 @@ class FlashFilmFinding : public FilmFinding {
     const Reading& base = *phase.Find("base");
     const Reading& width = *phase.Find("width");
     std::string text = Format("frames  %.0f\n", phase.Find("frame_count")->value());
-    text += Format("peak    %.2f of 255%s, at %.1f ms\n", peak.value(), LimitText(peak).c_str(), PeakTime(record));
-    text += Format("base    %.2f of 255%s\n", base.value(), LimitText(base).c_str());
-    text += std::isfinite(width.value()) ? Format("pulse   %.1f ms at half height", width.value()) : "pulse   none";
+    text += Format("peak    %s of 255%s, at %.1f ms\n", ValueText(peak, 2).c_str(), LimitText(peak).c_str(),
+                   PeakTime(record));
+    text += Format("base    %s of 255%s\n", ValueText(base, 2).c_str(), LimitText(base).c_str());
+    text += std::isfinite(width.value()) ? Format("pulse   %s ms at half height", ValueText(width, 1).c_str())
+                                         : "pulse   none";
     return text + LimitText(width) + "\n";
   }
 
@@ -109,6 +112,7 @@ class VideoFlash : public Measurement {
     phase.Add("base", results.video_flash_base_);
     phase.Add("width", results.video_flash_width_);
     phase.Add("mean", time, Widen(results.video_flash_mean_, count));
+    TrustFlash(phase, time);
     if (count != tester.prop_video_flash_frame_count_) DoubtCutFilm(record, tester, spec().inputs[0].slot, time);
     return std::make_unique<FlashFilmFinding>(time);
   }

@@ -6,6 +6,7 @@
 #include "desk/base/text.h"
 #include "desk/measure/chart_view.h"
 #include "desk/measure/film_course.h"
+#include "desk/measure/film_trust.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/sharpness.h"
 #include "desk/measure/telling.h"
@@ -32,10 +33,12 @@ class FocusFinding : public FilmFinding {
     const auto frame = static_cast<std::size_t>(phase.Find("best_frame")->value());
     std::string text = Format("frames       %.0f, the chart measured in %.0f\n", phase.Find("frame_count")->value(),
                               phase.Find("measured_count")->value());
-    text += Format("MTF50 best   %.4f Nyquist  %.4f c/p%s, in frame %zu at %.1f ms\n", best.value(), best.value() / 2,
-                   LimitText(best).c_str(), frame, time_[frame]);
-    text += Format("MTF50 final  %.4f Nyquist  %.4f c/p%s\n", last.value(), last.value() / 2, LimitText(last).c_str());
-    text += std::isfinite(settle.value()) ? Format("settled      at %.1f ms", settle.value()) : "settled      never";
+    text += Format("MTF50 best   %s Nyquist  %.4f c/p%s, in frame %zu at %.1f ms\n", ValueText(best, 4).c_str(),
+                   best.value() / 2, LimitText(best).c_str(), frame, time_[frame]);
+    text += Format("MTF50 final  %s Nyquist  %.4f c/p%s\n", ValueText(last, 4).c_str(), last.value() / 2,
+                   LimitText(last).c_str());
+    text += std::isfinite(settle.value()) ? Format("settled      at %s ms", ValueText(settle, 1).c_str())
+                                          : "settled      never";
     return text + LimitText(settle) + "\n";
   }
 
@@ -114,6 +117,7 @@ class VideoFocus : public Measurement {
     phase.Add("settle_time", results.video_af_settle_time_);
     phase.Add("mtf50_vertical", time, vertical);
     phase.Add("mtf50_horizontal", time, Widen(results.video_af_mtf50_horizontal_, count));
+    TrustFocus(phase, time);
     DoubtCutFilm(record, tester, spec().inputs[0].slot, time);
     return std::make_unique<FocusFinding>(time);
   }

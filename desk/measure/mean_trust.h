@@ -1,0 +1,48 @@
+#ifndef QVTESTER_DESK_MEASURE_MEAN_TRUST_H_
+#define QVTESTER_DESK_MEASURE_MEAN_TRUST_H_
+
+#include <opencv2/core.hpp>
+#include <vector>
+
+#include "desk/measure/codec_steps.h"
+#include "desk/measure/uncertainty.h"
+
+namespace qv {
+
+// How far means of a photo's colours may be trusted, and what is made of them.
+
+/// By how much the means of a lit area's channels may be off, drawn many times (JCGM 101).
+class MeanErrors {
+ public:
+  /// @param pixels  CV_8UC3, from within the area, blue first.
+  /// @param codec   by how much the photo's file rounds the means of its blocks.
+  MeanErrors(const cv::Mat& pixels, const CodecSteps& codec);
+
+  /// Of a mean over so many pixels: levels, blue first. None where there are too few pixels to tell their noise.
+  std::vector<cv::Vec3d> OfMean(double area) const;
+  /// Of the smallest over the largest of a grid of means of grey (CV_64F) over so many pixels each, drawn about what
+  /// their true values probably are: of even levels noise makes the least smaller and the largest larger.
+  Uncertainty OfEvenness(const cv::Mat& means, double area) const;
+
+ private:
+  cv::Mat pixels_;
+  CodecSteps codec_;
+  cv::Vec3d spread_;                               // of the scene between blocks: luma, both chromas
+  cv::Matx33d covariance_ = cv::Matx33d::zeros();  // of a pixel, as means of many have it
+  double degrees_ = 0;                             // of freedom
+};
+
+/// Grey of means as the tests weigh stored blue, green and red.
+inline double GreyOfMeans(const cv::Vec3d& bgr) { return 0.299 * bgr[0] + 0.587 * bgr[1] + 0.114 * bgr[2]; }
+
+/// Of a reading of drawn means' errors: `figure` says what it is if the means are off by so much.
+template <typename Figure>
+Uncertainty OfDrawn(const std::vector<cv::Vec3d>& off, double reading, const Figure& figure) {
+  std::vector<double> errors;
+  for (const cv::Vec3d& one : off) errors.push_back(figure(one) - reading);
+  return FromErrors(std::move(errors), kPixelMethod);
+}
+
+}  // namespace qv
+
+#endif  // QVTESTER_DESK_MEASURE_MEAN_TRUST_H_
