@@ -228,14 +228,14 @@ void Run() {
   double stored_as_jpeg = 0;
   for (const Setting& setting : kSettings) {
     if (Trials(1, 0) == 0 && setting.size.width > 800) continue;
-    const double median = PrintCorners(setting, Trials(200, 10));
+    const double median = PrintCorners(setting, Trials(200, 6));
     double& worst = setting.jpeg > 0 ? stored_as_jpeg : largest;
     if (setting.size.width >= 800) worst = std::max(worst, median);
   }
   Hold("display_corners", largest);
   Hold("display_jpeg", stored_as_jpeg);
-  PrintPatterns(Trials(500, 20));
-  PrintAmbient(Trials(120, 6));
+  PrintPatterns(Trials(500, 10));
+  PrintAmbient(Trials(120, 3));
 }
 
 }  // namespace

@@ -259,7 +259,7 @@ std::vector<Fault> Faults() {
 }
 
 void PrintSharpness() {
-  const int scene_count = Trials(24, 4);
+  const int scene_count = Trials(24, 3);
   const auto make = [&](double pan, double tilt) {
     std::vector<ChartScene> scenes(scene_count);
     ForEachTrial(scene_count, [&](int i) { scenes[i] = MakeScene(i, pan, tilt); });
@@ -331,7 +331,7 @@ std::pair<double, bool> TryPatches(double oblique_deg, int trial, bool as_standa
 }
 
 void PrintPatches() {
-  const int photos = Trials(48, 6);
+  const int photos = Trials(48, 4);
   std::printf(
       "\nPatches, 1200 x 900, noise 1 %%, turned by up to 5 degrees: off is a photo with a patch further than 3 "
       "(CIE 1976) from its colour\n\n%s",
@@ -354,7 +354,7 @@ void PrintPatches() {
 // ---- Registration ------------------------------------------------------------------------------------------------
 
 void PrintMaps() {
-  const int pairs = Trials(200, 16);
+  const int pairs = Trials(200, 8);
   std::vector<std::pair<double, bool>> tried(pairs, {NAN, false});
   ForEachTrial(pairs, [&](int trial) {
     cv::RNG random(trial + 5001);

@@ -157,7 +157,7 @@ Outcome Look(const Fault& fault, int trial, int trials) {
 }
 
 void Run(bool show) {
-  const int trials = Trials(30, 5);
+  const int trials = Trials(30, 3);
   int misses = 0;
   int right = 0;
   std::printf(
