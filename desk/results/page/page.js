@@ -26,6 +26,8 @@ function h(tag, attributes, ...children) {
   element.append(...children.flat().filter(c => c !== null && c !== undefined));
   return element;
 }
+/* Long names go on behind an underscore. */
+const broken_up = name => name.split(/(?<=_)/).flatMap((part, i) => i ? [h('wbr'), part] : [part]);
 function verdict(word, marginal) {
   const ns = 'http://www.w3.org/2000/svg';
   const svg = document.createElementNS(ns, 'svg'), path = document.createElementNS(ns, 'path');
@@ -310,8 +312,8 @@ function figures() {
   if (!rows.some(row => row.place === state.figure) && rows.length) state.figure = rows[0].place;
   const cell = text => h('td', {class: 'number'}, text), unsure = rows.some(r => r.uncertainty > 0);
   const row_of = r => h('tr', {class: r.place === state.figure ? 'chosen' : undefined},
-    h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', 'aria-pressed': String(r.place === state.figure), onclick: () => { state.figure = r.place; render('figure'); }}, r.f.name)),
-    cell(r.f.list ? 'a list' : r.m.n + (r.odd ? ' (+' + r.odd + ' not finite)' : '')), cell(r.m.n ? number(r.m.mean) : '–'), cell(isFinite(r.m.s) ? number(r.m.s) : '–'),
+    h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', 'aria-pressed': String(r.place === state.figure), onclick: () => { state.figure = r.place; render('figure'); }}, broken_up(r.f.name))),
+    cell(r.f.list ? 'a list' : r.odd ? [r.m.n + ' ', h('br'), '(+' + r.odd + ' not finite)'] : r.m.n), cell(r.m.n ? number(r.m.mean) : '–'), cell(isFinite(r.m.s) ? number(r.m.s) : '–'),
     cell(r.m.n ? number(r.m.min) : '–'), cell(r.m.n ? number(r.m.max) : '–'), unsure ? cell(r.uncertainty > 0 ? '± ' + Number((2 * r.uncertainty).toPrecision(2)) : '') : null,
     h('td', {}, r.f.unit === '1' ? '' : r.f.unit), h('td', {class: r.f.list ? undefined : 'whole'}, limits_text(r.f, r.last)), cell(isFinite(r.capability) ? r.capability.toFixed(2) : '–'),
     h('td', {class: 'whole'}, r.judged ? (r.bad ? verdict('FAIL') : verdict('PASS')) : verdict('MEASURED'), r.bad ? ' ' + r.bad + ' of ' + r.judged : ''));
@@ -343,7 +345,7 @@ function figure_detail() {
   const ks = trusted(f, readings_of(f));
   const b = ks.length ? f.bounds[f.bound[ks[ks.length - 1]]] : {};
   const us = ks.map(k => f.uncertainty[k]).filter(finite), u = us.length ? us.reduce((a, x) => a + x, 0) / us.length : 0;
-  box.append(h('h3', {}, short_name(f)), h('p', {}, f.docstring), h('p', {class: 'quiet'}, 'Method: ' + f.method));
+  box.append(h('h3', {}, broken_up(short_name(f))), h('p', {}, f.docstring), h('p', {class: 'quiet'}, 'Method: ' + f.method));
   if (f.list) box.append(h('p', {}, 'A list: choose a run below to see which of its values are outside their limits.'));
   if (!ks.length) return box;
   const zone = 'red zone: beyond the limits; dashed: marginal' + (u > 0 ? '; yellow: guard band, the limit ± the expanded uncertainty (2 × ' + number(u) + ')' : '');
@@ -451,7 +453,7 @@ function run_pane() {
   const order = {FAIL: 0, UNSET: 1, PASS: 2, MEASURED: 3};
   const rows = by_run[i].slice().sort((a, b) => order[D.figures[a[0]].outcome[a[1]]] - order[D.figures[b[0]].outcome[b[1]]]).map(([p, k]) => {
     const f = D.figures[p];
-    return h('tr', {}, h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', onclick: () => { state.figure = p; render('figure'); $('figure').scrollIntoView({block: 'nearest'}); }}, f.name)), h('td', {}, verdict(f.outcome[k], f.marginal[k])),
+    return h('tr', {}, h('td', {class: 'name'}, h('button', {type: 'button', class: 'link', onclick: () => { state.figure = p; render('figure'); $('figure').scrollIntoView({block: 'nearest'}); }}, broken_up(f.name))), h('td', {}, verdict(f.outcome[k], f.marginal[k])),
       h('td', {class: 'number'}, reading(f, k)), h('td', {}, limits_text(f, k)), h('td', {class: 'quiet'}, f.docstring.split('. ')[0].replace(/\.?$/, '.')));
   });
   const about = [['start', time(D.start_millis[i])], ['step', field('step', i)], ['station', field('station', i)], ['lot', field('lot', i)], ['operator', field('operator', i)], ['limits', field('limits', i)],
@@ -486,7 +488,9 @@ function start(data) {
   document.title = D.title; $('title').textContent = D.title;
   let first = Infinity, last = -Infinity;
   for (const t of D.start_millis) { first = Math.min(first, t); last = Math.max(last, t); }
-  $('about').textContent = N + (N === 1 ? ' run' : ' runs') + (N ? ', ' + time(first) + (N > 1 ? ' to ' + time(last) : '') : '') + ' · limits ' + (D.limits.values.filter(x => x).join(', ') || 'none') + ' · written ' + time(D.made_millis);
+  const has = outcome => D.figures.findIndex(f => f.outcome.includes(outcome)), broken = has('FAIL');
+  state.figure = Math.max(0, broken);
+  $('about').textContent = N + (N === 1 ? ' run' : ' runs') + (N ? ', ' + time(first) + (N > 1 ? ' to ' + time(last) : '') : '') + ' · limits ' + (D.limits.values.filter(x => x).join(', ') || (broken >= 0 || has('PASS') >= 0 ? 'without a name' : 'none')) + ' · written ' + time(D.made_millis);
   index_figures();
   shown = Array.from({length: N}, (_, i) => i);
   if (N === 1) state.run = 0;
