@@ -28,7 +28,9 @@ double StampStep(const std::vector<double>& time) {
 // as far as intervals are from that, and four times what the stamps' step rounds it by.
 double OffAtEnd(const std::vector<double>& intervals, double step) {
   const double usual = Median(intervals);
-  if (intervals.size() < 3 || intervals.back() != usual || intervals[intervals.size() - 2] != usual) return 0;
+  constexpr double kEqual = 1e-6;
+  const auto follows = [&](std::size_t i) { return std::fabs(intervals[i] - usual) < kEqual; };
+  if (intervals.size() < 3 || !follows(intervals.size() - 1) || !follows(intervals.size() - 2)) return 0;
   std::vector<double> off;
   for (const double interval : intervals) off.push_back(std::fabs(interval - usual));
   return std::hypot(1.4826 * Median(off), 4 * step / 2 / std::sqrt(3.0));

@@ -93,7 +93,7 @@ std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double 
 
 // The dark inner square, three modules wide, in the light ring about it: centre of gravity and size of what is dark
 // within 2.2 or 2.3 modules, which holds the whole square whatever its turn, and nothing of the dark frame.
-Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module) {
+Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double hidden) {
   constexpr double kReach = 2.2;
   constexpr double kSizeReach = 2.3;
   constexpr double kSeen = 4.5;  // the paper about the mark
@@ -111,7 +111,7 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module) {
   const double noise = NoiseOf(grey);
   grey = Evened(grey, light - std::clamp(2.5 * noise, contrast / 8, contrast / 3));
   const cv::Point2d corner = part.tl();
-  Core core = {mark.centre, 0, noise / contrast};
+  Core core = {mark.centre, 0, std::hypot(noise, hidden) / contrast};
   for (int round = 0; round < 6; ++round) {
     const cv::Vec3d dark = DarknessWithin(grey, core.centre - corner, kReach * module, 1);
     if (!(dark[2] > 0)) return {};
@@ -148,8 +148,8 @@ Uncertainty FromKnownError(double error, double standard, const char* method) {
   return {all, high, all == 0 ? 1 : high / all, method};
 }
 
-void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
-  constexpr double kCorePx = 0.005;       // type B: what pixels and light leave of a centre
+void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const CodecSteps& codec) {
+  constexpr double kCorePx = 0.0065;      // type B: what pixels and light leave of a centre
   constexpr double kApartPx = 0.003;      // and of two centres' distance
   constexpr double kCoreModulePx = 0.01;  // and of the squares' sizes
   // Noise over the contrast moves a centre by the circle's second moment over the square's weight, and the square's
@@ -157,6 +157,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
   constexpr double kNoisePx = 0.48;
   constexpr double kNoiseModulePx = 0.23;
   if (!view.complete()) return;
+  const double hidden = 8 * codec.luma / std::sqrt(12.0);  // noise of a pixel that a codec's steps take off it
   const double turn = view.turn_deg * CV_PI / 180;
   const double upright = std::max(std::fabs(std::cos(turn)), std::fabs(std::sin(turn)));  // of a row's way through
   Places found;
@@ -167,7 +168,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo) {
   std::vector<Uncertainty> rows;
   for (int i = 0; i < 3; ++i) {
     const Mark& mark = view.marks[i];
-    const Core core = LookAtCore(photo, mark, mark.module_px * upright);
+    const Core core = LookAtCore(photo, mark, mark.module_px * upright, hidden);
     if (core.module_px == 0) return;
     found[2 * i] = mark.centre.x;
     found[2 * i + 1] = mark.centre.y;

@@ -1,9 +1,12 @@
 // Tests 13 and 19: how much two preview frames differ.
 
+#include <cmath>
 #include <opencv2/imgproc.hpp>
 
 #include "desk/base/text.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/frames.h"
+#include "desk/measure/grey.h"
 #include "desk/measure/heading.h"
 #include "desk/measure/load.h"
 #include "desk/measure/run_test.h"
@@ -16,6 +19,25 @@ namespace {
 constexpr Method kDifference = {"mean absolute difference of the grey frames over 255",
                                 "Exact for the frames as delivered.",
                                 "Moved by motion, noise, flicker and exposure between the frames."};
+
+// Noise of both frames over their pixels; it tells of itself in what neighbours differ by on rows and columns, where
+// the scene is an edge at most. What noise adds to the difference of all photos alike is part of it.
+Uncertainty OfDifference(const cv::Mat& frame, const cv::Mat& map, const CodecSteps& codec) {
+  const cv::Matx33f edgeless(1, -2, 1, -2, 4, -2, 1, -2, 1);
+  constexpr double kRootOfSquares = 6;
+  const Uncertainty of_map = OfMeanLevel(map);
+  cv::Mat left;
+  cv::filter2D(GreyOf(frame), left, CV_32F, edgeless);
+  std::vector<double> sizes;
+  for (const float one : cv::Mat_<float>(left)) sizes.push_back(std::fabs(one));
+  const double noise = 1.4826 * Median(std::move(sizes)) / kRootOfSquares / 255;
+  // Sizes of noise alone scatter less than noise: by 1 - 2 / pi of its variance.
+  const double moved = cv::countNonZero(map > 2 * std::sqrt(2.0) * noise) / static_cast<double>(map.total());
+  const double share = moved + (1 - moved) * (1 - 2 / CV_PI);
+  const double standard = std::sqrt(2 * share / static_cast<double>(map.total())) * noise;
+  if (codec.luma != 0 || !(standard < of_map.standard)) return of_map;  // a codec hides noise
+  return Combined(standard, static_cast<double>(map.total()), 0, kMeanMethod);
+}
 
 // The map's colours, largest above, with the grey levels that they stand for.
 void DrawColourBar(Picture& picture, cv::Point2d origin, int steps, double largest) {
@@ -97,7 +119,9 @@ class Preview : public Measurement {
       if (result.preview_diff_map_ != nullptr) {
         map = cv::Mat(result.preview_diff_rows_, result.preview_diff_cols_, CV_32F, result.preview_diff_map_).clone();
         cv::patchNaNs(map, 0);  // identical frames: no difference anywhere
-        record.phase.Add("difference_mean", result.preview_diff_mean_).Trust({OfMeanLevel(map)});
+        const cv::Mat frame = SlotPhoto(tester, spec_.inputs[0].slot);
+        record.phase.Add("difference_mean", result.preview_diff_mean_)
+            .Trust({OfDifference(frame, map, StepsOf(request.inputs.at(0)))});
       } else {
         SayFramesDiffer(record);
       }

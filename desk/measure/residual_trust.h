@@ -4,6 +4,7 @@
 #include <opencv2/core.hpp>
 
 #include "desk/measure/chart_view.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/robust_map.h"
 
 namespace qv {
@@ -16,8 +17,8 @@ Uncertainty FromKnownError(double error, double standard, const char* method = k
 
 /// The marks' places, module size, the legs' ratio and angle, the chart's turn: from how far the search's places lie
 /// from the centres of gravity of the marks' inner squares. Says nothing unless there are three marks. `photo` is the
-/// one that was searched, CV_8U or CV_16U.
-void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo);
+/// one that was searched, CV_8U or CV_16U; its file rounds by the steps of `codec`.
+void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const CodecSteps& codec);
 
 /// Both maps of a registration. The map of all matches: from the grey levels' residuals under it, by 64 parts of the
 /// picture. The fixed one: from how far it lies from that. Says nothing where the map of all is doubtful. Pictures are

@@ -119,10 +119,12 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "What light and exposure do from photo to photo is not in it (take several photos)."},
       {kResidualMethod,
        "Marks: how far the search's places lie from the centres of gravity of the marks' inner squares in evened "
-       "light, which are good to 0.005 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
+       "light, which are good to 0.0065 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
        "carried to the legs and the turn; a module is good to 0.01 px (type B) and noise. Where the blur is over a "
-       "fifth of a module the frame shines into the square, and in a JPEG file the codec hides the noise: U then holds "
-       "for 83 to 90 of 100. Registration: the grey levels left over under the map of all matches, by 64 parts of the "
+       "fifth of a module the frame shines into the square: U then holds for 83 of 100. In a JPEG file noise is hidden "
+       "up "
+       "to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
+       "the map of all matches, by 64 parts of the "
        "picture (as noise may be alike between neighbours), tell where the best map lies and how surely; what lies "
        "between it and either map is in that one's uncertainty, and the distance of both maps has it by 400 draws "
        "(JCGM 101). Type B, of interpolated pixels: 0.0015 px of a place and 0.0038 px of an enlargement at the "
