@@ -173,8 +173,8 @@ void TrustMeans(Phase& phase, const LcdFinding& found, const CodecSteps& codec) 
       return total > 0 ? mean(bgr, i) / total : 0;
     })});
   }
-  const double side = std::min(found.screen.cols, found.screen.rows) / 12;
-  const double part = side * side * area / static_cast<double>(found.screen.total());  // of the photo
+  const int side = std::min(found.screen.cols, found.screen.rows) / 12;  // of a point, as the library has it
+  const double part = 1.0 * side * side * area / static_cast<double>(found.screen.total());  // of the photo
   const std::vector<cv::Vec3d> off_point = errors.OfMean(part);
   const Uncertainty of_level = OfDrawn(off_point, 0, GreyOfMeans);
   phase.Find("levels")->Trust(std::vector<Uncertainty>(9, of_level));

@@ -117,7 +117,8 @@ LightTrust TrustInLight(const cv::Mat& photo, const QVLightRegion& region, const
   cv::Mat grey;
   cv::cvtColor(pixels, grey, cv::COLOR_RGB2GRAY);
   const cv::Mat means = BlockMeans(grey);
-  trust.uniformity = errors.OfEvenness(means, 1.0 * (grey.rows / means.rows) * (grey.cols / means.cols));
+  const cv::Size smallest(grey.cols / means.cols, grey.rows / means.rows);
+  trust.uniformity = errors.OfEvenness(means, smallest.area());
   cv::Mat clipped;
   cv::transform(pixels == 255, clipped, cv::Matx13f(1, 1, 1));  // saturates
   trust.clipped_share = OfShare(clipped);

@@ -65,7 +65,8 @@ cv::Mat SurfaceThrough(const cv::Mat& grid, int terms) {
   cv::Mat at(static_cast<int>(grid.total()), terms, CV_64F);
   for (int i = 0; i < at.rows; ++i) {
     const double x = i % grid.cols - (grid.cols - 1) / 2.0;
-    const double y = i / grid.cols - (grid.rows - 1) / 2.0;
+    const int row = i / grid.cols;
+    const double y = row - (grid.rows - 1) / 2.0;
     const std::array<double, 6> powers = {1, x, y, x * x, x * y, y * y};
     std::copy_n(powers.begin(), terms, at.ptr<double>(i));
   }

@@ -25,7 +25,7 @@ constexpr Method kDifference = {"mean absolute difference of the grey frames ove
 Uncertainty OfDifference(const cv::Mat& frame, const cv::Mat& map, const CodecSteps& codec) {
   const cv::Matx33f edgeless(1, -2, 1, -2, 4, -2, 1, -2, 1);
   constexpr double kRootOfSquares = 6;
-  const Uncertainty of_map = OfMeanLevel(map);
+  Uncertainty of_map = OfMeanLevel(map);
   cv::Mat left;
   cv::filter2D(GreyOf(frame), left, CV_32F, edgeless);
   std::vector<double> sizes;
