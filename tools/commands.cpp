@@ -1,5 +1,6 @@
 #include "tools/commands.h"
 
+#include <cstdint>
 #include <cstdio>
 #include <exception>
 #include <filesystem>
@@ -7,6 +8,7 @@
 
 #include "desk/base/failure.h"
 #include "desk/base/text.h"
+#include "qvtester/resource.h"
 #include "tools/program.h"
 
 namespace qv {
@@ -96,7 +98,8 @@ const std::vector<Command> kCommands = {
 constexpr char kFooter[] =
     "Exit status: 0 measured, within all limits; 1 measured, a limit broken; 2 wrong usage;\n"
     "3 could not measure, or not to be trusted; 4 internal fault or a full disk; 130 interrupted.\n"
-    "`qvtester COMMAND --help` shows a command's options.";
+    "`qvtester COMMAND --help` shows a command's options. `qvtester --most-megapixels N COMMAND ...`\n"
+    "reads pictures and films of up to N megapixels, 1 to 1000, in place of 200.";
 
 // Options and their values as words of their own: "--json=FILE" and "-oFILE" taken apart.
 std::vector<std::string> Separate(const std::vector<std::string>& words) {
@@ -114,10 +117,28 @@ std::vector<std::string> Separate(const std::vector<std::string>& words) {
   return parts;
 }
 
+// What stands before any command: how large a picture or film may be. Takes it, and leaves the command.
+std::vector<std::string> WithoutMostMegapixels(const std::vector<std::string>& words) {
+  constexpr std::int64_t kMega = 1'000'000;
+  const std::vector<std::string> parts = Separate({words.begin(), words.begin() + (words.empty() ? 0 : 1)});
+  QVResource::most_pixels_ = 200 * kMega;
+  if (parts.empty() || parts[0] != "--most-megapixels") return words;
+  const std::size_t taken = parts.size() == 2 ? 1 : 2;
+  const std::string number = parts.size() == 2 ? parts[1] : words.size() > 1 ? words[1] : "";
+  const bool whole =
+      !number.empty() && number.size() <= 4 && number.find_first_not_of("0123456789") == std::string::npos;
+  const std::int64_t most = whole ? std::stoll(number) : 0;
+  if (most < 1 || most > 1000) {
+    throw Failure(kWrongUsage, "--most-megapixels " + number + ": give a whole number from 1 to 1000");
+  }
+  QVResource::most_pixels_ = most * kMega;
+  return {words.begin() + static_cast<std::ptrdiff_t>(taken), words.end()};
+}
+
 int RunCommand(const std::vector<std::string>& words) {
   const CommandBody body =
       Parse({"qvtester", "Judges a phone's camera hardware from photos of test charts.", QVTESTER_VERSION, kFooter},
-            kCommands, words);
+            kCommands, WithoutMostMegapixels(words));
   SetCommandLine(Separate(words));
   const int status = body();
   if (!std::cout.flush()) throw Failure(kInternalFault, "standard output can't be written");

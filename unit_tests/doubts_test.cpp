@@ -1,3 +1,4 @@
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <opencv2/imgproc.hpp>
@@ -51,6 +52,11 @@ TEST(LevelPiles, CutOffLightIsSeenAndFlatPaperIsNot) {
   for (const Case& row : kCases) {
     const cv::Mat light = cv::min(cv::max(Edge(row.noise, 0, 7), row.bottom), row.top);
     EXPECT_EQ(row.piled, FindLevelPile(Levels(light), kWhole).has_value()) << row.name;
+    cv::Mat within;  // a photo whose other pixels are cut off
+    cv::copyMakeBorder(Levels(light), within, 31, 7, 53, 9, cv::BORDER_CONSTANT, cv::Scalar(255));
+    std::array<cv::Point2d, 4> moved = kWhole;
+    for (cv::Point2d& corner : moved) corner += cv::Point2d(53, 31);
+    EXPECT_EQ(row.piled, FindLevelPile(within, moved).has_value()) << row.name;
   }
   EXPECT_TRUE(FindLevelPile(Levels(Edge(0, 0, 1) * (255 / 200.0)), kWhole)) << "at 255, also without noise";
   const cv::Mat good = Levels(Edge(2.5, 0, 1));
@@ -61,6 +67,37 @@ TEST(LevelPiles, CutOffLightIsSeenAndFlatPaperIsNot) {
   ASSERT_TRUE(pile);
   EXPECT_EQ(1, pile->channel);
   EXPECT_EQ(218, pile->level);
+}
+
+// The edge's own spread is symmetric about its middle.
+TEST(LightSides, ACurveThatBendsTowardsWhiteBringsTheLightSideNearer) {
+  struct Case {
+    double noise, knee, slope;
+    bool srgb;
+    double least, most;
+  };
+  const Case kCases[] = {{0, 255, 1, false, 0.98, 1.0001},
+                         {2.5, 255, 1, false, 0.96, 1.02},
+                         {2.5, 255, 1, true, 1.02, 1.5},
+                         {0, 190, 0.3, false, 0.7, 0.9},
+                         {2.5, 190, 0.3, false, 0.7, 0.9}};
+  for (const Case& row : kCases) {
+    cv::Mat light = Edge(row.noise, 0, 3);
+    light.forEach<float>([&](float& level, const int* /*place*/) {
+      if (row.srgb) level = 255 * std::pow(level / 255, 1 / 2.2F);
+      if (level > row.knee) level = static_cast<float>(row.knee + row.slope * (level - row.knee));
+    });
+    for (const int turn : {0, 1, 2, 3}) {  // a side that is the left one, or the lower
+      cv::Mat levels = Levels(light);
+      if (turn > 0) cv::rotate(levels, levels, turn - 1);
+      const double right = levels.cols - 1;
+      const double bottom = levels.rows - 1;
+      const auto reach = LightSideReach(levels, {{{0, 0}, {right, 0}, {right, bottom}, {0, bottom}}});
+      ASSERT_TRUE(reach);
+      EXPECT_THAT(*reach, testing::AllOf(testing::Ge(row.least), testing::Le(row.most)))
+          << row.knee << " turn " << turn;
+    }
+  }
 }
 
 double Mtf50(const cv::Mat& levels) {

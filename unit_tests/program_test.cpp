@@ -201,9 +201,12 @@ TEST_F(Program, BadInputIsACodeAndASentence) {
   folder_.Write("empty.jpg", std::string());
   folder_.Write("words.jpg", std::string("words"));
   folder_.Write("cut.png", png.substr(0, 25));
+  folder_.Write("huge.pgm", std::string("P5 60000 60000 255\n"));
   for (const auto& [file, complaint] : {std::pair("missing.png", "no such file"),
                                         {"./", "is a directory"},
                                         {"empty.jpg", "the file is empty"},
+                                        {"/dev/zero", "/dev/zero: is no regular file"},
+                                        {"huge.pgm", "too many pixels: over 200 megapixels"},
                                         {"words.jpg", "not a picture that can be decoded"},
                                         {"cut.png", "not a picture that can be decoded"}}) {
     for (const std::string command : {"autofocus ", "mtf ", "flash "}) {
@@ -213,6 +216,12 @@ TEST_F(Program, BadInputIsACodeAndASentence) {
   }
   EXPECT_EQ(3, Run("autofocus small.png").status);
   EXPECT_EQ(0, Run("flash small.png").status);
+  folder_.Write("wide.png", cv::Mat(1000, 1001, CV_8UC3, cv::Scalar(9, 9, 9)));
+  EXPECT_EQ(3, Run("--most-megapixels 1 flash wide.png").status);
+  EXPECT_EQ(0, Run("--most-megapixels 2 flash wide.png").status);
+  const ProgramRun mixed = Run("flash small.png --json /dev/stdout");
+  EXPECT_EQ(2, mixed.status);
+  EXPECT_THAT(mixed.err, HasSubstr("/dev/stdout: is where standard output goes"));
 }
 
 // What OpenCV fills up measures like a whole photo, or nearly; what libpng calls a warning has whole pixels.

@@ -136,10 +136,19 @@ bool IsPlainStream(const std::string& path) {
          (S_ISFIFO(status.st_mode) && statfs(path.c_str(), &system) == 0 && system.f_type == PIPEFS_MAGIC);
 }
 
-// A named pipe would be waited for, a disk overwritten.
+// A named pipe would be waited for, a disk overwritten, and what goes to standard output by itself be lost or mixed up.
 void RefuseOtherThings(const std::string& path) {
   struct stat status = {};
-  if (stat(path.c_str(), &status) != 0 || S_ISREG(status.st_mode) || IsPlainStream(path)) return;
+  if (stat(path.c_str(), &status) != 0) return;
+  for (const int stream : {STDOUT_FILENO, STDERR_FILENO}) {
+    struct stat taken = {};
+    const bool same = fstat(stream, &taken) == 0 && taken.st_dev == status.st_dev && taken.st_ino == status.st_ino;
+    if (!same || S_ISCHR(status.st_mode)) continue;
+    throw Failure(kWrongUsage,
+                  Printable(path) + (stream == STDOUT_FILENO ? ": is where standard output goes; - names it"
+                                                             : ": is where standard error goes"));
+  }
+  if (S_ISREG(status.st_mode) || IsPlainStream(path)) return;
   throw Failure(kWrongUsage, Printable(path) + (S_ISDIR(status.st_mode) ? ": is a directory" : ": is no regular file"));
 }
 
@@ -200,13 +209,13 @@ void WriteWholeFile(const std::string& path, const std::function<void(const Sink
       if (!WriteAll(file, part)) RefuseToWrite(path);
     });
   };
+  RefuseOtherThings(path);
   if (IsPlainStream(path)) {
     const Descriptor file(open(path.c_str(), O_WRONLY | O_CLOEXEC));
     if (file.number() < 0) RefuseToWrite(path);
     write_to(file.number());
     return;
   }
-  RefuseOtherThings(path);
   const fs::path target = Followed(path);
   FileAside aside(target);
   if (aside.file() < 0 || fchmod(aside.file(), RightsFor(target)) != 0) RefuseToWrite(path);

@@ -137,6 +137,34 @@ bool IsCut(const cv::Mat& channel, const std::array<cv::Point2d, 4>& outline, bo
   return here && there && *here < (top ? kSharperTop : kSharperBottom) * *there;
 }
 
+// Bin in which the spread comes to so much of the way, the nearest to its middle; NaN where it does not.
+double BinOf(const EdgeSpread& spread, double share) {
+  const std::vector<double>& levels = spread.levels;
+  const int way = levels[spread.middle] < share ? 1 : -1;
+  const int last = static_cast<int>(levels.size()) - 1;
+  for (int k = spread.middle; k + way >= 0 && k + way <= last; k += way) {
+    if (way * (levels[k + way] - share) >= 0) return k + way * (share - levels[k]) / (levels[k + way] - levels[k]);
+  }
+  return NAN;
+}
+
+// What of a photo lies about an outline, with the outline in it, also rounded.
+struct Part {
+  cv::Mat photo;
+  std::array<cv::Point2d, 4> outline;
+  std::vector<cv::Point> corners;
+};
+
+Part PartAbout(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
+  std::vector<cv::Point> corners;
+  for (const cv::Point2d& corner : outline) corners.emplace_back(cvRound(corner.x), cvRound(corner.y));
+  const cv::Rect bounds = cv::boundingRect(corners) & cv::Rect({}, photo.size());
+  Part part = {photo(bounds), outline, corners};
+  for (cv::Point2d& corner : part.outline) corner -= cv::Point2d(bounds.tl());
+  for (cv::Point& corner : part.corners) corner -= bounds.tl();
+  return part;
+}
+
 // Mean grey level about a place of the chart, in chart units.
 std::optional<double> LevelAt(const FoundChart& found, double x, double y) {
   constexpr int kHalf = 3;  // pixels
@@ -152,17 +180,12 @@ std::optional<double> LevelAt(const FoundChart& found, double x, double y) {
 }  // namespace
 
 std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
-  std::vector<cv::Point> corners;
-  for (const cv::Point2d& corner : outline) corners.emplace_back(cvRound(corner.x), cvRound(corner.y));
-  const cv::Rect bounds = cv::boundingRect(corners) & cv::Rect({}, photo.size());
-  if (bounds.empty()) return std::nullopt;
-  for (cv::Point& corner : corners) corner -= bounds.tl();
-  cv::Mat inside(bounds.size(), CV_8UC1, cv::Scalar(0));
-  cv::fillConvexPoly(inside, corners, cv::Scalar(255));
-  std::array<cv::Point2d, 4> within = outline;
-  for (cv::Point2d& corner : within) corner -= cv::Point2d(bounds.tl());
+  const Part part = PartAbout(photo, outline);
+  if (part.photo.empty()) return std::nullopt;
+  cv::Mat inside(part.photo.size(), CV_8UC1, cv::Scalar(0));
+  cv::fillConvexPoly(inside, part.corners, cv::Scalar(255));
   std::vector<cv::Mat> channels;
-  cv::split(photo(bounds), channels);
+  cv::split(part.photo, channels);
   std::optional<LevelPile> worst;
   for (int channel = 0; channel < std::min<int>(3, static_cast<int>(channels.size())); ++channel) {
     double lowest = 0;
@@ -173,10 +196,37 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
     for (const bool top : {true, false}) {
       const std::optional<PileCandidate> found = PileOf(top ? light : dark, NoiseOf(top ? dark : light), top, channel);
       if (!found || (worst && found->pile.share <= worst->share)) continue;
-      if (found->sure || IsCut(channels[channel], within, top)) worst = found->pile;
+      if (found->sure || IsCut(channels[channel], part.outline, top)) worst = found->pile;
     }
   }
   return worst;
+}
+
+std::optional<double> LightSideReach(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
+  Part part = PartAbout(photo, outline);
+  if (part.photo.empty()) return std::nullopt;
+  if (part.photo.channels() > 1) {
+    cv::cvtColor(part.photo, part.photo, part.photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
+  }
+  const SlantedEdge edge = LocateEdge(part.photo, part.outline, {Transfer::Kind::kLinear, 1});
+  // Nearer to the pixels' grid the spread is seen in too few places; steeper, the region may hold the chart's corner.
+  constexpr double kLeastAngleDeg = 1.5;
+  constexpr double kMostAngleDeg = 6.5;
+  const double angle = edge.reason == nullptr ? std::fabs(edge.angle_deg()) : 0;
+  if (angle < kLeastAngleDeg || angle > kMostAngleDeg) return std::nullopt;
+  const EdgeSpread spread = ProjectEdge(edge, edge.room).whole;
+  if (spread.levels.empty()) return std::nullopt;
+  const double middle = BinOf(spread, 0.5);
+  const bool light_right = edge.right.level > edge.left.level;
+  double least = INFINITY;
+  for (const double rest : {0.2, 0.1, 0.05}) {
+    const double to_right = BinOf(spread, 1 - rest) - middle;
+    const double to_left = middle - BinOf(spread, rest);
+    const double reach = light_right ? to_right / to_left : to_left / to_right;
+    if (!std::isfinite(reach)) return std::nullopt;
+    least = std::min(least, reach);
+  }
+  return least;
 }
 
 bool LooksMirrored(const FoundChart& found) {

@@ -126,6 +126,20 @@ void NameInput(std::vector<LogLine>& lines, std::size_t first, const std::string
   }
 }
 
+// Why the library refused a file, as its last line says after the name; nothing where it says no more than that.
+std::string ReasonOf(const std::vector<LogLine>& lines, std::size_t first, const std::string& name) {
+  if (lines.size() == first) return "";
+  const std::string& line = lines.back().text;
+  const std::string before = "] " + name + ": ";
+  const std::size_t at = line.find(before);
+  const std::string reason = at == std::string::npos ? "" : line.substr(at + before.size());
+  if (reason == "not an image that can be decoded" || reason.rfind("not a video", 0) == 0) return "";
+  return reason.find("too many pixels") == std::string::npos
+             ? reason
+             : reason + Format(": over %g megapixels, which --most-megapixels before the command raises",
+                               static_cast<double>(QVResource::most_pixels_) / 1e6);
+}
+
 class Loader {
  public:
   Loader(QVTester& tester, const Spec& spec, const Request& request, Record& record, LogCollector& log)
@@ -153,10 +167,10 @@ class Loader {
     const KeptStderr kept;
     const std::size_t first_line = log_.lines().size();
     const int code = Guarded("SetResource", [&] { return tester_.SetResource(slot, paths); });
+    Hear(kept.Lines(), first_line);
     for (std::size_t k = 0; k < paths.size(); ++k) {
       NameInput(log_.lines(), first_line, paths[k] + ":", request_.inputs[i + k].name + ":");
     }
-    Hear(kept.Lines());
     if (code != QV_SUCCESS) return RefuseList(i, code, first_line);
     SayComplaint(record_, "one of the " + std::to_string(paths.size()) + " pictures", said_);
     for (std::size_t k = 0; k < paths.size(); ++k) {
@@ -191,9 +205,16 @@ class Loader {
     return false;
   }
 
-  void Hear(const std::vector<std::string>& chatter) {
-    said_.insert(said_.end(), chatter.begin(), chatter.end());
-    record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
+  // What was said of inputs from the log's line `first` on. The library's own lines, where they are shown, are among it
+  // and no decoder's.
+  void Hear(const std::vector<std::string>& chatter, std::size_t first) {
+    for (const std::string& line : chatter) {
+      const auto is_line = [&](const LogLine& own) { return own.text == line; };
+      if (std::none_of(log_.lines().begin() + static_cast<std::ptrdiff_t>(first), log_.lines().end(), is_line)) {
+        said_.push_back(line);
+      }
+      record_.chatter.push_back(line);
+    }
   }
 
   void DoubtEnd(const std::string& name, const std::string& content) {
@@ -213,6 +234,7 @@ class Loader {
 
   int Take(const Input& input, QV_RESOURCE_INDEX slot) {
     said_.clear();
+    reason_.clear();
     if (!input.picture.empty()) {
       record_.inputs.push_back({slot, input.name, "", ""});
       return KindOfSlot(slot) == SlotKind::kHdr ? TakeFloats(tester_, slot, input.picture)
@@ -231,11 +253,15 @@ class Loader {
     if (!input.is_path()) throw Failure(kCouldNotMeasure, "a film is read from its file: give a path");
     record_.inputs.push_back({slot, input.name, HexDigest(Content(input), "SHA256"), ""});
     const KeptStderr kept;
+    const std::size_t first_line = log_.lines().size();
     std::string path = input.name;
     const int code = Guarded("SetResource", [&] { return tester_.SetResource(slot, path.data()); });
     const std::vector<std::string> chatter = kept.Lines();
     record_.chatter.insert(record_.chatter.end(), chatter.begin(), chatter.end());
-    if (code != QV_SUCCESS) said_ = chatter;
+    if (code != QV_SUCCESS) {
+      said_ = chatter;
+      reason_ = ReasonOf(log_.lines(), first_line, input.name);
+    }
     return code;
   }
 
@@ -247,8 +273,9 @@ class Loader {
     const int code = KindOfSlot(slot) == SlotKind::kHdr
                          ? TakeFloats(tester_, slot, ReadFloats(path))
                          : Guarded("SetResource", [&] { return tester_.SetResource(slot, path.data()); });
+    Hear(kept.Lines(), first_line);
     NameInput(log_.lines(), first_line, path, name);
-    Hear(kept.Lines());
+    if (code != QV_SUCCESS) reason_ = ReasonOf(log_.lines(), first_line, name);
     if (said_.empty()) DoubtEnd(name, content);
     return code;
   }
@@ -258,7 +285,7 @@ class Loader {
       const bool frame = LowerExtension(input.name) == ".nv21";
       const char* const wanted = KindOfSlot(slot) == SlotKind::kVideo ? "film" : "picture";
       return Refuse(input, code,
-                    Format("not a %s that can be decoded", wanted) +
+                    (reason_.empty() ? Format("not a %s that can be decoded", wanted) : reason_) +
                         (said_.empty() ? "" : "; the decoder says \"" + said_.front() + "\"") +
                         (frame ? "; a raw frame needs its size: --raw WxH, where the command takes it" : ""));
     }
@@ -287,6 +314,7 @@ class Loader {
   Record& record_;
   LogCollector& log_;
   std::vector<std::string> said_;  // by the decoder of the input at hand
+  std::string reason_;             // why the library refused it
 };
 
 }  // namespace

@@ -272,8 +272,10 @@ std::string Record::MissSentence() const {
   if (row.code != phase.code) {
     return Format("%s (code %d: %s); %s", text.c_str(), phase.code, row.meaning, look_at.c_str());
   }
-  return Format("%s (code %d, %s: %s); %s", text.c_str(), row.code, row.name,
-                meaning.empty() ? row.meaning : meaning.c_str(), look_at.c_str());
+  // Of a refused input its own reason says more than that an argument is not valid.
+  const bool told = row.code == QV_ERROR_INVALID_ARGUMENT && meaning.empty();
+  const std::string meant = told ? "" : ": " + (meaning.empty() ? row.meaning : meaning);
+  return Format("%s (code %d, %s%s); %s", text.c_str(), row.code, row.name, meant.c_str(), look_at.c_str());
 }
 
 Json Record::ToJson() const {

@@ -1,5 +1,6 @@
 // What would make a sharpness figure wrong without a word.
 
+#include <algorithm>
 #include <cmath>
 
 #include "desk/base/text.h"
@@ -11,7 +12,8 @@ namespace qv {
 
 namespace {
 
-constexpr double kMostOff = 0.05;  // of the noiseless figure
+constexpr double kMostOff = 0.05;     // of the noiseless figure
+constexpr double kLeastReach = 0.94;  // of the light side over the dark one
 
 constexpr Method kNoiselessMethod = {
     "the test's own measure of the region's edge spread alone",
@@ -19,9 +21,22 @@ constexpr Method kNoiselessMethod = {
     "Moved by focus, motion, sharpening and denoising; not by noise, nor by light "
     "that falls evenly across the region."};
 
+// A curve that bends below white leaves no pile. No doubt, since a lens that blurs unlike to both sides looks the same.
+void WarnOfShoulder(Record& record, const cv::Mat& photo, const SharpnessRegion& region, const char* name) {
+  const std::optional<double> reach = LightSideReach(photo, region.outline);
+  if (!reach || *reach >= kLeastReach) return;
+  record.Say(
+      Remark::kWarning, "flattened_light",
+      Format("%s: the light side of the %s region looks flattened: its edge comes to the paper in %.2f of the way "
+             "that it takes from the dark, and may look sharper than it is; use less light, or a camera setting "
+             "that leaves light levels as they are",
+             record.inputs[0].path.c_str(), name, *reach),
+      std::string("mtf50_") + name);
+}
+
 void DoubtLevels(Record& record, const cv::Mat& photo, const SharpnessRegion& region, const char* name) {
   const std::optional<LevelPile> pile = FindLevelPile(photo, region.outline);
-  if (!pile) return;
+  if (!pile) return WarnOfShoulder(record, photo, region, name);
   constexpr const char* kChannels[] = {"blue", "green", "red"};
   record.Say(
       Doubt::kClipped,
@@ -31,6 +46,33 @@ void DoubtLevels(Record& record, const cv::Mat& photo, const SharpnessRegion& re
              photo.channels() == 1 ? "grey" : kChannels[pile->channel],
              pile->top ? "less light or a shorter exposure" : "more light, or a camera setting that keeps its blacks"),
       std::string("mtf50_") + name);
+}
+
+struct Cause {
+  Doubt doubt;
+  const char* sentence;
+};
+
+// Seen obliquely, a region lies beside its place, and may hold more than its edge.
+Cause LightCause(bool oblique) {
+  return {Doubt::kUnevenLight, oblique
+                                   ? "the light falls across it, or, seen obliquely, the region holds more than its "
+                                     "edge; face the chart straight on, and light it evenly"
+                                   : "the light falls across it; light the chart evenly"};
+}
+
+// Of a difference that even light leaves.
+Cause NoiseCause(bool oblique, const SharpnessRegion& region, const std::function<double(const cv::Mat&)>& read,
+                 double difference) {
+  if (oblique && !(ResampleEdge(region.pixels, read).expanded >= difference)) {
+    return {Doubt::kOblique, "the chart is seen obliquely; face it straight on"};
+  }
+  return {Doubt::kNoise, "noise moved the reading; take several photos, and the median"};
+}
+
+bool IsOblique(const Record& record) {
+  return std::any_of(record.remarks.begin(), record.remarks.end(),
+                     [](const Remark& remark) { return remark.name() == Info(Doubt::kOblique).name; });
 }
 
 // The figure of the edge alone says what noise and uneven light have made of it.
@@ -65,11 +107,11 @@ void DoubtReading(Record& record, const SharpnessRegion& region, const char* nam
   if (value >= noiseless.low * (1 - kMostOff) && value <= noiseless.high * (1 + kMostOff)) return;
   // Of both causes the one that accounts for more.
   const bool uneven = std::fabs(noiseless.in_its_light - noiseless.value) > std::fabs(value - noiseless.value) / 2;
-  record.Say(uneven ? Doubt::kUnevenLight : Doubt::kNoise,
+  const Cause cause = uneven ? LightCause(IsOblique(record))
+                             : NoiseCause(IsOblique(record), region, read, std::fabs(value - noiseless.value));
+  record.Say(cause.doubt,
              Format("%s: the %s region reads %.4f Nyquist, and its edge without noise and in even light %.4f: %s", path,
-                    name, value, noiseless.value,
-                    uneven ? "the light falls across it; light the chart evenly"
-                           : "noise moved the reading; take several photos, and the median"),
+                    name, value, noiseless.value, cause.sentence),
              figure);
 }
 
