@@ -149,17 +149,17 @@ double BinOf(const EdgeSpread& spread, double share) {
 }
 
 // What of a photo lies about an outline, with the outline in it, also rounded.
-struct Part {
+struct Surroundings {
   cv::Mat photo;
   std::array<cv::Point2d, 4> outline;
   std::vector<cv::Point> corners;
 };
 
-Part PartAbout(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
+Surroundings SurroundingsOf(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
   std::vector<cv::Point> corners;
   for (const cv::Point2d& corner : outline) corners.emplace_back(cvRound(corner.x), cvRound(corner.y));
   const cv::Rect bounds = cv::boundingRect(corners) & cv::Rect({}, photo.size());
-  Part part = {photo(bounds), outline, corners};
+  Surroundings part = {photo(bounds), outline, corners};
   for (cv::Point2d& corner : part.outline) corner -= cv::Point2d(bounds.tl());
   for (cv::Point& corner : part.corners) corner -= bounds.tl();
   return part;
@@ -180,7 +180,7 @@ std::optional<double> LevelAt(const FoundChart& found, double x, double y) {
 }  // namespace
 
 std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
-  const Part part = PartAbout(photo, outline);
+  const Surroundings part = SurroundingsOf(photo, outline);
   if (part.photo.empty()) return std::nullopt;
   cv::Mat inside(part.photo.size(), CV_8UC1, cv::Scalar(0));
   cv::fillConvexPoly(inside, part.corners, cv::Scalar(255));
@@ -203,7 +203,7 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
 }
 
 std::optional<double> LightSideReach(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
-  Part part = PartAbout(photo, outline);
+  Surroundings part = SurroundingsOf(photo, outline);
   if (part.photo.empty()) return std::nullopt;
   if (part.photo.channels() > 1) {
     cv::cvtColor(part.photo, part.photo, part.photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);

@@ -11,7 +11,6 @@ namespace qv {
 
 namespace {
 
-constexpr int kMeanDraws = 400;
 constexpr int kCodecBlock = 8;       // pixels a side
 constexpr int kMostLookedAt = 1024;  // pixels a side
 
@@ -130,7 +129,7 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area) const {
   cv::meanStdDev(pixels_, mean, deviation);
   for (int k = 0; k < 3 && codec_.luma == 0; ++k) rounding[k] = HalfInterval(1, deviation[k]);
   cv::RNG random(9);
-  std::vector<cv::Vec3d> errors(kMeanDraws);
+  std::vector<cv::Vec3d> errors(kColourDraws);
   for (cv::Vec3d& error : errors) {
     cv::Vec3d normal;
     for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
@@ -154,7 +153,7 @@ Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area) const {
   const cv::Mat even = WithoutNoise(means, noise, degrees_);
   cv::RNG random(10);
   std::vector<double> errors;
-  for (int draw = 0; draw < kMeanDraws; ++draw) {
+  for (int draw = 0; draw < kColourDraws; ++draw) {
     const double of_noise = 1 + random.gaussian(1) / std::sqrt(2 * degrees_);  // which is not known better
     cv::Mat noisy(even.size(), CV_64F);
     random.fill(noisy, cv::RNG::NORMAL, 0, of_noise * noise);

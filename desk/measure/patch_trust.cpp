@@ -8,8 +8,6 @@ namespace qv {
 
 namespace {
 
-constexpr int kDraws = 400;
-
 cv::Vec3d Levels(const cv::Point3i& mean) { return {1.0 * mean.x, 1.0 * mean.y, 1.0 * mean.z}; }
 
 constexpr double kLumaShare = 0.67;  // of a channel's noise: the root of the weights' squares
@@ -118,7 +116,7 @@ std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, cons
   const cv::Matx33d root = RootOf(CovarianceOfMean(pixels, 0) * share);
   cv::RNG random(seed);
   std::vector<cv::Vec3d> draws;
-  for (int i = 0; i < kDraws; ++i) {
+  for (int i = 0; i < kColourDraws; ++i) {
     cv::Vec3d normal;
     cv::Vec3d cut;
     for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);

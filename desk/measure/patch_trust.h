@@ -11,6 +11,8 @@
 
 namespace qv {
 
+constexpr int kColourDraws = 400;  // of what a colour may be (JCGM 101)
+
 /// What a JPEG file's rounding may add to the mean of a picture's pixels, drawn many times: nothing for other files.
 class CodecRounding {
  public:

@@ -106,8 +106,7 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "mean, which a JPEG file's tables round by blocks (type B). A patch's mean is cut to a whole level (type B: up "
        "to one level low); the standard photo's noise is taken to be the same. Of a light the true value is that "
        "without noise, which lifts the mean of bent levels: by how much, its blocks of 8 x 8 pixels tell. An evenness "
-       "is "
-       "the least over the largest of means, and reads low by noise: noise is drawn anew about the plainest surface "
+       "is the least over the largest of means, and reads low by noise: noise is drawn anew about the plainest surface "
        "through them. A light's region should keep 16 px off its rim in a JPEG file. What light and exposure do from "
        "photo to photo is not in it."},
       {kMeanMethod,
@@ -122,13 +121,12 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "light, which are good to 0.0065 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
        "carried to the legs and the turn; a module is good to 0.01 px (type B) and noise. Where the blur is over a "
        "fifth of a module the frame shines into the square: U then holds for 83 of 100. In a JPEG file noise is hidden "
-       "up "
-       "to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
-       "the map of all matches, by 64 parts of the "
-       "picture (as noise may be alike between neighbours), tell where the best map lies and how surely; what lies "
-       "between it and either map is in that one's uncertainty, and the distance of both maps has it by 400 draws "
-       "(JCGM 101). Type B, of interpolated pixels: 0.0015 px of a place and 0.0038 px of an enlargement at the "
-       "picture's sides; none for depth in the scene and distortion, which no affine map follows."},
+       "up to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
+       "the map of all matches, by 64 parts of the picture (as noise may be alike between neighbours), tell where the "
+       "best map lies and how surely; what lies between it and either map is in that one's uncertainty, and the "
+       "distance of both maps has it by 400 draws (JCGM 101). Type B, of interpolated pixels: 0.0015 px of a place and "
+       "0.0038 px of an enlargement at the picture's sides; none for depth in the scene and distortion, which no "
+       "affine map follows."},
       {kSpotMethod,
        "Type B alone: the 95 % quantiles of the errors of 3,000 simulated spots, half sharp and half soft, by contrast "
        "times the root of the pixels over the noise, s: of the area 0.48 + 1.5 / s of it, of the contrast 0.45 + 6 / s "
@@ -150,8 +148,7 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "frames alike is not in it."},
       {kRepeatMethod,
        "The spread of several photos of one unit, over the root of their number, with Student's factor; the median's "
-       "is "
-       "wider than the mean's by sqrt(pi / 2)."},
+       "is wider than the mean's by sqrt(pi / 2)."},
   };
   return methods;
 }
