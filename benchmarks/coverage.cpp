@@ -451,7 +451,7 @@ std::vector<Trial> TryPreview(const Condition& condition, cv::RNG& random) {
     const std::lock_guard<std::mutex> lock(one_at_a_time);
     const auto [found, is_new] = known.try_emplace(&condition);
     if (!is_new) return found->second;
-    constexpr int kPairs = 400;
+    const int kPairs = Trials(400, 100);
     found->second.first = Simulate(options);
     cv::RNG seeds(77);
     for (int i = 0; i < kPairs; ++i) {
