@@ -74,6 +74,7 @@ void Flatten(const json& value, const std::string& name, std::string& text) {
                                                 "sha1",
                                                 "sha256",
                                                 "sha512",
+                                                "start_millis",
                                                 "start_time_millis",
                                                 "timestamp_millis",
                                                 "units"};
