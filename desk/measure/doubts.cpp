@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "chart/chart_layout.h"
+#include "desk/measure/grey.h"
 #include "desk/measure/slanted_edge.h"
 
 namespace qv {
@@ -203,12 +204,9 @@ std::optional<LevelPile> FindLevelPile(const cv::Mat& photo, const std::array<cv
 }
 
 std::optional<double> LightSideReach(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
-  Surroundings part = SurroundingsOf(photo, outline);
+  const Surroundings part = SurroundingsOf(photo, outline);
   if (part.photo.empty()) return std::nullopt;
-  if (part.photo.channels() > 1) {
-    cv::cvtColor(part.photo, part.photo, part.photo.channels() == 4 ? cv::COLOR_BGRA2GRAY : cv::COLOR_BGR2GRAY);
-  }
-  const SlantedEdge edge = LocateEdge(part.photo, part.outline, {Transfer::Kind::kLinear, 1});
+  const SlantedEdge edge = LocateEdge(GreyOf(part.photo), part.outline, {Transfer::Kind::kLinear, 1});
   // Nearer to the pixels' grid the spread is seen in too few places; steeper, the region may hold the chart's corner.
   constexpr double kLeastAngleDeg = 1.5;
   constexpr double kMostAngleDeg = 6.5;

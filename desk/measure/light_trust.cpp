@@ -16,14 +16,15 @@ namespace qv {
 
 namespace {
 
-constexpr int kSide = 8;  // pixels of a block, and the test's blocks of a region
+constexpr int kBlockSide = 8;    // pixels within which the scene is even, or nearly
+constexpr int kBlocksASide = 8;  // the test's, of a region
 
 // What the mean of linear light has of noise alone: within small blocks the scene is even, and the light of their mean
 // level is that without noise. Red, green, blue.
 cv::Vec3d LiftOf(const cv::Mat& pixels) {
   const Transfer srgb;
-  const cv::Size blocks(std::max(pixels.cols / kSide, 1), std::max(pixels.rows / kSide, 1));
-  const cv::Size block(std::min(pixels.cols, kSide), std::min(pixels.rows, kSide));
+  const cv::Size blocks(std::max(pixels.cols / kBlockSide, 1), std::max(pixels.rows / kBlockSide, 1));
+  const cv::Size block(std::min(pixels.cols, kBlockSide), std::min(pixels.rows, kBlockSide));
   const cv::Mat part = pixels(cv::Rect(0, 0, blocks.width * block.width, blocks.height * block.height));
   const double n = block.area();
   cv::Vec3d lift;
@@ -84,7 +85,7 @@ void TrustColour(const QVLightRegion& region, const std::vector<cv::Vec3d>& ligh
 
 // Means of the test's blocks.
 cv::Mat BlockMeans(const cv::Mat& grey) {
-  cv::Mat means(std::min(kSide, grey.rows), std::min(kSide, grey.cols), CV_64F);
+  cv::Mat means(std::min(kBlocksASide, grey.rows), std::min(kBlocksASide, grey.cols), CV_64F);
   for (int i = 0; i < means.rows; ++i) {
     for (int k = 0; k < means.cols; ++k) {
       const cv::Range rows(i * grey.rows / means.rows, (i + 1) * grey.rows / means.rows);

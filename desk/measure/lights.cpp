@@ -245,11 +245,11 @@ class LightFinding : public Finding {
       text += Format("%6zu %6d %6.1f %7.4f  %7s %7s %8s %7.1f %% %8.3f\n", i, r.label_, r.mean_grey_, r.xyz_[1],
                      ColourText("%.4f", r.chromaticity_[0]).c_str(), ColourText("%.4f", r.chromaticity_[1]).c_str(),
                      ColourText("%.0f K", r.cct_).c_str(), 100 * r.clipped_share_, r.uniformity_);
+      if (record.phase.Find("mean_grey")->uncertainties.empty()) continue;
       const auto plus = [&](const char* figure, const char* format, double unit = 1) {
         const std::vector<Uncertainty>& known = record.phase.Find(figure)->uncertainties;
         return i < known.size() ? Format(format, unit * known[i].expanded) : std::string("-");
       };
-      if (record.phase.Find("mean_grey")->uncertainties.empty()) continue;
       text += Format("%6s \u00b1 %4s %6s %7s  %7s %7s %8s %7s %% %8s\n", "", "", plus("mean_grey", "%.1f").c_str(),
                      plus("luminance", "%.4f").c_str(), plus("chromaticity_x", "%.4f").c_str(),
                      plus("chromaticity_y", "%.4f").c_str(), plus("cct", "%.0f K").c_str(),
