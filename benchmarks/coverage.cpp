@@ -307,6 +307,23 @@ Trial TrialOf(const Reading& reading, std::size_t i, double is, double scale) {
   return {reading.values[i] - is, reading.uncertainties[i].expanded, scale};
 }
 
+double GreyLevelOf(const cv::Scalar& mean) { return 0.299 * mean[0] + 0.587 * mean[1] + 0.114 * mean[2]; }
+
+// The darkest of 8 x 8 parts' means to the lightest.
+double UniformityOf(const cv::Mat& levels) {
+  double least = 1e9;
+  double most = 0;
+  for (int i = 0; i < 8; ++i) {
+    for (int k = 0; k < 8; ++k) {
+      const double grey = GreyLevelOf(cv::mean(levels(cv::Range(i * levels.rows / 8, (i + 1) * levels.rows / 8),
+                                                      cv::Range(k * levels.cols / 8, (k + 1) * levels.cols / 8))));
+      least = std::min(least, grey);
+      most = std::max(most, grey);
+    }
+  }
+  return least / most;
+}
+
 // Lights of some colour in light that falls off by none to 40 % across the photo; the second of six.
 std::vector<Trial> TryLights(const Condition& condition, cv::RNG& random) {
   SimulationOptions options = SceneOptions("lights", {600, 400}, condition.noise_percent, random.next());
@@ -328,21 +345,9 @@ std::vector<Trial> TryLights(const Condition& condition, cv::RNG& random) {
   const Json& r = regions[1];
   const cv::Mat levels = simulation.levels[0](cv::Rect(r[0], r[1], r[2], r[3]));
   cv::Vec3d light;
-  double least = 1e9;
-  double most = 0;
-  for (int i = 0; i < 8; ++i) {
-    for (int k = 0; k < 8; ++k) {
-      const cv::Scalar mean = cv::mean(levels(cv::Range(i * levels.rows / 8, (i + 1) * levels.rows / 8),
-                                              cv::Range(k * levels.cols / 8, (k + 1) * levels.cols / 8)));
-      const double grey = 0.299 * mean[0] + 0.587 * mean[1] + 0.114 * mean[2];
-      least = std::min(least, grey);
-      most = std::max(most, grey);
-    }
-  }
   for (const cv::Vec3f& bgr : cv::Mat_<cv::Vec3f>(levels)) {
     for (int k = 0; k < 3; ++k) light[k] += LightOf(bgr[2 - k]) / (255.0 * static_cast<double>(levels.total()));
   }
-  const cv::Scalar mean = cv::mean(levels);
   const cv::Matx33d xyz_from_rgb(0.4124, 0.3576, 0.1805, 0.2126, 0.7152, 0.0722, 0.0193, 0.1192, 0.9505);
   const cv::Vec3d xyz = xyz_from_rgb * light;
   std::vector<float> floats = {static_cast<float>(xyz[0]), static_cast<float>(xyz[1]), static_cast<float>(xyz[2])};
@@ -351,11 +356,11 @@ std::vector<Trial> TryLights(const Condition& condition, cv::RNG& random) {
   const auto trial = [&](const char* figure, double is, double scale) {
     return TrialOf(*record.phase.Find(figure), 1, is, scale);
   };
-  const double grey = 0.299 * mean[0] + 0.587 * mean[1] + 0.114 * mean[2];
+  const double grey = GreyLevelOf(cv::mean(levels));
   const double sum = xyz[0] + xyz[1] + xyz[2];
   return {trial("mean_grey", grey, grey),     trial("linear_red", light[0], light[0]),
           trial("luminance", xyz[1], xyz[1]), trial("chromaticity_x", xyz[0] / sum, xyz[0] / sum),
-          trial("cct", *kelvin, 6500),        trial("uniformity", least / most, 1)};
+          trial("cct", *kelvin, 6500),        trial("uniformity", UniformityOf(levels), 1)};
 }
 
 // A display in light that falls off, seen up to 20 degrees off; the truth of its means by the same rule, without noise.
