@@ -28,8 +28,8 @@ cv::Mat PrintedSheet(int shift, bool spoilt) {
   cv::Mat sheet(150, 200, CV_8UC3, cv::Scalar::all(230));
   cv::RNG random(3);
   for (int i = 0; i < 60; ++i) {
-    const cv::Point at(random.uniform(5, 190), random.uniform(5, 140));
-    const cv::Size size(random.uniform(3, 14), random.uniform(3, 14));
+    const cv::Point at{random.uniform(5, 190), random.uniform(5, 140)};
+    const cv::Size size{random.uniform(3, 14), random.uniform(3, 14)};
     cv::rectangle(sheet, {at + cv::Point(shift, shift), size}, cv::Scalar::all(random.uniform(0, 120)), cv::FILLED);
   }
   if (spoilt) cv::rectangle(sheet, {90, 60, 12, 9}, cv::Scalar::all(10), cv::FILLED);

@@ -42,7 +42,7 @@ TEST(Refine, ARoughMapBecomesAFineOne) {
   for (int i = 0; i < 12; ++i) {
     const double turn = random.uniform(-10.0, 10.0);
     const double scale = random.uniform(0.9, 1.1);
-    const cv::Point2d shift(random.uniform(-20.0, 20.0), random.uniform(-20.0, 20.0));
+    const cv::Point2d shift{random.uniform(-20.0, 20.0), random.uniform(-20.0, 20.0)};
     const cv::Mat truth = Motion(reference.size(), turn, scale, shift);
     cv::Mat photo = Photograph(reference, truth, i);
     cv::extractChannel(photo, photo, 0);

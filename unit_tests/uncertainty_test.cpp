@@ -105,7 +105,7 @@ TEST(Uncertainty, HoldsWhatACodecDoesToAPatch) {
     int within = 0;
     cv::RNG random(quality);
     for (int i = 0; i < kPatches; ++i) {
-      const cv::Vec3d truth(random.uniform(60.0, 200.0), random.uniform(60.0, 200.0), random.uniform(60.0, 200.0));
+      const cv::Vec3d truth{random.uniform(60.0, 200.0), random.uniform(60.0, 200.0), random.uniform(60.0, 200.0)};
       cv::Mat patch(64, 64, CV_32FC3);
       random.fill(patch, cv::RNG::NORMAL, cv::Scalar(truth[0], truth[1], truth[2]), cv::Scalar::all(2.5));
       patch.convertTo(patch, CV_8U);
