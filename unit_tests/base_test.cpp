@@ -11,6 +11,7 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <memory>
 #include <string>
 
 #include "desk/base/files.h"
@@ -190,6 +191,14 @@ TEST_F(Files, ANameIsTakenOverByAFileThatIsOnTheDisk) {
                              }),
               ::testing::ExitedWithCode(0), "");
   EXPECT_EQ(1U, Entries()) << "nothing is left beside it";
+}
+
+TEST_F(Files, AScratchFolderLivesAsLongAsItsOwner) {
+  auto owner = std::make_unique<ScratchFolder>();
+  const std::string path = owner->path();
+  WriteWholeFile(path + "/part", "x");
+  owner.reset();
+  EXPECT_FALSE(fs::exists(path));
 }
 
 TEST_F(Files, OutputsAreCheckedBeforeAnythingIsDone) {

@@ -33,6 +33,7 @@ TEST(FilmTime, StampsBecomeTimes) {
       {"a repeat", {0, 10, 10, 30}, {0, 10, 20, 30}, 1, 0, 100, 10},
       {"none usable", {0, 0, 0}, {0, third, 2 * third}, 2, 0, 30, third},
       {"the ticks of a bare stream", {0, 1 / 1200.0, 2 / 1200.0, 0}, {0, third, 2 * third, 3 * third}, 3, 0, 30, third},
+      {"9,500 a second", {0, 0.105, 0.21}, {0, 0.105, 0.21}, 0, 0, 2000 / 0.21, 0.105},
       {"no numbers", {nan, 10, nan, 30}, {0, 10, 20, 30}, 1, 0, 100, 10},
       {"even count of intervals", {0, 10, 22, 34, 44}, {0, 10, 22, 34, 44}, 0, 0, 4000 / 44.0, 12},
       {"from 30 to 15", {0, 1, 2, 3, 4, 6, 8}, {0, 1, 2, 3, 4, 6, 8}, 0, 2, 750, 2},

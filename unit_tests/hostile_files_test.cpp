@@ -172,8 +172,8 @@ TEST_F(Files, SizesOfExtendedWebPsAreReadInTheirOrder) {
   }
 }
 
-// Rows stored from the top are a height below 0; a big TIFF's numbers have eight bytes; a JPEG 2000's size is less its
-// origin.
+// Rows stored from the top are a height below 0; of the oldest BMPs numbers have two bytes, of a big TIFF eight; a
+// JPEG 2000's size is less its origin.
 TEST_F(Files, SizesAreReadWhereTheirFormatsKeepThem) {
   std::string bmp = ReadFile(folder_.Write("a.bmp", cv::Mat(9, 20, CV_8UC3, cv::Scalar(3))));
   EXPECT_EQ(1, LoadInto(17, folder_.Write("top.bmp", bmp.replace(22, 4, "\xF7\xFF\xFF\xFF"))));
@@ -189,8 +189,12 @@ TEST_F(Files, SizesAreReadWhereTheirFormatsKeepThem) {
     return "\xFF\x4F\xFF\x51" + number(41, 4, true) + number(40000, 4, true) + number(40000, 4, true) +
            number(origin, 4, true) + number(origin, 4, true);
   };
+  const std::string old_bmp =
+      "BM" + std::string(12, '\0') + number(12, 4, false) + number(20000, 2, false) + number(20000, 2, false);
   std::string reason;
   for (const auto& [file, expected] : {std::pair{tiff, "too many pixels"},
+                                       {old_bmp, "too many pixels"},
+                                       {std::string("P5\t20000\t20000\t255\n"), "too many pixels"},
                                        {jpeg_2000(9), "too many pixels"},
                                        {jpeg_2000(39990), "not an image that can be decoded"}}) {
     EXPECT_TRUE(QVResource::DecodePicture({file.begin(), file.end()}, reason).empty());

@@ -16,7 +16,8 @@ TEST(RobustMap, IsRightWhereThreeMatchesAreNot) {
   const cv::Mat scene = DrawScene(11, {420, 340}, 220);
   cv::RNG random(5);
   for (int i = 0; i < 5; ++i) {
-    cv::Mat truth = cv::getRotationMatrix2D({210, 170}, random.uniform(-10.0, 10.0), random.uniform(0.9, 1.1));
+    const double turn = random.uniform(-10.0, 10.0);
+    cv::Mat truth = cv::getRotationMatrix2D({210, 170}, turn, random.uniform(0.9, 1.1));
     truth.at<double>(0, 2) += random.uniform(-41.0, 41.0);
     truth.at<double>(1, 2) += random.uniform(-41.0, 41.0);
     cv::Mat image;
@@ -43,6 +44,15 @@ TEST(RobustMap, SaysWhyThereIsNoneOrItIsDoubtful) {
     EXPECT_THAT(map.doubt, HasSubstr(why));
     EXPECT_TRUE(map.matrix.empty());
   }
+  cv::Mat scattered = blank.clone();  // pieces that went each its own way
+  cv::RNG random(1);
+  for (int i = 0; i < 20; ++i) {
+    const cv::Point from{random.uniform(0, 396), random.uniform(0, 316)};
+    scene({from, cv::Size(24, 24)}).copyTo(scattered({{i % 5 * 84 + 20, i / 5 * 84 + 20}, cv::Size(24, 24)}));
+  }
+  const qv::RobustMap none = qv::FindRobustMap(tester, scene, scattered);
+  EXPECT_THAT(none.doubt, HasSubstr("matches agree with one map"));
+  EXPECT_TRUE(none.matrix.empty());
   cv::Mat corner = blank.clone();  // a few features agree; the rest is another picture
   DrawScene(13, {420, 340}, 220).copyTo(corner);
   scene(cv::Rect(0, 0, 110, 90)).copyTo(corner(cv::Rect(0, 0, 110, 90)));

@@ -85,6 +85,11 @@ TEST_F(VideoProgram, WhatIsNoFilmIsToldInASentence) {
   ExpectComplaint("video", 2, "a command is needed");
   ExpectComplaint("simulate --scene film-flash -o film.avi", 2, "a film is written as .mp4, .mkv or .mov");
   ExpectComplaint("simulate --scene film-flash -o film.mp4 --lost 0", 2, "only frames between the first and the last");
+  const std::filesystem::path broken = folder_.Write("ffmpeg", std::string("#!/bin/sh\nexit 1\n"));
+  std::filesystem::permissions(broken, std::filesystem::perms::owner_all);
+  const ProgramRun run = Run("simulate --scene film-flash --size 160x120 -o film.mp4", "PATH=\"$PWD:$PATH\" ");
+  EXPECT_EQ(4, run.status);
+  EXPECT_THAT(run.err, HasSubstr("film.mp4: ffmpeg could not encode the film"));
   EXPECT_EQ(0, Measured(Record("video preview photo.png photo.png"), "video_preview_difference_mean"));
 }
 
