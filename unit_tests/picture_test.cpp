@@ -111,6 +111,9 @@ TEST(Labels, FarOnesAreTiedToTheirThing) {
   labels.Keep(crowd);
   labels.Add(picture, {"a"}, {150, 100, 1, 1}, kGood);
   EXPECT_GT(cv::countNonZero(MaskOf(Decode(picture)(crowd), OnLabel(kGood), 60)), 30) << "a stroke over the crowd";
+  const cv::Rect2d all_but_below(0, 0, 300, 170);
+  labels.Keep(all_but_below);
+  EXPECT_EQ(0, (labels.Add(picture, {"b"}, {60, 40, 1, 1}, kGood) & all_but_below).area()) << "nowhere near is room";
 }
 
 // After an error cairo draws nothing more and says nothing: the picture would look finished.

@@ -86,6 +86,15 @@ SlantedEdge EdgeOf(const cv::Mat& region) {
                     {Transfer::Kind::kLinear, 1});
 }
 
+// Standard deviation of independent noise: of two normal values the median of |a - b| is 0.954 sigma.
+double NoiseBetweenNeighbours(const cv::Mat& noise) {
+  const cv::Mat_<double> steps = cv::abs(noise.colRange(1, noise.cols) - noise.colRange(0, noise.cols - 1));
+  std::vector<double> sorted(steps.begin(), steps.end());
+  const auto middle = sorted.begin() + static_cast<std::ptrdiff_t>(sorted.size() / 2);
+  std::nth_element(sorted.begin(), middle, sorted.end());
+  return *middle / 0.954;
+}
+
 // The region without its noise, as it lies in the photo, in levels.
 cv::Mat NoiselessRegion(const SlantedEdge& edge, const EdgeSpread& spread, double moved) {
   cv::Mat plain;
@@ -111,6 +120,18 @@ NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double
   if (std::fabs(found - value) <= tolerance * value) return {value, value, value, value};
   const auto [low, high] = std::minmax({value, moved(-kMoved), moved(kMoved)});
   return {value, low, high, read(NoiselessRegion(lit, SpreadOf(lit), 0))};
+}
+
+bool ShowsMoreThanEdge(const cv::Mat& region) {
+  constexpr double kTimesNoise = 3;
+  constexpr double kLeastNoise = 1.0 / 255;
+  const SlantedEdge edge = EdgeOf(region);
+  if (edge.reason != nullptr) return false;
+  const EdgeSpread spread = SpreadOf(edge);
+  if (spread.levels.empty()) return false;
+  const cv::Mat noise = edge.light - Noiseless(edge, spread);
+  const double rms = cv::norm(noise) / std::sqrt(static_cast<double>(noise.total()));
+  return rms > kTimesNoise * std::max(kLeastNoise, NoiseBetweenNeighbours(noise));
 }
 
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {

@@ -20,6 +20,10 @@ inline constexpr int kResamplings = 50;
 /// @return the uncertainty of `read(region)`; NaN where no edge is found.
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read);
 
+/// Whether the region holds more than one edge and noise, such as the edge's end: it lies off its edge spread by over
+/// three times what neighbouring pixels tell of noise. False where no edge is found.
+bool ShowsMoreThanEdge(const cv::Mat& region);
+
 struct NoiselessReading {
   double value;  // NaN where no edge is found
   double low,

@@ -47,6 +47,12 @@ std::string BrokenSentence(const Reading& m) {
   return m.info->name + ": outside " + (broken == 1 ? "its limit: " : "their limits: ") + text;
 }
 
+// What a limit asks for and a run did not give: without a standard, say, or with fewer places.
+std::string UnsetSentence(const Reading& m) {
+  if (!m.values.empty()) return m.info->name + ": the limits ask for " + m.info->figure->axis->name + "s that it lacks";
+  return m.info->name + ": the limits ask for it, and it was not measured; was it given what it compares with?";
+}
+
 bool AnyFinite(const std::vector<double>& values) {
   return std::any_of(values.begin(), values.end(), [](double value) { return std::isfinite(value); });
 }
@@ -110,6 +116,10 @@ void Record::Judge() {
     if (m.info->figure->axis != nullptr && m.outcome == Outcome::kFail) {
       Say(Remark::kWarning, "entries_broken", BrokenSentence(m), m.info->figure->name);
     }
+  }
+  if (!measured()) return;  // and that has been told
+  for (const Reading& m : phase.readings) {
+    if (m.outcome == Outcome::kUnset) Say(Remark::kWarning, "not_measured", UnsetSentence(m), m.info->figure->name);
   }
 }
 

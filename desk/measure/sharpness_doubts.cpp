@@ -61,10 +61,10 @@ Cause LightCause(bool oblique) {
                                    : "the light falls across it; light the chart evenly"};
 }
 
-// Of a difference that even light leaves.
+// Of a difference that even light leaves. What a region holds beside its edge is no noise, and no median helps.
 Cause NoiseCause(bool oblique, const SharpnessRegion& region, const std::function<double(const cv::Mat&)>& read,
                  double difference) {
-  if (oblique && !(ResampleEdge(region.pixels, read).expanded >= difference)) {
+  if (oblique && (ShowsMoreThanEdge(region.pixels) || !(ResampleEdge(region.pixels, read).expanded >= difference))) {
     return {Doubt::kOblique, "the chart is seen obliquely; face it straight on"};
   }
   return {Doubt::kNoise, "noise moved the reading; take several photos, and the median"};

@@ -127,7 +127,7 @@ std::optional<Picture> SharpnessFinding::Draw(const Record& record) const {
   Picture picture(cvRound(whole), cvRound(height + top));
   heading.Draw(picture);
   const PhotoPlace place = picture.PlacePhoto(photo, {0, top}, scale);
-  Labels labels({0, top, measured ? width : whole, measured ? photo.rows * scale : height});
+  Labels labels({0, top, measured ? width : whole, height});  // below a low photo is room beside the plots
   std::vector<cv::Rect2d> boxes;
   for (std::size_t i = 0; i < regions.size(); ++i) {
     std::vector<cv::Point2d> outline;
