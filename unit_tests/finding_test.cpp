@@ -138,6 +138,11 @@ TEST(Finding, MatchesThatTheMapExplainsAreOfAnotherColour) {
   EXPECT_GT(Count(Drawn(record), {0, 60, 960, 400}, OnLabel(kPoor)), 1000);
 }
 
+TEST(Finding, LargePhotosAreDrawnSmaller) {
+  const cv::Mat photo(100, 2400, CV_8UC3, cv::Scalar::all(90));
+  EXPECT_EQ(1200, Drawn(MeasureAnew({"camera_flash", {photo}})).cols);
+}
+
 // The map's lightest colour stands at the top of its bar, beside the largest difference as a number.
 TEST(Finding, ADifferenceMapHasABarWithNumbers) {
   cv::Mat first(240, 320, CV_8UC3, cv::Scalar::all(100));

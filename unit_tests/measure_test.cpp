@@ -80,6 +80,14 @@ TEST(Measure, PropertiesAreSetByIndexOrNameAndStoredOnce) {
   EXPECT_THAT(miss.MissSentence(), HasSubstr("tried: property 86"));
 }
 
+TEST(Measure, LightThatFallsAcrossTheEdgesIsTheCauseThatIsNamed) {
+  cv::Mat photo = DrawChart({3, 3, 0.09, {800, 800}, 0.8});
+  photo.forEach<cv::Vec3b>([](cv::Vec3b& pixel, const int* at) { pixel *= 1 - 0.6 * (at[0] + at[1]) / 1600; });
+  std::vector<std::string> said;
+  for (const Remark& remark : MeasureAnew({"camera_autofocus", {photo}}).remarks) said.emplace_back(remark.name());
+  EXPECT_THAT(said, ::testing::ElementsAre("uneven_light"));
+}
+
 TEST(Measure, RequestsThatCantBeRunAreRefusedInASentence) {
   const std::vector<Input> photo = {Input("photo.png")};
   for (const auto& [request, complaint] : {

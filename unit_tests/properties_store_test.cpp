@@ -3,7 +3,9 @@
 #include <unistd.h>
 
 #include <filesystem>
+#include <opencv2/imgcodecs.hpp>
 
+#include "platform/jpeg.h"
 #include "platform/properties.h"
 #include "qvtester/host_properties.h"
 #include "unit_tests/drawing.h"
@@ -93,6 +95,18 @@ TEST_F(Store, WhatIsNotItsOwnIsNoStore) {
     EXPECT_GT(0, platform::property_set("k", "other"));
   }
   EXPECT_EQ("own", ReadFile(path_ + "/k"));
+}
+
+// The fast road, which damaged files and those of other colours leave to OpenCV.
+TEST(Jpeg, SoundOnesNeedNoOtherDecoder) {
+  cv::Mat picture(16, 24, CV_8UC3, cv::Scalar(200, 90, 30));
+  std::vector<unsigned char> file;
+  cv::imencode(".jpg", picture, file);
+  const cv::Mat decoded = platform::DecodeSoundJpeg(file);
+  ASSERT_EQ(picture.size(), decoded.size());
+  EXPECT_EQ(0, cv::norm(cv::imdecode(file, cv::IMREAD_COLOR), decoded, cv::NORM_INF));
+  file.resize(file.size() - 8);
+  EXPECT_TRUE(platform::DecodeSoundJpeg(file).empty());
 }
 
 }  // namespace

@@ -15,7 +15,7 @@ TEST(RobustMap, IsRightWhereThreeMatchesAreNot) {
   QVTester tester;
   const cv::Mat scene = DrawScene(11, {420, 340}, 220);
   cv::RNG random(5);
-  for (int i = 0; i < 5; ++i) {
+  for (int i = 0; i < 4; ++i) {
     const double turn = random.uniform(-10.0, 10.0);
     cv::Mat truth = cv::getRotationMatrix2D({210, 170}, turn, random.uniform(0.9, 1.1));
     truth.at<double>(0, 2) += random.uniform(-41.0, 41.0);
@@ -33,6 +33,11 @@ TEST(RobustMap, IsRightWhereThreeMatchesAreNot) {
     EXPECT_GT(map.agreeing, 50);
     EXPECT_LT(map.residual_px, 1.5);
   }
+  cv::Mat large(1000, 1600, CV_8UC1, cv::Scalar(128));  // is shrunk to be searched
+  scene.copyTo(large({{900, 500}, scene.size()}));
+  const qv::RobustMap map = qv::FindRobustMap(tester, scene, large);
+  EXPECT_EQ("", map.doubt);
+  EXPECT_LT(qv::MapDistance((cv::Mat_<double>(2, 3) << 1, 0, 900, 0, 1, 500), map.matrix, scene.size()), 0.1);
 }
 
 TEST(RobustMap, SaysWhyThereIsNoneOrItIsDoubtful) {

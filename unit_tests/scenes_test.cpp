@@ -2,12 +2,16 @@
 
 #include <gtest/gtest.h>
 
+#include <cmath>
+#include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
 
 #include "desk/scenes/display.h"
 #include "desk/scenes/lights.h"
 #include "desk/scenes/print.h"
 #include "desk/scenes/targets.h"
+#include "desk/simulation/camera.h"
+#include "desk/simulation/photo_file.h"
 #include "desk/simulation/simulation.h"
 
 namespace qv {
@@ -18,6 +22,31 @@ cv::Size2d Extent(const FilledShape& shape) {
   std::vector<cv::Point2f> outline(shape.outline.begin(), shape.outline.end());
   const cv::RotatedRect box = cv::minAreaRect(outline);
   return {std::max(box.size.width, box.size.height), std::min(box.size.width, box.size.height)};
+}
+
+TEST(PhotoFiles, KeepEveryLevel) {
+  cv::Mat photo(31, 47, CV_16UC3);
+  cv::randu(photo, 0, 65536);
+  cv::Mat eight;
+  photo.convertTo(eight, CV_8U, 1 / 257.0);
+  for (const auto& [name, levels] :
+       {std::pair{"a.png", eight}, {"a.tif", eight}, {"a.bmp", eight}, {"a.png", photo}, {"a.tif", photo}}) {
+    const std::string file = EncodePhoto(levels, {name});
+    const cv::Mat back = cv::imdecode(std::vector<char>(file.begin(), file.end()), cv::IMREAD_UNCHANGED);
+    ASSERT_EQ(levels.type(), back.type()) << name;
+    EXPECT_EQ(0, cv::norm(levels, back, cv::NORM_INF)) << name;
+  }
+}
+
+// Of a well of one electron, a level is as many electrons as it is shares of 255.
+TEST(Camera, ShotNoiseIsThatOfTheSmallestWellToo) {
+  CameraModel camera;
+  camera.full_well = 1;
+  cv::Mat levels(100, 100, CV_32FC3, cv::Scalar::all(100));
+  cv::RNG random(1);
+  AddNoise(camera, levels, random);
+  EXPECT_NEAR(std::sqrt(100 * 255.0),
+              cv::norm(levels, cv::Mat(levels.size(), levels.type(), cv::Scalar::all(100))) / std::sqrt(3e4), 3);
 }
 
 TEST(Scenes, LightsStandInRowsAndColumns) {

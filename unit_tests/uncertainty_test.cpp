@@ -11,6 +11,7 @@
 #include "desk/measure/codec_steps.h"
 #include "desk/measure/decision.h"
 #include "desk/measure/edge_resampling.h"
+#include "desk/measure/film_trust.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/patch_trust.h"
 #include "desk/measure/trust_table.h"
@@ -44,6 +45,28 @@ TEST(Uncertainty, MeansMediansAndErrors) {
   for (int i = 1; i <= 99; ++i) errors.push_back(i % 2 == 0 ? i : -i);
   EXPECT_DOUBLE_EQ(95, FromErrors(errors, kResamplingMethod).expanded);  // a hundredth error exceeds it 5 times in 100
   EXPECT_TRUE(std::isinf(FromErrors({1, NAN}, kResamplingMethod).expanded));
+}
+
+// The median of n frames scatters by sqrt(pi / 2n) of one, and those of the pulse tell nothing of the base; colours of
+// whole levels, off by up to one, come on top of either.
+TEST(Uncertainty, AFlashsBaseIsThatOfItsQuietFrames) {
+  Phase phase;
+  phase.name = "video_flash";
+  cv::RNG random(4);
+  std::vector<double> time;
+  std::vector<double> mean;
+  for (int i = 0; i < 90; ++i) {
+    time.push_back(33.0 * i);
+    mean.push_back((i < 25 || i >= 65 ? 40 : 200) + random.gaussian(8));
+  }
+  for (const auto& [name, value] : {std::pair{"peak", 200.0}, {"peak_frame", 45.0}, {"base", 40.0}, {"width", 1320.0}})
+    phase.Add(name, value);
+  phase.Add("mean", time, mean);
+  TrustFlash(phase, time);
+  const auto noise = [&](const char* name) {
+    return std::pow(phase.Find(name)->uncertainties[0].standard, 2) - 1 / 3.0;
+  };
+  EXPECT_NEAR(CV_PI / 2 / 50, noise("base") / noise("mean"), 1e-6);
 }
 
 TEST(Uncertainty, PixelsTellTheirNoiseWhateverTheLight) {

@@ -175,7 +175,7 @@ TEST_F(WrongUses, HelpFitsATerminalAndTellsRanges) {
   }
   EXPECT_GT(commands.size(), 30U);
   ASSERT_EQ(0, Run({"autofocus", "--help"}));
-  EXPECT_THAT(Said(), HasSubstr("[125; 0 to 255]"));
+  EXPECT_THAT(Said(), AllOf(HasSubstr("[125; 0 to 255]"), HasSubstr("--set PROPERTY=VALUE")));
   ASSERT_EQ(0, Run({"simulate", "--help"}));
   EXPECT_THAT(Said(), AllOf(HasSubstr("phone: 0.8; 0 to 0.99]"), HasSubstr("; auto, none or srgb]")));
 }
