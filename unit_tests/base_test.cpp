@@ -21,6 +21,7 @@
 #include "desk/base/memory_file.h"
 #include "desk/base/text.h"
 #include "unit_tests/drawing.h"
+#include "unit_tests/sentence.h"
 
 // Stands in for the system's: what the written file was called when it was flushed, and whether that works.
 static std::function<int(int)> flush = [](int) { return 0; };
@@ -32,15 +33,6 @@ namespace {
 
 namespace fs = std::filesystem;
 using ::testing::HasSubstr;
-
-std::string Sentence(const std::function<void()>& call) {
-  try {
-    call();
-  } catch (const Failure& failure) {
-    return failure.what();
-  }
-  return "no failure";
-}
 
 struct Refused {
   std::string text, sentence;

@@ -17,6 +17,7 @@
 #include "desk/batch/batch.h"
 #include "desk/batch/worker.h"
 #include "unit_tests/drawing.h"
+#include "unit_tests/sentence.h"
 
 namespace qv {
 
@@ -25,15 +26,6 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::EndsWith;
 using ::testing::HasSubstr;
-
-std::string Sentence(const std::function<void()>& call) {
-  try {
-    call();
-  } catch (const Failure& failure) {
-    return failure.what();
-  }
-  return "no failure";
-}
 
 TEST(Plans, WhatCantBeRunAsItStandsIsRefused) {
   const TemporaryFolder folder;

@@ -84,7 +84,7 @@ TEST(Picture, WordsStandInTheColourOfTheirToneOnTheirGround) {
     EXPECT_NEAR(10 + WidthOf("MMMM", 30) + 12, badge.Badge("MMMM", {10, 40}, 30, row.tone), 1e-6);
     EXPECT_GT(Count(Decode(badge), row.on_paper), 1000) << row.name;
   }
-  const std::vector<std::string> lines = Wrapped("the words of a long sentence, in lines", 14, 100);
+  const std::vector<std::string> lines = Wrapped("the words of a long sentence, in lines", 14.0, 100.0);
   EXPECT_GE(lines.size(), 3U);
   for (const std::string& line : lines) EXPECT_LE(WidthOf(line, 14), 100) << line;
 }
