@@ -242,6 +242,7 @@ int main() {
     qv::CompareWithItsParts(jobs);
     qv::CompareWorkers(jobs);
     qv::WatchMemory(folder);
+    return 0;
   } catch (const std::exception& e) {
     std::fprintf(stderr, "%s\n", e.what());
     return 1;

@@ -31,7 +31,7 @@ namespace {
 constexpr double kBlurs[] = {0.3, 0.5, 0.8, 1.2, 2.0, 3.0};
 
 // An upright region, as large as in an upright photo of 12 or 2 megapixels, and what happens to it.
-struct Setting {
+struct EdgeSetting {
   const char* name;
   int rows = 650, columns = 225, jpeg = 0;
   bool srgb = false;
@@ -42,7 +42,7 @@ struct Setting {
 };
 // From the sRGB rows on there is noise of half a level, as in every photo: without any, a plateau is rounded as a
 // whole, by up to half a level, which alone is up to 1 % of MTF50.
-constexpr Setting kSettings[] = {
+constexpr EdgeSetting kEdgeSettings[] = {
     {"12 MP", 650, 225, 0, false, 0, 5, 0, 0, 0, "iso_plain"},
     {"12 MP, noise 2 %", 650, 225, 0, false, 2, 5, 0, 0, 0, "iso_noisy"},
     {"12 MP, noise 5 %", 650, 225, 0, false, 5, 5, 0, 0, 0, "iso_very_noisy"},
@@ -156,7 +156,7 @@ double MeasureVigra(const cv::Mat& stored, const Transfer& transfer, double smoo
 }
 #endif
 
-cv::Mat ThroughJpeg(const cv::Mat& gray, int quality) {
+cv::Mat GreyThroughJpeg(const cv::Mat& gray, int quality) {
   cv::Mat photo;
   cv::cvtColor(gray, photo, cv::COLOR_GRAY2BGR);
   std::vector<uchar> file;
@@ -167,7 +167,7 @@ cv::Mat ThroughJpeg(const cv::Mat& gray, int quality) {
 }
 
 // One photo of many: slopes from 3 to 8 degrees, either way.
-EdgePhoto View(const Setting& setting, double sigma_px, int index, int photos, cv::RNG& random) {
+EdgePhoto View(const EdgeSetting& setting, double sigma_px, int index, int photos, cv::RNG& random) {
   EdgePhoto view;
   view.size = {setting.columns, setting.rows};
   view.through = {setting.columns / 2.0 + random.uniform(-2.0, 2.0), setting.rows / 2.0};
@@ -181,7 +181,7 @@ EdgePhoto View(const Setting& setting, double sigma_px, int index, int photos, c
   return view;
 }
 
-cv::Mat Photograph(const Setting& setting, const EdgePhoto& view, cv::RNG& random) {
+cv::Mat Photograph(const EdgeSetting& setting, const EdgePhoto& view, cv::RNG& random) {
   cv::Mat levels = DrawEdgePhoto(view);
   if (setting.srgb) levels = EncodeSrgb(levels);
   cv::Mat noise(levels.size(), CV_32F);
@@ -189,7 +189,7 @@ cv::Mat Photograph(const Setting& setting, const EdgePhoto& view, cv::RNG& rando
   levels += noise;
   cv::Mat stored;
   levels.convertTo(stored, CV_8U);
-  return setting.jpeg == 0 ? stored : ThroughJpeg(stored, setting.jpeg);
+  return setting.jpeg == 0 ? stored : GreyThroughJpeg(stored, setting.jpeg);
 }
 
 struct Errors {
@@ -197,7 +197,7 @@ struct Errors {
   int none = 0;
 };
 
-Errors Measure(const Method& method, const Setting& setting, double sigma_px, int photos) {
+Errors Measure(const Method& method, const EdgeSetting& setting, double sigma_px, int photos) {
   cv::RNG random(2024);
   Errors errors;
   for (int i = 0; i < photos; ++i) {
@@ -219,7 +219,7 @@ Errors Measure(const Method& method, const Setting& setting, double sigma_px, in
 }
 
 // Answers the largest size of the mean error at a blur that is promised.
-double PrintRow(const char* name, const Method& method, const Setting& setting, int photos) {
+double PrintRow(const char* name, const Method& method, const EdgeSetting& setting, int photos) {
   std::printf("| %s | %s |", setting.name, name);
   double largest = 0;
   for (const double sigma_px : kBlurs) {
@@ -235,13 +235,13 @@ double PrintRow(const char* name, const Method& method, const Setting& setting, 
   return largest;
 }
 
-void Run() {
+void PrintIso() {
   const int photos = Trials(50, 12);
   std::printf("MTF50 by ISO 12233: mean error, mean and largest size of it, percent, of %d photos, by blur in px\n\n",
               photos);
   std::printf("| region | by | 0.3 | 0.5 | 0.8 | 1.2 | 2.0 | 3.0 |\n|---|---|---|---|---|---|---|---|\n");
   std::map<std::string, double> largest;  // by promise
-  for (const Setting& setting : kSettings) {
+  for (const EdgeSetting& setting : kEdgeSettings) {
     // Noise of 5 % moves readings of small regions by 4 %: their mean takes more of them.
     const bool noisy = setting.noise_percent > 1;
     if (noisy && setting.rows < 650 && Trials(1, 0) == 0) continue;
@@ -267,6 +267,6 @@ void Run() {
 int main(int count, char** arguments) {
   std::vector<std::string> words(arguments + 1, arguments + count);
   TakeCheckOptions(words);
-  qv::Run();
+  qv::PrintIso();
   return AllKept() ? 0 : 1;
 }

@@ -26,7 +26,7 @@ struct Try {
   cv::Mat Photo() const { return Sense(options.camera, Simulate(options).levels[0], 8); }
 };
 
-struct Fault {
+struct ChartFault {
   const char* name;
   std::vector<MissCause> causes;  // that are true of it
   std::function<cv::Mat(Try&)> photo;
@@ -73,9 +73,9 @@ cv::Mat Covered(Try& t) {
   return photo;
 }
 
-const std::vector<Fault>& Faults() {
+const std::vector<ChartFault>& ChartFaults() {
   using C = MissCause;
-  static const std::vector<Fault> faults = {
+  static const std::vector<ChartFault> faults = {
       {"blur, sigma 4 to 12 px",
        {C::kBlur},
        [](Try& t) {
@@ -133,7 +133,7 @@ struct Outcome {
   std::string told;
 };
 
-Outcome Look(const Fault& fault, int trial, int trials) {
+Outcome Look(const ChartFault& fault, int trial, int trials) {
   Try t;
   t.random = cv::RNG(trial + 1);
   t.degree = (trial + 0.5) / trials;
@@ -165,7 +165,7 @@ void Run(bool show) {
       "varied\n\n",
       trials);
   std::printf("| fault | missed | true reason told first | a threshold suggested |\n|---|---|---|---|\n");
-  for (const Fault& fault : Faults()) {
+  for (const ChartFault& fault : ChartFaults()) {
     std::array<int, 3> counts = {};
     std::vector<Outcome> outcomes(trials);
     ForEachTrial(trials, [&](int trial) { outcomes[trial] = Look(fault, trial, trials); });

@@ -17,11 +17,11 @@ namespace {
 
 constexpr double kLight = 200;  // level in the middle
 
-struct Setting {
+struct SpotSetting {
   double noise;    // of 255, or of the light where it is 255
   double shading;  // at the corners
 };
-constexpr Setting kSettings[] = {{0.005, 0}, {0.005, 0.5}, {0.01, 0}, {0.01, 0.5}, {0.03, 0}, {0.03, 0.5}};
+constexpr SpotSetting kSpotSettings[] = {{0.005, 0}, {0.005, 0.5}, {0.01, 0}, {0.01, 0.5}, {0.03, 0}, {0.03, 0.5}};
 constexpr double kDiameters[] = {3, 6, 12, 40, 100, 300};
 constexpr double kTimesNoise[] = {9, 12, 20};  // contrast times the root of the pixels, over the noise
 
@@ -64,7 +64,7 @@ struct Count {
   double contrast_error = 0, diameter_error = 0;  // sums of relative errors
 };
 
-Count Try(const Setting& setting, double diameter, double times, bool soft, int photos) {
+Count Try(const SpotSetting& setting, double diameter, double times, bool soft, int photos) {
   Count count;
   const bool large = diameter > 100;
   if (large && Trials(1, 0) == 0) return count;
@@ -103,7 +103,7 @@ struct Totals {
   Count nine, all;
 };
 
-void PrintRow(const Setting& setting, bool soft, int photos, Totals& totals) {
+void PrintRow(const SpotSetting& setting, bool soft, int photos, Totals& totals) {
   std::vector<Count> counts(std::size(kDiameters) * std::size(kTimesNoise));
   cv::parallel_for_(cv::Range(0, static_cast<int>(counts.size())), [&](const cv::Range& range) {
     for (int i = range.start; i < range.end; ++i)
@@ -130,21 +130,21 @@ int FalseOnes(cv::Size size, int photos) {
   std::atomic<int> count = 0;
   cv::parallel_for_(cv::Range(0, photos), [&](const cv::Range& range) {
     for (int i = range.start; i < range.end; ++i) {
-      const Setting& setting = kSettings[i % std::size(kSettings)];
+      const SpotSetting& setting = kSpotSettings[i % std::size(kSpotSettings)];
       count += static_cast<int>(FindSpots(Sensed(Plain(size, setting.shading), setting.noise, i + 1)).spots.size());
     }
   });
   return count;
 }
 
-void Run() {
+void PrintSpots() {
   std::printf(
       "Dark spots found, percent; in each cell for contrast times the root of the pixels 9, 12 and 20 times the "
       "noise\n\n| noise | shading | spots |");
   for (const double diameter : kDiameters) std::printf(" %g px |", diameter);
   std::printf("\n|---|---|---|---|---|---|---|---|---|\n");
   Totals totals;
-  for (const Setting& setting : kSettings) {
+  for (const SpotSetting& setting : kSpotSettings) {
     for (const bool soft : {false, true}) PrintRow(setting, soft, Trials(10, 1), totals);
   }
   const int photos = Trials(60, 2);
@@ -164,6 +164,6 @@ void Run() {
 int main(int count, char** arguments) {
   std::vector<std::string> words(arguments + 1, arguments + count);
   TakeCheckOptions(words);
-  qv::Run();
+  qv::PrintSpots();
   return AllKept() ? 0 : 1;
 }
