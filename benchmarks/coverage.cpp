@@ -1,7 +1,7 @@
 // Whether uncertainties keep their word: simulated readings of known truth, and the share of them whose true value lies
 // within the expanded uncertainty. 95 in 100 is meant, 93 to 97 is promised.
 //   coverage_accuracy [--check] [--quick] [NUMBER] [WORD...]     --quick: 12 readings a row in place of 1000, of
-//   fewer conditions; NUMBER: so many readings a row; of rows that hold all words
+//   fewer conditions; NUMBER: so many readings a row; of rows that hold all words, or one of a WORD|WORD
 
 #include <algorithm>
 #include <array>
@@ -17,12 +17,14 @@
 #include <opencv2/core/utility.hpp>
 #include <opencv2/imgcodecs.hpp>
 #include <opencv2/imgproc.hpp>
+#include <sstream>
 #include <string>
 #include <vector>
 
 #include "benchmarks/pairs.h"
 #include "benchmarks/trials.h"
 #include "desk/measure/cielab.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/edge_resampling.h"
 #include "desk/measure/iso_mtf.h"
 #include "desk/measure/legs.h"
@@ -79,6 +81,14 @@ cv::Mat ThroughJpeg(const cv::Mat& photo, int quality) {
   return cv::imdecode(file, photo.channels() == 1 ? cv::IMREAD_GRAYSCALE : cv::IMREAD_COLOR);
 }
 
+// A photo as the measurements take it: a picture, or a JPEG file's content, whose tables tell how it rounds.
+Input AsInput(const Condition& condition, const cv::Mat& photo) {
+  if (condition.jpeg == 0) return {photo};
+  std::vector<uchar> file;
+  cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, condition.jpeg});
+  return {"photo.jpg", std::string(file.begin(), file.end())};
+}
+
 struct Edge {
   EdgePhoto view;
   cv::Mat levels;  // CV_32F, as the camera encodes them, without noise
@@ -119,11 +129,14 @@ std::vector<Trial> TryIso(const Condition& condition, cv::RNG& random) {
   const Edge edge = DrawTrial(condition, random);
   const cv::Mat photo = Photograph(condition, edge.levels, condition.noise_percent, random);
   const cv::Point2d middle((photo.cols - 1) / 2.0, (photo.rows - 1) / 2.0);
-  const IsoMtf iso = MeasureIsoMtf(
-      photo, TurnedRectangle(middle, condition.rows, condition.columns, condition.turn_deg), TransferOf(condition));
+  const auto region = TurnedRectangle(middle, condition.rows, condition.columns, condition.turn_deg);
+  const IsoMtf iso = MeasureIsoMtf(photo, region, TransferOf(condition));
+  const CodecSteps codec = condition.jpeg == 0 ? CodecSteps() : StepsOf(AsInput(condition, photo));
+  const IsoFigures again = MeasureCodedAgain(photo, region, TransferOf(condition), codec);
   std::vector<Trial> trials;
   const auto add = [&](double IsoFigures::*figure, double truth) {
-    trials.push_back({iso.figures.*figure - truth, UncertaintyOf(iso, figure).expanded, truth});
+    trials.push_back({iso.figures.*figure - truth,
+                      UncertaintyOf(iso, figure, condition.jpeg == 0 ? nullptr : &again).expanded, truth});
   };
   for (const auto& [figure, level] :
        {std::pair(&IsoFigures::mtf50, 0.5), {&IsoFigures::mtf30, 0.3}, {&IsoFigures::mtf10, 0.1}}) {
@@ -292,14 +305,6 @@ std::vector<Trial> TrySpots(const Condition& condition, cv::RNG& random) {
     break;
   }
   return trials;
-}
-
-// A photo as the measurements take it: a picture, or a JPEG file's content, whose tables tell how it rounds.
-Input AsInput(const Condition& condition, const cv::Mat& photo) {
-  if (condition.jpeg == 0) return {photo};
-  std::vector<uchar> file;
-  cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, condition.jpeg});
-  return {"photo.jpg", std::string(file.begin(), file.end())};
 }
 
 Trial TrialOf(const Reading& reading, std::size_t i, double is, double scale) {
@@ -668,8 +673,8 @@ constexpr char kJumps[] = "U is rather too wide: readings jump";
 constexpr char kRim[] = "its rim counts as noise";
 constexpr char kSharp[] = "only sharp spots are found";
 constexpr Miss kMisses[] = {
-    {"MTF30 ISO", "JPEG 75", "the codec's steps take high frequencies"},
-    {"MTF10 ISO", "JPEG 75", "the codec's steps take high frequencies"},
+    {"MTF10 ISO", "JPEG 75", "the codec's steps take more the first time than the second"},
+    {"edge width", "JPEG 75", kTooWide},
     {"MTF50 of the test", "noise 0.3 %", kJumps},
     {"MTF50 of the test", "noise 5 %", kJumps},
     {"clipped share", "noise 0.3 %", kRim},
@@ -690,7 +695,7 @@ const char* WhyMissed(const Group& group, const char* figure, const Condition& c
   if (group.run == TryPreview && condition.jpeg != 0) return kTooWide;
   if (group.run == TryPrint) return kTooWide;
   if (group.run == TryDisplay) return "straightening";
-  if (group.run == TryMarks && condition.blur > 1.5) return "the frame shines into the inner square";
+  if (group.run == TryMarks && condition.blur > 1.5) return "the frame shines into the module";
   if (group.run == TrySpots && condition.jpeg != 0) return "the codec takes noise and faint spots";
   if (group.run == TryPatch && condition.jpeg == 75) return kTooWide;
   for (const Miss& miss : kMisses) {
@@ -761,8 +766,13 @@ int main(int count, char** arguments) {
               trials);
   std::printf("|---|---|---|---|---|---|\n");
   const auto wanted = [&](const std::string& row) {
-    return std::all_of(words.begin(), words.end(),
-                       [&](const std::string& word) { return row.find(word) != std::string::npos; });
+    return std::all_of(words.begin(), words.end(), [&](const std::string& word) {
+      std::istringstream either(word);
+      for (std::string one; std::getline(either, one, '|');) {
+        if (row.find(one) != std::string::npos) return true;
+      }
+      return false;
+    });
   };
   cv::Vec2d within;
   for (const qv::Group& group : qv::kGroups) {

@@ -121,6 +121,28 @@ TEST(Uncertainty, AFileTellsByHowMuchItsCodecRounds) {
   EXPECT_EQ(0, StepsOf(folder.Path("nowhere.jpg")).luma);
 }
 
+TEST(Uncertainty, ACodecLetLooseOnItsOwnBlocksChangesNothing) {
+  cv::Mat photo(96, 96, CV_8UC1);
+  cv::randu(photo, 60, 200);
+  std::vector<uchar> file;
+  cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, 50});
+  const CodecSteps codec = StepsOf(Input("photo.jpg", std::string(file.begin(), file.end())));
+  const std::array<std::tuple<int, int, float>, 4> known = {{{0, 1, 11}, {1, 0, 12}, {0, 7, 61}, {7, 0, 72}}};
+  for (const auto& [row, column, step] : known) EXPECT_EQ(step, codec.luma_table(row, column));  // T.81, table K.1
+  const cv::Mat coded = cv::imdecode(file, cv::IMREAD_GRAYSCALE);
+  const auto changed = [&](const cv::Rect& part) {  // by more than what rounding to levels may
+    return cv::countNonZero(cv::abs(CodedAgain(coded(part), cv::Rect({}, part.size()), codec) - coded(part)) > 3);
+  };
+  EXPECT_EQ(0, changed({4, 4, 64, 64}));  // half-way between the part's blocks are the file's own
+  EXPECT_LT(1000, changed({0, 0, 64, 64}));
+}
+
+TEST(Uncertainty, AKnownErrorMovesTheIntervalToOneSide) {
+  const Uncertainty about = Combined(1, 3, 0, kBandsMethod);
+  EXPECT_DOUBLE_EQ(about.expanded, OffBy(0, about, 3).expanded);
+  EXPECT_NEAR(20 + 2.353, OffBy(-20, about, 3).expanded, 0.002);  // Student's 95 % quantile, of one side
+}
+
 TEST(Uncertainty, HoldsWhatACodecDoesToAPatch) {
   const auto blue_to_yellow = [](const cv::Vec3d& rgb) { return OwnLab(rgb)[2]; };
   for (const int quality : {95, 90, 75, 50}) {

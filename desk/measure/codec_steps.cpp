@@ -1,6 +1,8 @@
 #include "desk/measure/codec_steps.h"
 
 #include <algorithm>
+#include <array>
+#include <cmath>
 #include <fstream>
 #include <sstream>
 #include <vector>
@@ -9,18 +11,39 @@ namespace qv {
 
 namespace {
 
+constexpr int kBlock = 8;
 constexpr double kRootOfBlock = 8;  // a block's first coefficient is eight times its mean
 
-// A table's first entry: 8 bits, or 16.
+// Tables stand in a zigzag from the lowest frequencies to the highest (T.81, figure 5).
+std::array<cv::Point, kBlock * kBlock> Zigzag() {
+  std::array<cv::Point, kBlock * kBlock> order;
+  std::size_t n = 0;
+  for (int sum = 0; sum <= 2 * (kBlock - 1); ++sum) {
+    for (int i = std::max(0, sum - kBlock + 1); i <= std::min(sum, kBlock - 1); ++i) {
+      order.at(n++) = sum % 2 == 0 ? cv::Point(i, sum - i) : cv::Point(sum - i, i);
+    }
+  }
+  return order;
+}
+
+// Entries of 8 bits, or of 16.
 void TakeTables(const std::vector<unsigned char>& tables, CodecSteps& steps) {
   for (std::size_t at = 0; at + 1 < tables.size();) {
     const bool wide = tables[at] >> 4 != 0;
     const int number = tables[at] & 15;
     const std::size_t size = 1 + (wide ? 128 : 64);
     if (at + size > tables.size()) return;
-    const double first = wide ? 256 * tables[at + 1] + tables[at + 2] : tables[at + 1];
-    if (number == 0) steps.luma = first / kRootOfBlock;
-    if (number == 1) steps.chroma = first / kRootOfBlock;
+    const auto entry = [&](std::size_t i) {
+      return wide ? 256.0 * tables[at + 1 + 2 * i] + tables[at + 2 + 2 * i] : 1.0 * tables[at + 1 + i];
+    };
+    if (number == 0) {
+      steps.luma = entry(0) / kRootOfBlock;
+      const auto order = Zigzag();
+      for (std::size_t i = 0; i < order.size(); ++i) {
+        steps.luma_table(order.at(i).y, order.at(i).x) = static_cast<float>(entry(i));
+      }
+    }
+    if (number == 1) steps.chroma = entry(0) / kRootOfBlock;
     at += size;
   }
 }
@@ -71,6 +94,29 @@ CodecSteps StepsAtQuality(int quality) {
   const int scale = quality < 50 ? 5000 / std::max(quality, 1) : 200 - 2 * quality;
   const auto first = [scale](int entry) { return std::clamp((entry * scale + 50) / 100, 1, 255) / kRootOfBlock; };
   return {first(kFirstOfLuma), first(kFirstOfChroma)};
+}
+
+cv::Mat CodedAgain(const cv::Mat& photo, const cv::Rect& part, const CodecSteps& codec) {
+  cv::Mat again = photo(part).clone();
+  if (codec.luma == 0) return again;
+  const auto start = [](int first) { return (first + kBlock / 2) / kBlock * kBlock + kBlock / 2 - first; };
+  cv::Mat_<float> block(kBlock, kBlock);
+  for (int top = start(part.y); top + kBlock <= part.height; top += kBlock) {
+    for (int left = start(part.x); left + kBlock <= part.width; left += kBlock) {
+      cv::Mat pixels = again(cv::Rect(left, top, kBlock, kBlock));
+      pixels.convertTo(block, CV_32F, 1, -128);
+      cv::dct(block, block);
+      for (int i = 0; i < kBlock; ++i) {
+        for (int k = 0; k < kBlock; ++k) {
+          const float step = codec.luma_table(i, k);
+          if (step > 0) block(i, k) = step * std::round(block(i, k) / step);
+        }
+      }
+      cv::idct(block, block);
+      block.convertTo(pixels, CV_8U, 1, 128);
+    }
+  }
+  return again;
 }
 
 }  // namespace qv

@@ -2,6 +2,7 @@
 #define QVTESTER_DESK_MEASURE_CODEC_STEPS_H_
 
 #include <cmath>
+#include <opencv2/core.hpp>
 #include <string>
 
 #include "desk/measure/request.h"
@@ -11,6 +12,7 @@ namespace qv {
 /// By how many levels a codec rounds the mean of a block: 0 where it keeps it.
 struct CodecSteps {
   double luma = 0, chroma = 0;
+  cv::Matx<float, 8, 8> luma_table = {};  // steps of a block's coefficients, by vertical and horizontal frequency
 };
 
 /// Of a JPEG file's quantisation tables (ITU-T T.81, B.2.4.1); none for a file of another kind, or one that can't be
@@ -21,6 +23,10 @@ CodecSteps StepsOf(const Input& input);
 
 /// Of what cv::imencode and others with the standard tables (T.81, Annex K) write at this quality.
 CodecSteps StepsAtQuality(int quality);
+
+/// A part of a photo, CV_8UC1, as the codec leaves it once more, its blocks half-way between those of the first time,
+/// which begin at the photo's first pixel. Blocks that reach over the part's rim stay as they are.
+cv::Mat CodedAgain(const cv::Mat& photo, const cv::Rect& part, const CodecSteps& codec);
 
 /// Standard uncertainty, in levels, of what the codec does to the mean of a whole picture. Blocks half-way between two
 /// steps, one in eight times the first table entry, are all rounded away from middle grey, by half a step; the entry

@@ -106,7 +106,19 @@ IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corn
   return iso;
 }
 
-Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure) {
+IsoFigures MeasureCodedAgain(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer,
+                             const CodecSteps& codec) {
+  const std::vector<cv::Point2f> around(corners.begin(), corners.end());
+  constexpr int kMargin = 8;  // a block
+  cv::Rect part = cv::boundingRect(around);
+  part = (part + cv::Size(2 * kMargin, 2 * kMargin) - cv::Point(kMargin, kMargin)) & cv::Rect({}, gray.size());
+  if (gray.type() != CV_8UC1 || part.empty()) return kNoFigures;
+  std::array<cv::Point2d, 4> moved = corners;
+  for (cv::Point2d& corner : moved) corner -= cv::Point2d(part.tl());
+  return MeasureIsoMtf(CodedAgain(gray, part, codec), moved, transfer).figures;
+}
+
+Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure, const IsoFigures* again) {
   std::vector<double> readings;
   for (const IsoFigures& band : iso.bands) readings.push_back(band.*figure);
   const double whole = iso.figures.*figure;
@@ -117,7 +129,11 @@ Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure) {
     for (const double reading : readings) excess += reading / kBands;
     of_method = std::hypot(of_method, excess);
   }
-  return OfMean(readings, of_method, kBandsMethod);
+  const Uncertainty scatter = OfMean(readings, of_method, kBandsMethod);
+  if (again == nullptr || !std::isfinite(again->*figure)) return scatter;
+  // Beyond what chance does, which the scatter tells.
+  const double error = std::max(std::fabs(again->*figure - whole) - scatter.standard, 0.0);
+  return OffBy(error, scatter, kBands - 1);
 }
 
 }  // namespace qv

@@ -5,6 +5,7 @@
 #include <opencv2/core.hpp>
 #include <vector>
 
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/slanted_edge.h"
 #include "desk/measure/transfer.h"
 #include "desk/measure/uncertainty.h"
@@ -46,8 +47,15 @@ inline constexpr double kSharpenedOvershoot = 0.05;
 /// Slanted edge after ISO 12233:2014 in linear light, four bins a pixel; steps: slanted_edge.cpp, iso_mtf.cpp.
 IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer);
 
+/// The figures alone, of a photo whose file's codec is let loose on the region once more.
+IsoFigures MeasureCodedAgain(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer,
+                             const CodecSteps& codec);
+
 /// Of one figure, from the scatter of its bands; NaN where a band gives none.
-Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure);
+///
+/// @param again  the same from a photo that went through its file's codec once more: what that does to a figure, it
+///               has done before. Null for a file that keeps all.
+Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure, const IsoFigures* again = nullptr);
 
 }  // namespace qv
 

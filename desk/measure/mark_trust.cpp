@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <cmath>
+#include <numeric>
 #include <opencv2/imgproc.hpp>
 
 #include "desk/measure/legs.h"
@@ -15,6 +16,7 @@ struct Core {
   cv::Point2d centre;
   double module_px = 0;  // along the square's side
   double noise = 0;      // of a pixel, of the contrast
+  double follows = 0;    // of a step of the circle about it, which takes in more of the blurred frame
 };
 
 // Of levels as the search weighs them.
@@ -35,43 +37,58 @@ float LevelAt(std::vector<float> levels, double share) {
   return *at;
 }
 
-// Of a pixel, from second differences along the rows; few of them cross an edge.
-double NoiseOf(const cv::Mat& grey) {
-  std::vector<float> off;
+// Of a pixel, from the smaller half of the second differences along the rows, where these stay light or dark.
+double NoiseOf(const cv::Mat& grey, double light, double dark) {
+  constexpr double kTheirSquares = 0.1426;  // mean of a normal variable's squares among the smaller half
+  const double most = (light - dark) / 4;
+  std::vector<double> squares;
   for (int row = 0; row < grey.rows; ++row) {
     const auto* const v = grey.ptr<float>(row);
-    for (int i = 0; i + 2 < grey.cols; ++i) off.push_back(std::fabs(v[i] - 2 * v[i + 1] + v[i + 2]));
+    for (int i = 0; i + 2 < grey.cols; ++i) {
+      const auto [least, largest] = std::minmax({v[i], v[i + 1], v[i + 2]});
+      if (least < light - most && largest > dark + most) continue;
+      squares.push_back(std::pow(1.0 * v[i] - 2.0 * v[i + 1] + v[i + 2], 2));
+    }
   }
-  return off.empty() ? 0 : 1.4826 * LevelAt(off, 0.5) / std::sqrt(6.0);
+  const auto half = static_cast<std::ptrdiff_t>(squares.size() / 2);
+  if (half == 0) return 0;
+  std::nth_element(squares.begin(), squares.begin() + half, squares.end());
+  const double mean = std::accumulate(squares.begin(), squares.begin() + half, 0.0) / static_cast<double>(half);
+  return std::sqrt(mean / kTheirSquares / 6);
 }
 
-// How dark the levels are within a circle, moved by where.
+// How dark the levels are within a circle, moved by where. Pixels on its rim count by what of them lies within.
 cv::Vec3d DarknessWithin(const cv::Mat& grey, cv::Point2d middle, double radius, double light) {
   cv::Vec3d sum;
   for (int row = 0; row < grey.rows; ++row) {
     for (int i = 0; i < grey.cols; ++i) {
       const cv::Point2d off = cv::Point2d(i, row) - middle;
-      if (off.dot(off) <= radius * radius) sum += (light - grey.at<float>(row, i)) * cv::Vec3d(off.x, off.y, 1);
+      const double within = std::clamp(radius + 0.5 - cv::norm(off), 0.0, 1.0);
+      if (within > 0) sum += within * (light - grey.at<float>(row, i)) * cv::Vec3d(off.x, off.y, 1);
     }
   }
   return sum;
 }
 
 // Levels as if the light that falls there were even, and paper and ring at level 1: over the plane through those that
-// are `least` or more.
-cv::Mat Evened(const cv::Mat& grey, double least) {
-  cv::Matx33d products = cv::Matx33d::zeros();
-  cv::Vec3d sums;
+// come within this share of it. Looked for anew about each plane, else the brighter side would have more blurred edges.
+cv::Mat Evened(const cv::Mat& grey, double light, double share) {
+  constexpr int kRounds = 12;
   const auto at = [](int row, int column) { return cv::Vec3d(1, column, row); };
-  for (int row = 0; row < grey.rows; ++row) {
-    for (int i = 0; i < grey.cols; ++i) {
-      const double level = grey.at<float>(row, i);
-      if (level < least) continue;
-      products += at(row, i) * at(row, i).t();
-      sums += at(row, i) * level;
+  cv::Vec3d plane(light, 0, 0);
+  for (int round = 0; round < kRounds; ++round) {
+    cv::Matx33d products = cv::Matx33d::zeros();
+    cv::Vec3d sums;
+    for (int row = 0; row < grey.rows; ++row) {
+      for (int i = 0; i < grey.cols; ++i) {
+        const double level = grey.at<float>(row, i);
+        if (level < (1 - share) * plane.dot(at(row, i))) continue;
+        products += at(row, i) * at(row, i).t();
+        sums += at(row, i) * level;
+      }
     }
+    plane = products.solve(sums, cv::DECOMP_SVD);
   }
-  const cv::Vec3d plane = products.solve(sums, cv::DECOMP_SVD);
   cv::Mat even(grey.size(), CV_32F);
   for (int row = 0; row < grey.rows; ++row) {
     for (int i = 0; i < grey.cols; ++i) {
@@ -79,6 +96,16 @@ cv::Mat Evened(const cv::Mat& grey, double least) {
     }
   }
   return even;
+}
+
+// How far the centre of gravity within a circle follows the circle, by what is dark on its rim.
+double FollowsCircle(const cv::Mat& grey, cv::Point2d middle, double radius, double light) {
+  constexpr double kRim = 1;  // pixels to either side
+  const double inner = std::max(radius - kRim, 0.0);
+  const double outer = radius + kRim;
+  const double rim = DarknessWithin(grey, middle, outer, light)[2] - DarknessWithin(grey, middle, inner, light)[2];
+  const double share = radius * radius / (outer * outer - inner * inner);  // rim to ring: both have twice the pi
+  return share * rim / DarknessWithin(grey, middle, radius, light)[2];
 }
 
 std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double radius) {
@@ -96,7 +123,7 @@ std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double 
 Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double hidden) {
   constexpr double kReach = 2.2;
   constexpr double kSizeReach = 2.3;
-  constexpr double kSeen = 4.5;  // the paper about the mark
+  constexpr double kSeen = 4.1;  // the paper about the mark
   const int reach = cvCeil(kSeen * module) + 1;
   const cv::Rect part =
       cv::Rect(cvRound(mark.centre.x) - reach, cvRound(mark.centre.y) - reach, 2 * reach + 1, 2 * reach + 1) &
@@ -105,11 +132,12 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double hi
   cv::Mat grey = GreyPart(photo, part);
   const std::vector<float> levels(grey.begin<float>(), grey.end<float>());
   const double light = LevelAt(levels, 0.85);
-  const double contrast = light - LevelAt(levels, 0.15);
+  const double black = LevelAt(levels, 0.15);
+  const double contrast = light - black;
   if (!(contrast > 0)) return {};
   // What is light but for noise, and no blurred edge.
-  const double noise = NoiseOf(grey);
-  grey = Evened(grey, light - std::clamp(2.5 * noise, contrast / 8, contrast / 3));
+  const double noise = NoiseOf(grey, light, black);
+  grey = Evened(grey, light, std::clamp(2.5 * noise, contrast / 16, contrast / 3) / light);
   const cv::Point2d corner = part.tl();
   Core core = {mark.centre, 0, std::hypot(noise, hidden) / contrast};
   for (int round = 0; round < 6; ++round) {
@@ -117,6 +145,7 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double hi
     if (!(dark[2] > 0)) return {};
     core.centre += cv::Point2d(dark[0], dark[1]) / dark[2];
   }
+  core.follows = std::clamp(FollowsCircle(grey, core.centre - corner, kReach * module, 1), 0.0, 0.9);
   const std::vector<float> inside = LevelsWithin(grey, core.centre - corner, kSizeReach * module);
   if (inside.empty()) return {};
   const double square = LevelAt(inside, 0.25);
@@ -149,9 +178,9 @@ Uncertainty FromKnownError(double error, double standard, const char* method) {
 }
 
 void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const CodecSteps& codec) {
-  constexpr double kCorePx = 0.0065;      // type B: what pixels and light leave of a centre
-  constexpr double kApartPx = 0.003;      // and of two centres' distance
-  constexpr double kCoreModulePx = 0.01;  // and of the squares' sizes
+  constexpr double kCorePx = 0.004;       // type B: what pixels leave of a centre
+  constexpr double kRimPx = 0.0125;       // and those on the circle's rim, times how dark they are
+  constexpr double kCoreModulePx = 0.01;  // and what is left of the squares' sizes
   // Noise over the contrast moves a centre by the circle's second moment over the square's weight, and the square's
   // side by half the root of the circle's pixels over it.
   constexpr double kNoisePx = 0.48;
@@ -174,10 +203,9 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
     found[2 * i + 1] = mark.centre.y;
     cores[2 * i] = core.centre.x;
     cores[2 * i + 1] = core.centre.y;
-    const double noise = kNoisePx * core.noise;
-    const double apart = std::hypot(kApartPx, noise);
-    covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = apart * apart;
-    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, std::hypot(kCorePx, noise)));
+    const double off = std::hypot(kCorePx + kRimPx * core.follows, kNoisePx * core.noise) / (1 - core.follows);
+    covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = off * off;
+    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, off));
     module_off += (mark.module_px - core.module_px / upright) / 3;
     module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2);
   }

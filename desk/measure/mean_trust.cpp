@@ -139,16 +139,29 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area) const {
   return errors;
 }
 
+// Of a mean of so many pixels, of channels with these weights: what is made of chroma and whole levels.
+double MeanErrors::RoundingVariance(const cv::Vec3d& weights, double area) const {
+  constexpr int kDraws = 200;
+  const int side = std::clamp(cvRound(std::sqrt(area)), 3, std::min(pixels_.cols, pixels_.rows));
+  const cv::Rect middle((pixels_.cols - side) / 2, (pixels_.rows - side) / 2, side, side);
+  const CodecRounding codec(pixels_(middle), codec_, SpreadOf(pixels_(middle), codec_));
+  cv::RNG random(11);
+  double squares = 0;
+  for (int i = 0; i < kDraws; ++i) squares += std::pow(weights.dot(codec.Draw(random)), 2) / kDraws;
+  return squares;
+}
+
 Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
   const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
-  // A codec rounds each block's luma to a step, and with its chroma the channels to levels; without one, grey is.
+  // A codec rounds each block's luma to a step; with its chroma, the channels to levels, alike where that hardly
+  // differs, as within one of the means; without one, grey is rounded.
   const double luma_steps = std::pow(codec_.luma * kCodecBlock, 2) / 12 / area;
   cv::Scalar deviation;
   cv::meanStdDev(pixels_, cv::noArray(), deviation);
   const double levels = codec_.luma == 0
                             ? std::pow(HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]})), 2) / 3
-                            : 0.02;
+                            : RoundingVariance(weights, area);
   const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + luma_steps + levels);
   const cv::Mat even = WithoutNoise(means, noise, degrees_);
   cv::RNG random(10);

@@ -25,6 +25,8 @@ class MeanErrors {
   Uncertainty OfEvenness(const cv::Mat& means, double area) const;
 
  private:
+  double RoundingVariance(const cv::Vec3d& weights, double area) const;
+
   cv::Mat pixels_;
   CodecSteps codec_;
   cv::Vec3d spread_;                               // of the scene between blocks: luma, both chromas

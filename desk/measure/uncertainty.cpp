@@ -92,9 +92,10 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
       {kBandsMethod,
        "Each quarter of the edge gives a reading of its own; their scatter over the root of four is the standard "
        "uncertainty, with three degrees of freedom. Type B: 0.1 % for what the method itself leaves (bins, plateaus, "
-       "rounding of levels). What JPEG does to edges sharper than 0.8 px, and what light or chart do to the edge "
-       "itself, "
-       "is not in it."},
+       "rounding of levels). A JPEG file's region goes through the file's own steps once more, its blocks half-way "
+       "between those of the first time: what that does to a figure beyond its scatter is taken for its error, which "
+       "the first time left in it. MTF10 at quality 75, of which the first time takes more, is not held by that: see "
+       "docs/accuracy.md. What light or chart do to the edge itself is not in it."},
       {kResamplingMethod,
        "The region is taken apart into its edge spread and its noise; the noise is drawn again in blocks of rows, "
        "50 times, and each picture is measured anew. The 95 % quantile of the readings' distance from the one without "
@@ -118,9 +119,10 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "What light and exposure do from photo to photo is not in it (take several photos)."},
       {kResidualMethod,
        "Marks: how far the search's places lie from the centres of gravity of the marks' inner squares in evened "
-       "light, which are good to 0.0065 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
-       "carried to the legs and the turn; a module is good to 0.01 px (type B) and noise. Where the blur is over a "
-       "fifth of a module the frame shines into the square: U then holds for 83 of 100. In a JPEG file noise is hidden "
+       "light, which are good to 0.004 px (type B) but for what noise moves them, carried to the legs and the turn; a "
+       "module is good to 0.01 px (type B) and noise. Where the blur is over a fifth of a module the frame shines into "
+       "the circle about the square: what moves a centre then counts by as much more as the circle follows it, and "
+       "0.0125 px times how dark the circle's rim is (type B). In a JPEG file noise is hidden "
        "up to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
        "the map of all matches, by 64 parts of the picture (as noise may be alike between neighbours), tell where the "
        "best map lies and how surely; what lies between it and either map is in that one's uncertainty, and the "
@@ -172,6 +174,24 @@ Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, co
   const double share = standard == 0 ? 1 : type_a / standard;
   const double factor = StudentFactor(degrees_of_freedom / std::pow(share, 4));
   return {standard, factor * standard, factor, method};
+}
+
+Uncertainty OffBy(double error, const Uncertainty& about, double degrees_of_freedom) {
+  const double off = std::fabs(error);
+  if (!(off > 0) || !(about.standard > 0)) return about;
+  const auto degrees = static_cast<int>(std::clamp(degrees_of_freedom, 1.0, 200.0));
+  const auto below = [&](double x) {  // Student's distribution about where the error puts the true value
+    const double t = (x - off) / about.standard;
+    return (1 + std::copysign(StudentShare(std::fabs(t), degrees), t)) / 2;
+  };
+  double low = 0;
+  double high = off + about.expanded;
+  for (int step = 0; step < 50; ++step) {
+    const double middle = (low + high) / 2;
+    (below(middle) - below(-middle) < kCoverage ? low : high) = middle;
+  }
+  const double standard = std::hypot(off, about.standard);
+  return {standard, high, high / standard, about.method};
 }
 
 Uncertainty Rectangular(double half, const char* method) {

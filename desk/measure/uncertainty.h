@@ -45,6 +45,10 @@ double StudentFactor(double degrees_of_freedom);
 /// Type A of so many degrees of freedom and type B together, by Welch and Satterthwaite.
 Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, const char* method);
 
+/// Of a reading whose error is known, and left in it: the true value lies about where the error puts it as `about`
+/// says, with so many degrees of freedom.
+Uncertainty OffBy(double error, const Uncertainty& about, double degrees_of_freedom);
+
 /// Type B alone: anything up to `half` to either side is as likely.
 Uncertainty Rectangular(double half, const char* method);
 
