@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <opencv2/imgproc.hpp>
 
 namespace qv {
 
@@ -129,7 +130,7 @@ Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure, const I
     for (const double reading : readings) excess += reading / kBands;
     of_method = std::hypot(of_method, excess);
   }
-  const Uncertainty scatter = OfMean(readings, of_method, kBandsMethod);
+  Uncertainty scatter = OfMean(readings, of_method, kBandsMethod);
   if (again == nullptr || !std::isfinite(again->*figure)) return scatter;
   // Beyond what chance does, which the scatter tells.
   const double error = std::max(std::fabs(again->*figure - whole) - scatter.standard, 0.0);

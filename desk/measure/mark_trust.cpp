@@ -70,6 +70,23 @@ cv::Vec3d DarknessWithin(const cv::Mat& grey, cv::Point2d middle, double radius,
   return sum;
 }
 
+// How dark the levels are within a square that is turned counter-clockwise.
+double DarknessOfSquare(const cv::Mat& even, cv::Point2d middle, double half_side, double turn_deg) {
+  const double turn = turn_deg * CV_PI / 180;
+  const cv::Point2d right(std::cos(turn), -std::sin(turn));
+  double sum = 0;
+  for (int row = 0; row < even.rows; ++row) {
+    for (int i = 0; i < even.cols; ++i) {
+      const cv::Point2d off = cv::Point2d(i, row) - middle;
+      const double x = std::fabs(off.dot(right));
+      const double y = std::fabs(off.cross(right));
+      const double within = std::clamp(half_side + 0.5 - x, 0.0, 1.0) * std::clamp(half_side + 0.5 - y, 0.0, 1.0);
+      sum += within * (1 - even.at<float>(row, i));
+    }
+  }
+  return sum;
+}
+
 // Levels as if the light that falls there were even, and paper and ring at level 1: over the plane through those that
 // come within this share of it. Looked for anew about each plane, else the brighter side would have more blurred edges.
 cv::Mat Evened(const cv::Mat& grey, double light, double share) {
@@ -118,11 +135,13 @@ std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double 
   return levels;
 }
 
-// The dark inner square, three modules wide, in the light ring about it: centre of gravity and size of what is dark
-// within 2.2 or 2.3 modules, which holds the whole square whatever its turn, and nothing of the dark frame.
-Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double hidden) {
+// The dark inner square, three modules wide, in the light ring about it. Its centre of gravity is that of what is dark
+// within 2.2 modules, which holds the whole square whatever its turn, and of the dark frame what blur makes shine in.
+// Its size is all that is dark up to the middle of the ring, where the frame's blur adds what the square's takes away.
+Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double turn_deg, double hidden) {
   constexpr double kReach = 2.2;
   constexpr double kSizeReach = 2.3;
+  constexpr double kRingMiddle = 2;
   constexpr double kSeen = 4.1;  // the paper about the mark
   const int reach = cvCeil(kSeen * module) + 1;
   const cv::Rect part =
@@ -149,7 +168,7 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double hi
   const std::vector<float> inside = LevelsWithin(grey, core.centre - corner, kSizeReach * module);
   if (inside.empty()) return {};
   const double square = LevelAt(inside, 0.25);
-  const double dark = DarknessWithin(grey, core.centre - corner, kSizeReach * module, 1)[2];
+  const double dark = DarknessOfSquare(grey, core.centre - corner, kRingMiddle * module, turn_deg);
   core.module_px = square < 1 ? std::sqrt(std::max(dark, 0.0) / (1 - square)) / 3 : 0;
   return core;
 }
@@ -178,9 +197,11 @@ Uncertainty FromKnownError(double error, double standard, const char* method) {
 }
 
 void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const CodecSteps& codec) {
-  constexpr double kCorePx = 0.004;       // type B: what pixels leave of a centre
-  constexpr double kRimPx = 0.0125;       // and those on the circle's rim, times how dark they are
-  constexpr double kCoreModulePx = 0.01;  // and what is left of the squares' sizes
+  constexpr double kCorePx = 0.005;       // type B: what pixels and light leave of a centre
+  constexpr double kApartPx = 0.003;      // and of two centres' distance
+  constexpr double kRimPx = 0.017;        // and those on the circle's rim, times how dark they are
+  constexpr double kCoreModulePx = 0.01;  // what is left of the squares' sizes
+  constexpr double kRimModulePx = 0.1;    // and of their corners, which blur rounds, as much as the circle is followed
   // Noise over the contrast moves a centre by the circle's second moment over the square's weight, and the square's
   // side by half the root of the circle's pixels over it.
   constexpr double kNoisePx = 0.48;
@@ -197,17 +218,19 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
   std::vector<Uncertainty> rows;
   for (int i = 0; i < 3; ++i) {
     const Mark& mark = view.marks[i];
-    const Core core = LookAtCore(photo, mark, mark.module_px * upright, hidden);
+    const Core core = LookAtCore(photo, mark, mark.module_px * upright, view.turn_deg, hidden);
     if (core.module_px == 0) return;
     found[2 * i] = mark.centre.x;
     found[2 * i + 1] = mark.centre.y;
     cores[2 * i] = core.centre.x;
     cores[2 * i + 1] = core.centre.y;
-    const double off = std::hypot(kCorePx + kRimPx * core.follows, kNoisePx * core.noise) / (1 - core.follows);
-    covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = off * off;
-    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, off));
+    const auto left = [&](double type_b) {
+      return std::hypot(type_b + kRimPx * core.follows, kNoisePx * core.noise) / (1 - core.follows);
+    };
+    covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = std::pow(left(kApartPx), 2);
+    rows.push_back(FromKnownError(mark.centre.y - core.centre.y, left(kCorePx)));
     module_off += (mark.module_px - core.module_px / upright) / 3;
-    module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2);
+    module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2) + std::pow(kRimModulePx * core.follows, 2) / 3;
   }
   phase.Find("marks")->Trust(std::move(rows));
   const auto trust = [&](const char* figure, double (*f)(const Places&)) {

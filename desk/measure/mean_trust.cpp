@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <limits>
 #include <opencv2/imgproc.hpp>
 
 #include "desk/measure/patch_trust.h"
@@ -139,12 +140,12 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area) const {
   return errors;
 }
 
-// Of a mean of so many pixels, of channels with these weights: what is made of chroma and whole levels.
-double MeanErrors::RoundingVariance(const cv::Vec3d& weights, double area) const {
+// Of the mean of a part's channels with these weights: what is made of chroma and of whole levels, not of luma.
+double MeanErrors::RoundingVariance(const cv::Mat& part, const cv::Vec3d& weights) const {
   constexpr int kDraws = 200;
-  const int side = std::clamp(cvRound(std::sqrt(area)), 3, std::min(pixels_.cols, pixels_.rows));
-  const cv::Rect middle((pixels_.cols - side) / 2, (pixels_.rows - side) / 2, side, side);
-  const CodecRounding codec(pixels_(middle), codec_, SpreadOf(pixels_(middle), codec_));
+  cv::Vec3d spread = SpreadOf(part, codec_);
+  spread[0] = std::numeric_limits<double>::infinity();
+  const CodecRounding codec(part, codec_, spread);
   cv::RNG random(11);
   double squares = 0;
   for (int i = 0; i < kDraws; ++i) squares += std::pow(weights.dot(codec.Draw(random)), 2) / kDraws;
@@ -155,13 +156,15 @@ Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
   const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
   // A codec rounds each block's luma to a step; with its chroma, the channels to levels, alike where that hardly
-  // differs, as within one of the means; without one, grey is rounded.
+  // differs, as within one of the means. Without a codec, grey is rounded.
+  const int side = std::clamp(cvRound(std::sqrt(area)), 1, std::min(pixels_.cols, pixels_.rows));
+  const cv::Rect middle((pixels_.cols - side) / 2, (pixels_.rows - side) / 2, side, side);
   const double luma_steps = std::pow(codec_.luma * kCodecBlock, 2) / 12 / area;
   cv::Scalar deviation;
   cv::meanStdDev(pixels_, cv::noArray(), deviation);
   const double levels = codec_.luma == 0
                             ? std::pow(HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]})), 2) / 3
-                            : RoundingVariance(weights, area);
+                            : RoundingVariance(pixels_(middle), weights);
   const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + luma_steps + levels);
   const cv::Mat even = WithoutNoise(means, noise, degrees_);
   cv::RNG random(10);

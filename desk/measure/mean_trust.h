@@ -25,7 +25,7 @@ class MeanErrors {
   Uncertainty OfEvenness(const cv::Mat& means, double area) const;
 
  private:
-  double RoundingVariance(const cv::Vec3d& weights, double area) const;
+  double RoundingVariance(const cv::Mat& part, const cv::Vec3d& weights) const;
 
   cv::Mat pixels_;
   CodecSteps codec_;

@@ -119,10 +119,12 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "What light and exposure do from photo to photo is not in it (take several photos)."},
       {kResidualMethod,
        "Marks: how far the search's places lie from the centres of gravity of the marks' inner squares in evened "
-       "light, which are good to 0.004 px (type B) but for what noise moves them, carried to the legs and the turn; a "
-       "module is good to 0.01 px (type B) and noise. Where the blur is over a fifth of a module the frame shines into "
-       "the circle about the square: what moves a centre then counts by as much more as the circle follows it, and "
-       "0.0125 px times how dark the circle's rim is (type B). In a JPEG file noise is hidden "
+       "light, which are good to 0.005 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
+       "carried to the legs and the turn; a module is good to 0.01 px (type B) and noise. Where the blur is over a "
+       "fifth "
+       "of a module the frame shines into the circle about the square: what moves a centre then counts by as much more "
+       "as it follows the circle, and of that 0.017 px, and 0.1 px of a module, are added (type B). In a JPEG file "
+       "noise is hidden "
        "up to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
        "the map of all matches, by 64 parts of the picture (as noise may be alike between neighbours), tell where the "
        "best map lies and how surely; what lies between it and either map is in that one's uncertainty, and the "
