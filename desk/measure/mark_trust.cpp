@@ -197,11 +197,11 @@ Uncertainty FromKnownError(double error, double standard, const char* method) {
 }
 
 void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const CodecSteps& codec) {
-  constexpr double kCorePx = 0.005;       // type B: what pixels and light leave of a centre
-  constexpr double kApartPx = 0.003;      // and of two centres' distance
-  constexpr double kRimPx = 0.017;        // and those on the circle's rim, times how dark they are
-  constexpr double kCoreModulePx = 0.01;  // what is left of the squares' sizes
-  constexpr double kRimModulePx = 0.1;    // and of their corners, which blur rounds, as much as the circle is followed
+  constexpr double kCorePx = 0.005;         // type B: what pixels and light leave of a centre
+  constexpr double kApartPx = 0.003;        // and of two centres' distance
+  constexpr double kRimPx = 0.0125;         // and those on the circle's rim, times how dark they are
+  constexpr double kCoreModulePx = 0.0065;  // what is left of the squares' sizes
+  constexpr double kRimModulePx = 0.1;  // and of their corners, which blur rounds, as much as the circle is followed
   // Noise over the contrast moves a centre by the circle's second moment over the square's weight, and the square's
   // side by half the root of the circle's pixels over it.
   constexpr double kNoisePx = 0.48;
@@ -215,6 +215,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
   auto covariance = cv::Matx<double, 6, 6>::zeros();
   double module_off = 0;
   double module_squares = kCoreModulePx * kCoreModulePx;
+  double follows = 0;
   std::vector<Uncertainty> rows;
   for (int i = 0; i < 3; ++i) {
     const Mark& mark = view.marks[i];
@@ -230,7 +231,8 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
     covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = std::pow(left(kApartPx), 2);
     rows.push_back(FromKnownError(mark.centre.y - core.centre.y, left(kCorePx)));
     module_off += (mark.module_px - core.module_px / upright) / 3;
-    module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2) + std::pow(kRimModulePx * core.follows, 2) / 3;
+    module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2);
+    follows += core.follows / 3;
   }
   phase.Find("marks")->Trust(std::move(rows));
   const auto trust = [&](const char* figure, double (*f)(const Places&)) {
@@ -239,7 +241,8 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
   trust("legs_ratio", LegsRatio);
   trust("legs_angle", LegsAngle);
   trust("chart_turn", TurnOf);
-  phase.Find("module_size")->Trust({FromKnownError(module_off, std::sqrt(module_squares))});
+  const double off = std::hypot(std::sqrt(module_squares), kRimModulePx * follows);
+  phase.Find("module_size")->Trust({FromKnownError(module_off, off)});
 }
 
 }  // namespace qv

@@ -120,10 +120,10 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
       {kResidualMethod,
        "Marks: how far the search's places lie from the centres of gravity of the marks' inner squares in evened "
        "light, which are good to 0.005 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
-       "carried to the legs and the turn; a module is good to 0.01 px (type B) and noise. Where the blur is over a "
+       "carried to the legs and the turn; a module is good to 0.0065 px (type B) and noise. Where the blur is over a "
        "fifth "
        "of a module the frame shines into the circle about the square: what moves a centre then counts by as much more "
-       "as it follows the circle, and of that 0.017 px, and 0.1 px of a module, are added (type B). In a JPEG file "
+       "as it follows the circle, and of that 0.0125 px, and 0.1 px of a module, are added (type B). In a JPEG file "
        "noise is hidden "
        "up to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
        "the map of all matches, by 64 parts of the picture (as noise may be alike between neighbours), tell where the "
