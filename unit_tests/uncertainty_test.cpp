@@ -109,16 +109,15 @@ TEST(Uncertainty, AFileTellsByHowMuchItsCodecRounds) {
   cv::randu(photo, 0, 255);
   for (const auto& [quality, luma, chroma] : {std::tuple(75, 8, 9), {50, 16, 17}, {100, 1, 1}}) {  // T.81, Annex K
     cv::imwrite(folder.Path("photo.jpg"), photo, {cv::IMWRITE_JPEG_QUALITY, quality});
-    for (const CodecSteps& steps : {StepsOf(folder.Path("photo.jpg")), StepsAtQuality(quality)}) {
+    for (const CodecSteps& steps : {StepsOf(ReadFile(folder.Path("photo.jpg"))), StepsAtQuality(quality)}) {
       EXPECT_EQ(luma / 8.0, steps.luma);
       EXPECT_EQ(chroma / 8.0, steps.chroma);
     }
   }
   const std::string whole = ReadFile(folder.Path("photo.jpg"));
   for (const std::size_t size : {0U, 1U, 3U, 21U, 40U, 90U}) {
-    EXPECT_EQ(0, StepsOf(folder.Write("cut.jpg", whole.substr(0, size))).chroma) << size;
+    EXPECT_EQ(0, StepsOf(whole.substr(0, size)).chroma) << size;
   }
-  EXPECT_EQ(0, StepsOf(folder.Path("nowhere.jpg")).luma);
 }
 
 TEST(Uncertainty, ACodecLetLooseOnItsOwnBlocksChangesNothing) {
@@ -126,7 +125,7 @@ TEST(Uncertainty, ACodecLetLooseOnItsOwnBlocksChangesNothing) {
   cv::randu(photo, 60, 200);
   std::vector<uchar> file;
   cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, 50});
-  const CodecSteps codec = StepsOf(Input("photo.jpg", std::string(file.begin(), file.end())));
+  const CodecSteps codec = StepsOf(std::string(file.begin(), file.end()));
   const std::array<std::tuple<int, int, float>, 4> known = {{{0, 1, 11}, {1, 0, 12}, {0, 7, 61}, {7, 0, 72}}};
   for (const auto& [row, column, step] : known) EXPECT_EQ(step, codec.luma_table(row, column));  // T.81, table K.1
   const cv::Mat coded = cv::imdecode(file, cv::IMREAD_GRAYSCALE);

@@ -311,7 +311,7 @@ class Capture : public Measurement {
     std::map<int, cv::Vec3d> given;
     if (request.parameters.contains("reference")) given = ReferencePatches(request.parameters["reference"]);
     TrustPatches(record.phase, {finding->photo, finding->outlines, finding->measured, finding->standard,
-                                std::move(given), StepsOf(request.inputs.at(0))});
+                                std::move(given), record.inputs.at(0).codec});
     return finding;
   }
 

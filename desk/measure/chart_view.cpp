@@ -145,7 +145,7 @@ ChartView DescribeChart(Record& record, const FoundChart& found, const std::stri
                "marks_found");
     return view;
   }
-  TrustMarks(record.phase, view, photo, StepsOf(record.request.inputs.at(0)));
+  TrustMarks(record.phase, view, photo, record.inputs.at(0).codec);
   DoubtMarks(record, found, view, photo_path);
   if (view.candidates > static_cast<int>(kMarks)) {
     record.Say(Remark::kWarning, "more_candidates",

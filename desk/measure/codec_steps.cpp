@@ -3,8 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <fstream>
-#include <sstream>
+#include <cstddef>
 #include <vector>
 
 namespace qv {
@@ -48,44 +47,26 @@ void TakeTables(const std::vector<unsigned char>& tables, CodecSteps& steps) {
   }
 }
 
-CodecSteps StepsOfStream(std::istream& file) {
+}  // namespace
+
+CodecSteps StepsOf(const std::string& content) {
   constexpr int kStart = 0xD8;
   constexpr int kTables = 0xDB;
   constexpr int kScan = 0xDA;
-  constexpr int kMostSegments = 1000;
   CodecSteps steps;
-  if (file.get() != 0xFF || file.get() != kStart) return steps;
-  for (int i = 0; i < kMostSegments; ++i) {
-    int marker = file.get();
-    while (marker == 0xFF) marker = file.get();
-    const int high = file.get();
-    const int low = file.get();
-    const int size = 256 * high + low - 2;
-    if (!file || size < 0 || marker == kScan) return steps;
-    if (marker == kTables) {
-      std::vector<unsigned char> tables(size);
-      file.read(reinterpret_cast<char*>(tables.data()), size);  // NOLINT: bytes
-      if (!file) return steps;
-      TakeTables(tables, steps);
-    } else {
-      file.seekg(size, std::ios::cur);
-    }
-    if (file.get() != 0xFF) return steps;
+  const auto byte = [&](std::size_t at) { return at < content.size() ? static_cast<unsigned char>(content[at]) : -1; };
+  if (byte(0) != 0xFF || byte(1) != kStart) return steps;
+  for (std::size_t at = 2; byte(at) == 0xFF;) {
+    while (byte(at) == 0xFF) ++at;
+    const int marker = byte(at);
+    if (marker == kScan || at + 2 >= content.size()) return steps;
+    const std::size_t size = 256 * byte(at + 1) + byte(at + 2);  // its own two bytes too
+    const std::size_t end = at + 1 + size;
+    if (size < 2 || end > content.size()) return steps;
+    if (marker == kTables) TakeTables({content.begin() + at + 3, content.begin() + end}, steps);
+    at = end;
   }
   return steps;
-}
-
-}  // namespace
-
-CodecSteps StepsOf(const std::string& path) {
-  std::ifstream file(path, std::ios::binary);
-  return StepsOfStream(file);
-}
-
-CodecSteps StepsOf(const Input& input) {
-  if (input.is_path()) return StepsOf(input.name);
-  std::istringstream file(input.content.value_or(""));
-  return StepsOfStream(file);
 }
 
 CodecSteps StepsAtQuality(int quality) {

@@ -5,8 +5,6 @@
 #include <opencv2/core.hpp>
 #include <string>
 
-#include "desk/measure/request.h"
-
 namespace qv {
 
 /// By how many levels a codec rounds the mean of a block: 0 where it keeps it.
@@ -15,11 +13,8 @@ struct CodecSteps {
   cv::Matx<float, 8, 8> luma_table = {};  // steps of a block's coefficients, by vertical and horizontal frequency
 };
 
-/// Of a JPEG file's quantisation tables (ITU-T T.81, B.2.4.1); none for a file of another kind, or one that can't be
-/// read.
-CodecSteps StepsOf(const std::string& path);
-/// The same of an input: none for a picture from memory.
-CodecSteps StepsOf(const Input& input);
+/// Of the quantisation tables of a JPEG file with this content (ITU-T T.81, B.2.4.1); none for another kind of file.
+CodecSteps StepsOf(const std::string& content);
 
 /// Of what cv::imencode and others with the standard tables (T.81, Annex K) write at this quality.
 CodecSteps StepsAtQuality(int quality);

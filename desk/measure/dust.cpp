@@ -227,7 +227,7 @@ class Dust : public Measurement {
     AddHistogram(record.phase, *results, request);
     cv::Mat grey;
     cv::cvtColor(finding->photo, grey, cv::COLOR_RGB2GRAY);
-    record.phase.Find("mean_level")->Trust({OfMeanLevel(grey, 1, MeanShift(StepsOf(request.inputs.at(0))))});
+    record.phase.Find("mean_level")->Trust({OfMeanLevel(grey, 1, MeanShift(record.inputs.at(0).codec))});
     finding->spots = FindSpots(finding->photo);
     AddSpots(record, finding->spots, static_cast<double>(finding->photo.total()));
     const double mean = record.phase.Find("mean_level")->value();

@@ -98,7 +98,7 @@ class Flash : public Measurement {
       const bool vt = spec_.test == QV_TEST_CAMERA_FLASH_VT;
       cv::Mat first;
       cv::extractChannel(SlotPhoto(tester, spec_.inputs[0].slot), first, 0);
-      const double shift = MeanShift(StepsOf(request.inputs.at(0)));
+      const double shift = MeanShift(record.inputs.at(0).codec);
       record.phase.Add("mean", vt ? results->flash_mean_vtcam_ : results->flash_mean_)
           .Trust({OfMeanLevel(first, 1, shift)});
       CollectChannels(record.phase, SlotPhoto(tester, spec_.inputs[0].slot), shift);

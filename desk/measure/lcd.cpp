@@ -224,7 +224,7 @@ class Lcd : public Measurement {
     lcd.keep_corners_ = true;
     lcd.Straighten(finding->photo, lcd.screen_size_, finding->screen);
     Collect(record.phase, *finding);
-    TrustMeans(record.phase, *finding, StepsOf(request.inputs.at(0)));
+    TrustMeans(record.phase, *finding, record.inputs.at(0).codec);
     if (finding->result.verdict_ != 1) record.Say(Remark::kWarning, "verdict", finding->result.reason_, "verdict");
     return finding;
   }

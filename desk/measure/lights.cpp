@@ -381,7 +381,7 @@ class Lights : public Measurement {
     finding->regions.assign(found.regions_, found.regions_ + found.region_count_);
     finding->areas = AreasOf(found.error_count_, found.error_areas_, found.error_pixels_);
     Collect(record.phase, finding->regions, finding->areas);
-    const CodecSteps codec = StepsOf(request.inputs.at(0));
+    const CodecSteps codec = record.inputs.at(0).codec;
     std::vector<LightTrust> trusts;
     for (const QVLightRegion& region : finding->regions) {
       trusts.push_back(TrustInLight(finding->photo(), region, codec));

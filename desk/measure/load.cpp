@@ -243,6 +243,7 @@ class Loader {
     if (KindOfSlot(slot) == SlotKind::kVideo) return TakeFilm(input, slot);
     std::string content = Content(input);
     record_.inputs.push_back({slot, input.name, HexDigest(content, "SHA256"), ""});
+    record_.inputs.back().codec = StepsOf(content);
     if (content.empty()) throw Failure(kCouldNotMeasure, "the file is empty");
     if (!RawSize().empty()) return TakeFrame(tester_, slot, RawSize(), content);
     return TakeFile(input.name, slot, content);

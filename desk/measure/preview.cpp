@@ -121,7 +121,7 @@ class Preview : public Measurement {
         cv::patchNaNs(map, 0);  // identical frames: no difference anywhere
         const cv::Mat frame = SlotPhoto(tester, spec_.inputs[0].slot);
         record.phase.Add("difference_mean", result.preview_diff_mean_)
-            .Trust({OfDifference(frame, map, StepsOf(request.inputs.at(0)))});
+            .Trust({OfDifference(frame, map, record.inputs.at(0).codec)});
       } else {
         SayFramesDiffer(record);
       }

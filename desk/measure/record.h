@@ -10,6 +10,7 @@
 
 #include "desk/base/json.h"
 #include "desk/base/log_lines.h"
+#include "desk/measure/codec_steps.h"
 #include "desk/measure/decision.h"
 #include "desk/measure/doubt_names.h"
 #include "desk/measure/figures.h"
@@ -91,6 +92,7 @@ struct RecordedInput {
   std::string sha256;       // of the file; empty for a picture from memory
   std::string pixels_hash;  // of the pixels as they lie in the slot: 128 bits of XXH3
   int width = 0, height = 0;
+  CodecSteps codec = {};  // of the file; not stored
 };
 
 /// A sentence about a run: a note under any name, or one of Doubts(), which a limits file may accept by its name.

@@ -86,7 +86,7 @@ void WarnOfIso(Record& record, const IsoMtf& iso, std::size_t i) {
 void AddIsoFigures(Record& record, const cv::Mat& gray, const SharpnessRegion& region, std::size_t i) {
   const Transfer transfer = *ParseTransfer(record.request.parameters.at("transfer").get<std::string>());
   const IsoMtf iso = MeasureIsoMtf(gray, region.outline, transfer);
-  const CodecSteps codec = StepsOf(record.request.inputs.at(0));
+  const CodecSteps codec = record.inputs.at(0).codec;
   std::optional<IsoFigures> again;
   if (codec.luma != 0 && iso.reason == nullptr) again = MeasureCodedAgain(gray, region.outline, transfer, codec);
   for (const IsoRow& row : kIsoRows) {
