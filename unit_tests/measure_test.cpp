@@ -152,6 +152,7 @@ TEST(Measure, AListIsHeldAgainstItsLimitsEntryByEntry) {
         {R"({"patches": {"0": {"max": 2.5, "marginal_max": 0.5}}})", "simple", 0.4, Outcome::kPass, "[]", "[0]"},
         {R"({"patches": {"0": {"max": 1.2}, "1": {"max": 3}}})", "simple", 0.4, Outcome::kPass, "[]", "[0]"},
         {R"({"patches": {"0": {"max": 1.2}, "1": {"max": 3}}})", "guarded", 0.4, Outcome::kFail, "[0]", "[0]"},
+        {R"({"each": {"max": 9}})", "guarded", 0.0, Outcome::kUnset, "[]", "[]"},
         {R"({"patches": {"0": {"max": 0.8}}})", "guarded_rejection", 0.4, Outcome::kPass, "[]", "[0]"},
         {R"({"patches": {"0": {"max": 2}, "7": {"max": 2}}})", "simple", 0.0, Outcome::kUnset, "[]", "[]"}}) {
     const Reading m = JudgedPatches(limit, rule, uncertainty);
@@ -166,6 +167,16 @@ TEST(Measure, AListIsHeldAgainstItsLimitsEntryByEntry) {
     EXPECT_EQ(marginal, "[" + near + "]") << limit;
     EXPECT_EQ(marginal != std::string("[]"), m.marginal) << limit;
   }
+}
+
+TEST(Measure, AListFailsAsSurelyAsItsSurestEntryAndPassesAsSurelyAsItsLeastSure) {
+  const auto wrong = [](const char* limit) { return JudgedPatches(limit, "simple", 0.4).decision->wrong_probability; };
+  const double one_deviation = 0.158655;  // of the normal distribution, beyond
+  EXPECT_NEAR(one_deviation, wrong(R"({"patches": {"0": {"max": 1.2}, "1": {"max": 3}}})"), 1e-5);
+  EXPECT_NEAR(one_deviation, wrong(R"({"patches": {"1": {"max": 3}, "0": {"max": 1.2}, "2": {"max": 9}}})"), 1e-5);
+  EXPECT_NEAR(one_deviation, wrong(R"({"patches": {"0": {"max": 0.8}, "1": {"max": 3}}})"), 1e-5)
+      << "the one that fails";
+  EXPECT_NEAR(0, wrong(R"({"patches": {"0": {"max": 0.8}, "2": {"max": 1}}})"), 1e-5) << "surely broken by the other";
 }
 
 TEST(Measure, OfManyBrokenEntriesTheNumberIsTold) {

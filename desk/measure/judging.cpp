@@ -53,8 +53,9 @@ std::string UnsetSentence(const Reading& m) {
   return m.info->name + ": the limits ask for it, and it was not measured; was it given what it compares with?";
 }
 
-bool AnyFinite(const std::vector<double>& values) {
-  return std::any_of(values.begin(), values.end(), [](double value) { return std::isfinite(value); });
+bool LacksUncertainty(const Reading& m) {
+  return m.uncertainties.empty() && m.info->figure->number == Number::kReal &&
+         std::any_of(m.values.begin(), m.values.end(), [](double value) { return std::isfinite(value); });
 }
 
 }  // namespace
@@ -80,7 +81,10 @@ void Reading::JudgeEntries(const DecisionRule& rule) {
         VerdictOn(values[i], i < uncertainties.size() ? uncertainties[i] : Uncertainty(), own, rule);
     entries.push_back({i, verdict.decision, verdict.marginal});
     marginal = marginal || verdict.marginal;
-    const auto rank = [](const Decision& d) { return std::make_pair(d.pass, -d.wrong_probability); };
+    // A list fails with any entry, as surely as the surest of those; it passes with all, as surely as the least sure.
+    const auto rank = [](const Decision& d) {
+      return std::make_pair(d.pass, d.pass ? -d.wrong_probability : d.wrong_probability);
+    };
     if (entries.size() == 1 || rank(verdict.decision) < rank(*decision)) decision = verdict.decision;
   }
   outcome = decision->pass ? Outcome::kPass : Outcome::kFail;
@@ -100,26 +104,29 @@ void Record::Judge() {
     unset.outcome = Outcome::kUnset;
     phase.readings.push_back(unset);
   }
+  const bool ran = measured();  // else what is missing has been told
   for (Reading& m : phase.readings) {
     const auto limit = limits.by_name.find(m.info->name);
-    if (limit == limits.by_name.end() || m.outcome == Outcome::kUnset) continue;
-    m.limit = limit->second;
-    if (limits.rule.kind != DecisionRule::Kind::kSimple && m.uncertainties.empty() &&
-        m.info->figure->number == Number::kReal && AnyFinite(m.values)) {
-      Say(Remark::kNoJudgement, "no_uncertainty",
-          Format("%s: the limits ask for the rule \"%s\", and how far this figure may be trusted is not known%s",
-                 m.info->name.c_str(), limits.rule.Name(),
-                 request.parameters.contains("uncertainty") ? "; give --uncertainty" : ""),
-          m.info->figure->name);
+    if (limit == limits.by_name.end()) continue;
+    if (m.outcome != Outcome::kUnset || !m.values.empty()) {
+      m.limit = limit->second;
+      if (limits.rule.kind != DecisionRule::Kind::kSimple && LacksUncertainty(m)) {
+        m.outcome = Outcome::kUnset;
+        Say(Remark::kWarning, "no_uncertainty",
+            Format("%s: the limits ask for the rule \"%s\", and how far this figure may be trusted is not known%s",
+                   m.info->name.c_str(), limits.rule.Name(),
+                   request.parameters.contains("uncertainty") ? "; give --uncertainty" : ""),
+            m.info->figure->name);
+        continue;
+      }
+      m.Judge(limits.rule);
     }
-    m.Judge(limits.rule);
     if (m.info->figure->axis != nullptr && m.outcome == Outcome::kFail) {
       Say(Remark::kWarning, "entries_broken", BrokenSentence(m), m.info->figure->name);
     }
-  }
-  if (!measured()) return;  // and that has been told
-  for (const Reading& m : phase.readings) {
-    if (m.outcome == Outcome::kUnset) Say(Remark::kWarning, "not_measured", UnsetSentence(m), m.info->figure->name);
+    if (ran && m.outcome == Outcome::kUnset) {
+      Say(Remark::kWarning, "not_measured", UnsetSentence(m), m.info->figure->name);
+    }
   }
 }
 

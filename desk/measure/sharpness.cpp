@@ -27,7 +27,8 @@ constexpr Method kIso = {
     "{iso_srgb} on edges bowed by 1 px, {iso_uneven} in light that falls by 40 % across the region, and {iso_jpeg} "
     "after JPEG of quality 75 from a blur of 0.5 px on.",
     "Moved by focus, motion, sharpening and denoising; by a transfer that is not the photo's (--transfer); reads far "
-    "too high where the paper is clipped; there is none where the edge lies along the pixel grid."};
+    "too high where the paper is clipped; there is none where the edge lies along the pixel grid, and none (nan) where "
+    "the response doesn't fall so far below twice the Nyquist frequency."};
 
 constexpr Unit kShare = {"one", "C62", "1", 1e-3};
 
