@@ -685,7 +685,8 @@ constexpr Miss kMisses[] = {
 // Whole groups besides: no promise is made of them.
 const char* WhyMissed(const Group& group, const char* figure, const Condition& condition) {
   if (group.run == TryMaps) return kTooWide;
-  if (group.run == TryMarks && std::string(figure) == "module size") return "noise and blur move the light about it";
+  if (group.run == TryMarks && std::string(figure) == "module size")
+    return "U is rather too wide: blur reaches the middle taken for black";
   if (group.run == TryMarks && condition.jpeg != 0) return "what a codec hides is guessed by its table";
   if (group.run == TryMarks && std::string(figure).rfind("legs", 0) == 0) return kTooWide;
   if (group.run == TryMarks && condition.turn_deg != 0) return "rows cross a turned mark's rim askew";

@@ -14,9 +14,10 @@ using Places = cv::Vec<double, 6>;  // column and row of the three marks
 
 struct Core {
   cv::Point2d centre;
-  double module_px = 0;  // along the square's side
-  double noise = 0;      // of a pixel, of the contrast
-  double follows = 0;    // of a step of the circle about it, which takes in more of the blurred frame
+  double module_px = 0;     // along the square's side
+  double noise = 0;         // of a pixel, of the contrast
+  double module_noise = 0;  // what that leaves of the size, pixels
+  double follows = 0;       // of a step of the circle about it, which takes in more of the blurred frame
 };
 
 // Of levels as the search weighs them.
@@ -99,7 +100,8 @@ cv::Mat Evened(const cv::Mat& grey, double light, double share) {
     for (int row = 0; row < grey.rows; ++row) {
       for (int i = 0; i < grey.cols; ++i) {
         const double level = grey.at<float>(row, i);
-        if (level < (1 - share) * plane.dot(at(row, i))) continue;
+        const double expected = plane.dot(at(row, i));
+        if (std::fabs(level - expected) > share * expected) continue;
         products += at(row, i) * at(row, i).t();
         sums += at(row, i) * level;
       }
@@ -140,9 +142,10 @@ std::vector<float> LevelsWithin(const cv::Mat& grey, cv::Point2d middle, double 
 // Its size is all that is dark up to the middle of the ring, where the frame's blur adds what the square's takes away.
 Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double turn_deg, double hidden) {
   constexpr double kReach = 2.2;
-  constexpr double kSizeReach = 2.3;
   constexpr double kRingMiddle = 2;
   constexpr double kSeen = 4.1;  // the paper about the mark
+  // Half the root of the square's pixels over its side: by so much noise over the contrast moves a module.
+  constexpr double kNoiseModulePx = 0.23;
   const int reach = cvCeil(kSeen * module) + 1;
   const cv::Rect part =
       cv::Rect(cvRound(mark.centre.x) - reach, cvRound(mark.centre.y) - reach, 2 * reach + 1, 2 * reach + 1) &
@@ -165,11 +168,14 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double tu
     core.centre += cv::Point2d(dark[0], dark[1]) / dark[2];
   }
   core.follows = std::clamp(FollowsCircle(grey, core.centre - corner, kReach * module, 1), 0.0, 0.9);
-  const std::vector<float> inside = LevelsWithin(grey, core.centre - corner, kSizeReach * module);
+  // Means throughout: noise that is cut off at black lifts them, and leaves a median where it is.
+  const std::vector<float> inside = LevelsWithin(grey, core.centre - corner, module);
   if (inside.empty()) return {};
-  const double square = LevelAt(inside, 0.25);
+  const auto pixels = static_cast<double>(inside.size());
+  const double square = std::accumulate(inside.begin(), inside.end(), 0.0) / pixels;
   const double dark = DarknessOfSquare(grey, core.centre - corner, kRingMiddle * module, turn_deg);
   core.module_px = square < 1 ? std::sqrt(std::max(dark, 0.0) / (1 - square)) / 3 : 0;
+  core.module_noise = core.noise * std::hypot(kNoiseModulePx, core.module_px / 2 / std::sqrt(pixels));
   return core;
 }
 
@@ -202,10 +208,8 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
   constexpr double kRimPx = 0.0125;         // and those on the circle's rim, times how dark they are
   constexpr double kCoreModulePx = 0.0065;  // what is left of the squares' sizes
   constexpr double kRimModulePx = 0.1;  // and of their corners, which blur rounds, as much as the circle is followed
-  // Noise over the contrast moves a centre by the circle's second moment over the square's weight, and the square's
-  // side by half the root of the circle's pixels over it.
+  // Noise over the contrast moves a centre by the circle's second moment over the square's weight.
   constexpr double kNoisePx = 0.48;
-  constexpr double kNoiseModulePx = 0.23;
   if (!view.complete()) return;
   const double hidden = 8 * codec.luma / std::sqrt(12.0);  // noise of a pixel that a codec's steps take off it
   const double turn = view.turn_deg * CV_PI / 180;
@@ -231,7 +235,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
     covariance(2 * i, 2 * i) = covariance(2 * i + 1, 2 * i + 1) = std::pow(left(kApartPx), 2);
     rows.push_back(FromKnownError(mark.centre.y - core.centre.y, left(kCorePx)));
     module_off += (mark.module_px - core.module_px / upright) / 3;
-    module_squares += std::pow(kNoiseModulePx * core.noise / 3, 2);
+    module_squares += std::pow(core.module_noise / 3, 2);
     follows += core.follows / 3;
   }
   phase.Find("marks")->Trust(std::move(rows));
