@@ -131,7 +131,7 @@ std::vector<Trial> TryIso(const Condition& condition, cv::RNG& random) {
   const cv::Point2d middle((photo.cols - 1) / 2.0, (photo.rows - 1) / 2.0);
   const auto region = TurnedRectangle(middle, condition.rows, condition.columns, condition.turn_deg);
   const IsoMtf iso = MeasureIsoMtf(photo, region, TransferOf(condition));
-  const CodecSteps codec = condition.jpeg == 0 ? CodecSteps() : StepsOf(AsInput(condition, photo).content.value_or(""));
+  const CodecSteps codec = StepsOf(AsInput(condition, photo).content.value_or(""));
   const IsoFigures again = MeasureCodedAgain(photo, region, TransferOf(condition), codec);
   std::vector<Trial> trials;
   const auto add = [&](double IsoFigures::*figure, double truth) {

@@ -89,10 +89,7 @@ SlantedEdge EdgeOf(const cv::Mat& region) {
 // Standard deviation of independent noise: of two normal values the median of |a - b| is 0.954 sigma.
 double NoiseBetweenNeighbours(const cv::Mat& noise) {
   const cv::Mat_<double> steps = cv::abs(noise.colRange(1, noise.cols) - noise.colRange(0, noise.cols - 1));
-  std::vector<double> sorted(steps.begin(), steps.end());
-  const auto middle = sorted.begin() + static_cast<std::ptrdiff_t>(sorted.size() / 2);
-  std::nth_element(sorted.begin(), middle, sorted.end());
-  return *middle / 0.954;
+  return Median({steps.begin(), steps.end()}) / 0.954;
 }
 
 // The region without its noise, as it lies in the photo, in levels.

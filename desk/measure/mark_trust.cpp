@@ -192,13 +192,8 @@ double TurnOf(const Places& p) { return std::atan2(-Right(p).y, Right(p).x) * 18
 Uncertainty FromKnownError(double error, double standard, const char* method) {
   const double off = std::fabs(error);
   const double all = std::hypot(off, standard);
-  const auto below = [&](double x) { return 0.5 * std::erfc(-x / standard / std::sqrt(2.0)); };
-  double low = off;
-  double high = off + 2 * standard;
-  for (int step = 0; step < 40 && standard > 0; ++step) {
-    const double middle = (low + high) / 2;
-    (below(middle - off) - below(-middle - off) < kCoverage ? low : high) = middle;
-  }
+  const auto below = [&](double x) { return 0.5 * std::erfc((off - x) / standard / std::sqrt(2.0)); };
+  const double high = HalfWidthHolding(below, off, off + 2 * standard);
   return {all, high, all == 0 ? 1 : high / all, method};
 }
 

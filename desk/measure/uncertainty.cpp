@@ -121,16 +121,14 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "Marks: how far the search's places lie from the centres of gravity of the marks' inner squares in evened "
        "light, which are good to 0.005 px (type B) and beside each other to 0.003 px, but for what noise moves them, "
        "carried to the legs and the turn; a module is good to 0.0065 px (type B) and noise. Where the blur is over a "
-       "fifth "
-       "of a module the frame shines into the circle about the square: what moves a centre then counts by as much more "
-       "as it follows the circle, and of that 0.0125 px, and 0.1 px of a module, are added (type B). In a JPEG file "
-       "noise is hidden "
-       "up to the first step of its table, over the root of 12 (type B). Registration: the grey levels left over under "
-       "the map of all matches, by 64 parts of the picture (as noise may be alike between neighbours), tell where the "
-       "best map lies and how surely; what lies between it and either map is in that one's uncertainty, and the "
-       "distance of both maps has it by 400 draws (JCGM 101). Type B, of interpolated pixels: 0.0015 px of a place and "
-       "0.0038 px of an enlargement at the picture's sides; none for depth in the scene and distortion, which no "
-       "affine map follows."},
+       "fifth of a module the frame shines into the circle about the square: what moves a centre then counts by as "
+       "much more as it follows the circle, and of that 0.0125 px, and 0.1 px of a module, are added (type B). In a "
+       "JPEG file noise is hidden up to the first step of its table, over the root of 12 (type B). Registration: the "
+       "grey levels left over under the map of all matches, by 64 parts of the picture (as noise may be alike between "
+       "neighbours), tell where the best map lies and how surely; what lies between it and either map is in that one's"
+       " uncertainty, and the distance of both maps has it by 400 draws (JCGM 101). Type B, of interpolated pixels: "
+       "0.0015 px of a place and 0.0038 px of an enlargement at the picture's sides; none for depth in the scene and "
+       "distortion, which no affine map follows."},
       {kSpotMethod,
        "Type B alone: the 95 % quantiles of the errors of 3,000 simulated spots, half sharp and half soft, by contrast "
        "times the root of the pixels over the noise, s: of the area 0.48 + 1.5 / s of it, of the contrast 0.45 + 6 / s "
@@ -178,6 +176,15 @@ Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, co
   return {standard, factor * standard, factor, method};
 }
 
+double HalfWidthHolding(const std::function<double(double)>& below, double low, double high) {
+  constexpr int kSteps = 50;
+  for (int step = 0; step < kSteps; ++step) {
+    const double middle = (low + high) / 2;
+    (below(middle) - below(-middle) < kCoverage ? low : high) = middle;
+  }
+  return high;
+}
+
 Uncertainty OffBy(double error, const Uncertainty& about, double degrees_of_freedom) {
   const double off = std::fabs(error);
   if (!(off > 0) || !(about.standard > 0)) return about;
@@ -186,12 +193,7 @@ Uncertainty OffBy(double error, const Uncertainty& about, double degrees_of_free
     const double t = (x - off) / about.standard;
     return (1 + std::copysign(StudentShare(std::fabs(t), degrees), t)) / 2;
   };
-  double low = 0;
-  double high = off + about.expanded;
-  for (int step = 0; step < 50; ++step) {
-    const double middle = (low + high) / 2;
-    (below(middle) - below(-middle) < kCoverage ? low : high) = middle;
-  }
+  const double high = HalfWidthHolding(below, 0, off + about.expanded);
   const double standard = std::hypot(off, about.standard);
   return {standard, high, high / standard, about.method};
 }

@@ -1,6 +1,7 @@
 #ifndef QVTESTER_DESK_MEASURE_UNCERTAINTY_H_
 #define QVTESTER_DESK_MEASURE_UNCERTAINTY_H_
 
+#include <functional>
 #include <opencv2/core.hpp>
 #include <string>
 #include <vector>
@@ -44,6 +45,10 @@ double StudentFactor(double degrees_of_freedom);
 
 /// Type A of so many degrees of freedom and type B together, by Welch and Satterthwaite.
 Uncertainty Combined(double type_a, double degrees_of_freedom, double type_b, const char* method);
+
+/// Half the width of the interval about 0 that holds kCoverage of a distribution; `below(x)` is its share below x, and
+/// the answer lies between these bounds.
+double HalfWidthHolding(const std::function<double(double)>& below, double low, double high);
 
 /// Of a reading whose error is known, and left in it: the true value lies about where the error puts it as `about`
 /// says, with so many degrees of freedom.
