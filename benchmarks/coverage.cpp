@@ -1,12 +1,14 @@
 // Whether uncertainties keep their word: simulated readings of known truth, and the share of them whose true value lies
 // within the expanded uncertainty. 95 in 100 is meant, 93 to 97 is promised.
-//   coverage_accuracy [--check] [--quick] [NUMBER] [WORD...]     --quick: 12 readings a row in place of 1000, of
-//   fewer conditions; NUMBER: so many readings a row; of rows that hold all words, or one of a WORD|WORD
+//   coverage_accuracy [--check] [--quick] [--seed N] [NUMBER] [WORD...]
+//   --quick: 12 readings a row in place of 1000, of fewer conditions; --seed: other readings than the documents', which
+//   are of 0; NUMBER: so many readings a row; of rows that hold all words, or one of a WORD|WORD
 
 #include <algorithm>
 #include <array>
 #include <atomic>
 #include <cmath>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <functional>
@@ -733,14 +735,19 @@ void PrintRow(const Group& group, const char* figure, const Condition& condition
   std::fflush(stdout);
 }
 
-void PrintGroup(const Group& group, const Condition& condition, int trials,
+// So many readings of their own a row.
+struct Draws {
+  int trials, seed;
+};
+
+void PrintGroup(const Group& group, const Condition& condition, const Draws& draws,
                 const std::function<bool(const std::string& row)>& wanted, cv::Vec2d& within) {
   const auto row_wanted = [&](const char* figure) { return wanted(std::string(figure) + ", " + condition.name); };
   if (std::none_of(group.figures.begin(), group.figures.end(), row_wanted)) return;
-  std::vector<std::vector<Trial>> done(group.figures.size(), std::vector<Trial>(trials));
-  cv::parallel_for_({0, trials}, [&](const cv::Range& range) {
+  std::vector<std::vector<Trial>> done(group.figures.size(), std::vector<Trial>(draws.trials));
+  cv::parallel_for_({0, draws.trials}, [&](const cv::Range& range) {
     for (int i = range.start; i < range.end; ++i) {
-      cv::RNG random(1000 + i);
+      cv::RNG random(1000 + 1000000 * static_cast<std::uint64_t>(draws.seed) + i);
       const std::vector<Trial> figures = group.run(condition, random);
       for (std::size_t k = 0; k < done.size(); ++k) done[k][i] = figures.at(k);
     }
@@ -759,6 +766,12 @@ int main(int count, char** arguments) {
   constexpr int kFull = 1000;
   int trials = Trials(kFull, 12);
   const bool quick = trials < kFull;
+  int seed = 0;
+  const auto option = std::find(words.begin(), words.end(), "--seed");
+  if (option < words.end() - 1) {
+    seed = std::stoi(option[1]);
+    words.erase(option, option + 2);
+  }
   if (!words.empty() && words[0].find_first_not_of("0123456789") == std::string::npos) {
     trials = std::stoi(words[0]);
     words.erase(words.begin());
@@ -780,7 +793,7 @@ int main(int count, char** arguments) {
     for (const qv::Condition& condition : qv::kConditions) {
       const bool costly = group.kind >= qv::Group::kChart && &condition != qv::kConditions;
       if (!group.Takes(condition) || (quick && (costly || !condition.quick()))) continue;
-      qv::PrintGroup(group, condition, trials, wanted, within);
+      qv::PrintGroup(group, condition, {trials, seed}, wanted, within);
     }
   }
   if (!words.empty()) return 0;
