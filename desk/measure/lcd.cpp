@@ -1,6 +1,8 @@
 // A display in a photo: what it shows, judged by the library's own rules.
 
 #include <algorithm>
+#include <array>
+#include <cmath>
 #include <opencv2/imgproc.hpp>
 
 #include "desk/base/failure.h"
@@ -147,20 +149,87 @@ void Collect(Phase& phase, const LcdFinding& found) {
   phase.Add("corners", columns, rows);
 }
 
+// What straightening to whole levels adds to a mean, in levels: it weighs four neighbours by 32nds of a pixel each way,
+// and rounds halves up. Of sums in steps of 1 / q that is 1 / (2 q), unless neighbours are alike.
+double HalvesRoundedUp(const LcdFinding& found, const cv::Mat& within) {
+  constexpr int kPositions = 32;
+  constexpr int kEvery = 5;  // rows and columns, which tell as much as all
+  const cv::Size size = found.screen.size();
+  const auto right = static_cast<float>(size.width - 0.5);
+  const auto below = static_cast<float>(size.height - 0.5);
+  const std::array<cv::Point2f, 4> edges = {{{-0.5f, -0.5f}, {right, -0.5f}, {right, below}, {-0.5f, below}}};
+  const cv::Matx33d map(cv::getPerspectiveTransform(edges.data(), found.corners.data()));
+  const auto step = [](double place) {  // largest power of two up to 32 that divides the position
+    const int position = cvRound(place * kPositions) & (kPositions - 1);
+    return position == 0 ? 1.0 : static_cast<double>(position & -position) / kPositions;
+  };
+  double sum = 0;
+  int count = 0;
+  for (int row = 0; row < size.height; row += kEvery) {
+    for (int column = 0; column < size.width; column += kEvery, ++count) {
+      const cv::Vec3d at = map * cv::Vec3d(column, row, 1);
+      const double steps = step(at[0] / at[2]) * step(at[1] / at[2]);
+      if (steps < 1) sum += steps / 2;
+    }
+  }
+  const cv::Size pairs(within.cols - 1, within.rows);
+  if (pairs.width < 1) return 0;
+  const double differ = cv::norm(within(cv::Rect({0, 0}, pairs)), within(cv::Rect({1, 0}, pairs)), cv::NORM_L2SQR) /
+                        (3.0 * pairs.area());  // of neighbours, squared
+  return sum / count * (1 - std::exp(-CV_PI * CV_PI * differ / 2));
+}
+
+// By how much the screen's mean is off for each side found a pixel too far out: clockwise from the upper one.
+std::array<cv::Vec3d, 4> OffBySides(const cv::Mat& screen) {
+  constexpr int kStrip = 4;  // pixels
+  const int w = screen.cols;
+  const int h = screen.rows;
+  const int strip = std::min({kStrip, w, h});
+  const cv::Scalar mean = cv::mean(screen);
+  std::array<cv::Vec3d, 4> off;
+  const std::array<cv::Rect, 4> sides = {cv::Rect(0, 0, w, strip), cv::Rect(w - strip, 0, strip, h),
+                                         cv::Rect(0, h - strip, w, strip), cv::Rect(0, 0, strip, h)};
+  for (int i = 0; i < 4; ++i) {
+    const cv::Scalar more = (cv::mean(screen(sides[i])) - mean) / (i % 2 == 0 ? h : w);
+    off[i] = {more[0], more[1], more[2]};
+  }
+  return off;
+}
+
+cv::Mat PlainPhoto(const cv::Mat& photo) {
+  cv::Mat plain;
+  photo.convertTo(plain, CV_8U, photo.depth() == CV_16U ? 1.0 / 257 : 1);
+  if (plain.channels() != 3)
+    cv::cvtColor(plain, plain, plain.channels() == 1 ? cv::COLOR_GRAY2BGR : cv::COLOR_BGRA2BGR);
+  return plain;
+}
+
 // Noise is that of the photo within the screen: straightening makes neighbours alike. Of the result field's and the
-// bars' colours it is taken to be the same.
+// bars' colours it is taken to be the same. Straightening rounds again, to whole levels; so does the change to grey.
 void TrustMeans(Phase& phase, const LcdFinding& found, const CodecSteps& codec) {
-  cv::Mat photo;
-  found.photo.convertTo(photo, CV_8U, found.photo.depth() == CV_16U ? 1.0 / 257 : 1);
-  if (photo.channels() != 3)
-    cv::cvtColor(photo, photo, photo.channels() == 1 ? cv::COLOR_GRAY2BGR : cv::COLOR_BGRA2BGR);
+  constexpr int kDraws = 2000;
+  constexpr double kRounding = 1.0 / 12;  // variance of a whole level, of a pixel
+  constexpr double kSidePx = 0.02;        // standard uncertainty of a side's place
+  constexpr double kGreyOfRounded = 0.299 * 0.299 + 0.587 * 0.587 + 0.114 * 0.114;
+  const cv::Mat photo = PlainPhoto(found.photo);
   const cv::Mat corners(found.corners);
   const cv::Rect bounds = cv::boundingRect(corners);
   const cv::Point middle = (bounds.tl() + bounds.br()) / 2;
   const cv::Size half(bounds.width / 4, bounds.height / 4);  // within, however it is turned
-  const MeanErrors errors(photo(cv::Rect(middle - cv::Point(half), half * 2) & cv::Rect({}, photo.size())), codec);
+  const cv::Mat within = photo(cv::Rect(middle - cv::Point(half), half * 2) & cv::Rect({}, photo.size()));
+  const MeanErrors errors(within, codec);
+  const double halves = found.photo.depth() == CV_8U ? HalvesRoundedUp(found, within) : 0;
+  const cv::Size size = found.screen.size();
   const double area = cv::contourArea(corners);
-  const std::vector<cv::Vec3d> off = errors.OfMean(area);
+  const double rim = 2 * QVTester_LCD().margin_ * std::min(size.width, size.height);
+  const double inner = area * (1 - rim / size.width) * (1 - rim / size.height);
+  std::vector<cv::Vec3d> off = errors.OfMean(inner, kDraws);
+  const std::array<cv::Vec3d, 4> by_side = OffBySides(PlainPhoto(found.screen));
+  cv::RNG random(12);
+  for (cv::Vec3d& one : off) {
+    for (int k = 0; k < 3; ++k) one[k] += halves + std::sqrt(kRounding / inner) * random.gaussian(1);
+    for (const cv::Vec3d& side : by_side) one += side * (kSidePx * random.gaussian(1));
+  }
   const char* const channels[] = {"red", "green", "blue"};
   const QVLcdResult& r = found.result;
   for (int i = 0; i < 3; ++i) {
@@ -173,14 +242,16 @@ void TrustMeans(Phase& phase, const LcdFinding& found, const CodecSteps& codec) 
       return total > 0 ? mean(bgr, i) / total : 0;
     })});
   }
-  const int side = std::min(found.screen.cols, found.screen.rows) / 12;  // of a point, as the library has it
-  const double part = 1.0 * side * side * area / static_cast<double>(found.screen.total());  // of the photo
-  const std::vector<cv::Vec3d> off_point = errors.OfMean(part);
-  const Uncertainty of_level = OfDrawn(off_point, 0, GreyOfMeans);
-  phase.Find("levels")->Trust(std::vector<Uncertainty>(9, of_level));
+  // Of a point, as the library has it; its rim's pixels, weighed in part, make it a third of one larger to noise.
+  const int side = std::min(size.width, size.height) / 12;
+  const double part = std::pow(side + 1.0 / 3, 2) * area / static_cast<double>(found.screen.total());  // of the photo
+  const double rounded = kRounding * (1 + kGreyOfRounded) / part;
+  std::vector<cv::Vec3d> off_point = errors.OfMean(part, kDraws);
+  for (cv::Vec3d& one : off_point) one += cv::Vec3d::all(halves + std::sqrt(rounded) * random.gaussian(1));
+  phase.Find("levels")->Trust(std::vector<Uncertainty>(9, OfDrawn(off_point, 0, GreyOfMeans)));
   cv::Mat levels(3, 3, CV_64F);
   std::copy(std::begin(r.levels_), std::end(r.levels_), levels.begin<double>());
-  phase.Find("uniformity")->Trust({errors.OfEvenness(levels, part)});
+  phase.Find("uniformity")->Trust({errors.OfEvenness(levels, part, rounded)});
 }
 
 class Lcd : public Measurement {

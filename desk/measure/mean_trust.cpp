@@ -120,7 +120,7 @@ MeanErrors::MeanErrors(const cv::Mat& pixels, const CodecSteps& codec)
   }
 }
 
-std::vector<cv::Vec3d> MeanErrors::OfMean(double area) const {
+std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
   if (degrees_ < 1) return {};
   const cv::Matx33d root = RootOf(covariance_ * (1 / area));
   const CodecRounding codec(pixels_, codec_, spread_);
@@ -130,7 +130,7 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area) const {
   cv::meanStdDev(pixels_, mean, deviation);
   for (int k = 0; k < 3 && codec_.luma == 0; ++k) rounding[k] = HalfInterval(1, deviation[k]);
   cv::RNG random(9);
-  std::vector<cv::Vec3d> errors(kColourDraws);
+  std::vector<cv::Vec3d> errors(draws);
   for (cv::Vec3d& error : errors) {
     cv::Vec3d normal;
     for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
@@ -152,7 +152,7 @@ double MeanErrors::RoundingVariance(const cv::Mat& part, const cv::Vec3d& weight
   return squares;
 }
 
-Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area) const {
+Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area, double rounded) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
   const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
   // A codec rounds each block's luma to a step; with its chroma, the channels to levels, alike where that hardly
@@ -165,7 +165,7 @@ Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area) const {
   const double levels = codec_.luma == 0
                             ? std::pow(HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]})), 2) / 3
                             : RoundingVariance(pixels_(middle), weights);
-  const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + luma_steps + levels);
+  const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + luma_steps + levels + rounded);
   const cv::Mat even = WithoutNoise(means, noise, degrees_);
   cv::RNG random(10);
   std::vector<double> errors;

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "desk/measure/codec_steps.h"
+#include "desk/measure/patch_trust.h"
 #include "desk/measure/uncertainty.h"
 
 namespace qv {
@@ -19,10 +20,11 @@ class MeanErrors {
   MeanErrors(const cv::Mat& pixels, const CodecSteps& codec);
 
   /// Of a mean over so many pixels: levels, blue first. None where there are too few pixels to tell their noise.
-  std::vector<cv::Vec3d> OfMean(double area) const;
+  std::vector<cv::Vec3d> OfMean(double area, int draws = kColourDraws) const;
   /// Of the smallest over the largest of a grid of means of grey (CV_64F) over so many pixels each, drawn about what
-  /// their true values probably are: of even levels noise makes the least smaller and the largest larger.
-  Uncertainty OfEvenness(const cv::Mat& means, double area) const;
+  /// their true values probably are: of even levels noise makes the least smaller and the largest larger. `rounded` is
+  /// the variance of what rounds each mean's pixels after the photo was stored.
+  Uncertainty OfEvenness(const cv::Mat& means, double area, double rounded = 0) const;
 
  private:
   double RoundingVariance(const cv::Mat& part, const cv::Vec3d& weights) const;
