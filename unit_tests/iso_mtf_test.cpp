@@ -3,6 +3,9 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
+#include <opencv2/imgcodecs.hpp>
+#include <string>
+#include <vector>
 
 #include "desk/simulation/method_law.h"
 #include "unit_tests/drawing.h"
@@ -145,6 +148,32 @@ TEST(IsoMtf, PolarityPlaceAndOrientationLeaveItAlone) {
                                 cv::Point2d(3, -20)}) {  // the window goes with the edge, not with the region
     EXPECT_NEAR(mtf50, MeasureEdge({90, 185, 0.8, 0, off}).figures.mtf50, 5e-3 * mtf50);
   }
+}
+
+TEST(IsoMtf, KnowsWhatACodecTakesOffAnEdge) {
+  constexpr int kEdges = 12;
+  double lost = 0;
+  double told = 0;
+  for (int i = 0; i < kEdges; ++i) {
+    const bool lying = i % 2 != 0;
+    cv::Mat photo = DrawEdgePhoto({{151, 333}, {75.3 + i / 3.0, 166}, 3 + i / 3.0, 0.8, 36, 180});
+    if (lying) cv::transpose(photo, photo);
+    cv::Mat noise(photo.size(), CV_32F);
+    cv::RNG(i + 1).fill(noise, cv::RNG::NORMAL, 0, 2.5);
+    cv::Mat(photo + noise).convertTo(photo, CV_8U);
+    std::vector<uchar> file;
+    cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, 75});
+    const cv::Point2d middle(photo.cols / 2.0, photo.rows / 2.0);
+    const auto region = TurnedRectangle(middle, 301, 97, lying ? 90 : 0);
+    const IsoMtf plain = MeasureIsoMtf(photo, region, kLinear);
+    const IsoMtf coded = MeasureIsoMtf(cv::imdecode(file, cv::IMREAD_GRAYSCALE), region, kLinear,
+                                       StepsOf(std::string(file.begin(), file.end())));
+    lost += (plain.figures.mtf10 - coded.figures.mtf10) / kEdges;
+    told += -coded.of_codec.mean.mtf10 / kEdges;
+    EXPECT_GT(UncertaintyOf(coded, &IsoFigures::mtf10).expanded, -coded.of_codec.mean.mtf10) << i;
+  }
+  EXPECT_GT(lost, 0.02);
+  EXPECT_NEAR(lost, told, lost / 3);
 }
 
 TEST(IsoMtf, WhereThereIsNoFigureItSaysWhy) {

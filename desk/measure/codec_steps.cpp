@@ -77,14 +77,14 @@ CodecSteps StepsAtQuality(int quality) {
   return {first(kFirstOfLuma), first(kFirstOfChroma)};
 }
 
-cv::Mat CodedAgain(const cv::Mat& photo, const cv::Rect& part, const CodecSteps& codec) {
-  cv::Mat again = photo(part).clone();
-  if (codec.luma == 0) return again;
-  const auto start = [](int first) { return (first + kBlock / 2) / kBlock * kBlock + kBlock / 2 - first; };
+cv::Mat Coded(const cv::Mat& part, cv::Point first, const CodecSteps& codec) {
+  cv::Mat coded = part.clone();
+  if (codec.luma == 0) return coded;
+  const auto start = [](int at) { return ((-at) % kBlock + kBlock) % kBlock; };
   cv::Mat_<float> block(kBlock, kBlock);
-  for (int top = start(part.y); top + kBlock <= part.height; top += kBlock) {
-    for (int left = start(part.x); left + kBlock <= part.width; left += kBlock) {
-      cv::Mat pixels = again(cv::Rect(left, top, kBlock, kBlock));
+  for (int top = start(first.y); top + kBlock <= part.rows; top += kBlock) {
+    for (int left = start(first.x); left + kBlock <= part.cols; left += kBlock) {
+      cv::Mat pixels = coded(cv::Rect(left, top, kBlock, kBlock));
       pixels.convertTo(block, CV_32F, 1, -128);
       cv::dct(block, block);
       for (int i = 0; i < kBlock; ++i) {
@@ -97,7 +97,7 @@ cv::Mat CodedAgain(const cv::Mat& photo, const cv::Rect& part, const CodecSteps&
       block.convertTo(pixels, CV_8U, 1, 128);
     }
   }
-  return again;
+  return coded;
 }
 
 }  // namespace qv

@@ -19,9 +19,10 @@ CodecSteps StepsOf(const std::string& content);
 /// Of what cv::imencode and others with the standard tables (T.81, Annex K) write at this quality.
 CodecSteps StepsAtQuality(int quality);
 
-/// A part of a photo, CV_8UC1, as the codec leaves it once more, its blocks half-way between those of the first time,
-/// which begin at the photo's first pixel. Blocks that reach over the part's rim stay as they are.
-cv::Mat CodedAgain(const cv::Mat& photo, const cv::Rect& part, const CodecSteps& codec);
+/// A part of a photo, CV_8UC1, as the codec leaves it; its blocks begin at the photo's first pixel. Those that reach
+/// over the part's rim stay as they are.
+/// @param first  the part's first pixel in the photo.
+cv::Mat Coded(const cv::Mat& part, cv::Point first, const CodecSteps& codec);
 
 /// Standard uncertainty, in levels, of what the codec does to the mean of a whole picture. Blocks half-way between two
 /// steps, one in eight times the first table entry, are all rounded away from middle grey, by half a step; the entry

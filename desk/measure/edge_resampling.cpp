@@ -10,51 +10,8 @@ namespace qv {
 
 namespace {
 
-constexpr int kBlockRows = 8;       // kept together: interpolation and JPEG tie neighbouring rows
-constexpr double kSmoothing = 0.6;  // half the width of the smoothing, in sigmas of the edge
-constexpr double kSpreads =
-    4;  // sigmas and kBeyond pixels to each side of the edge, where it differs from its plateaus
-constexpr double kBeyond = 2;
+constexpr int kBlockRows = 8;    // kept together: interpolation and JPEG tie neighbouring rows
 constexpr double kMoved = 0.05;  // pixels
-
-// A parabola through 2 m + 1 neighbours, its value at the middle (Savitzky and Golay).
-std::vector<double> Smoothed(const std::vector<double>& levels, int m) {
-  std::vector<double> smooth = levels;
-  const int count = static_cast<int>(levels.size());
-  for (int k = m; k + m < count; ++k) {
-    double sum = 0;
-    for (int i = -m; i <= m; ++i) sum += (3 * m * m + 3 * m - 1 - 5 * i * i) * levels[k + i];
-    smooth[k] = 3 * sum / ((2 * m + 3) * (2 * m + 1) * (2 * m - 1));
-  }
-  return smooth;
-}
-
-EdgeSpread SpreadOf(const SlantedEdge& edge) {
-  return ProjectEdge(edge, std::min(kSpreads * edge.sigma_px + kBeyond, edge.room)).whole;
-}
-
-// The region without its noise: each pixel by its distance from the edge, which is moved across by so many pixels.
-cv::Mat Noiseless(const SlantedEdge& edge, const EdgeSpread& spread, double moved = 0) {
-  const std::vector<double> share =
-      Smoothed(spread.levels, std::max(1, cvRound(kSmoothing * edge.sigma_px * kBinsPerPixel)));
-  const int last = static_cast<int>(share.size()) - 1;
-  cv::Mat picture(edge.light.size(), CV_64F);
-  for (int row = 0; row < picture.rows; ++row) {
-    const double across = 1 / std::hypot(1, edge.curve.Slope(row));
-    const double place = edge.curve.Column(row);
-    const double t = row - edge.curve.middle_row;
-    for (int i = 0; i < picture.cols; ++i) {
-      const double d = (i - place - moved) * across;
-      const double bin = d * kBinsPerPixel + spread.middle;
-      const int below = std::clamp(cvFloor(bin), 0, last - 1);
-      double risen = d > 0 ? 1 : 0;
-      if (bin >= 0 && bin < last) risen = share[below] + (share[below + 1] - share[below]) * (bin - below);
-      const double left = edge.left.At(d, t);
-      picture.at<double>(row, i) = left + (edge.right.At(d, t) - left) * risen;
-    }
-  }
-  return picture;
-}
 
 // Blocks of the noise's rows in another order, some twice, each row where it lay as seen from the edge.
 cv::Mat Redrawn(const cv::Mat& noiseless, const cv::Mat& noise, const EdgeCurve& curve, cv::RNG& random) {
@@ -95,7 +52,7 @@ double NoiseBetweenNeighbours(const cv::Mat& noise) {
 // The region without its noise, as it lies in the photo, in levels.
 cv::Mat NoiselessRegion(const SlantedEdge& edge, const EdgeSpread& spread, double moved) {
   cv::Mat plain;
-  Noiseless(edge, spread, moved).convertTo(plain, CV_32F, 255);
+  NoiselessLight(edge, spread, 0, moved).convertTo(plain, CV_32F, 255);
   if (!edge.lying) return plain;
   cv::Mat turned;
   cv::transpose(plain, turned);
@@ -110,13 +67,13 @@ NoiselessReading ReadNoiseless(const cv::Mat& region, const std::function<double
   if (edge.reason != nullptr) return {kNone, kNone, kNone, kNone};
   const SlantedEdge lit = edge;
   for (Plateau* plateau : {&edge.left, &edge.right}) plateau->by_distance = plateau->by_row = 0;
-  const EdgeSpread spread = SpreadOf(edge);
+  const EdgeSpread spread = RiseOf(edge);
   if (spread.levels.empty()) return {kNone, kNone, kNone, kNone};
   const auto moved = [&](double by) { return read(NoiselessRegion(edge, spread, by)); };
   const double value = moved(0);
   if (std::fabs(found - value) <= tolerance * value) return {value, value, value, value};
   const auto [low, high] = std::minmax({value, moved(-kMoved), moved(kMoved)});
-  return {value, low, high, read(NoiselessRegion(lit, SpreadOf(lit), 0))};
+  return {value, low, high, read(NoiselessRegion(lit, RiseOf(lit), 0))};
 }
 
 bool ShowsMoreThanEdge(const cv::Mat& region) {
@@ -124,9 +81,9 @@ bool ShowsMoreThanEdge(const cv::Mat& region) {
   constexpr double kLeastNoise = 1.0 / 255;
   const SlantedEdge edge = EdgeOf(region);
   if (edge.reason != nullptr) return false;
-  const EdgeSpread spread = SpreadOf(edge);
+  const EdgeSpread spread = RiseOf(edge);
   if (spread.levels.empty()) return false;
-  const cv::Mat noise = edge.light - Noiseless(edge, spread);
+  const cv::Mat noise = edge.light - NoiselessLight(edge, spread);
   const double rms = cv::norm(noise) / std::sqrt(static_cast<double>(noise.total()));
   return rms > kTimesNoise * std::max(kLeastNoise, NoiseBetweenNeighbours(noise));
 }
@@ -134,9 +91,9 @@ bool ShowsMoreThanEdge(const cv::Mat& region) {
 Uncertainty ResampleEdge(const cv::Mat& region, const std::function<double(const cv::Mat&)>& read) {
   const SlantedEdge edge = EdgeOf(region);
   if (edge.reason != nullptr) return {kNone, kNone, kNone, kResamplingMethod};
-  const EdgeSpread spread = SpreadOf(edge);
+  const EdgeSpread spread = RiseOf(edge);
   if (spread.levels.empty()) return {kNone, kNone, kNone, kResamplingMethod};
-  const cv::Mat noiseless = Noiseless(edge, spread);
+  const cv::Mat noiseless = NoiselessLight(edge, spread);
   const cv::Mat noise = edge.light - noiseless;
   const auto as_found = [&](const cv::Mat& picture) {
     cv::Mat turned = picture;

@@ -23,12 +23,20 @@ struct IsoFigures {
   double overshoot;            // of the edge beyond its plateaus, the larger of both sides, share of the step
 };
 
+/// By how much the codec of the photo's file puts each figure off, and how much of that is chance: the difference that
+/// it makes to a drawn edge which lies where the photo's does, is as sharp and as noisy, and is seen in the same light.
+/// Its line spread is taken for a Gaussian.
+struct CodecError {
+  IsoFigures mean = {}, chance = {};
+};
+
 struct IsoMtf {
   IsoFigures figures;
   std::array<IsoFigures, kBands> bands;  // the same from each quarter of the edge alone
   std::vector<double> response;          // at 0, kIsoStep, 2 kIsoStep, ... to 2 (units of Nyquist)
   double edge_angle_deg;  // of the edge from the nearer of the photo's rows and columns, -45 to 45; NaN where not found
-  const char* reason;     // why there is no figure, a phrase; null otherwise
+  CodecError of_codec;
+  const char* reason;  // why there is no figure, a phrase; null otherwise
 };
 
 inline constexpr double kIsoStep = 0.02;
@@ -42,20 +50,15 @@ inline constexpr double kSharpenedOvershoot = 0.05;
 /// @param gray     rows x cols, CV_8UC1, CV_16UC1 or CV_32FC1.
 /// @param corners  of a rectangle, in order around it: column and row, pixel centres at whole numbers. The edge runs
 ///                 along its longer sides, from one shorter side to the other; pixels outside the photo are left out.
+/// @param codec    of the photo's file, of which only the uncertainty takes notice.
 /// @return figures, or the reason why there are none.
 /// @throws cv::Exception for another type or an empty picture.
 /// Slanted edge after ISO 12233:2014 in linear light, four bins a pixel; steps: slanted_edge.cpp, iso_mtf.cpp.
-IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer);
+IsoMtf MeasureIsoMtf(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer,
+                     const CodecSteps& codec = {});
 
-/// The figures alone, of a photo whose file's codec is let loose on the region once more.
-IsoFigures MeasureCodedAgain(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer,
-                             const CodecSteps& codec);
-
-/// Of one figure, from the scatter of its bands; NaN where a band gives none.
-///
-/// @param again  the same from a photo that went through its file's codec once more: what that does to a figure, it
-///               has done before. Null for a file that keeps all.
-Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure, const IsoFigures* again = nullptr);
+/// Of one figure, from the scatter of its bands and what the codec does to them; NaN where a band gives none.
+Uncertainty UncertaintyOf(const IsoMtf& iso, double IsoFigures::*figure);
 
 }  // namespace qv
 

@@ -1,6 +1,7 @@
 #include "desk/measure/line_spread.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <complex>
 #include <limits>
@@ -50,19 +51,26 @@ LineSpread Differentiate(const EdgeSpread& spread, double reach) {
 }
 
 std::vector<double> ResponseCurve(const LineSpread& line, double step, int count) {
+  constexpr std::size_t kAtOnce = 4;  // turns that wait for nothing but themselves; all are added one after the other
   std::vector<std::complex<double>> sums(count);
-  for (std::size_t k = 0; k < line.weights.size(); ++k) {
-    const double place = line.first + static_cast<double>(k) / kBinsPerPixel;
-    const double turn = -2 * kPi * step * place;
-    const double c = std::cos(turn);
-    const double s = std::sin(turn);
-    double re = line.weights[k];
-    double im = 0;
+  for (std::size_t first = 0; first < line.weights.size(); first += kAtOnce) {
+    std::array<double, kAtOnce> c = {};
+    std::array<double, kAtOnce> s = {};
+    std::array<double, kAtOnce> re = {};
+    std::array<double, kAtOnce> im = {};
+    for (std::size_t i = 0; i < kAtOnce && first + i < line.weights.size(); ++i) {
+      const double turn = -2 * kPi * step * (line.first + static_cast<double>(first + i) / kBinsPerPixel);
+      c[i] = std::cos(turn);
+      s[i] = std::sin(turn);
+      re[i] = line.weights[first + i];
+    }
     for (auto& sum : sums) {
-      sum += std::complex<double>(re, im);
-      const double next = re * c - im * s;
-      im = re * s + im * c;
-      re = next;
+      for (std::size_t i = 0; i < kAtOnce; ++i) {
+        sum += std::complex<double>(re[i], im[i]);
+        const double next = re[i] * c[i] - im[i] * s[i];
+        im[i] = re[i] * s[i] + im[i] * c[i];
+        re[i] = next;
+      }
     }
   }
   std::vector<double> curve(count);

@@ -86,13 +86,9 @@ void WarnOfIso(Record& record, const IsoMtf& iso, std::size_t i) {
 // The standard's figures of a region, in the photo as it was taken.
 void AddIsoFigures(Record& record, const cv::Mat& gray, const SharpnessRegion& region, std::size_t i) {
   const Transfer transfer = *ParseTransfer(record.request.parameters.at("transfer").get<std::string>());
-  const IsoMtf iso = MeasureIsoMtf(gray, region.outline, transfer);
-  const CodecSteps codec = record.inputs.at(0).codec;
-  std::optional<IsoFigures> again;
-  if (codec.luma != 0 && iso.reason == nullptr) again = MeasureCodedAgain(gray, region.outline, transfer, codec);
+  const IsoMtf iso = MeasureIsoMtf(gray, region.outline, transfer, record.inputs.at(0).codec);
   for (const IsoRow& row : kIsoRows) {
-    record.phase.Add(row.names[i], iso.figures.*row.figure)
-        .Trust({UncertaintyOf(iso, row.figure, again ? &*again : nullptr)});
+    record.phase.Add(row.names[i], iso.figures.*row.figure).Trust({UncertaintyOf(iso, row.figure)});
   }
   std::vector<double> frequencies(iso.response.size());
   for (std::size_t k = 0; k < frequencies.size(); ++k) frequencies[k] = static_cast<double>(k) * kIsoStep;

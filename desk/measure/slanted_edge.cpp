@@ -318,6 +318,18 @@ EdgeSpread Means(const Bins& bins, int least) {
   return spread;
 }
 
+// A parabola through 2 m + 1 neighbours, its value at the middle (Savitzky and Golay).
+std::vector<double> Smoothed(const std::vector<double>& levels, int m) {
+  std::vector<double> smooth = levels;
+  const int count = static_cast<int>(levels.size());
+  for (int k = m; k + m < count; ++k) {
+    double sum = 0;
+    for (int i = -m; i <= m; ++i) sum += (3 * m * m + 3 * m - 1 - 5 * i * i) * levels[k + i];
+    smooth[k] = 3 * sum / ((2 * m + 3) * (2 * m + 1) * (2 * m - 1));
+  }
+  return smooth;
+}
+
 }  // namespace
 
 EdgeSpreads ProjectEdge(const SlantedEdge& edge, double reach) {
@@ -354,6 +366,36 @@ EdgeSpreads ProjectEdge(const SlantedEdge& edge, double reach) {
   return spreads;
 }
 
+EdgeSpread RiseOf(const SlantedEdge& edge) {
+  constexpr double kSigmas = 4;
+  constexpr double kBeyond = 2;  // pixels
+  return ProjectEdge(edge, std::min(kSigmas * edge.sigma_px + kBeyond, edge.room)).whole;
+}
+
+cv::Mat NoiselessLight(const SlantedEdge& edge, const EdgeSpread& rise, int margin, double moved) {
+  constexpr double kSmoothing = 0.6;  // half the width of the smoothing, in sigmas of the edge
+  const std::vector<double> share =
+      Smoothed(rise.levels, std::max(1, cvRound(kSmoothing * edge.sigma_px * kBinsPerPixel)));
+  const int last = static_cast<int>(share.size()) - 1;
+  cv::Mat picture(edge.light.rows + 2 * margin, edge.light.cols + 2 * margin, CV_64F);
+  for (int i = 0; i < picture.rows; ++i) {
+    const double row = i - margin;
+    const double across = 1 / std::hypot(1, edge.curve.Slope(row));
+    const double place = edge.curve.Column(row);
+    const double t = row - edge.curve.middle_row;
+    for (int k = 0; k < picture.cols; ++k) {
+      const double d = (k - margin - place - moved) * across;
+      const double bin = d * kBinsPerPixel + rise.middle;
+      const int below = std::clamp(cvFloor(bin), 0, last - 1);
+      double risen = d > 0 ? 1 : 0;
+      if (bin >= 0 && bin < last) risen = share[below] + (share[below + 1] - share[below]) * (bin - below);
+      const double left = edge.left.At(d, t);
+      picture.at<double>(i, k) = left + (edge.right.At(d, t) - left) * risen;
+    }
+  }
+  return picture;
+}
+
 SlantedEdge LocateEdge(const cv::Mat& gray, const std::array<cv::Point2d, 4>& corners, const Transfer& transfer) {
   SlantedEdge edge;
   const auto refuse = [&](const char* reason) {
@@ -370,6 +412,7 @@ SlantedEdge LocateEdge(const cv::Mat& gray, const std::array<cv::Point2d, 4>& co
   const cv::Point last(cvCeil(region.middle.x + reach.x), cvCeil(region.middle.y + reach.y));
   const cv::Rect part = cv::Rect(first, last + cv::Point(1, 1)) & cv::Rect({}, gray.size());
   if (part.empty()) return refuse("the region lies outside the photo");
+  edge.first = part.tl();
   edge.light = LinearLight(gray(part), transfer);
   region.middle -= cv::Point2d(part.tl());
   edge.lying = std::fabs(region.along.x) > std::fabs(region.along.y);

@@ -35,6 +35,7 @@ inline constexpr int kBands = 4;  // along the edge, each with a spread of its o
 
 struct SlantedEdge {
   const char* reason = nullptr;  // why there is no edge, a phrase; null otherwise, and only then does the rest hold
+  cv::Point first;               // of `light` in the photo
   cv::Mat light;                 // the part of the photo about the region, CV_64F, the edge running down the rows
   EdgeRegion region;             // in `light`
   bool lying = false;            // rows and columns of the photo were swapped
@@ -63,6 +64,13 @@ struct EdgeSpreads {
 /// Up to `reach` pixels to each side, of all rows and of each of the bands; a band's may end after two fifths of that.
 /// A spread has no levels when too many of its bins see no pixel.
 EdgeSpreads ProjectEdge(const SlantedEdge& edge, double reach);
+
+/// Of all rows, as far as the edge differs from its plateaus.
+EdgeSpread RiseOf(const SlantedEdge& edge);
+
+/// `edge.light` without its noise, and so many pixels more to each side: each pixel by its distance from the edge,
+/// which is moved across by some pixels.
+cv::Mat NoiselessLight(const SlantedEdge& edge, const EdgeSpread& rise, int margin = 0, double moved = 0);
 
 }  // namespace qv
 

@@ -1,8 +1,10 @@
 #include "desk/measure/transfer.h"
 
+#include <algorithm>
 #include <cmath>
 #include <cstdlib>
 #include <sstream>
+#include <vector>
 
 namespace qv {
 
@@ -14,6 +16,15 @@ double Transfer::Light(double level) const {
     case Kind::kLinear: break;
   }
   return level;
+}
+
+double Transfer::Level(double light) const {
+  switch (kind) {
+    case Kind::kSrgb: return light <= 0.0031308 ? 12.92 * light : 1.055 * std::pow(light, 1 / 2.4) - 0.055;
+    case Kind::kGamma: return light <= 0 ? light : std::pow(light, 1 / gamma);
+    case Kind::kLinear: break;
+  }
+  return light;
 }
 
 std::string Transfer::Text() const {
@@ -51,6 +62,21 @@ cv::Mat LinearLight(const cv::Mat& levels, const Transfer& transfer) {
     light.forEach<double>([&](double& pixel, const int* /*place*/) { pixel = transfer.Light(pixel); });
   }
   return light;
+}
+
+cv::Mat Encoded(const cv::Mat& light, const Transfer& transfer) {
+  constexpr int kSteps = 4096;  // of light, between which levels are taken along a line
+  std::vector<float> table;
+  for (int step = 0; step <= kSteps; ++step) {
+    table.push_back(static_cast<float>(255 * transfer.Level(static_cast<double>(step) / kSteps)));
+  }
+  cv::Mat levels(light.size(), CV_32F);
+  levels.forEach<float>([&](float& level, const int* place) {
+    const double step = kSteps * std::clamp(light.at<double>(place), 0.0, 1.0);
+    const int below = std::min(static_cast<int>(step), kSteps - 1);
+    level = table[below] + static_cast<float>(step - below) * (table[below + 1] - table[below]);
+  });
+  return levels;
 }
 
 }  // namespace qv

@@ -17,6 +17,8 @@ struct Transfer {
 
   /// Light of a level; both are shares of full scale.
   double Light(double level) const;
+  /// Of which `Light` makes this.
+  double Level(double light) const;
   /// "srgb", "linear" or "gamma:G".
   std::string Text() const;
 };
@@ -26,6 +28,10 @@ std::optional<Transfer> ParseTransfer(std::string_view text);
 
 /// Light of each pixel, CV_64FC1, as a share of full scale: 255 in CV_8UC1, 65535 in CV_16UC1, 1 in CV_32FC1.
 cv::Mat LinearLight(const cv::Mat& levels, const Transfer& transfer);
+
+/// Levels of 0 to 255, CV_32FC1, of which it makes light like this, CV_64FC1; not rounded, and light cut off at 0
+/// and 1.
+cv::Mat Encoded(const cv::Mat& light, const Transfer& transfer);
 
 }  // namespace qv
 

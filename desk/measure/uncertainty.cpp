@@ -92,10 +92,9 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
       {kBandsMethod,
        "Each quarter of the edge gives a reading of its own; their scatter over the root of four is the standard "
        "uncertainty, with three degrees of freedom. Type B: 0.1 % for what the method itself leaves (bins, plateaus, "
-       "rounding of levels). A JPEG file's region goes through the file's own steps once more, its blocks half-way "
-       "between those of the first time: what that does to a figure beyond its scatter is taken for its error, which "
-       "the first time left in it. MTF10 at quality 75, of which the first time takes more, is not held by that: see "
-       "docs/accuracy.md. What light or chart do to the edge itself is not in it."},
+       "rounding of levels). A JPEG file's own steps are also taken on a drawn edge, as sharp as the one that was "
+       "found (a Gaussian), in its place, light and noise: what they change of a figure there, beyond chance, is "
+       "taken for an error of the reading. What light or chart do to the edge itself is not in it."},
       {kResamplingMethod,
        "The region is taken apart into its edge spread and its noise; the noise is drawn again in blocks of rows, "
        "50 times, and each picture is measured anew. The 95 % quantile of the readings' distance from the one without "
