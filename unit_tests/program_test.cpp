@@ -285,7 +285,9 @@ TEST_F(Program, NothingOfAnEarlierRunStaysAndNoFullDiskGoesUnseen) {
   folder_.Write("seen.png", cv::Mat(9, 9, CV_8UC1, cv::Scalar(3)));
   EXPECT_EQ(3, Run("flash missing.png --annotate seen.png").status);
   EXPECT_TRUE(cv::imread(folder_.Path("seen.png")).empty());
-  for (const char* name : {"a.png", "b.png", "c.png"}) folder_.Write(name, cv::Mat(9, 9, CV_8UC3, cv::Scalar::all(90)));
+  for (const char name : {'a', 'b', 'c'}) {
+    folder_.Write(std::string(1, name) + ".png", cv::Mat(9, 9, CV_8UC3, cv::Scalar::all(name)));
+  }
   EXPECT_EQ(0U, Run("flash a.png --annotate -").out.find("\x89PNG")) << "and the report elsewhere";
   EXPECT_THAT(Run("flash a.png --repeat b.png --repeat c.png").out, HasSubstr("medians of 3 photos"));
   const int status =

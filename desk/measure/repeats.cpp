@@ -3,7 +3,10 @@
 #include <algorithm>
 #include <cmath>
 #include <iterator>
+#include <map>
+#include <string>
 
+#include "desk/base/text.h"
 #include "qvtester/indices.h"
 
 namespace qv {
@@ -47,6 +50,18 @@ void Append(List& list, const List& more) {
   list.insert(list.end(), more.begin(), more.end());
 }
 
+// Photos with the same pixels are one photo, whose spread of nought would pass for certainty.
+void RefuseCopies(Record& record) {
+  std::map<std::string, std::string> seen;
+  for (const RecordedInput& input : record.inputs) {
+    const auto [first, is_new] = seen.try_emplace(input.pixels_hash, input.path);
+    if (is_new || input.pixels_hash.empty()) continue;
+    record.Say(Remark::kNoJudgement, "same_photo",
+               Format("%s holds the very pixels of %s: one photo does not tell how photos of a unit differ",
+                      input.path.c_str(), first->second.c_str()));
+  }
+}
+
 }  // namespace
 
 void JoinRepeats(Record& first, const std::vector<Record>& others) {
@@ -63,6 +78,7 @@ void JoinRepeats(Record& first, const std::vector<Record>& others) {
     first.phase.end_millis = other.phase.end_millis;
     first.end_millis = other.end_millis;
   }
+  RefuseCopies(first);
 }
 
 }  // namespace qv

@@ -32,10 +32,13 @@ bool ShowsPhoto(int code) {
 }
 
 std::string ValueText(const Reading& m, int decimals) {
+  if (std::isnan(m.value())) return "none";
   const std::string text = Format("%.*f", decimals, m.value());
   const std::string spread = m.repeats.empty() ? "" : Format(" (spread %.*f)", decimals, Spread(m.repeats));
   if (m.uncertainties.size() != 1) return text + spread;
-  return text + Format(" \u00b1 %.*f", decimals, m.uncertainty().expanded) + spread;
+  const double expanded = m.uncertainty().expanded;
+  const bool shows = expanded == 0 || expanded >= 0.5 * std::pow(10, -decimals);
+  return text + (shows ? Format(" \u00b1 %.*f", decimals, expanded) : Format(" \u00b1 %.1g", expanded)) + spread;
 }
 
 std::string FrequencyText(const Reading& m, int photo_height, double pixel_pitch_um) {
