@@ -2,7 +2,10 @@
 
 #include <algorithm>
 #include <cmath>
+#include <numeric>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "desk/measure/cielab.h"
 #include "desk/measure/patch_trust.h"
@@ -10,8 +13,6 @@
 namespace qv {
 
 namespace {
-
-using Lists = std::array<std::vector<Uncertainty>, 3>;
 
 // Of an upright square well within a patch, whatever its turn, channels as the measures weigh them: as they are stored.
 cv::Mat InnerPixels(const cv::Mat& photo, const std::array<cv::Point2d, 4>& outline) {
@@ -53,6 +54,8 @@ std::vector<std::size_t> PatchesOf(const Phase& phase, const char* figure, const
   return patches;
 }
 
+cv::Vec3d StoredLevels(const cv::Point3i& mean) { return {1.0 * mean.x, 1.0 * mean.y, 1.0 * mean.z}; }
+
 using LabOf = cv::Vec3d (*)(const cv::Vec3d& rgb);
 
 void TrustColours(Phase& phase, const std::string& figure, const PatchScene& scene, const Draws& draws, LabOf lab) {
@@ -67,17 +70,44 @@ void TrustColours(Phase& phase, const std::string& figure, const PatchScene& sce
   }
 }
 
+// Of patches that were compared: each one's difference as it is read, and as it may be, draw by draw.
+struct DrawnDifferences {
+  std::vector<double> readings;
+  std::vector<std::vector<double>> draws;
+
+  void Add(double reading, std::vector<double> drawn) {
+    readings.push_back(reading);
+    draws.push_back(std::move(drawn));
+  }
+  // Of what is made of all of them, say their mean: the cut of means to whole levels moves many one way.
+  template <typename Figure>
+  Uncertainty Of(const Figure& figure) const {
+    const double reading = figure(readings);
+    std::vector<double> errors;
+    for (std::size_t draw = 0; draw < draws[0].size(); ++draw) {
+      std::vector<double> all;
+      for (const auto& patch : draws) all.push_back(patch[draw]);
+      errors.push_back(figure(all) - reading);
+    }
+    return FromErrors(std::move(errors), kPixelMethod);
+  }
+};
+
 // The list, its mean and its largest.
-void TrustDifferences(Phase& phase, const std::string& figure, const std::vector<Uncertainty>& known) {
+void TrustDifferences(Phase& phase, const std::string& figure, const DrawnDifferences& drawn) {
   Reading* const each = phase.Find(figure);
-  if (each == nullptr || known.empty() || known.size() != each->values.size()) return;
+  if (each == nullptr || drawn.readings.empty() || drawn.readings.size() != each->values.size()) return;
+  std::vector<Uncertainty> known;
+  for (std::size_t i = 0; i < drawn.readings.size(); ++i) {
+    known.push_back(drawn.Of([i](const std::vector<double>& all) { return all[i]; }));
+  }
   each->Trust(known);
-  double squares = 0;
-  for (const Uncertainty& u : known) squares += u.standard * u.standard;
-  const double mean = std::sqrt(squares) / static_cast<double>(known.size());
-  phase.Find(figure + "_mean")->Trust({Combined(0, 1, mean, kPixelMethod)});
-  const auto largest = std::max_element(each->values.begin(), each->values.end());
-  phase.Find(figure + "_max")->Trust({known[largest - each->values.begin()]});
+  phase.Find(figure + "_mean")->Trust({drawn.Of([](const std::vector<double>& all) {
+    return std::accumulate(all.begin(), all.end(), 0.0) / static_cast<double>(all.size());
+  })});
+  phase.Find(figure + "_max")->Trust({drawn.Of([](const std::vector<double>& all) {
+    return *std::max_element(all.begin(), all.end());
+  })});
 }
 
 double Difference76(const cv::Vec3d& a, const cv::Vec3d& b) { return cv::norm(OwnLab(a) - OwnLab(b)); }
@@ -90,21 +120,26 @@ void TrustPatches(Phase& phase, const PatchScene& scene) {
   if (draws.measured.empty()) return;
   TrustColours(phase, "lab_", scene, draws, OwnLab);
   TrustColours(phase, "lab_d65_", scene, draws, [](const cv::Vec3d& rgb) { return LabD65OfSrgb(rgb); });
-  const auto pair = [&](std::size_t i, double (*difference)(const cv::Vec3d&, const cv::Vec3d&)) {
-    return TrustInPair(scene.measured[i], draws.measured[i], scene.standard[i], draws.standard[i], difference);
+  const auto compare = [&](DrawnDifferences& all, std::size_t i, const PairFigure& difference) {
+    std::vector<double> drawn;
+    for (int k = 0; k < kColourDraws; ++k) drawn.push_back(difference(draws.measured[i][k], draws.standard[i][k]));
+    all.Add(difference(StoredLevels(scene.measured[i]), StoredLevels(scene.standard[i])), std::move(drawn));
   };
-  std::vector<Uncertainty> own;
-  for (const std::size_t i : PatchesOf(phase, "delta_e_76", draws)) own.push_back(pair(i, Difference76));
+  DrawnDifferences own;
+  for (const std::size_t i : PatchesOf(phase, "delta_e_76", draws)) compare(own, i, Difference76);
   TrustDifferences(phase, "delta_e_76", own);
 
-  std::vector<Uncertainty> by_cie;
+  DrawnDifferences by_cie;
   for (const std::size_t i : PatchesOf(phase, "delta_e_2000", draws)) {
     const auto given = scene.given.find(static_cast<int>(i));
-    by_cie.push_back(given == scene.given.end()
-                         ? pair(i, Difference2000)
-                         : TrustInColour(scene.measured[i], draws.measured[i], [&](const cv::Vec3d& rgb) {
-                             return DeltaE2000(LabD65OfSrgb(rgb), given->second);
-                           }));
+    if (given == scene.given.end()) {
+      compare(by_cie, i, Difference2000);
+      continue;
+    }
+    const auto off = [&](const cv::Vec3d& rgb) { return DeltaE2000(LabD65OfSrgb(rgb), given->second); };
+    std::vector<double> drawn;
+    for (const cv::Vec3d& rgb : draws.measured[i]) drawn.push_back(off(rgb));
+    by_cie.Add(off(StoredLevels(scene.measured[i])), std::move(drawn));
   }
   TrustDifferences(phase, "delta_e_2000", by_cie);
 }
