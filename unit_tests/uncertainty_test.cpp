@@ -47,8 +47,8 @@ TEST(Uncertainty, MeansMediansAndErrors) {
   EXPECT_TRUE(std::isinf(FromErrors({1, NAN}, kResamplingMethod).expanded));
 }
 
-// The median of n frames scatters by sqrt(pi / 2n) of one, and those of the pulse tell nothing of the base; colours of
-// whole levels, off by up to one, come on top of either.
+// The median of n frames scatters by sqrt(pi / 2n) of one, and those of the pulse tell nothing of the base; a cut of
+// the decoder's is an error that is left in.
 TEST(Uncertainty, AFlashsBaseIsThatOfItsQuietFrames) {
   Phase phase;
   phase.name = "video_flash";
@@ -57,16 +57,36 @@ TEST(Uncertainty, AFlashsBaseIsThatOfItsQuietFrames) {
   std::vector<double> mean;
   for (int i = 0; i < 90; ++i) {
     time.push_back(33.0 * i);
-    mean.push_back((i < 25 || i >= 65 ? 40 : 200) + random.gaussian(8));
+    mean.push_back((i < 25 || i >= 65 ? 40 : 200) + random.gaussian(3));
   }
   for (const auto& [name, value] : {std::pair{"peak", 200.0}, {"peak_frame", 45.0}, {"base", 40.0}, {"width", 1320.0}})
     phase.Add(name, value);
   phase.Add("mean", time, mean);
-  TrustFlash(phase, time);
-  const auto noise = [&](const char* name) {
-    return std::pow(phase.Find(name)->uncertainties[0].standard, 2) - 1 / 3.0;
+  TrustFlash(phase, time, {0.25, 0}, {0.5, 0});
+  const auto noise = [&](const char* name, double cut) {
+    return std::pow(phase.Find(name)->uncertainties[0].standard, 2) - cut * cut;
   };
-  EXPECT_NEAR(CV_PI / 2 / 50, noise("base") / noise("mean"), 1e-6);
+  EXPECT_NEAR(CV_PI / 2 / 50, noise("base", 0.25) / noise("peak", 0.5), 1e-5);
+}
+
+// Levels of blue by BT.601 in limited range, cut as the decoder cuts them.
+TEST(Uncertainty, AFramesPixelsTellWhatTheDecoderCut) {
+  cv::Mat frame(64, 64, CV_8UC3);
+  cv::RNG random(6);
+  double cut = 0;
+  for (auto& pixel : cv::Mat_<cv::Vec3b>(frame)) {
+    const double luma = (random.uniform(60, 180) - 16) * 255 / 219.0;
+    const int u = random.uniform(-12, 13);
+    const int v = random.uniform(-12, 13);
+    const int whole = cvFloor(luma + 1e-9);
+    pixel = cv::Vec3b(cv::saturate_cast<uchar>(whole + cvFloor(2.017232 * u)),
+                      cv::saturate_cast<uchar>(whole + cvFloor(-0.391762 * u) + cvFloor(-0.812968 * v)),
+                      cv::saturate_cast<uchar>(whole + cvFloor(1.596027 * v)));
+    cut += luma + 2.017232 * u - pixel[0];
+  }
+  EXPECT_NEAR(cut / static_cast<double>(frame.total()), CutOf(frame).mean, 0.02);
+  cv::randu(frame, 60, 180);
+  EXPECT_TRUE(std::isnan(CutOf(frame).mean)) << "no luma and chroma give these";
 }
 
 TEST(Uncertainty, PixelsTellTheirNoiseWhateverTheLight) {

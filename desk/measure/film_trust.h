@@ -16,8 +16,18 @@ void TrustTimes(Phase& phase, const std::vector<double>& time);
 /// Of one frame's reading, from all of a film; those that are no numbers are left out. NaN for fewer than five.
 Uncertainty OfFrame(const std::vector<double>& course);
 
-/// `peak`, `base`, `width` and `mean` of a flash.
-void TrustFlash(Phase& phase, const std::vector<double>& time);
+/// How far the conversion of a film's frame from luma and chroma has lowered its first channel: it cuts what each of
+/// them adds to whole levels.
+struct ConversionCut {
+  double mean;         // levels; not a number for frames that were converted otherwise
+  double apart;        // standard deviation of what it is at other levels: noise of a lattice's width makes all alike
+  double rounded = 0;  // and of what an encoder's rounding to steps of luma leaves
+};
+ConversionCut CutOf(const cv::Mat& frame);
+
+/// `peak`, `base`, `width` and `mean` of a flash; the cuts of a usual frame and of the one with most light.
+void TrustFlash(Phase& phase, const std::vector<double>& time, const ConversionCut& base_cut,
+                const ConversionCut& peak_cut);
 
 /// `best_mtf50`, `final_mtf50`, `settle_time` and both courses of a focus.
 void TrustFocus(Phase& phase, const std::vector<double>& time);

@@ -16,8 +16,12 @@ constexpr int kParts = 8;  // of the picture in each direction
 
 // Type B: what interpolated pixels do, whatever the noise, seen on 900 pairs: to places, and at half of the picture's
 // longer side to enlargements. The search leaves maps a little small. Turns are free of it.
-constexpr double kPlacePx = 0.0015;
-constexpr double kEnlargementPx = 0.0038;
+struct Interpolated {
+  double place_px, enlargement_px;
+};
+constexpr Interpolated kTextures = {0.0015, 0.0038};
+// Prints, which are smoothed by a median before, are flat but for the rims of their strokes: enlargements are free too.
+constexpr Interpolated kStrokes = {0.001, 0};
 
 // Reference coordinates from the middle, in halves of the longer side: all six parameters are then pixels of the image.
 struct Frame {
@@ -149,7 +153,7 @@ struct MapTrust {
 };
 
 // By the parts' own scores (a sandwich, as White 1980): noise may be alike between neighbours, and differ by place.
-MapTrust TrustOf(const Overlap& seen, const Frame& frame) {
+MapTrust TrustOf(const Overlap& seen, const Frame& frame, const Interpolated& pixels) {
   std::vector<Part> parts = LevelsByParts(seen);
   Part all;
   for (const Part& part : parts) all += part;
@@ -175,7 +179,7 @@ MapTrust TrustOf(const Overlap& seen, const Frame& frame) {
   const double n = trust.parts;
   trust.step = inverse * all_scores;
   trust.covariance = inverse * scores * inverse * (n / std::max(n - 6, 1.0));
-  const Parameters interpolated(kEnlargementPx, 0, kPlacePx, 0, kEnlargementPx, kPlacePx);
+  const Parameters interpolated(pixels.enlargement_px, 0, pixels.place_px, 0, pixels.enlargement_px, pixels.place_px);
   trust.covariance += Covariance::diag(interpolated.mul(interpolated));
   trust.correlation = Spread(without) * (n - 1) / std::sqrt(n);
   return trust;
@@ -210,10 +214,9 @@ Uncertainty OfDistance(const Frame& frame, const cv::Mat& fixed, const Parameter
   return FromErrors(std::move(errors), kResidualMethod);
 }
 
-// Of each element of a map, by the best one near that of all matches, `refined`.
-std::vector<Uncertainty> OfElements(const MapTrust& trust, const Frame& frame, const Parameters& refined,
+// Of each element of a map, by the best one there is.
+std::vector<Uncertainty> OfElements(const MapTrust& trust, const Frame& frame, const Parameters& best,
                                     const Parameters& is) {
-  const Parameters best = refined + trust.step;
   std::vector<Uncertainty> elements;
   for (const int i : {0, 1, 2, 3, 4, 5}) {
     const auto element = [&](const Parameters& p) { return frame.Map(p).val[i]; };
@@ -228,9 +231,9 @@ std::vector<Uncertainty> OfElements(const MapTrust& trust, const Frame& frame, c
 void TrustRefinedMap(Phase& phase, const cv::Mat& reference, const cv::Mat& image, const cv::Mat& map) {
   if (!std::isfinite(phase.Find("correlation")->value())) return;
   const Frame frame(reference.size());
-  const MapTrust trust = TrustOf(LookThrough(reference, image, map), frame);
+  const MapTrust trust = TrustOf(LookThrough(reference, image, map), frame, kStrokes);
   if (trust.parts <= 6) return;
-  const Parameters found = frame.From(map);
+  const Parameters found = frame.From(map);  // where the search ended: of strokes its last step says nothing
   phase.Find("matrix")->Trust(OfElements(trust, frame, found, found));
   phase.Find("correlation")->Trust({Combined(trust.correlation, trust.parts - 6, 0, kResidualMethod)});
 }
@@ -239,7 +242,7 @@ void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, con
                const RobustMap& robust) {
   if (robust.matrix.empty() || !robust.doubt.empty()) return;
   const Frame frame(reference.size());
-  const MapTrust trust = TrustOf(LookThrough(reference, image, robust.matrix), frame);
+  const MapTrust trust = TrustOf(LookThrough(reference, image, robust.matrix), frame, kTextures);
   const double degrees = trust.parts - 6;
   if (degrees < 1) return;
   const Parameters of_all = frame.From(robust.matrix);
@@ -254,8 +257,8 @@ void TrustMaps(Phase& phase, const cv::Mat& reference, const cv::Mat& image, con
   by_best("turn", Turn);
   by_best("scale", [&](const Parameters& p) { return std::sqrt(std::fabs(Area(p))) / frame.half; });
   by_best("stretch", Stretch);
-  phase.Find("robust_matrix")->Trust(OfElements(trust, frame, of_all, of_all));
-  phase.Find("matrix")->Trust(OfElements(trust, frame, of_all, of_three));
+  phase.Find("robust_matrix")->Trust(OfElements(trust, frame, best, of_all));
+  phase.Find("matrix")->Trust(OfElements(trust, frame, best, of_three));
   phase.Find("map_distance")->Trust({OfDistance(frame, fixed, best, trust.covariance, phase, reference.size())});
   const double matches = 2.0 * robust.agreeing - 6;
   phase.Find("robust_residual")

@@ -137,16 +137,22 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "off noise and spots is not in it. Under half a percent of noise only sharp spots stand out of the levels' "
        "steps: areas and contrasts are then too wide, by half."},
       {kStampTrust,
-       "Type B alone: of a rate and of a gap the step of both time stamps, a millisecond where all are whole ones "
-       "(Matroska), else a 90,000th of a second, rectangular, and of a film whose last frames have no stamps how far "
-       "its intervals depart from their median; of the moment of settling one frame to either side."},
+       "Type B alone. Of a rate the rounding of the last stamp, a millisecond where all are whole ones (Matroska), "
+       "else "
+       "a 90,000th of a second, rectangular; where a film's last frames have no stamps, by how much the median "
+       "interval, "
+       "at which they are taken to follow, departs from the film's own. Of a gap the difference of two roundings, "
+       "triangular; where several are as long but for a step, what the longest has more than their mean. Of the moment "
+       "of settling one frame to either side."},
       {kCourseMethod,
        "Differences between neighbouring frames beyond what the film does tell the noise of one; a median of n has it "
-       "1.25 times over the root of n (of two thirds of n for MTF50, since a codec makes neighbours alike). A pulse's "
-       "width has that of both its flanks, and type B, for what lies between "
-       "frames, up to 0.4 intervals over the number of intervals that it lasts. Type B of a flash's levels: up to one "
-       "level, by which colours are rounded between luma and chroma and back; what else the film's codec does to all "
-       "frames alike is not in it."},
+       "1.25 times over the root of n (of two thirds of n for MTF50, since a codec makes neighbours alike). A flash's "
+       "levels are those of decoded frames, whose luma and chroma are cut to whole levels: two frames' pixels are "
+       "taken "
+       "back to them and tell how much was cut, which is left in the levels and taken for an error; frames that were "
+       "converted otherwise may be up to a level off (type B). A pulse's width has the noise of its flanks and of "
+       "the level half-way, and what it departs from that of a smooth pulse through its frames. What else the film's "
+       "codec does to all frames alike is not in it."},
       {kRepeatMethod,
        "The spread of several photos of one unit, over the root of their number, with Student's factor; the median's "
        "is wider than the mean's by sqrt(pi / 2)."},

@@ -1,8 +1,11 @@
 // Test 24: brightness over a film, and the flash's pulse in it.
 
 #include <algorithm>
+#include <array>
 #include <climits>
 #include <cmath>
+#include <limits>
+#include <opencv2/videoio.hpp>
 
 #include "desk/base/text.h"
 #include "desk/measure/film_course.h"
@@ -70,6 +73,28 @@ class FlashFilmFinding : public FilmFinding {
   }
 };
 
+// Of a frame as bright as most and of the brightest one.
+std::array<ConversionCut, 2> Cuts(const QVTester& tester, QV_RESOURCE_INDEX slot, const Phase& phase) {
+  constexpr double kUnknown = std::numeric_limits<double>::quiet_NaN();
+  constexpr double kSame = 0.01;  // levels: the frame that was sought
+  const std::vector<double>& mean = phase.Find("mean")->values;
+  const double base = phase.Find("base")->value();
+  const auto usual = std::min_element(mean.begin(), mean.end(), [=](double one, double other) {
+    return std::fabs(one - base) < std::fabs(other - base);
+  });
+  const std::array<double, 2> frames = {static_cast<double>(usual - mean.begin()), phase.Find("peak_frame")->value()};
+  std::array<ConversionCut, 2> cuts = {{{kUnknown, kUnknown}, {kUnknown, kUnknown}}};
+  cv::VideoCapture film;
+  cv::Mat frame;
+  if (tester.resources_[slot]->OpenVideo(&film) != QV_SUCCESS) return cuts;
+  for (std::size_t i = 0; i < frames.size(); ++i) {
+    if (!film.set(cv::CAP_PROP_POS_FRAMES, frames[i]) || !film.read(frame)) continue;
+    const bool same = std::fabs(cv::mean(frame)[0] - mean[static_cast<std::size_t>(frames[i])]) < kSame;
+    if (same && frame.type() == CV_8UC3) cuts[i] = CutOf(frame);
+  }
+  return cuts;
+}
+
 class VideoFlash : public Measurement {
  public:
   const Spec& spec() const override {
@@ -112,7 +137,8 @@ class VideoFlash : public Measurement {
     phase.Add("base", results.video_flash_base_);
     phase.Add("width", results.video_flash_width_);
     phase.Add("mean", time, Widen(results.video_flash_mean_, count));
-    TrustFlash(phase, time);
+    const auto [base_cut, peak_cut] = Cuts(tester, spec().inputs[0].slot, phase);
+    TrustFlash(phase, time, base_cut, peak_cut);
     if (count != tester.prop_video_flash_frame_count_) DoubtCutFilm(record, tester, spec().inputs[0].slot, time);
     return std::make_unique<FlashFilmFinding>(time);
   }
