@@ -90,7 +90,7 @@ Uncertainty OfLongest(const std::vector<double>& intervals, double step) {
   const auto count = static_cast<double>(alike.size());
   const double half = step * (1 - std::sqrt(1 - kCoverage));
   const double standard = step / std::sqrt(6.0);
-  const Uncertainty one = {standard, half, half / standard, kStampTrust};
+  Uncertainty one = {standard, half, half / standard, kStampTrust};
   if (count < 2) return one;
   const double error = longest - MeanOf(alike);
   const double root = std::sqrt(count);
