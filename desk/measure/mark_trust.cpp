@@ -225,7 +225,7 @@ double FollowsSquare(const MarkLook& look) {
   return std::clamp(16.0 / 9 * dark / pixels, 0.0, 0.9);
 }
 
-// CrossingRows that cross two opposite sides of the inner square, away from its corners. None does where a chart stands
+// Rows that cross two opposite sides of the inner square, away from its corners. None does where a chart stands
 // at a slant, and its area must do.
 struct CrossingRows {
   double half;  // of them, pixels
@@ -281,7 +281,7 @@ struct ModuleSeen {
 };
 
 // What is dark up to the middle of the ring, where the frame's blur adds what the square's takes away.
-ModuleSeen SizeOf(const MarkLook& look, const CrossingRows& rows, const SquareLevel& black, double lift) {
+ModuleSeen SeeModule(const MarkLook& look, const CrossingRows& rows, const SquareLevel& black, double lift) {
   constexpr double kSmoothed = 0.4;  // pixels that smoothing takes of what is black at either side
   const double level = look.LightAtMiddle();
   cv::Mat smooth;
@@ -326,7 +326,7 @@ Core LookAtCore(const cv::Mat& photo, const Mark& mark, double module, double tu
   const double contrast = level - black.level;
   if (black.part.empty() || !(contrast > 0)) return {};
   const double noise = look.Noise();
-  const ModuleSeen size = SizeOf(look, rows, black, black.Lift(look, noise));
+  const ModuleSeen size = SeeModule(look, rows, black, black.Lift(look, noise));
   Core core = {look.square.middle + cv::Point2d(look.part.tl()), size.module_px, size.lifted_px};
   core.follows = FollowsSquare(look);
   // By the squares of the distances in the light ring, and in the dark, over nine modules squared.
