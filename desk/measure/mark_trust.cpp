@@ -389,7 +389,7 @@ void TrustMarks(Phase& phase, const ChartView& view, const cv::Mat& photo, const
   constexpr double kCorePx = 0.0008;        // type B: what pixels leave of a centre
   constexpr double kRimPx = 0.0075;         // and those on the square's rim, times how dark they are
   constexpr double kCoreModulePx = 0.0007;  // what pixels leave of the squares' sizes
-  constexpr double kRimModulePx = 0.045;    // and of blurred ones, as much as the square about them is followed
+  constexpr double kRimModulePx = 0.06;     // and of blurred ones, as much as the square about them is followed
   constexpr double kLifted = 0.25;          // of what black that is cut off makes of them
   if (!view.complete()) return;
   const std::array<Core, 3> seen = LookAtCores(view, photo, codec);
