@@ -787,7 +787,7 @@ const char* WhyMissed(const Group& group, const char* figure, const Condition& c
   if (group.run == TryMarks && std::string(figure) == "module size")
     return "readings are half a per cent off to one side, and U is rather too wide";
   if (group.run == TryLights && condition.jpeg != 0) return "the codec's rounding is guessed by its table";
-  if (group.run == TryFlashFilm) return "an encoder's dead zone hides part of what the decoder cuts: U is too wide";
+  if (group.run == TryFlashFilm) return "what an encoder's steps do to all blocks alike isn't known: U is too wide";
   if (group.run == TryFocus) return "of films with few frames";
   if (group.run == TryPreview && condition.jpeg != 0) return kTooWide;
   if (group.run == TryPrint) return kTooWide;

@@ -272,7 +272,7 @@ Uncertainty OfFrame(const std::vector<double>& course) {
 void TrustFlash(Phase& phase, const std::vector<double>& time, const ConversionCut& base_cut,
                 const ConversionCut& peak_cut) {
   constexpr double kConverted = 1 / 1.7320508;  // levels, type B, of decoders whose cuts aren't known: up to one
-  constexpr double kLooked = 0.005;             // levels: what the pixels looked at leave of a cut
+  constexpr double kCoded = 0.2;                // levels: encoders code means of 4 x 4 pixels in steps of some 0.7
   constexpr double kQuiet = 0.1;                // of the pulse's height
   constexpr std::size_t kFewest = 8;
   const std::vector<double>& mean = phase.Find("mean")->values;
@@ -290,8 +290,8 @@ void TrustFlash(Phase& phase, const std::vector<double>& time, const ConversionC
   const auto of_level = [&](double scatter, double cut, double between) {
     return OffBy(known ? cut : 0, Combined(scatter, degrees, known ? between : kConverted, kCourseMethod), degrees);
   };
-  phase.Find("peak")->Trust({of_level(frame, peak_cut.mean, std::hypot(kLooked, peak_cut.rounded))});
-  phase.Find("base")->Trust({of_level(of_base, base_cut.mean, std::hypot(kLooked, base_cut.rounded))});
+  phase.Find("peak")->Trust({of_level(frame, peak_cut.mean, std::hypot(kCoded, peak_cut.rounded))});
+  phase.Find("base")->Trust({of_level(of_base, base_cut.mean, std::hypot(kCoded, base_cut.rounded))});
   std::vector<Uncertainty> of_frames;
   for (const double level : mean) {
     const double share = peak > base ? (level - base) / (peak - base) : 0;

@@ -152,7 +152,8 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "levels are those of decoded frames, whose luma and chroma are cut to whole levels: two frames' pixels are "
        "taken "
        "back to them and tell how much was cut, which is left in the levels and taken for an error; frames that were "
-       "converted otherwise may be up to a level off (type B). A pulse's width has the noise of its flanks and of "
+       "converted otherwise may be up to a level off (type B). Type B besides: 0.2 levels, as encoders code means of 4 "
+       "x 4 pixels in steps of some 0.7. A pulse's width has the noise of its flanks and of "
        "the level half-way, and what it departs from that of a smooth pulse through its frames. What else the film's "
        "codec does to all frames alike is not in it."},
       {kRepeatMethod,
