@@ -152,7 +152,9 @@ double RoundingOfSum(const cv::Mat& weights, cv::Point at, const CodecSteps& cod
   cv::Mat block;
   for (int row = 0; row < blocks.rows; row += kBlock) {
     for (int i = 0; i < blocks.cols; i += kBlock) {
-      cv::dct(blocks(cv::Rect(i, row, kBlock, kBlock)), block);
+      const cv::Mat spatial = blocks(cv::Rect(i, row, kBlock, kBlock));
+      if (cv::countNonZero(spatial) == 0) continue;
+      cv::dct(spatial, block);
       squares += std::pow(cv::norm(block.mul(cv::Mat(codec.luma_table))), 2);
     }
   }
