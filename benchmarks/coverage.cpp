@@ -252,7 +252,7 @@ std::vector<Trial> TryPatch(const Condition& condition, cv::RNG& random) {
 // Two photos of the chart, one of other colours: the mean and the largest difference, to a photo and to given values.
 std::vector<Trial> TryDifferences(const Condition& condition, cv::RNG& random) {
   SimulationOptions options;
-  options.camera.size = {1000, 750};
+  options.camera.size = {700, 525};
   options.camera.blur_px = condition.blur;
   options.camera.noise_percent = condition.noise_percent;
   options.camera.gain = random.uniform(0.7, 0.85);  // no whole levels
