@@ -220,7 +220,7 @@ struct PatchTrial {
     const double area = 1.0 * kSide * kSide;
     mean = cut(photo);
     standard = cut(photograph(standard_truth));
-    const CodecSteps codec = condition.jpeg == 0 ? CodecSteps() : StepsAtQuality(condition.jpeg);
+    const CodecSteps codec = StepsOf(AsInput(condition, photo).content.value_or(""));
     draws = DrawPatchColours(photo, area, mean, random.next(), codec);
     standard_draws = DrawPatchColours(photo, area, standard, random.next(), codec);
   }

@@ -181,7 +181,7 @@ TEST(Uncertainty, HoldsWhatACodecDoesToAPatch) {
       cv::imencode(".jpg", patch, file, {cv::IMWRITE_JPEG_QUALITY, quality});
       const cv::Scalar mean = cv::mean(patch = cv::imdecode(file, cv::IMREAD_COLOR));
       const cv::Point3i cut(cvFloor(mean[0]), cvFloor(mean[1]), cvFloor(mean[2]));
-      const auto draws = DrawPatchColours(patch, 4096, cut, random.next(), StepsAtQuality(quality));
+      const auto draws = DrawPatchColours(patch, 4096, cut, random.next(), StepsOf({file.begin(), file.end()}));
       const double error = blue_to_yellow(cv::Vec3d(cut.x, cut.y, cut.z)) - blue_to_yellow(truth);
       within += std::fabs(error) <= TrustInColour(cut, draws, blue_to_yellow).expanded ? 1 : 0;
     }

@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <limits>
 #include <opencv2/imgproc.hpp>
 
+#include "desk/measure/coded_mean.h"
 #include "desk/measure/patch_trust.h"
 
 namespace qv {
@@ -43,38 +43,6 @@ std::vector<cv::Vec3f> DifferencesOf(const cv::Mat& means) {
   return all;
 }
 
-// How far luma and both chromas differ between blocks, what the codec's steps add taken out.
-cv::Vec3d SpreadOf(const cv::Mat& pixels, const CodecSteps& codec) {
-  const cv::Size blocks(pixels.cols / kCodecBlock, pixels.rows / kCodecBlock);
-  if (codec.luma == 0 || blocks.area() < 2) return {};
-  cv::Mat means;
-  pixels(cv::Rect({}, blocks * kCodecBlock)).convertTo(means, CV_32F, 1.0 / 255);
-  cv::resize(means, means, blocks, 0, 0, cv::INTER_AREA);
-  cv::cvtColor(means, means, cv::COLOR_BGR2YCrCb);
-  cv::Scalar mean;
-  cv::Scalar deviation;
-  cv::meanStdDev(means, mean, deviation);
-  const auto without = [](double spread, double step) {
-    return std::sqrt(std::max(255 * 255 * spread * spread - step * step / 12, 0.0));
-  };
-  return {without(deviation[0], codec.luma), without(deviation[2], codec.chroma), without(deviation[1], codec.chroma)};
-}
-
-// A smooth surface through a grid of means, CV_64F, of so many terms: a constant, a plane, of the second degree.
-cv::Mat SurfaceThrough(const cv::Mat& grid, int terms) {
-  cv::Mat at(static_cast<int>(grid.total()), terms, CV_64F);
-  for (int i = 0; i < at.rows; ++i) {
-    const double x = i % grid.cols - (grid.cols - 1) / 2.0;
-    const int row = i / grid.cols;
-    const double y = row - (grid.rows - 1) / 2.0;
-    const std::array<double, 6> powers = {1, x, y, x * x, x * y, y * y};
-    std::copy_n(powers.begin(), terms, at.ptr<double>(i));
-  }
-  cv::Mat factors;
-  cv::solve(at, grid.reshape(1, at.rows), factors, cv::DECOMP_SVD);
-  return cv::Mat(at * factors).reshape(1, grid.rows);
-}
-
 // What the true values of means with this noise probably are: the plainest surface off which they lie no further than
 // noise, which is known to so many degrees of freedom; else what lies surely further stays.
 cv::Mat WithoutNoise(const cv::Mat& grid, double noise, double degrees) {
@@ -104,7 +72,7 @@ double LeastOverMost(const cv::Mat& means) {
 }  // namespace
 
 MeanErrors::MeanErrors(const cv::Mat& pixels, const CodecSteps& codec)
-    : pixels_(MiddleOf(pixels)), codec_(codec), spread_(SpreadOf(pixels_, codec)) {
+    : pixels_(MiddleOf(pixels)), codec_(codec), coded_(pixels_, codec) {
   constexpr int kFewest = 60;  // blocks that tell what is alike between neighbouring pixels
   constexpr double kSquaredWeights = 6;
   const cv::Size blocks(pixels_.cols / kCodecBlock, pixels_.rows / kCodecBlock);
@@ -122,8 +90,7 @@ MeanErrors::MeanErrors(const cv::Mat& pixels, const CodecSteps& codec)
 
 std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
   if (degrees_ < 1) return {};
-  const cv::Matx33d root = RootOf(covariance_ * (1 / area));
-  const CodecRounding codec(pixels_, codec_, spread_);
+  const cv::Matx33d root = codec_.luma == 0 ? RootOf(covariance_ * (1 / area)) : cv::Matx33d::zeros();
   cv::Vec3d rounding;  // to whole levels, which noise and scene spread
   cv::Scalar mean;
   cv::Scalar deviation;
@@ -134,47 +101,47 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
   for (cv::Vec3d& error : errors) {
     cv::Vec3d normal;
     for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
-    error = root * normal + codec.Draw(random);
+    error = root * normal - coded_.Draw(area, random);
     for (int k = 0; k < 3; ++k) error[k] += rounding[k] * random.uniform(-1.0, 1.0);
   }
   return errors;
 }
 
-// Of the mean of a part's channels with these weights: what is made of chroma and of whole levels, not of luma.
-double MeanErrors::RoundingVariance(const cv::Mat& part, const cv::Vec3d& weights) const {
-  constexpr int kDraws = 200;
-  cv::Vec3d spread = SpreadOf(part, codec_);
-  spread[0] = std::numeric_limits<double>::infinity();
-  const CodecRounding codec(part, codec_, spread);
-  cv::RNG random(11);
-  double squares = 0;
-  for (int i = 0; i < kDraws; ++i) squares += std::pow(weights.dot(codec.Draw(random)), 2) / kDraws;
-  return squares;
+// What means of grey over so many pixels are off by, drawn: by noise, which is not known better than that, and by whole
+// levels; with a codec by what that rounds, most of it alike.
+std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area) const {
+  const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
+  cv::Scalar deviation;
+  cv::meanStdDev(pixels_, cv::noArray(), deviation);
+  const double levels = HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]}));
+  const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + levels * levels / 3);
+  cv::RNG random(10);
+  std::vector<cv::Mat> errors(kColourDraws);
+  for (cv::Mat& error : errors) {
+    error.create(grid.size(), CV_64F);
+    if (codec_.luma != 0) {
+      error = coded_.DrawGrey(grid, area, random);
+    } else {
+      const double of_noise = 1 + random.gaussian(1) / std::sqrt(2 * degrees_);
+      random.fill(error, cv::RNG::NORMAL, 0, of_noise * noise);
+    }
+  }
+  return errors;
 }
 
 Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area, double rounded) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
-  const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
-  // A codec rounds each block's luma to a step; with its chroma, the channels to levels, alike where that hardly
-  // differs, as within one of the means. Without a codec, grey is rounded.
-  const int side = std::clamp(cvRound(std::sqrt(area)), 1, std::min(pixels_.cols, pixels_.rows));
-  const cv::Rect middle((pixels_.cols - side) / 2, (pixels_.rows - side) / 2, side, side);
-  const double luma_steps = std::pow(codec_.luma * kCodecBlock, 2) / 12 / area;
-  cv::Scalar deviation;
-  cv::meanStdDev(pixels_, cv::noArray(), deviation);
-  const double levels = codec_.luma == 0
-                            ? std::pow(HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]})), 2) / 3
-                            : RoundingVariance(pixels_(middle), weights);
-  const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + luma_steps + levels + rounded);
-  const cv::Mat even = WithoutNoise(means, noise, degrees_);
-  cv::RNG random(10);
-  std::vector<double> errors;
-  for (int draw = 0; draw < kColourDraws; ++draw) {
-    const double of_noise = 1 + random.gaussian(1) / std::sqrt(2 * degrees_);  // which is not known better
-    cv::Mat noisy(even.size(), CV_64F);
-    random.fill(noisy, cv::RNG::NORMAL, 0, of_noise * noise);
-    errors.push_back(LeastOverMost(even + noisy) - LeastOverMost(even));
+  const std::vector<cv::Mat> drawn = OfGreyMeans(means, area);
+  double variance = 0;
+  for (const cv::Mat& one : drawn) {
+    cv::Scalar mean;
+    cv::Scalar deviation;
+    cv::meanStdDev(one, mean, deviation);
+    variance += deviation[0] * deviation[0] / kColourDraws;
   }
+  const cv::Mat even = WithoutNoise(means, std::sqrt(variance), degrees_);
+  std::vector<double> errors;
+  for (const cv::Mat& one : drawn) errors.push_back(LeastOverMost(even + one) - LeastOverMost(even));
   return FromErrors(std::move(errors), kPixelMethod);
 }
 

@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "desk/measure/codec_steps.h"
-#include "desk/measure/patch_trust.h"
+#include "desk/measure/coded_mean.h"
 #include "desk/measure/uncertainty.h"
 
 namespace qv {
@@ -27,17 +27,14 @@ class MeanErrors {
   Uncertainty OfEvenness(const cv::Mat& means, double area, double rounded = 0) const;
 
  private:
-  double RoundingVariance(const cv::Mat& part, const cv::Vec3d& weights) const;
+  std::vector<cv::Mat> OfGreyMeans(const cv::Mat& grid, double area) const;
 
   cv::Mat pixels_;
   CodecSteps codec_;
-  cv::Vec3d spread_;                               // of the scene between blocks: luma, both chromas
+  CodedMean coded_;
   cv::Matx33d covariance_ = cv::Matx33d::zeros();  // of a pixel, as means of many have it
   double degrees_ = 0;                             // of freedom
 };
-
-/// Grey of means as the tests weigh stored blue, green and red.
-inline double GreyOfMeans(const cv::Vec3d& bgr) { return 0.299 * bgr[0] + 0.587 * bgr[1] + 0.114 * bgr[2]; }
 
 /// Of a reading of drawn means' errors: `figure` says what it is if the means are off by so much.
 template <typename Figure>

@@ -13,24 +13,6 @@ namespace qv {
 
 constexpr int kColourDraws = 400;  // of what a colour may be (JCGM 101)
 
-/// What a JPEG file's rounding may add to the mean of a picture's pixels, drawn many times: nothing for other files.
-class CodecRounding {
- public:
-  /// @param pixels  CV_8UC3, channels as stored: blue first.
-  /// @param spread  how far the scene itself differs between blocks, luma and both chromas: it takes the rounding away.
-  CodecRounding(const cv::Mat& pixels, const CodecSteps& codec, const cv::Vec3d& spread = {});
-
-  /// Levels, in the order of the channels.
-  cv::Vec3d Draw(cv::RNG& random) const;
-
- private:
-  bool rounds_ = false;
-  double luma_ = 0, chroma_blue_ = 0, chroma_red_ = 0, chroma_sample_ = 0, channel_ = 0;  // half intervals
-};
-
-/// Half the interval in which rounding to steps leaves a mean; a spread of the step's size takes the error away.
-double HalfInterval(double step, double spread);
-
 /// L with L L^T = covariance, of what is positive definite but for rounding.
 cv::Matx33d RootOf(const cv::Matx33d& covariance);
 
