@@ -37,7 +37,7 @@ Draws DrawColours(const PatchScene& scene) {
     const double area = std::pow(cv::norm(scene.outlines[i][1] - scene.outlines[i][0]), 2);
     draws.measured.push_back(DrawPatchColours(pixels, area, scene.measured[i], i, scene.codec));
     if (i < scene.standard.size()) {
-      draws.standard.push_back(DrawPatchColours(pixels, area, scene.standard[i], 100 + i, scene.codec));
+      draws.standard.push_back(DrawStandardColours(pixels, area, scene.standard[i], 100 + i, scene.codec));
     }
   }
   return draws;

@@ -12,10 +12,11 @@ namespace qv {
 
 namespace {
 
-constexpr int kLumaBlockPx = 8;         // pixels a side, of luma
+constexpr int kLumaBlockPx = 8;     // pixels a side, of luma
 constexpr int kChromaBlockPx = 16;  // of halved chroma
-constexpr int kPhasesOfStep = 32;       // of a step that are looked at
-constexpr int kStepsOfPeriod = 8;         // of an eighth's multiple, until whole levels come again
+constexpr int kPhasesOfStep = 32;   // of a step that are looked at
+constexpr int kGrey = 128;          // of chroma
+constexpr int kStepsOfPeriod = 8;   // of an eighth's multiple, until whole levels come again
 
 // Noise of channels that is alike in all, as luma and chroma have it: roots of the weights' squares.
 constexpr double kLumaShare = 0.669;
@@ -97,6 +98,43 @@ double ChromaNoise(double luma) {
   return std::sqrt((std::pow(kChromaShare / kLumaShare, 2) * (luma * luma - kRounding) + kRounding) / 4 + kRounding);
 }
 
+// Of the mean over a length that lies anywhere about blocks of so many pixels a side: the square of what a frequency
+// within them adds to it, in the mean of all places.
+double PartOfMean(double length, int side, int frequency) {
+  const int pixels = std::max(cvRound(length), 1);
+  const double scale = frequency == 0 ? std::sqrt(1.0 / side) : std::sqrt(2.0 / side);
+  double squares = 0;
+  for (int first = 0; first < side; ++first) {
+    double in_block = 0;
+    for (int i = first; i <= first + pixels; ++i) {
+      if (i == first + pixels || (i % side == 0 && i > first)) {
+        squares += in_block * in_block / side;
+        in_block = 0;
+      }
+      in_block += scale * std::cos(CV_PI * frequency * (i % side + 0.5) / side);
+    }
+  }
+  return squares / (1.0 * pixels * pixels);
+}
+
+// Blocks that a mean over a square is as good as: those it cuts count less.
+double BlocksOf(double area, int side) {
+  const double part = PartOfMean(std::sqrt(area), side, 0);
+  return 1 / (part * part * side * side);
+}
+
+// Variance of a mean over a square, of what noise leaves in luma's coefficients but for blocks' means.
+double DetailIn(double area, double noise, const CodecSteps& codec) {
+  std::array<double, kLumaBlockPx> part = {};
+  for (int i = 0; i < kLumaBlockPx; ++i) part.at(i) = PartOfMean(std::sqrt(area), kLumaBlockPx, i);
+  double sum = 0;
+  for (int i = 1; i < kLumaBlockPx * kLumaBlockPx; ++i) {
+    const float step = codec.luma_table.val[i];
+    if (step > 0) sum += part.at(i / kLumaBlockPx) * part.at(i % kLumaBlockPx) * RoundedSquare(noise, step);
+  }
+  return sum;
+}
+
 // Share of blocks that show nothing within: neighbours reach into the rim of an enlarged one.
 double FlatShare(const cv::Mat& plane, int side) {
   const int rim = side / kLumaBlockPx - 1 == 0 ? 0 : 2;
@@ -112,7 +150,7 @@ double FlatShare(const cv::Mat& plane, int side) {
 
 // How blocks' means differ by the scene alone: a smooth surface of as many terms as surely tell something.
 std::vector<double> SceneOf(const cv::Mat& plane, int side) {
-  constexpr int kMost = 32;       // blocks a side
+  constexpr int kMost = 12;      // places a side
   constexpr double kSurely = 4;  // times what a term takes of noise
   cv::Mat means;
   const cv::Size blocks(plane.cols / side, plane.rows / side);
@@ -152,34 +190,46 @@ std::vector<double> WithinPart(const cv::Vec2d& slope, int blocks) {
   return off;
 }
 
-double GreyVariance(const std::vector<cv::Vec3d>& off) {
-  double squares = 0;
-  for (const cv::Vec3d& one : off) squares += std::pow(GreyOfMeans(one), 2) / static_cast<double>(off.size());
-  return squares;
+// How often samples of chroma are blue and red such, as shares.
+ChromaCounts ChromaOf(const cv::Mat& planes) {
+  constexpr int kMostSamples = 20000;
+  ChromaCounts counts;
+  const int step = static_cast<int>(planes.total()) / kMostSamples + 1;
+  const double one = step / static_cast<double>(planes.total());
+  for (int i = 0; i < static_cast<int>(planes.total()); i += step) {
+    const auto& sample = planes.at<cv::Vec3b>(i / planes.cols, i % planes.cols);
+    counts[{sample[2], sample[1]}] += one;
+  }
+  return counts;
 }
 
-// What rounding to channels does to the mean of samples of chroma that differ as these do, wherever they lie.
-std::vector<cv::Vec3d> ChannelRounding(const cv::Mat& chroma) {
-  constexpr int kPlaces = 100;
-  constexpr double kReach = 60;
-  constexpr int kMostSamples = 20000;
-  std::map<std::pair<int, int>, int> counts;
-  const int step = static_cast<int>(chroma.total()) / kMostSamples + 1;
-  int samples = 0;
-  for (int i = 0; i < static_cast<int>(chroma.total()); i += step, ++samples) {
-    const auto& one = chroma.at<cv::Vec3b>(i / chroma.cols, i % chroma.cols);
-    ++counts[{one[2], one[1]}];
+// Of a picture cut as a grid is, the part of the grid's so many-th value.
+cv::Mat PartOf(const cv::Mat& picture, const cv::Mat& grid, int number) {
+  const auto range = [](int i, int of, int length) { return cv::Range(i * length / of, (i + 1) * length / of); };
+  return picture(range(number / grid.cols, grid.rows, picture.rows),
+                 range(number % grid.cols, grid.cols, picture.cols));
+}
+
+// What rounding to channels adds to the mean of such chroma, moved by whole levels, with luma of whole levels.
+cv::Vec3d ChannelRounding(const ChromaCounts& counts, cv::Point moved) {
+  cv::Vec3d error;
+  for (const auto& [chroma, share] : counts) {
+    const cv::Vec3d exact = RgbOf(0, chroma.first - kGrey + moved.x, chroma.second - kGrey + moved.y);
+    for (int k = 0; k < 3; ++k) error[k] += (std::round(exact[k]) - exact[k]) * share;
   }
-  cv::RNG random(7);
-  std::vector<cv::Vec3d> errors(kPlaces);
-  for (cv::Vec3d& error : errors) {
-    const cv::Point place(cvRound(random.uniform(-kReach, kReach)), cvRound(random.uniform(-kReach, kReach)));
-    for (const auto& [values, count] : counts) {
-      const cv::Vec3d exact = RgbOf(0, values.first + place.x, values.second + place.y);
-      for (int k = 0; k < 3; ++k) error[k] += (std::round(exact[k]) - exact[k]) * count / samples;
-    }
+  return error;
+}
+
+// The same of grey, which is rounded in its turn.
+double GreyRounding(const ChromaCounts& counts, cv::Point moved) {
+  double error = 0;
+  for (const auto& [chroma, share] : counts) {
+    cv::Vec3d rgb = RgbOf(0, chroma.first - kGrey + moved.x, chroma.second - kGrey + moved.y);
+    const double exact = GreyOfMeans(rgb);
+    for (int k = 0; k < 3; ++k) rgb[k] = std::round(rgb[k]);
+    error += (std::round(GreyOfMeans(rgb)) - exact) * share;
   }
-  return errors;
+  return error;
 }
 
 }  // namespace
@@ -203,7 +253,8 @@ cv::Mat SurfaceThrough(const cv::Mat& grid, int terms) {
   return cv::Mat(at * factors).reshape(1, grid.rows);
 }
 
-PlaneRounding::PlaneRounding(double step, double noise, double flat) : step_(step), errors_(kStepsOfPeriod * kPhasesOfStep) {
+PlaneRounding::PlaneRounding(double step, double noise, double flat)
+    : step_(step), errors_(kStepsOfPeriod * kPhasesOfStep) {
   const double spread = std::max(noise, 1e-3 * step);
   const int reach = cvCeil(5 * spread / step) + 1;
   for (int i = 0; i < kStepsOfPeriod * kPhasesOfStep; ++i) {
@@ -211,8 +262,7 @@ PlaneRounding::PlaneRounding(double step, double noise, double flat) : step_(ste
     double mean = 0;
     double square = 0;
     for (int n = cvRound(level / step) - reach; n <= cvRound(level / step) + reach; ++n) {
-      const double share =
-          Below(((n + 0.5) * step - level) / spread) - Below(((n - 0.5) * step - level) / spread);
+      const double share = Below(((n + 0.5) * step - level) / spread) - Below(((n - 0.5) * step - level) / spread);
       const double off = n * step + flat * (std::floor(n * step + 0.5) - n * step) - level;
       mean += share * off;
       square += share * off * off;
@@ -244,7 +294,7 @@ double PlaneRounding::Draw(double level, const std::vector<double>& scene, doubl
   return sum.mean + std::sqrt(sum.variance / std::max(blocks, 1.0)) * random.gaussian(1);
 }
 
-CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) {
+CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) : codec_(codec) {
   if (codec.luma == 0) return;
   cv::Mat planes;  // as decoded, to the level
   cv::Mat luma;
@@ -263,50 +313,96 @@ CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) {
   for (const int k : {2, 1}) {
     const cv::Mat chroma = plane_of(kChromaBlockPx, k);
     scene_.at(planes_.size()) = SceneOf(chroma, kChromaBlockPx);
-    relative_.at(planes_.size()) = (cv::mean(chroma)[0] - 128) / std::max(cv::mean(luma)[0], 1.0);
+    decoded_mean_.at(planes_.size()) = cv::mean(chroma)[0] - kGrey;
+    relative_.at(planes_.size()) = decoded_mean_.at(planes_.size()) / std::max(cv::mean(luma)[0], 1.0);
     planes_.emplace_back(step, ChromaNoise(noise_) / kLumaBlockPx, FlatShare(chroma, kChromaBlockPx));
   }
   relative_[0] = 1;
-  cv::cvtColor(pixels, planes, cv::COLOR_BGR2YCrCb);
-  channels_ = ChannelRounding(planes);
-  const cv::Size part(std::max(pixels.cols / 8, 1), std::max(pixels.rows / 8, 1));
-  const cv::Rect middle({(pixels.cols - part.width) / 2, (pixels.rows - part.height) / 2}, part);
-  channels_apart_ = std::sqrt(std::max(GreyVariance(ChannelRounding(planes(middle))) - GreyVariance(channels_), 0.0));
+  decoded_mean_[0] = cv::mean(luma)[0];
+  cv::cvtColor(pixels, decoded_, cv::COLOR_BGR2YCrCb);
+  chroma_ = ChromaOf(decoded_);
   whole_levels_ = HalfInterval(1, std::hypot(noise_ / kLumaShare, Spread(scene_[0])));
 }
 
-cv::Vec3d CodedMean::Draw(double area, cv::RNG& random) const {
-  if (planes_.empty()) return {};
-  std::array<double, 3> off = {};
-  for (std::size_t k = 0; k < 3; ++k) {
-    const int side = k == 0 ? kLumaBlockPx : kChromaBlockPx;
-    const double level = random.uniform(0.0, planes_[k].period());
-    off.at(k) = planes_[k].Draw(level, scene_.at(k), area / (side * side), random);
+CodedMean::Place CodedMean::PlaceOf(int plane, double level, double area, cv::RNG& random) const {
+  const int side = plane == 0 ? kLumaBlockPx : kChromaBlockPx;
+  return {level, planes_[plane].Draw(level, scene_.at(plane), area / (side * side), random)};
+}
+
+// Such that the decoded mean comes about: where that lies about the steps tells something.
+CodedMean::Place CodedMean::SeenPlace(int plane, double area, cv::RNG& random) const {
+  constexpr int kTries = 60;
+  constexpr double kAlike = 0.1;  // levels
+  const double reach = 0.6 + planes_[plane].step();
+  Place place = {};
+  for (int i = 0; i < kTries; ++i) {
+    place = PlaceOf(plane, decoded_mean_[plane] + random.uniform(-reach, reach), area, random);
+    if (std::fabs(place.level + place.off - decoded_mean_[plane]) < kAlike) break;
   }
-  cv::Vec3d all = RgbOf(off[0], off[1], off[2]) + channels_[random.uniform(0, static_cast<int>(channels_.size()))];
+  return place;
+}
+
+// Anywhere; chroma about grey, since what steps and channels round is bound to whole levels.
+std::array<CodedMean::Place, 3> CodedMean::AnyPlaces(double area, cv::RNG& random) const {
+  constexpr double kReach = 60;
+  std::array<Place, 3> places = {};
+  for (int k = 0; k < 3; ++k) places.at(k) = PlaceOf(k, random.uniform(-kReach, kReach), area, random);
+  return places;
+}
+
+// By which whole levels decoded chroma then differs from what it is.
+cv::Point CodedMean::MovedBy(const std::array<Place, 3>& places) const {
+  const auto moved = [&](int k) { return cvRound(places.at(k).level + places.at(k).off - decoded_mean_[k]); };
+  return {moved(1), moved(2)};
+}
+
+cv::Vec3d CodedMean::InChannels(const std::array<Place, 3>& places, cv::Point moved, cv::RNG& random) const {
+  cv::Vec3d all = RgbOf(places[0].off, places[1].off, places[2].off) + ChannelRounding(chroma_, moved);
   for (int k = 0; k < 3; ++k) all[k] += whole_levels_ * random.uniform(-1.0, 1.0);
   return all;
 }
 
-cv::Mat CodedMean::DrawGrey(const cv::Mat& grid, double area, cv::RNG& random) const {
-  cv::Mat off = cv::Mat::zeros(grid.size(), CV_64F);
-  if (planes_.empty()) return off;
-  random.fill(off, cv::RNG::NORMAL, 0, channels_apart_);
+cv::Vec3d CodedMean::Draw(double area, cv::RNG& random) const {
+  if (planes_.empty()) return {};
+  return InChannels({SeenPlace(0, area, random), SeenPlace(1, area, random), SeenPlace(2, area, random)}, {}, random);
+}
+
+cv::Vec3d CodedMean::DrawOther(double area, cv::RNG& random) const {
+  if (planes_.empty()) return {};
+  const std::array<Place, 3> places = AnyPlaces(area, random);
+  return InChannels(places, MovedBy(places), random);
+}
+
+std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, int draws, cv::RNG& random) const {
+  std::vector<cv::Mat> drawn(draws);
+  std::vector<ChromaCounts> chroma;
+  for (int i = 0; i < static_cast<int>(grid.total()); ++i) chroma.push_back(ChromaOf(PartOf(decoded_, grid, i)));
+  const double detail = std::sqrt(DetailIn(area, noise_, codec_));
   const cv::Vec3d weights(1, GreyOfMeans(RgbOf(0, 1, 0)), GreyOfMeans(RgbOf(0, 0, 1)));
   const cv::Vec2d slope = {SlopeAcross(grid), SlopeAcross(grid.t())};
-  const double middle = cv::mean(grid)[0];
+  const cv::Mat about = grid - cv::mean(grid)[0];
+  std::array<std::vector<double>, 3> scene;
+  cv::Vec3d blocks;
   for (int k = 0; k < 3; ++k) {
     const int side = k == 0 ? kLumaBlockPx : kChromaBlockPx;
-    const double level = random.uniform(0.0, planes_[k].period());
-    const std::vector<double> scene = WithinPart(slope * relative_.at(k), cvRound(std::sqrt(area) / side));
-    for (int row = 0; row < grid.rows; ++row) {
-      for (int i = 0; i < grid.cols; ++i) {
-        const double here = level + relative_.at(k) * (grid.at<double>(row, i) - middle);
-        off.at<double>(row, i) += weights[k] * planes_[k].Draw(here, scene, area / (side * side), random);
+    scene.at(k) = WithinPart(slope * relative_.at(k), cvRound(std::sqrt(area) / side));
+    blocks[k] = BlocksOf(area, side);
+  }
+  for (cv::Mat& off : drawn) {
+    off.create(grid.size(), CV_64F);
+    random.fill(off, cv::RNG::NORMAL, 0, detail);
+    const std::array<Place, 3> places = AnyPlaces(static_cast<double>(decoded_.total()), random);
+    const cv::Point moved = MovedBy(places);
+    for (std::size_t i = 0; i < chroma.size(); ++i) {
+      double& one = off.begin<double>()[static_cast<int>(i)];
+      one += GreyRounding(chroma[i], moved);
+      for (int k = 0; k < 3; ++k) {
+        const double here = places.at(k).level + relative_.at(k) * about.begin<double>()[static_cast<int>(i)];
+        one += weights[k] * planes_[k].Draw(here, scene.at(k), blocks[k], random);
       }
     }
   }
-  return off;
+  return drawn;
 }
 
 }  // namespace qv

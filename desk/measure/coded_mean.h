@@ -2,7 +2,9 @@
 #define QVTESTER_DESK_MEASURE_CODED_MEAN_H_
 
 #include <array>
+#include <map>
 #include <opencv2/core.hpp>
+#include <utility>
 #include <vector>
 
 #include "desk/measure/codec_steps.h"
@@ -26,15 +28,18 @@ class PlaneRounding {
   Error At(double level) const;
   /// Of a mean over so many blocks, drawn; the scene in them differs by so much from this level.
   double Draw(double level, const std::vector<double>& scene, double blocks, cv::RNG& random) const;
-  double period() const { return 8 * step_; }
+  double step() const { return step_; }
 
  private:
   double step_;
   std::vector<Error> errors_;  // over the period
 };
 
-/// What a JPEG file may have added to the mean of a picture's pixels, drawn many times, since nothing tells where the
-/// mean lay between the steps. Noise is in it.
+/// Shares of blue and red chroma's values.
+using ChromaCounts = std::map<std::pair<int, int>, double>;
+
+/// What a JPEG file may have added to the mean of a picture's pixels, drawn many times; noise is in it. Where the mean
+/// lay between the steps is known as far as what became of it tells.
 class CodedMean {
  public:
   /// @param pixels  CV_8UC3, channels as stored: blue first. Part of the photo, so that its blocks can be told.
@@ -43,19 +48,30 @@ class CodedMean {
 
   /// Of a mean over so many pixels, levels in the order of the channels.
   cv::Vec3d Draw(double area, cv::RNG& random) const;
+  /// The same of another picture, as noisy and as even, of which nothing else is known.
+  cv::Vec3d DrawOther(double area, cv::RNG& random) const;
   /// Of grey means over so many pixels each, which lie about each other as this grid (CV_64F) says.
-  cv::Mat DrawGrey(const cv::Mat& grid, double area, cv::RNG& random) const;
-  /// Of a pixel's luma, before the codec took most of it.
-  double noise() const { return noise_; }
+  std::vector<cv::Mat> DrawGrey(const cv::Mat& grid, double area, int draws, cv::RNG& random) const;
 
  private:
-  double noise_ = 0;
-  std::vector<PlaneRounding> planes_;                // luma, blue, red
-  std::array<std::vector<double>, 3> scene_;         // of their blocks, about the mean
-  std::array<double, 3> relative_ = {};              // the planes' means over that of luma
-  std::vector<cv::Vec3d> channels_;                  // what rounding to channels may do
-  double channels_apart_ = 0;                        // to grey of small parts, beyond what it does to all alike
-  double whole_levels_ = 0;                          // half of what the codec was given is rounded to
+  struct Place {  // where a plane's mean may have lain, and what it then is off by
+    double level, off;
+  };
+  Place PlaceOf(int plane, double level, double area, cv::RNG& random) const;
+  Place SeenPlace(int plane, double area, cv::RNG& random) const;
+  std::array<Place, 3> AnyPlaces(double area, cv::RNG& random) const;
+  cv::Point MovedBy(const std::array<Place, 3>& places) const;
+  cv::Vec3d InChannels(const std::array<Place, 3>& places, cv::Point moved, cv::RNG& random) const;
+
+  CodecSteps codec_;
+  cv::Mat decoded_;                           // luma, red and blue
+  double noise_ = 0;                          // of a pixel's luma, before the codec took most of it
+  std::vector<PlaneRounding> planes_;         // luma, blue, red
+  std::array<std::vector<double>, 3> scene_;  // of their blocks, about the mean
+  std::array<double, 3> decoded_mean_ = {};   // of chroma, about grey
+  std::array<double, 3> relative_ = {};       // the planes' means over that of luma
+  ChromaCounts chroma_;
+  double whole_levels_ = 0;  // half of what the codec was given is rounded to
 };
 
 /// Half the interval in which rounding to steps leaves a mean; a spread of the step's size takes the error away.

@@ -118,8 +118,7 @@ LightTrust TrustInLight(const cv::Mat& photo, const QVLightRegion& region, const
   cv::Mat grey;
   cv::cvtColor(pixels, grey, cv::COLOR_RGB2GRAY);
   const cv::Mat means = BlockMeans(grey);
-  const cv::Size smallest(grey.cols / means.cols, grey.rows / means.rows);
-  trust.uniformity = errors.OfEvenness(means, smallest.area());
+  trust.uniformity = errors.OfEvenness(means, area / static_cast<double>(means.total()));
   cv::Mat clipped;
   cv::transform(pixels == 255, clipped, cv::Matx13f(1, 1, 1));  // saturates
   trust.clipped_share = OfShare(clipped);

@@ -43,9 +43,9 @@ std::vector<cv::Vec3f> DifferencesOf(const cv::Mat& means) {
   return all;
 }
 
-// What the true values of means with this noise probably are: the plainest surface off which they lie no further than
-// noise, which is known to so many degrees of freedom; else what lies surely further stays.
-cv::Mat WithoutNoise(const cv::Mat& grid, double noise, double degrees) {
+// What the true values of means probably are: the plainest surface off which they lie with no more variance than may
+// be noise's; else what surely lies further stays.
+cv::Mat WithoutNoise(const cv::Mat& grid, double most) {
   cv::Mat surface;
   cv::Mat off;
   double share = 0;
@@ -54,12 +54,24 @@ cv::Mat WithoutNoise(const cv::Mat& grid, double noise, double degrees) {
     if (freedom < terms) break;
     surface = SurfaceThrough(grid, terms);
     off = grid - surface;
-    const double surely = 1 + 2 * std::sqrt(2 / freedom + 2 / degrees);  // two deviations
     const double variance = off.dot(off) / freedom;
-    share = variance > 0 ? std::max(1 - surely * noise * noise / variance, 0.0) : 0;
+    share = variance > 0 ? std::max(1 - most / variance, 0.0) : 0;
     if (share == 0) break;
   }
   return surface + share * off;
+}
+
+// The variance about their own means that two deviations more than the middle of these grids have.
+double MostVariance(const std::vector<cv::Mat>& drawn) {
+  constexpr double kShare = 0.977;
+  std::vector<double> variances;
+  for (const cv::Mat& one : drawn) {
+    const cv::Mat off = one - cv::mean(one)[0];
+    variances.push_back(off.dot(off) / std::max(static_cast<double>(off.total()) - 1, 1.0));
+  }
+  const auto place = static_cast<std::ptrdiff_t>(kShare * static_cast<double>(variances.size()));
+  std::nth_element(variances.begin(), variances.begin() + place, variances.end());
+  return variances[place];
 }
 
 double LeastOverMost(const cv::Mat& means) {
@@ -82,7 +94,7 @@ MeanErrors::MeanErrors(const cv::Mat& pixels, const CodecSteps& codec)
   if (side > 1) cv::resize(means(cv::Rect({}, blocks * side)), means, blocks, 0, 0, cv::INTER_AREA);
   const std::vector<cv::Vec3f> differences = DifferencesOf(means);
   const auto n = static_cast<double>(differences.size());
-  degrees_ = 18.0 / 35 * n;  // they overlap
+  degrees_ = 18.0 / 53 * n;  // they overlap, and rows cross columns
   for (const cv::Vec3f& d : differences) {
     covariance_ += cv::Matx33d(cv::Vec3d(d) * cv::Vec3d(d).t()) * (side * side / (kSquaredWeights * n));
   }
@@ -110,21 +122,20 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
 // What means of grey over so many pixels are off by, drawn: by noise, which is not known better than that, and by whole
 // levels; with a codec by what that rounds, most of it alike.
 std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area) const {
+  cv::RNG random(10);
+  if (codec_.luma != 0) return coded_.DrawGrey(grid, area, kColourDraws, random);
   const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
   cv::Scalar deviation;
   cv::meanStdDev(pixels_, cv::noArray(), deviation);
   const double levels = HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]}));
-  const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + levels * levels / 3);
-  cv::RNG random(10);
+  const double spread_out = (1 - 4 * levels * levels) / 12;  // of grey's rounding, pixel by pixel
+  const double noise = std::sqrt((weights.dot(covariance_ * weights) + spread_out) / area + levels * levels / 3);
   std::vector<cv::Mat> errors(kColourDraws);
-  for (cv::Mat& error : errors) {
+  for (cv::Mat& error : errors) {  // the root of degrees over chi squared, by Wilson and Hilferty
+    const double part = 2 / (9 * degrees_);
+    const double of_noise = std::pow(std::max(1 - part + std::sqrt(part) * random.gaussian(1), 0.2), -1.5);
     error.create(grid.size(), CV_64F);
-    if (codec_.luma != 0) {
-      error = coded_.DrawGrey(grid, area, random);
-    } else {
-      const double of_noise = 1 + random.gaussian(1) / std::sqrt(2 * degrees_);
-      random.fill(error, cv::RNG::NORMAL, 0, of_noise * noise);
-    }
+    random.fill(error, cv::RNG::NORMAL, 0, of_noise * noise);
   }
   return errors;
 }
@@ -132,14 +143,7 @@ std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area) c
 Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area, double rounded) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
   const std::vector<cv::Mat> drawn = OfGreyMeans(means, area);
-  double variance = 0;
-  for (const cv::Mat& one : drawn) {
-    cv::Scalar mean;
-    cv::Scalar deviation;
-    cv::meanStdDev(one, mean, deviation);
-    variance += deviation[0] * deviation[0] / kColourDraws;
-  }
-  const cv::Mat even = WithoutNoise(means, std::sqrt(variance), degrees_);
+  const cv::Mat even = WithoutNoise(means, MostVariance(drawn));
   std::vector<double> errors;
   for (const cv::Mat& one : drawn) errors.push_back(LeastOverMost(even + one) - LeastOverMost(even));
   return FromErrors(std::move(errors), kPixelMethod);

@@ -1,5 +1,6 @@
 #include "desk/measure/patch_trust.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include "desk/measure/cielab.h"
@@ -16,6 +17,26 @@ cv::Vec3d CutAlike(const cv::Scalar& mean, double place) {
   cv::Vec3d cut;
   for (int k = 0; k < 3; ++k) cut[k] = mean[k] + place - std::floor(mean[k] + place);
   return cut;
+}
+
+cv::Vec3d CutOff(const cv::Scalar& pixels, const cv::Point3i& mean) {
+  const cv::Vec3d cut = cv::Vec3d(pixels[0], pixels[1], pixels[2]) - Levels(mean);
+  return {std::clamp(cut[0], 0.0, 1.0), std::clamp(cut[1], 0.0, 1.0), std::clamp(cut[2], 0.0, 1.0)};
+}
+
+// Of a camera's own levels.
+std::vector<cv::Vec3d> DrawUncoded(const cv::Mat& pixels, double area, const cv::Point3i& mean, cv::RNG& random) {
+  const double share = static_cast<double>(pixels.total()) / area;
+  const cv::Matx33d root = RootOf(CovarianceOfMean(pixels, 0) * share);
+  std::vector<cv::Vec3d> draws;
+  for (int i = 0; i < kColourDraws; ++i) {
+    cv::Vec3d normal;
+    cv::Vec3d cut;
+    for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
+    for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
+    draws.push_back(Levels(mean) + cut + root * normal);
+  }
+  return draws;
 }
 
 }  // namespace
@@ -38,18 +59,24 @@ cv::Matx33d RootOf(const cv::Matx33d& covariance) {
 
 std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean, std::uint64_t seed,
                                         const CodecSteps& codec) {
-  const CodedMean coded(pixels, codec);
-  const double share = static_cast<double>(pixels.total()) / area;
-  const cv::Matx33d root = codec.luma == 0 ? RootOf(CovarianceOfMean(pixels, 0) * share) : cv::Matx33d::zeros();
   cv::RNG random(seed);
+  if (codec.luma == 0) return DrawUncoded(pixels, area, mean, random);
+  const CodedMean coded(pixels, codec);
+  const cv::Vec3d decoded = Levels(mean) + CutOff(cv::mean(pixels), mean);
+  std::vector<cv::Vec3d> draws;
+  for (int i = 0; i < kColourDraws; ++i) draws.push_back(decoded - coded.Draw(area, random));
+  return draws;
+}
+
+std::vector<cv::Vec3d> DrawStandardColours(const cv::Mat& pixels, double area, const cv::Point3i& mean,
+                                           std::uint64_t seed, const CodecSteps& codec) {
+  cv::RNG random(seed);
+  if (codec.luma == 0) return DrawUncoded(pixels, area, mean, random);
+  const CodedMean coded(pixels, codec);
   std::vector<cv::Vec3d> draws;
   for (int i = 0; i < kColourDraws; ++i) {
-    cv::Vec3d normal;
-    cv::Vec3d cut;
-    for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
-    for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
-    if (codec.luma != 0) cut = CutAlike(cv::mean(pixels), cut[0]);
-    draws.push_back(Levels(mean) + cut + root * normal - coded.Draw(area, random));
+    const cv::Vec3d cut = CutAlike(cv::mean(pixels), random.uniform(0.0, 1.0));
+    draws.push_back(Levels(mean) + cut - coded.DrawOther(area, random));
   }
   return draws;
 }

@@ -24,6 +24,9 @@ cv::Matx33d RootOf(const cv::Matx33d& covariance);
 /// @param codec   by how much the photo's file rounds the means of its blocks.
 std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, const cv::Point3i& mean, std::uint64_t seed,
                                         const CodecSteps& codec = {});
+/// The same of a standard's patch, of which the mean alone is known; `pixels` are those of the patch held against it.
+std::vector<cv::Vec3d> DrawStandardColours(const cv::Mat& pixels, double area, const cv::Point3i& mean,
+                                           std::uint64_t seed, const CodecSteps& codec);
 
 /// Of a figure of one patch, and of a figure of a patch and its standard.
 using ColourFigure = std::function<double(const cv::Vec3d&)>;
