@@ -373,11 +373,12 @@ cv::Vec3d CodedMean::DrawOther(double area, cv::RNG& random) const {
   return InChannels(places, MovedBy(places), random);
 }
 
-std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, int draws, cv::RNG& random) const {
+std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, double rounded, int draws,
+                                         cv::RNG& random) const {
   std::vector<cv::Mat> drawn(draws);
   std::vector<ChromaCounts> chroma;
   for (int i = 0; i < static_cast<int>(grid.total()); ++i) chroma.push_back(ChromaOf(PartOf(decoded_, grid, i)));
-  const double detail = std::sqrt(DetailIn(area, noise_, codec_));
+  const double detail = std::sqrt(DetailIn(area, noise_, codec_) + rounded);
   const cv::Vec3d weights(1, GreyOfMeans(RgbOf(0, 1, 0)), GreyOfMeans(RgbOf(0, 0, 1)));
   const cv::Vec2d slope = {SlopeAcross(grid), SlopeAcross(grid.t())};
   const cv::Mat about = grid - cv::mean(grid)[0];

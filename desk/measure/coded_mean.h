@@ -50,8 +50,9 @@ class CodedMean {
   cv::Vec3d Draw(double area, cv::RNG& random) const;
   /// The same of another picture, as noisy and as even, of which nothing else is known.
   cv::Vec3d DrawOther(double area, cv::RNG& random) const;
-  /// Of grey means over so many pixels each, which lie about each other as this grid (CV_64F) says.
-  std::vector<cv::Mat> DrawGrey(const cv::Mat& grid, double area, int draws, cv::RNG& random) const;
+  /// Of grey means over so many pixels each, which lie about each other as this grid (CV_64F) says;
+  /// `rounded` is the variance of what was rounded after decoding, but for the change to grey.
+  std::vector<cv::Mat> DrawGrey(const cv::Mat& grid, double area, double rounded, int draws, cv::RNG& random) const;
 
  private:
   struct Place {  // where a plane's mean may have lain, and what it then is off by

@@ -118,7 +118,9 @@ LightTrust TrustInLight(const cv::Mat& photo, const QVLightRegion& region, const
   cv::Mat grey;
   cv::cvtColor(pixels, grey, cv::COLOR_RGB2GRAY);
   const cv::Mat means = BlockMeans(grey);
-  trust.uniformity = errors.OfEvenness(means, area / static_cast<double>(means.total()));
+  const double part = area / static_cast<double>(means.total());
+  const double of_grey = codec.luma == 0 ? 1.0 / 12 / part : 0;  // rounded pixel by pixel; a codec's is alike in many
+  trust.uniformity = errors.OfEvenness(means, part, of_grey);
   cv::Mat clipped;
   cv::transform(pixels == 255, clipped, cv::Matx13f(1, 1, 1));  // saturates
   trust.clipped_share = OfShare(clipped);

@@ -120,16 +120,15 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
 }
 
 // What means of grey over so many pixels are off by, drawn: by noise, which is not known better than that, and by whole
-// levels; with a codec by what that rounds, most of it alike.
-std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area) const {
+// levels, of each pixel after the photo was stored too; with a codec by what that rounds, most of it alike.
+std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area, double rounded) const {
   cv::RNG random(10);
-  if (codec_.luma != 0) return coded_.DrawGrey(grid, area, kColourDraws, random);
+  if (codec_.luma != 0) return coded_.DrawGrey(grid, area, rounded, kColourDraws, random);
   const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
   cv::Scalar deviation;
   cv::meanStdDev(pixels_, cv::noArray(), deviation);
   const double levels = HalfInterval(1, GreyOfMeans({deviation[0], deviation[1], deviation[2]}));
-  const double spread_out = (1 - 4 * levels * levels) / 12;  // of grey's rounding, pixel by pixel
-  const double noise = std::sqrt((weights.dot(covariance_ * weights) + spread_out) / area + levels * levels / 3);
+  const double noise = std::sqrt(weights.dot(covariance_ * weights) / area + levels * levels / 3 + rounded);
   std::vector<cv::Mat> errors(kColourDraws);
   for (cv::Mat& error : errors) {  // the root of degrees over chi squared, by Wilson and Hilferty
     const double part = 2 / (9 * degrees_);
@@ -142,7 +141,7 @@ std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area) c
 
 Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area, double rounded) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
-  const std::vector<cv::Mat> drawn = OfGreyMeans(means, area);
+  const std::vector<cv::Mat> drawn = OfGreyMeans(means, area, rounded);
   const cv::Mat even = WithoutNoise(means, MostVariance(drawn));
   std::vector<double> errors;
   for (const cv::Mat& one : drawn) errors.push_back(LeastOverMost(even + one) - LeastOverMost(even));

@@ -6,6 +6,7 @@
 
 #include "desk/measure/codec_steps.h"
 #include "desk/measure/coded_mean.h"
+#include "desk/measure/patch_trust.h"
 #include "desk/measure/uncertainty.h"
 
 namespace qv {
@@ -27,7 +28,7 @@ class MeanErrors {
   Uncertainty OfEvenness(const cv::Mat& means, double area, double rounded = 0) const;
 
  private:
-  std::vector<cv::Mat> OfGreyMeans(const cv::Mat& grid, double area) const;
+  std::vector<cv::Mat> OfGreyMeans(const cv::Mat& grid, double area, double rounded) const;
 
   cv::Mat pixels_;
   CodecSteps codec_;

@@ -102,9 +102,9 @@ const std::vector<UncertaintyMethod>& UncertaintyMethods() {
        "noiseless one, not how far that lies from the lens's own figure."},
       {kPixelMethod,
        "What the colour of a patch, a light or a display may be is drawn 400 times (JCGM 101) and carried through the "
-       "formulas: from the variance of its pixels, by differences between neighbours, over their number. In a JPEG "
-       "file "
-       "it is drawn from what luma and chroma may have been: blocks' means, moved by the noise that the file's table "
+       "formulas: from the variance of its pixels, by differences between neighbours, over their number. In a "
+       "JPEG file it is drawn from what luma and chroma may have been: blocks' means, moved by the noise that the "
+       "file's table "
        "left, are rounded to its steps, then to levels, and the mean that came of it tells where it may have lain "
        "(chroma at half the pixels is taken for granted). A patch's mean is cut to a whole level (type B: up "
        "to one level low); the standard photo's noise is taken to be the same. Of a light the true value is that "
