@@ -185,7 +185,8 @@ std::vector<double> WithinPart(const cv::Vec2d& slope, int blocks) {
   const int side = std::clamp(blocks, 1, kMost);
   std::vector<double> off;
   for (int i = 0; i < side * side; ++i) {
-    off.push_back(slope[0] * ((i % side + 0.5) / side - 0.5) + slope[1] * ((i / side + 0.5) / side - 0.5));
+    const int row = i / side;
+    off.push_back(slope[0] * ((i % side + 0.5) / side - 0.5) + slope[1] * ((row + 0.5) / side - 0.5));
   }
   return off;
 }
