@@ -12,6 +12,7 @@
 #include "desk/measure/decision.h"
 #include "desk/measure/edge_resampling.h"
 #include "desk/measure/film_trust.h"
+#include "desk/measure/mean_trust.h"
 #include "desk/measure/measure.h"
 #include "desk/measure/patch_trust.h"
 #include "desk/measure/trust_table.h"
@@ -166,10 +167,36 @@ TEST(Uncertainty, AKnownErrorMovesTheIntervalToOneSide) {
   EXPECT_NEAR(20 + 2.353, OffBy(-20, about, 3).expanded, 0.002);  // Student's 95 % quantile, of one side
 }
 
+TEST(Uncertainty, HoldsWhatACodecDoesToTheGreyOfAPoint) {
+  constexpr int kPhotos = 30;
+  const cv::Rect point(131, 77, 30, 30);
+  int within = 0;
+  double widest = 0;
+  for (int i = 0; i < kPhotos; ++i) {
+    cv::RNG random(i + 1);
+    cv::Vec3d colour;
+    for (int k = 0; k < 3; ++k) colour[k] = random.uniform(120.0, 200.0);
+    cv::Mat levels(240, 320, CV_32FC3);
+    random.fill(levels, cv::RNG::NORMAL, cv::Scalar(colour[0], colour[1], colour[2]), cv::Scalar::all(2.5));
+    cv::Mat photo;
+    levels.convertTo(photo, CV_8U);
+    std::vector<uchar> file;
+    cv::imencode(".jpg", photo, file, {cv::IMWRITE_JPEG_QUALITY, 90});
+    cv::Mat grey;
+    cv::cvtColor(cv::imdecode(file, cv::IMREAD_COLOR), grey, cv::COLOR_RGB2GRAY);  // as the tests weigh channels
+    const MeanErrors errors(cv::imdecode(file, cv::IMREAD_COLOR), StepsOf(std::string(file.begin(), file.end())));
+    const double u = FromErrors(errors.OfGreyPart(point.area(), 400), kPixelMethod).expanded;
+    within += std::fabs(cv::mean(grey(point))[0] - GreyOfMeans(colour)) <= u ? 1 : 0;
+    widest = std::max(widest, u);
+  }
+  EXPECT_GE(within, 25);
+  EXPECT_LT(widest, 1.5);
+}
+
 TEST(Uncertainty, HoldsWhatACodecDoesToAPatch) {
   const auto blue_to_yellow = [](const cv::Vec3d& rgb) { return OwnLab(rgb)[2]; };
   for (const int quality : {95, 90, 75, 50}) {
-    constexpr int kPatches = 150;
+    constexpr int kPatches = 100;
     int within = 0;
     cv::RNG random(quality);
     for (int i = 0; i < kPatches; ++i) {

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <map>
 #include <opencv2/imgproc.hpp>
 #include <utility>
@@ -233,6 +234,19 @@ double GreyRounding(const ChromaCounts& counts, cv::Point moved) {
   return error;
 }
 
+// What a part of so many pixels may have of it: blocks of one value each.
+ChromaCounts SomeOf(const ChromaCounts& counts, double area, cv::RNG& random) {
+  const int blocks = std::max(cvRound(area / (kChromaBlockPx * kChromaBlockPx)), 1);
+  ChromaCounts some;
+  for (int i = 0; i < blocks; ++i) {
+    double left = random.uniform(0.0, 1.0);
+    auto chosen = counts.begin();
+    while (std::next(chosen) != counts.end() && left > chosen->second) left -= (chosen++)->second;
+    some[chosen->first] += 1.0 / blocks;
+  }
+  return some;
+}
+
 }  // namespace
 
 double HalfInterval(double step, double spread) {
@@ -285,14 +299,23 @@ PlaneRounding::Error PlaneRounding::At(double level) const {
   return {low.mean + share * (high.mean - low.mean), low.variance + share * (high.variance - low.variance)};
 }
 
-double PlaneRounding::Draw(double level, const std::vector<double>& scene, double blocks, cv::RNG& random) const {
-  Error sum = {0, 0};
-  for (const double one : scene) {
-    const Error error = At(level + one);
-    sum.mean += error.mean / static_cast<double>(scene.size());
-    sum.variance += error.variance / static_cast<double>(scene.size());
+PlaneRounding PlaneRounding::Over(const std::vector<double>& scene) const {
+  PlaneRounding over = *this;
+  const auto n = static_cast<double>(scene.size());
+  for (std::size_t i = 0; i < errors_.size(); ++i) {
+    over.errors_[i] = {0, 0};
+    for (const double one : scene) {
+      const Error error = At(step_ * static_cast<double>(i) / kPhasesOfStep + one);
+      over.errors_[i].mean += error.mean / n;
+      over.errors_[i].variance += error.variance / n;
+    }
   }
-  return sum.mean + std::sqrt(sum.variance / std::max(blocks, 1.0)) * random.gaussian(1);
+  return over;
+}
+
+double PlaneRounding::Draw(double level, double blocks, cv::RNG& random) const {
+  const Error error = At(level);
+  return error.mean + std::sqrt(error.variance / std::max(blocks, 1.0)) * random.gaussian(1);
 }
 
 CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) : codec_(codec) {
@@ -309,25 +332,27 @@ CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) : codec_(co
   luma = plane_of(kLumaBlockPx, 0);
   noise_ = LumaBeforeCodec(luma, codec);
   planes_.emplace_back(codec.luma, noise_ / kLumaBlockPx, FlatShare(luma, kLumaBlockPx));
-  scene_[0] = SceneOf(luma, kLumaBlockPx);
+  const std::vector<double> scene = SceneOf(luma, kLumaBlockPx);
+  seen_.push_back(planes_.back().Over(scene));
   const double step = codec.chroma > 0 ? codec.chroma : codec.luma;  // files without a table of its own
   for (const int k : {2, 1}) {
     const cv::Mat chroma = plane_of(kChromaBlockPx, k);
-    scene_.at(planes_.size()) = SceneOf(chroma, kChromaBlockPx);
     decoded_mean_.at(planes_.size()) = cv::mean(chroma)[0] - kGrey;
     relative_.at(planes_.size()) = decoded_mean_.at(planes_.size()) / std::max(cv::mean(luma)[0], 1.0);
     planes_.emplace_back(step, ChromaNoise(noise_) / kLumaBlockPx, FlatShare(chroma, kChromaBlockPx));
+    seen_.push_back(planes_.back().Over(SceneOf(chroma, kChromaBlockPx)));
   }
   relative_[0] = 1;
   decoded_mean_[0] = cv::mean(luma)[0];
   cv::cvtColor(pixels, decoded_, cv::COLOR_BGR2YCrCb);
   chroma_ = ChromaOf(decoded_);
-  whole_levels_ = HalfInterval(1, std::hypot(noise_ / kLumaShare, Spread(scene_[0])));
+  whole_levels_ = HalfInterval(1, std::hypot(noise_ / kLumaShare, Spread(scene)));
 }
 
-CodedMean::Place CodedMean::PlaceOf(int plane, double level, double area, cv::RNG& random) const {
+CodedMean::Place CodedMean::PlaceOf(int plane, const PlaneRounding& rounding, double level, double area,
+                                    cv::RNG& random) {
   const int side = plane == 0 ? kLumaBlockPx : kChromaBlockPx;
-  return {level, planes_[plane].Draw(level, scene_.at(plane), area / (side * side), random)};
+  return {level, rounding.Draw(level, area / (side * side), random)};
 }
 
 // Such that the decoded mean comes about: where that lies about the steps tells something.
@@ -337,17 +362,17 @@ CodedMean::Place CodedMean::SeenPlace(int plane, double area, cv::RNG& random) c
   const double reach = 0.6 + planes_[plane].step();
   Place place = {};
   for (int i = 0; i < kTries; ++i) {
-    place = PlaceOf(plane, decoded_mean_[plane] + random.uniform(-reach, reach), area, random);
+    place = PlaceOf(plane, seen_[plane], decoded_mean_[plane] + random.uniform(-reach, reach), area, random);
     if (std::fabs(place.level + place.off - decoded_mean_[plane]) < kAlike) break;
   }
   return place;
 }
 
 // Anywhere; chroma about grey, since what steps and channels round is bound to whole levels.
-std::array<CodedMean::Place, 3> CodedMean::AnyPlaces(double area, cv::RNG& random) const {
+std::array<CodedMean::Place, 3> CodedMean::AnyPlaces(const Planes& planes, double area, cv::RNG& random) {
   constexpr double kReach = 60;
   std::array<Place, 3> places = {};
-  for (int k = 0; k < 3; ++k) places.at(k) = PlaceOf(k, random.uniform(-kReach, kReach), area, random);
+  for (int k = 0; k < 3; ++k) places.at(k) = PlaceOf(k, planes[k], random.uniform(-kReach, kReach), area, random);
   return places;
 }
 
@@ -370,11 +395,19 @@ cv::Vec3d CodedMean::Draw(double area, cv::RNG& random) const {
 
 cv::Vec3d CodedMean::DrawOther(double area, cv::RNG& random) const {
   if (planes_.empty()) return {};
-  const std::array<Place, 3> places = AnyPlaces(area, random);
+  const std::array<Place, 3> places = AnyPlaces(seen_, area, random);
   return InChannels(places, MovedBy(places), random);
 }
 
-std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, double rounded, int draws,
+double CodedMean::DrawGreyOfPart(double area, cv::RNG& random) const {
+  if (planes_.empty()) return 0;
+  const std::array<Place, 3> places = AnyPlaces(planes_, area, random);
+  return GreyOfMeans(RgbOf(places[0].off, places[1].off, places[2].off)) +
+         GreyRounding(SomeOf(chroma_, area, random), MovedBy(places)) +
+         std::sqrt(DetailIn(area, noise_, codec_)) * random.gaussian(1);
+}
+
+std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, double share, double rounded, int draws,
                                          cv::RNG& random) const {
   std::vector<cv::Mat> drawn(draws);
   std::vector<ChromaCounts> chroma;
@@ -383,24 +416,24 @@ std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, doubl
   const cv::Vec3d weights(1, GreyOfMeans(RgbOf(0, 1, 0)), GreyOfMeans(RgbOf(0, 0, 1)));
   const cv::Vec2d slope = {SlopeAcross(grid), SlopeAcross(grid.t())};
   const cv::Mat about = grid - cv::mean(grid)[0];
-  std::array<std::vector<double>, 3> scene;
+  Planes planes;
   cv::Vec3d blocks;
   for (int k = 0; k < 3; ++k) {
     const int side = k == 0 ? kLumaBlockPx : kChromaBlockPx;
-    scene.at(k) = WithinPart(slope * relative_.at(k), cvRound(std::sqrt(area) / side));
+    planes.push_back(planes_[k].Over(WithinPart(slope * share * relative_.at(k), cvRound(std::sqrt(area) / side))));
     blocks[k] = BlocksOf(area, side);
   }
   for (cv::Mat& off : drawn) {
     off.create(grid.size(), CV_64F);
     random.fill(off, cv::RNG::NORMAL, 0, detail);
-    const std::array<Place, 3> places = AnyPlaces(static_cast<double>(decoded_.total()), random);
+    const std::array<Place, 3> places = AnyPlaces(seen_, static_cast<double>(decoded_.total()), random);
     const cv::Point moved = MovedBy(places);
     for (std::size_t i = 0; i < chroma.size(); ++i) {
       double& one = off.begin<double>()[static_cast<int>(i)];
-      one += GreyRounding(chroma[i], moved);
+      one += GreyRounding(share < 1 ? SomeOf(chroma[i], area, random) : chroma[i], moved);
       for (int k = 0; k < 3; ++k) {
         const double here = places.at(k).level + relative_.at(k) * about.begin<double>()[static_cast<int>(i)];
-        one += weights[k] * planes_[k].Draw(here, scene.at(k), blocks[k], random);
+        one += weights[k] * planes[k].Draw(here, blocks[k], random);
       }
     }
   }

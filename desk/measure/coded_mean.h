@@ -26,8 +26,10 @@ class PlaneRounding {
   };
   /// Of a block whose mean is so many levels from some multiple of eight steps.
   Error At(double level) const;
-  /// Of a mean over so many blocks, drawn; the scene in them differs by so much from this level.
-  double Draw(double level, const std::vector<double>& scene, double blocks, cv::RNG& random) const;
+  /// Of blocks of which the scene makes as many as this list says differ by so much from the level.
+  PlaneRounding Over(const std::vector<double>& scene) const;
+  /// Of a mean over so many blocks, drawn.
+  double Draw(double level, double blocks, cv::RNG& random) const;
   double step() const { return step_; }
 
  private:
@@ -50,27 +52,31 @@ class CodedMean {
   cv::Vec3d Draw(double area, cv::RNG& random) const;
   /// The same of another picture, as noisy and as even, of which nothing else is known.
   cv::Vec3d DrawOther(double area, cv::RNG& random) const;
-  /// Of grey means over so many pixels each, which lie about each other as this grid (CV_64F) says;
+  /// Of the grey of a small part somewhere in the picture, within which the scene is even.
+  double DrawGreyOfPart(double area, cv::RNG& random) const;
+  /// Of grey means over so many pixels each, which lie about each other as this grid (CV_64F) says, and are as long as
+  /// this share of its steps;
   /// `rounded` is the variance of what was rounded after decoding, but for the change to grey.
-  std::vector<cv::Mat> DrawGrey(const cv::Mat& grid, double area, double rounded, int draws, cv::RNG& random) const;
+  std::vector<cv::Mat> DrawGrey(const cv::Mat& grid, double area, double share, double rounded, int draws,
+                                cv::RNG& random) const;
 
  private:
   struct Place {  // where a plane's mean may have lain, and what it then is off by
     double level, off;
   };
-  Place PlaceOf(int plane, double level, double area, cv::RNG& random) const;
+  using Planes = std::vector<PlaneRounding>;  // luma, blue, red
+  static Place PlaceOf(int plane, const PlaneRounding& rounding, double level, double area, cv::RNG& random);
+  static std::array<Place, 3> AnyPlaces(const Planes& planes, double area, cv::RNG& random);
   Place SeenPlace(int plane, double area, cv::RNG& random) const;
-  std::array<Place, 3> AnyPlaces(double area, cv::RNG& random) const;
   cv::Point MovedBy(const std::array<Place, 3>& places) const;
   cv::Vec3d InChannels(const std::array<Place, 3>& places, cv::Point moved, cv::RNG& random) const;
 
   CodecSteps codec_;
-  cv::Mat decoded_;                           // luma, red and blue
-  double noise_ = 0;                          // of a pixel's luma, before the codec took most of it
-  std::vector<PlaneRounding> planes_;         // luma, blue, red
-  std::array<std::vector<double>, 3> scene_;  // of their blocks, about the mean
-  std::array<double, 3> decoded_mean_ = {};   // of chroma, about grey
-  std::array<double, 3> relative_ = {};       // the planes' means over that of luma
+  cv::Mat decoded_;                          // luma, red and blue
+  double noise_ = 0;                         // of a pixel's luma, before the codec took most of it
+  Planes planes_, seen_;                     // of blocks, and of those over the scene in them
+  std::array<double, 3> decoded_mean_ = {};  // of chroma, about grey
+  std::array<double, 3> relative_ = {};      // the planes' means over that of luma
   ChromaCounts chroma_;
   double whole_levels_ = 0;  // half of what the codec was given is rounded to
 };

@@ -246,12 +246,12 @@ void TrustMeans(Phase& phase, const LcdFinding& found, const CodecSteps& codec) 
   const int side = std::min(size.width, size.height) / 12;
   const double part = std::pow(side + 1.0 / 3, 2) * area / static_cast<double>(found.screen.total());  // of the photo
   const double rounded = kRounding * (1 + kGreyOfRounded) / part;
-  std::vector<cv::Vec3d> off_point = errors.OfMean(part, kDraws);
-  for (cv::Vec3d& one : off_point) one += cv::Vec3d::all(halves + std::sqrt(rounded) * random.gaussian(1));
-  phase.Find("levels")->Trust(std::vector<Uncertainty>(9, OfDrawn(off_point, 0, GreyOfMeans)));
+  std::vector<double> off_point = errors.OfGreyPart(part, kDraws);
+  for (double& one : off_point) one += halves + std::sqrt(rounded) * random.gaussian(1);
+  phase.Find("levels")->Trust(std::vector<Uncertainty>(9, FromErrors(std::move(off_point), kPixelMethod)));
   cv::Mat levels(3, 3, CV_64F);
   std::copy(std::begin(r.levels_), std::end(r.levels_), levels.begin<double>());
-  phase.Find("uniformity")->Trust({errors.OfEvenness(levels, part, rounded)});
+  phase.Find("uniformity")->Trust({errors.OfEvenness(levels, part, rounded, std::sqrt(9 * part / area))});
 }
 
 class Lcd : public Measurement {

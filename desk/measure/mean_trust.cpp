@@ -119,11 +119,22 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
   return errors;
 }
 
+std::vector<double> MeanErrors::OfGreyPart(double area, int draws) const {
+  std::vector<double> errors;
+  cv::RNG random(14);
+  if (codec_.luma == 0) {
+    for (const cv::Vec3d& one : OfMean(area, draws)) errors.push_back(GreyOfMeans(one));
+  } else {
+    for (int i = 0; i < draws; ++i) errors.push_back(coded_.DrawGreyOfPart(area, random));
+  }
+  return errors;
+}
+
 // What means of grey over so many pixels are off by, drawn: by noise, which is not known better than that, and by whole
 // levels, of each pixel after the photo was stored too; with a codec by what that rounds, most of it alike.
-std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area, double rounded) const {
+std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area, double share, double rounded) const {
   cv::RNG random(10);
-  if (codec_.luma != 0) return coded_.DrawGrey(grid, area, rounded, kColourDraws, random);
+  if (codec_.luma != 0) return coded_.DrawGrey(grid, area, share, rounded, kColourDraws, random);
   const cv::Vec3d weights(GreyOfMeans({1, 0, 0}), GreyOfMeans({0, 1, 0}), GreyOfMeans({0, 0, 1}));
   cv::Scalar deviation;
   cv::meanStdDev(pixels_, cv::noArray(), deviation);
@@ -139,9 +150,9 @@ std::vector<cv::Mat> MeanErrors::OfGreyMeans(const cv::Mat& grid, double area, d
   return errors;
 }
 
-Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area, double rounded) const {
+Uncertainty MeanErrors::OfEvenness(const cv::Mat& means, double area, double rounded, double share) const {
   if (degrees_ < 1 || !(cv::norm(means, cv::NORM_INF) > 0)) return FromErrors({}, kPixelMethod);
-  const std::vector<cv::Mat> drawn = OfGreyMeans(means, area, rounded);
+  const std::vector<cv::Mat> drawn = OfGreyMeans(means, area, share, rounded);
   const cv::Mat even = WithoutNoise(means, MostVariance(drawn));
   std::vector<double> errors;
   for (const cv::Mat& one : drawn) errors.push_back(LeastOverMost(even + one) - LeastOverMost(even));

@@ -22,13 +22,16 @@ class MeanErrors {
 
   /// Of a mean over so many pixels: levels, blue first. None where there are too few pixels to tell their noise.
   std::vector<cv::Vec3d> OfMean(double area, int draws = kColourDraws) const;
+  /// Of the grey of a small part of the area, within which the scene is even.
+  std::vector<double> OfGreyPart(double area, int draws) const;
   /// Of the smallest over the largest of a grid of means of grey (CV_64F) over so many pixels each, drawn about what
   /// their true values probably are: of even levels noise makes the least smaller and the largest larger. `rounded` is
-  /// the variance of what rounds each mean's pixels after the photo was stored.
-  Uncertainty OfEvenness(const cv::Mat& means, double area, double rounded = 0) const;
+  /// the variance of what rounds each mean's pixels after the photo was stored, `share` that of the grid's step which
+  /// each mean's pixels take.
+  Uncertainty OfEvenness(const cv::Mat& means, double area, double rounded = 0, double share = 1) const;
 
  private:
-  std::vector<cv::Mat> OfGreyMeans(const cv::Mat& grid, double area, double rounded) const;
+  std::vector<cv::Mat> OfGreyMeans(const cv::Mat& grid, double area, double share, double rounded) const;
 
   cv::Mat pixels_;
   CodecSteps codec_;
