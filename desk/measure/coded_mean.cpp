@@ -346,7 +346,7 @@ CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) : codec_(co
   decoded_mean_[0] = cv::mean(luma)[0];
   cv::cvtColor(pixels, decoded_, cv::COLOR_BGR2YCrCb);
   chroma_ = ChromaOf(decoded_);
-  whole_levels_ = HalfInterval(1, std::hypot(noise_ / kLumaShare, Spread(scene)));
+  whole_levels_ = HalfInterval(1, std::hypot(noise_ / kLumaShare, scene.size() < 2 ? 0 : Spread(scene)));
 }
 
 CodedMean::Place CodedMean::PlaceOf(int plane, const PlaneRounding& rounding, double level, double area,

@@ -365,6 +365,7 @@ cv::Point2d Down(const Places& p) { return {p[4] - p[0], p[5] - p[1]}; }
 
 double LegsRatio(const Places& p) { return Legs{Right(p), Down(p)}.ratio(); }
 double LegsAngle(const Places& p) { return Legs{Right(p), Down(p)}.angle_deg(); }
+
 // How far the centres of gravity lie from the squares' middles where the chart is seen obliquely. A scale that changes
 // by g a pixel moves all three by 4/3 g times half a side squared, and by half a leg times g in their ratio and angle.
 double OffByView(const Places& cores, double module) {
