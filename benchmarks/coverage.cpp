@@ -791,7 +791,7 @@ const char* WhyMissed(const Group& group, const char* figure, const Condition& c
   if (group.run == TryFlashFilm) return "what an encoder's steps do to all blocks alike isn't known: U is too wide";
   if (group.run == TryFocus) return "of films with few frames";
   if (group.run == TryPreview && condition.jpeg != 0) return kTooWide;
-  if (group.run == TryPrint) return kTooWide;
+  if (group.run == TryPrint) return condition.blur > 1.5 ? "of blurred strokes U tells too little" : kTooWide;
   if (group.run == TryDisplay && condition.jpeg != 0) return "what the codec rounds is drawn for any tint";
   if (group.run == TryMarks && condition.blur > 1.5) return kTooWide;
   if (group.run == TrySpots && condition.jpeg != 0) return "the codec takes noise and faint spots";
