@@ -225,14 +225,13 @@ struct PatchTrial {
     standard_draws = DrawStandardColours(photo, area, standard, random.next(), codec);
   }
 
-  static cv::Vec3d Levels(const cv::Point3i& p) { return {1.0 * p.x, 1.0 * p.y, 1.0 * p.z}; }
-
   Trial Colour(const ColourFigure& figure) const {
-    return {figure(Levels(mean)) - figure(truth), TrustInColour(mean, draws, figure).expanded, 100};
+    return {figure(LevelsOf(mean)) - figure(truth), TrustInColour(mean, draws, figure).expanded, 100};
   }
-  Trial Difference(const PairFigure& figure) const {
-    return {figure(Levels(mean), Levels(standard)) - figure(truth, standard_truth),
-            TrustInPair(mean, draws, standard, standard_draws, figure).expanded, 100};
+  Trial Difference(const DrawnDifferences::PairFigure& figure) const {
+    DrawnDifferences one;
+    one.Add(mean, draws, standard, standard_draws, figure);
+    return {figure(LevelsOf(mean), LevelsOf(standard)) - figure(truth, standard_truth), one.OfPatch(0).expanded, 100};
   }
 };
 

@@ -54,8 +54,6 @@ std::vector<std::size_t> PatchesOf(const Phase& phase, const char* figure, const
   return patches;
 }
 
-cv::Vec3d StoredLevels(const cv::Point3i& mean) { return {1.0 * mean.x, 1.0 * mean.y, 1.0 * mean.z}; }
-
 using LabOf = cv::Vec3d (*)(const cv::Vec3d& rgb);
 
 void TrustColours(Phase& phase, const std::string& figure, const PatchScene& scene, const Draws& draws, LabOf lab) {
@@ -70,42 +68,17 @@ void TrustColours(Phase& phase, const std::string& figure, const PatchScene& sce
   }
 }
 
-// Of patches that were compared: each one's difference as it is read, and as it may be, draw by draw.
-struct DrawnDifferences {
-  std::vector<double> readings;
-  std::vector<std::vector<double>> draws;
-
-  void Add(double reading, std::vector<double> drawn) {
-    readings.push_back(reading);
-    draws.push_back(std::move(drawn));
-  }
-  // Of what is made of all of them, say their mean: the cut of means to whole levels moves many one way.
-  template <typename Figure>
-  Uncertainty Of(const Figure& figure) const {
-    const double reading = figure(readings);
-    std::vector<double> errors;
-    for (std::size_t draw = 0; draw < draws[0].size(); ++draw) {
-      std::vector<double> all;
-      for (const auto& patch : draws) all.push_back(patch[draw]);
-      errors.push_back(figure(all) - reading);
-    }
-    return FromErrors(std::move(errors), kPixelMethod);
-  }
-};
-
 // The list, its mean and its largest.
 void TrustDifferences(Phase& phase, const std::string& figure, const DrawnDifferences& drawn) {
   Reading* const each = phase.Find(figure);
-  if (each == nullptr || drawn.readings.empty() || drawn.readings.size() != each->values.size()) return;
+  if (each == nullptr || drawn.size() == 0 || drawn.size() != each->values.size()) return;
   std::vector<Uncertainty> known;
-  for (std::size_t i = 0; i < drawn.readings.size(); ++i) {
-    known.push_back(drawn.Of([i](const std::vector<double>& all) { return all[i]; }));
-  }
-  each->Trust(known);
-  phase.Find(figure + "_mean")->Trust({drawn.Of([](const std::vector<double>& all) {
+  for (std::size_t i = 0; i < drawn.size(); ++i) known.push_back(drawn.OfPatch(i));
+  each->Trust(std::move(known));
+  phase.Find(figure + "_mean")->Trust({drawn.OfAll([](const std::vector<double>& all) {
     return std::accumulate(all.begin(), all.end(), 0.0) / static_cast<double>(all.size());
   })});
-  phase.Find(figure + "_max")->Trust({drawn.Of([](const std::vector<double>& all) {
+  phase.Find(figure + "_max")->Trust({drawn.OfAll([](const std::vector<double>& all) {
     return *std::max_element(all.begin(), all.end());
   })});
 }
@@ -120,10 +93,8 @@ void TrustPatches(Phase& phase, const PatchScene& scene) {
   if (draws.measured.empty()) return;
   TrustColours(phase, "lab_", scene, draws, OwnLab);
   TrustColours(phase, "lab_d65_", scene, draws, [](const cv::Vec3d& rgb) { return LabD65OfSrgb(rgb); });
-  const auto compare = [&](DrawnDifferences& all, std::size_t i, const PairFigure& difference) {
-    std::vector<double> drawn;
-    for (int k = 0; k < kColourDraws; ++k) drawn.push_back(difference(draws.measured[i][k], draws.standard[i][k]));
-    all.Add(difference(StoredLevels(scene.measured[i]), StoredLevels(scene.standard[i])), std::move(drawn));
+  const auto compare = [&](DrawnDifferences& all, std::size_t i, const DrawnDifferences::PairFigure& difference) {
+    all.Add(scene.measured[i], draws.measured[i], scene.standard[i], draws.standard[i], difference);
   };
   DrawnDifferences own;
   for (const std::size_t i : PatchesOf(phase, "delta_e_76", draws)) compare(own, i, Difference76);
@@ -139,7 +110,7 @@ void TrustPatches(Phase& phase, const PatchScene& scene) {
     const auto off = [&](const cv::Vec3d& rgb) { return DeltaE2000(LabD65OfSrgb(rgb), given->second); };
     std::vector<double> drawn;
     for (const cv::Vec3d& rgb : draws.measured[i]) drawn.push_back(off(rgb));
-    by_cie.Add(off(StoredLevels(scene.measured[i])), std::move(drawn));
+    by_cie.Add(off(LevelsOf(scene.measured[i])), std::move(drawn));
   }
   TrustDifferences(phase, "delta_e_2000", by_cie);
 }

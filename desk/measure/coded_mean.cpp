@@ -320,16 +320,15 @@ double PlaneRounding::Draw(double level, double blocks, cv::RNG& random) const {
 
 CodedMean::CodedMean(const cv::Mat& pixels, const CodecSteps& codec) : codec_(codec) {
   if (codec.luma == 0) return;
-  cv::Mat planes;  // as decoded, to the level
-  cv::Mat luma;
-  const auto plane_of = [&](int side, int k) {
+  const auto plane_of = [&](int side, int k) {  // as decoded, to the level
     const cv::Mat blocks = WholeBlocks(pixels, side);
-    cv::cvtColor(blocks.empty() ? pixels : blocks, planes, cv::COLOR_BGR2YCrCb);
+    cv::Mat planes;
     cv::Mat plane;
+    cv::cvtColor(blocks.empty() ? pixels : blocks, planes, cv::COLOR_BGR2YCrCb);
     cv::extractChannel(planes, plane, k);
     return plane;
   };
-  luma = plane_of(kLumaBlockPx, 0);
+  const cv::Mat luma = plane_of(kLumaBlockPx, 0);
   noise_ = LumaBeforeCodec(luma, codec);
   planes_.emplace_back(codec.luma, noise_ / kLumaBlockPx, FlatShare(luma, kLumaBlockPx));
   const std::vector<double> scene = SceneOf(luma, kLumaBlockPx);
@@ -399,12 +398,17 @@ cv::Vec3d CodedMean::DrawOther(double area, cv::RNG& random) const {
   return InChannels(places, MovedBy(places), random);
 }
 
-double CodedMean::DrawGreyOfPart(double area, cv::RNG& random) const {
-  if (planes_.empty()) return 0;
-  const std::array<Place, 3> places = AnyPlaces(planes_, area, random);
-  return GreyOfMeans(RgbOf(places[0].off, places[1].off, places[2].off)) +
-         GreyRounding(SomeOf(chroma_, area, random), MovedBy(places)) +
-         std::sqrt(DetailIn(area, noise_, codec_)) * random.gaussian(1);
+std::vector<double> CodedMean::DrawGreyOfPart(double area, int draws, cv::RNG& random) const {
+  std::vector<double> drawn(draws);
+  if (planes_.empty()) return drawn;
+  const double detail = std::sqrt(DetailIn(area, noise_, codec_));
+  for (double& one : drawn) {
+    const std::array<Place, 3> places = AnyPlaces(planes_, area, random);
+    one = GreyOfMeans(RgbOf(places[0].off, places[1].off, places[2].off)) +
+          GreyRounding(SomeOf(chroma_, area, random), MovedBy(places));
+    one += detail * random.gaussian(1);
+  }
+  return drawn;
 }
 
 std::vector<cv::Mat> CodedMean::DrawGrey(const cv::Mat& grid, double area, double share, double rounded, int draws,

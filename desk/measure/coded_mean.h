@@ -53,7 +53,7 @@ class CodedMean {
   /// The same of another picture, as noisy and as even, of which nothing else is known.
   cv::Vec3d DrawOther(double area, cv::RNG& random) const;
   /// Of the grey of a small part somewhere in the picture, within which the scene is even.
-  double DrawGreyOfPart(double area, cv::RNG& random) const;
+  std::vector<double> DrawGreyOfPart(double area, int draws, cv::RNG& random) const;
   /// Of grey means over so many pixels each, which lie about each other as this grid (CV_64F) says, and are as long as
   /// this share of its steps;
   /// `rounded` is the variance of what was rounded after decoding, but for the change to grey.

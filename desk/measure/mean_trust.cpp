@@ -120,13 +120,10 @@ std::vector<cv::Vec3d> MeanErrors::OfMean(double area, int draws) const {
 }
 
 std::vector<double> MeanErrors::OfGreyPart(double area, int draws) const {
-  std::vector<double> errors;
   cv::RNG random(14);
-  if (codec_.luma == 0) {
-    for (const cv::Vec3d& one : OfMean(area, draws)) errors.push_back(GreyOfMeans(one));
-  } else {
-    for (int i = 0; i < draws; ++i) errors.push_back(coded_.DrawGreyOfPart(area, random));
-  }
+  if (codec_.luma != 0) return coded_.DrawGreyOfPart(area, draws, random);
+  std::vector<double> errors;
+  for (const cv::Vec3d& one : OfMean(area, draws)) errors.push_back(GreyOfMeans(one));
   return errors;
 }
 

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include "desk/measure/cielab.h"
 #include "desk/measure/coded_mean.h"
@@ -9,8 +10,6 @@
 namespace qv {
 
 namespace {
-
-cv::Vec3d Levels(const cv::Point3i& mean) { return {1.0 * mean.x, 1.0 * mean.y, 1.0 * mean.z}; }
 
 // A codec's channels are luma and whole levels where its chroma is flat: what is cut off them is then alike.
 cv::Vec3d CutAlike(const cv::Scalar& mean, double place) {
@@ -20,7 +19,7 @@ cv::Vec3d CutAlike(const cv::Scalar& mean, double place) {
 }
 
 cv::Vec3d CutOff(const cv::Scalar& pixels, const cv::Point3i& mean) {
-  const cv::Vec3d cut = cv::Vec3d(pixels[0], pixels[1], pixels[2]) - Levels(mean);
+  const cv::Vec3d cut = cv::Vec3d(pixels[0], pixels[1], pixels[2]) - LevelsOf(mean);
   return {std::clamp(cut[0], 0.0, 1.0), std::clamp(cut[1], 0.0, 1.0), std::clamp(cut[2], 0.0, 1.0)};
 }
 
@@ -34,7 +33,7 @@ std::vector<cv::Vec3d> DrawUncoded(const cv::Mat& pixels, double area, const cv:
     cv::Vec3d cut;
     for (int k = 0; k < 3; ++k) normal[k] = random.gaussian(1);
     for (int k = 0; k < 3; ++k) cut[k] = random.uniform(0.0, 1.0);
-    draws.push_back(Levels(mean) + cut + root * normal);
+    draws.push_back(LevelsOf(mean) + cut + root * normal);
   }
   return draws;
 }
@@ -62,7 +61,7 @@ std::vector<cv::Vec3d> DrawPatchColours(const cv::Mat& pixels, double area, cons
   cv::RNG random(seed);
   if (codec.luma == 0) return DrawUncoded(pixels, area, mean, random);
   const CodedMean coded(pixels, codec);
-  const cv::Vec3d decoded = Levels(mean) + CutOff(cv::mean(pixels), mean);
+  const cv::Vec3d decoded = LevelsOf(mean) + CutOff(cv::mean(pixels), mean);
   std::vector<cv::Vec3d> draws;
   for (int i = 0; i < kColourDraws; ++i) draws.push_back(decoded - coded.Draw(area, random));
   return draws;
@@ -76,24 +75,45 @@ std::vector<cv::Vec3d> DrawStandardColours(const cv::Mat& pixels, double area, c
   std::vector<cv::Vec3d> draws;
   for (int i = 0; i < kColourDraws; ++i) {
     const cv::Vec3d cut = CutAlike(cv::mean(pixels), random.uniform(0.0, 1.0));
-    draws.push_back(Levels(mean) + cut - coded.DrawOther(area, random));
+    draws.push_back(LevelsOf(mean) + cut - coded.DrawOther(area, random));
   }
   return draws;
 }
 
 Uncertainty TrustInColour(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const ColourFigure& figure) {
-  const double reading = figure(Levels(mean));
+  const double reading = figure(LevelsOf(mean));
   std::vector<double> errors;
   for (const cv::Vec3d& draw : draws) errors.push_back(figure(draw) - reading);
   return FromErrors(std::move(errors), kPixelMethod);
 }
 
-Uncertainty TrustInPair(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const cv::Point3i& standard,
-                        const std::vector<cv::Vec3d>& standard_draws, const PairFigure& figure) {
-  const double reading = figure(Levels(mean), Levels(standard));
-  std::vector<double> errors;
+void DrawnDifferences::Add(double reading, std::vector<double> drawn) {
+  readings_.push_back(reading);
+  draws_.push_back(std::move(drawn));
+}
+
+void DrawnDifferences::Add(const cv::Point3i& mean, const std::vector<cv::Vec3d>& draws, const cv::Point3i& standard,
+                           const std::vector<cv::Vec3d>& standard_draws, const PairFigure& difference) {
+  std::vector<double> drawn;
   for (std::size_t i = 0; i < std::min(draws.size(), standard_draws.size()); ++i) {
-    errors.push_back(figure(draws[i], standard_draws[i]) - reading);
+    drawn.push_back(difference(draws[i], standard_draws[i]));
+  }
+  Add(difference(LevelsOf(mean), LevelsOf(standard)), std::move(drawn));
+}
+
+Uncertainty DrawnDifferences::OfPatch(std::size_t i) const {
+  std::vector<double> errors = draws_.at(i);
+  for (double& error : errors) error -= readings_[i];
+  return FromErrors(std::move(errors), kPixelMethod);
+}
+
+Uncertainty DrawnDifferences::OfAll(const std::function<double(const std::vector<double>&)>& figure) const {
+  const double reading = figure(readings_);
+  std::vector<double> all(draws_.size());
+  std::vector<double> errors;
+  for (std::size_t draw = 0; draw < draws_.at(0).size(); ++draw) {
+    for (std::size_t i = 0; i < all.size(); ++i) all[i] = draws_[i][draw];
+    errors.push_back(figure(all) - reading);
   }
   return FromErrors(std::move(errors), kPixelMethod);
 }
